@@ -1,0 +1,118 @@
+#include "core/process.h"
+
+#include <fcntl.h>
+#include <signal.h>
+#include <spawn.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <cerrno>
+
+namespace Bluetooth {
+
+namespace {
+
+/// What the new process does to itself before it becomes the program.
+class SpawnSetup {
+public:
+    /// @param output descriptor to become its standard output; -1: this process's own
+    explicit SpawnSetup(int output) {
+        posix_spawn_file_actions_init(&m_actions);
+        posix_spawnattr_init(&m_attributes);
+
+        // Output first: its descriptor may be 0 where this process has closed its own.
+        if (output >= 0)
+            posix_spawn_file_actions_adddup2(&m_actions, output, STDOUT_FILENO);
+        posix_spawn_file_actions_addopen(&m_actions, STDIN_FILENO, "/dev/null", O_RDONLY, 0);
+        // Not left to close-on-exec: descriptors that are not the library's own lack it.
+        posix_spawn_file_actions_addclosefrom_np(&m_actions, STDERR_FILENO + 1);
+
+        sigset_t none;
+        sigemptyset(&none);
+        posix_spawnattr_setsigmask(&m_attributes, &none);
+        sigset_t all;
+        sigfillset(&all);
+        posix_spawnattr_setsigdefault(&m_attributes, &all);
+        posix_spawnattr_setflags(&m_attributes, POSIX_SPAWN_SETSIGMASK | POSIX_SPAWN_SETSIGDEF);
+    }
+
+    SpawnSetup(const SpawnSetup&) = delete;
+    SpawnSetup& operator=(const SpawnSetup&) = delete;
+
+    ~SpawnSetup() {
+        posix_spawnattr_destroy(&m_attributes);
+        posix_spawn_file_actions_destroy(&m_actions);
+    }
+
+    const posix_spawn_file_actions_t* actions() const { return &m_actions; }
+    const posix_spawnattr_t* attributes() const { return &m_attributes; }
+
+private:
+    posix_spawn_file_actions_t m_actions{};
+    posix_spawnattr_t m_attributes{};
+};
+
+/// @return the process, or -1 with errno set
+pid_t start(const char* program, const std::vector<std::string>& arguments, int output) {
+    if (!program) {
+        errno = EINVAL;
+        return -1;
+    }
+    std::vector<char*> argv{const_cast<char*>(program)};
+    for (const std::string& argument : arguments)
+        argv.push_back(const_cast<char*>(argument.c_str()));
+    argv.push_back(nullptr);
+
+    const SpawnSetup setup(output);
+    pid_t pid = -1;
+    const int error =
+        posix_spawn(&pid, program, setup.actions(), setup.attributes(), argv.data(), environ);
+    if (error != 0) {
+        errno = error;
+        return -1;
+    }
+    return pid;
+}
+
+int waitFor(pid_t pid) {
+    int status = 0;
+    while (waitpid(pid, &status, 0) < 0) {
+        if (errno != EINTR)
+            return -1;
+    }
+    return status;
+}
+
+} // namespace
+
+std::unique_ptr<ProcessReader> ProcessReader::open(const char* program,
+                                                   const std::vector<std::string>& arguments) {
+    int ends[2];
+    if (pipe2(ends, O_CLOEXEC) != 0)
+        return nullptr;
+    FILE* stream = fdopen(ends[0], "r");
+    const pid_t pid = stream ? start(program, arguments, ends[1]) : -1;
+    const int error = errno;
+    close(ends[1]);
+    if (pid >= 0)
+        return std::unique_ptr<ProcessReader>(new ProcessReader(stream, pid));
+
+    if (stream)
+        fclose(stream);
+    else
+        close(ends[0]);
+    errno = error;
+    return nullptr;
+}
+
+ProcessReader::~ProcessReader() {
+    fclose(m_stream);
+    waitFor(m_pid);
+}
+
+int runProcess(const char* program, const std::vector<std::string>& arguments) {
+    const pid_t pid = start(program, arguments, -1);
+    return pid < 0 ? -1 : waitFor(pid);
+}
+
+} // namespace Bluetooth
