@@ -1,0 +1,32 @@
+#ifndef KESBLUETOOTH_CONNECTION_H
+#define KESBLUETOOTH_CONNECTION_H
+
+#include <bluetooth/export.h>
+
+#include <dbus/dbus.h>
+
+namespace Bluetooth {
+
+/// Gives the process's connection to a bus: libdbus's shared one, the same for every proxy.
+///
+/// The process does not end when the bus goes away (libdbus's exit-on-disconnect is turned off);
+/// calls then fail, and a later get() connects anew.
+///
+/// Programs that call dbus_connection_send_with_reply_and_block() on this connection themselves
+/// lose nothing, but a slow call of theirs holds up every call of the library meanwhile.
+class KESBLUETOOTH_API Connection {
+public:
+    Connection() = delete;
+
+    /// @return the shared connection with one more reference, or null when the bus cannot be
+    ///         reached (logged)
+    /// Blocks while connecting. May be called from any thread.
+    static DBusConnection* get(DBusBusType type);
+
+    /// Drops one reference. @param connection may be null
+    static void unref(DBusConnection* connection);
+};
+
+} // namespace Bluetooth
+
+#endif

@@ -1,0 +1,243 @@
+#ifndef KESBLUETOOTH_REMOTE_OBJECT_H
+#define KESBLUETOOTH_REMOTE_OBJECT_H
+
+#include <bluetooth/export.h>
+#include <bluetooth/object_path.h>
+#include <bluetooth/signal_handler.h>
+#include <bluetooth/variant.h>
+
+#include <dbus/dbus.h>
+#include <pthread.h>
+
+#include <atomic>
+#include <list>
+#include <string>
+#include <vector>
+
+namespace Bluetooth {
+
+/// The proxy of one interface of one object of a remote D-Bus service.
+///
+/// A method call is made in steps: newMessage(), an append() for each argument, sendMessage() or
+/// sendMessagePending(), then one getReplyValue() for the reply's first argument:
+/// @code
+///     RemoteObject bus("org.freedesktop.DBus", "/", "org.freedesktop.DBus", DBUS_BUS_SESSION);
+///     std::string id;
+///     if (bus.newMessage("GetId") != 0 || bus.sendMessage(true, -1) != 0 ||
+///         bus.getReplyValue(id) != 0)
+///         std::cerr << bus.getErrorMessage() << '\n';
+/// @endcode
+///
+/// ERRORS. Operations that return int give 0 for success and -1 for failure, and record a number
+/// and a text in the proxy. An error stays until resetError(): no success clears it.
+///
+/// THREADS. One thread at a time may use a proxy; different proxies may be used by different
+/// threads at once. A call waits only for its own reply, never for another thread's.
+///
+/// SIGNALS. A subscription lasts until its proxy is destroyed. Signals are delivered by the
+/// receive thread that one proxy of the process starts; until then they are kept in memory.
+/// Subscribe before startLoop() where no signal may be missed.
+class KESBLUETOOTH_API RemoteObject {
+public:
+    /// @param destination bus name of the service, e.g. "org.bluez"
+    /// @param path        object path, e.g. "/org/bluez/1234/hci0"
+    /// @param interface   interface name, e.g. "org.bluez.Adapter"
+    /// The texts are copied and must not be null. They are not checked here: a call through a
+    /// proxy with an unusable name fails. Connects to the bus when the process has not yet; when
+    /// that fails, calls fail too.
+    RemoteObject(const char* destination, const char* path, const char* interface,
+                 DBusBusType busType);
+
+    RemoteObject(const RemoteObject&) = delete;
+    RemoteObject& operator=(const RemoteObject&) = delete;
+
+    /// Ends the proxy's subscriptions and drops its messages. The reference to the shared
+    /// connection is kept on purpose: Connection::unref() is for programs that want to drop it.
+    /// Waits while another thread runs one of this proxy's callbacks.
+    virtual ~RemoteObject();
+
+    /// The shared connection of the bus; null when it could not be reached. Not to be released.
+    DBusConnection* getConnection() const { return m_connection; }
+    /// This process's unique name on the bus, e.g. ":1.42"; "" without a connection.
+    const char* getConnectionName() const;
+    const char* getDestination() const { return m_destination.c_str(); }
+    const char* getPath() const { return m_path.c_str(); }
+    const char* getInterface() const { return m_interface.c_str(); }
+
+    /// Begins a method call and forgets the one begun before.
+    /// @return 0; -1 with error 1 for a null name (the call begun before is kept) or error 6
+    int newMessage(const char* method);
+
+    /// Each appends one argument (D-Bus type b, s, o, u, q) to the call begun by newMessage().
+    /// @return 0; -1 with error 1 for null, 3 for a path that does not begin with "/", else 7
+    int append(bool value);
+    int append(const char* text);
+    int append(const ObjectPath& path);
+    int append(unsigned int value);
+    int append(unsigned short value);
+
+    /// Appends one argument of D-Bus type v.
+    /// @return 0; -1 with error 8 or 9. A text array or a signed integer cannot be sent: nothing
+    ///         is appended and error 8 is recorded, yet the result is 0. Callers rely on such a
+    ///         call still going out; hasError() tells.
+    int append(const Variant& value);
+
+    /// Sends the call.
+    /// @param wantReply true: blocks until the reply is there, which is then held for
+    ///                  getReplyValue(); false: returns once the call is handed to the bus, and no
+    ///                  reply will come
+    /// @param timeoutMs how long to wait for the reply, in milliseconds; -1 for libdbus's default
+    ///                  of 25 s; unused without a reply
+    /// @return 0; -1 with error 10 (wantReply false) or error 11 and the service's or the bus's own
+    ///         error text
+    int sendMessage(bool wantReply, int timeoutMs);
+
+    /// Sends the call and waits for its reply without a time limit, while messages that come in,
+    /// requests to objects that this process serves among them, are handled on this thread.
+    /// Returns early when SIGTERM or SIGINT comes: a handler for both is installed and stays.
+    /// @return 0 when the call was sent, also when no reply came (getReplyValue() then gives error
+    ///         2); -1 with error 11. A reply that is a D-Bus error counts as a reply: reading a
+    ///         path from it gives its text.
+    /// One thread of the process at a time may wait here.
+    int sendMessagePending();
+
+    /// Holds a reply as if it had come for this proxy's call.
+    /// @param reply owned by the proxy afterwards; null is error 2
+    int setReplyMessage(DBusMessage* reply);
+
+    /// Each reads the held reply's first argument and lets go of the reply.
+    /// @return 0; -1 with error 2 when no reply is held, 4 for an argument of another type
+    int getReplyValue(std::string& text);
+    int getReplyValue(bool& value);
+    /// An empty array of any type is an empty list.
+    int getReplyValue(std::vector<std::string>& texts);
+    int getReplyValue(std::vector<ObjectPath>& paths);
+
+    /// Reads a path. Services answer with a text where something went wrong: such a text is stored
+    /// in `path` too and becomes the error text (error 11), and the result is -2. Any other type is
+    /// error 11, result -1.
+    int getReplyValue(ObjectPath& path);
+
+    /// Reads a dictionary (keys s or u, values as Variant tells). Stops with success at an entry
+    /// whose name is "". On failure `dict` holds the entries before the bad one.
+    /// @return 0; -1 with error 2, 5 for a reply that is no dictionary, 4 for a bad entry
+    int getReplyValue(Dict& dict);
+
+    /// Forgets the error.
+    void resetError();
+    bool hasError() const { return m_errorNumber != 0; }
+    /// 0 for none; see getErrorMessage().
+    int getErrorNumber() const { return m_errorNumber; }
+    /// The error as text: "" for none, the D-Bus error message for number 11, and for the others
+    /// 1 "Parameter is null", 2 "Reply message is null", 3 "Invalid path", 4 "Invalid reply value",
+    /// 5 "Invalid reply format", 6 "Failed to create message", 7 "Failed to append args to
+    /// message", 8 "Failed to append args = iterator", 9 "Failed to open container", 10 "Failed to
+    /// send message".
+    std::string getErrorMessage();
+
+    /// Three lines that tell the destination, the path and the interface.
+    std::string getInfo() const;
+    /// Writes getInfo() to standard output.
+    void printInfo() const;
+
+    /// Each subscribes to a signal of this proxy's interface and path; the kind tells which
+    /// arguments the signal has. A signal fires for every proxy of its interface that subscribed
+    /// to it, whichever object sent it. Subscribing twice fires twice.
+    /// @param member   the signal's name, e.g. "PropertyChanged"
+    /// @param callback must not be null; called on the receive thread with this proxy, except that
+    ///                 a NoArgumentCallback gets the proxy that runs the loop
+    /// @return 0, or -1 when the bus refuses (logged; nothing is subscribed)
+    /// Blocks until the bus has answered.
+    int setSignalHandlerNoArgument(const char* member, NoArgumentCallback callback);
+    int setSignalHandlerString(const char* member, StringCallback callback);
+    int setSignalHandlerObjectPath(const char* member, ObjectPathCallback callback);
+    int setSignalHandlerStringVariant(const char* member, StringVariantCallback callback);
+    int setSignalHandlerStringDict(const char* member, StringDictCallback callback);
+
+    /// Starts the receive thread of this proxy's bus. One for each bus is enough for all proxies.
+    /// The proxy must outlive the thread: stopLoop() and waitLoop() come before its destruction.
+    /// @return 0, or pthread_create's error number
+    int startLoop();
+    /// Asks every receive thread of the process to end, for good: none can run afterwards. They end
+    /// after the callback they are in, within 100 ms when idle; what has not been delivered by then
+    /// stays undelivered. Safe in a signal handler.
+    void stopLoop();
+    /// Waits for this proxy's receive thread to end.
+    /// @return 0, or pthread_join's error number (ESRCH when startLoop() was not called)
+    int waitLoop();
+
+    /// Each offers one message to the subscriptions of its kind; the receive thread calls them.
+    void signalHandlerDispatcherNoArgument(DBusMessage* message);
+    void signalHandlerDispatcherString(DBusMessage* message);
+    void signalHandlerDispatcherObjectPath(DBusMessage* message);
+    void signalHandlerDispatcherStringVariant(DBusMessage* message);
+    void signalHandlerDispatcherStringDict(DBusMessage* message);
+
+    /// Each decodes one half of a dictionary entry, or of a (name, value) pair of arguments.
+    /// @return 0; -1 with error 4, and the half keeps what it held
+    int parseEntryName(DBusMessageIter& iter, DictEntry& entry);
+    int parseEntryValue(DBusMessageIter& iter, DictEntry& entry);
+
+private:
+    friend void* receiveSignal(void* proxy);
+    template <class Callback>
+    using Registry = std::list<SignalHandler<Callback>>;
+
+    enum ErrorNumber {
+        errorNullParameter = 1,
+        errorNullReply,
+        errorInvalidPath,
+        errorReplyValue,
+        errorReplyFormat,
+        errorCreateMessage,
+        errorAppendArgs,
+        errorAppendIterator,
+        errorOpenContainer,
+        errorSend,
+        errorDBus
+    };
+    enum class DictResult { Read, NoDict, BadName, BadValue };
+
+    int recordError(ErrorNumber number);
+    int recordError(ErrorNumber number, const char* text);
+    int appendBasic(int type, const void* value);
+    DictResult parseDictionary(DBusMessageIter& iter, Dict& dict);
+    template <class Wire, class Value>
+    int readBasic(int type, Value& value);
+    template <class Text>
+    int readTexts(std::vector<Text>& texts);
+
+    template <class Callback>
+    int subscribe(Registry<Callback>& registry, const char* member, Callback callback);
+    template <class Callback>
+    void takeMembers(Registry<Callback>& registry, std::vector<std::string>& members);
+    void unsubscribeAll();
+    std::string matchRule(const std::string& member) const;
+    static void dispatch(void* proxy, DBusMessage* message);
+
+    std::string m_destination;
+    std::string m_path;
+    std::string m_interface;
+    DBusConnection* m_connection;
+    DBusMessage* m_message = nullptr;
+    DBusMessage* m_reply = nullptr;
+    DBusBusType m_busType;
+    pthread_t m_loopThread = 0;
+    std::atomic<int> m_errorNumber{0}; // a loop proxy's is also set by the receive thread
+    std::string m_errorText;
+
+    // Shared by all proxies; never destroyed, since a receive thread may outlive main().
+    static Registry<NoArgumentCallback>& signalHandlerVectorNoArgument;
+    static Registry<StringCallback>& signalHandlerVectorString;
+    static Registry<ObjectPathCallback>& signalHandlerVectorObjectPath;
+    static Registry<StringVariantCallback>& signalHandlerVectorStringVariant;
+    static Registry<StringDictCallback>& signalHandlerVectorStringDict;
+};
+
+/// Body of the receive thread: delivers signals on behalf of `proxy` (a RemoteObject*) until
+/// stopLoop(). startLoop() runs it in a thread of its own. @return null
+KESBLUETOOTH_API void* receiveSignal(void* proxy);
+
+} // namespace Bluetooth
+
+#endif

@@ -1,0 +1,118 @@
+#ifndef KESBLUETOOTH_CORE_BUS_LINK_H
+#define KESBLUETOOTH_CORE_BUS_LINK_H
+
+#include "core/dbus_ptr.h"
+
+#include <dbus/dbus.h>
+
+#include <atomic>
+#include <chrono>
+#include <condition_variable>
+#include <deque>
+#include <mutex>
+#include <vector>
+
+namespace Bluetooth {
+
+/// How the calls and the signals of all proxies share the one connection of a bus.
+///
+/// One thread at a time leads: it waits for the socket outside libdbus, reads and dispatches.
+/// Every other thread that waits for a reply sleeps until the leader has dispatched it, or takes
+/// the lead. A filter sorts what is dispatched: signals go to an inbox that the receive thread
+/// empties in order, replies complete their pending calls. So no thread can take another's reply,
+/// and no thread waits inside libdbus while others need the connection.
+///
+/// The receive thread leads when nobody calls. While calls are made, and shortly after, it leaves
+/// the lead to the callers, which saves a change of threads in every call.
+class BusLink {
+public:
+    using Deliver = void (*)(void* context, DBusMessage* signal);
+
+    /// The link of a connection, made when first asked for and living as long as the connection.
+    /// @return null for a null connection or without memory
+    static BusLink* of(DBusConnection* connection);
+
+    BusLink(const BusLink&) = delete;
+    BusLink& operator=(const BusLink&) = delete;
+
+    /// Sends a method call and waits for its reply.
+    /// @param timeoutMs milliseconds, or -1 for libdbus's default
+    /// @return the reply; null with `error` set, also when the reply is a D-Bus error
+    MessagePtr call(DBusMessage* message, int timeoutMs, DBusError& error);
+
+    /// Sends a message that gets no reply and waits until it is written.
+    /// @return false when the connection is closed or refuses it
+    bool send(DBusMessage* message);
+
+    /// Begins a method call that has no time limit. @return false without memory; `pending` stays
+    /// null when the connection is closed
+    bool begin(DBusMessage* message, PendingPtr& pending);
+
+    /// Leads until the call is answered, `interrupted` is set or the connection closes. Requests
+    /// to objects of this process are answered meanwhile, on this thread.
+    /// @return the reply, a D-Bus error among them; null when none came, and none will any more
+    MessagePtr finish(PendingPtr pending, const std::atomic<bool>& interrupted);
+
+    /// Waits until everything sent is written or the connection closes.
+    void flush();
+
+    /// Signals are kept for the receive thread while there are subscriptions, even before it runs.
+    void addSubscription();
+    void removeSubscription();
+
+    /// The receive thread's work: delivers signals, one after the other, until requestStop().
+    void receive(Deliver deliver, void* context);
+
+    /// Ends every receive() of the process, for good. Safe in a signal handler.
+    static void requestStop() { stopRequested = true; }
+    static bool isStopRequested() { return stopRequested; }
+
+    /// Takes notice of a bus that has gone. @return whether the connection is open
+    bool checkOpen();
+
+private:
+    struct Waiter;
+    using Clock = std::chrono::steady_clock;
+    using Milliseconds = std::chrono::milliseconds;
+    using Lock = std::unique_lock<std::mutex>;
+
+    explicit BusLink(DBusConnection* connection);
+    ~BusLink();
+    bool attach();
+
+    void wait(Waiter& waiter);
+    bool mayLead(const Waiter& waiter) const;
+    bool lead(Lock& lock, Milliseconds limit);
+    bool step(Milliseconds limit);
+    void awaitInput(Milliseconds limit);
+    void passLead();
+    void wakeFinished();
+    void wakeLeader();
+    void receiveMore(Lock& lock);
+    bool dispatchesHere() const;
+
+    static DBusHandlerResult filter(DBusConnection*, DBusMessage* message, void* link);
+    DBusHandlerResult keepSignal(DBusMessage* message);
+    static void replyArrived(DBusPendingCall*, void* link);
+
+    static std::atomic<bool> stopRequested;
+
+    DBusConnection* const m_connection; // not referenced: the link is the connection's data
+    int m_wakeFd = -1;                  // interrupts the leader's wait for the socket
+
+    // Guards what follows. Not held while waiting for the socket, in libdbus's I/O and dispatch, or
+    // in callbacks; libdbus's own locks may be taken under it.
+    std::mutex m_mutex;
+    bool m_reading = false; // some thread leads
+    std::vector<Waiter*> m_waiters;
+    Clock::time_point m_lastCall;
+    std::condition_variable m_receiverWake;
+    bool m_receiverParked = false; // the receive thread sleeps until told that no call is left
+    int m_receivers = 0;
+    int m_subscriptions = 0;
+    std::deque<MessagePtr> m_inbox;
+};
+
+} // namespace Bluetooth
+
+#endif

@@ -1,0 +1,9 @@
+#include <bluetooth/object_path.h>
+
+namespace Bluetooth {
+
+ObjectPath::ObjectPath(const char* text) : m_path(text ? text : "") {}
+
+ObjectPath::ObjectPath(const std::string& text) : m_path(text) {}
+
+} // namespace Bluetooth

@@ -1,0 +1,271 @@
+// How replies, signals and variants become values of the library, and back.
+
+#include <bluetooth/remote_object.h>
+
+#include "core/dbus_ptr.h"
+
+#include <cstring>
+
+namespace Bluetooth {
+
+namespace {
+
+template <class Value>
+Value basicAt(DBusMessageIter& iter) {
+    Value value{};
+    dbus_message_iter_get_basic(&iter, &value);
+    return value;
+}
+
+bool isText(int type) {
+    return type == DBUS_TYPE_STRING || type == DBUS_TYPE_OBJECT_PATH;
+}
+
+bool isEmptyArray(DBusMessageIter& array) {
+    DBusMessageIter first;
+    dbus_message_iter_recurse(&array, &first);
+    return dbus_message_iter_get_arg_type(&first) == DBUS_TYPE_INVALID;
+}
+
+/// The elements must be of a type that is text in libdbus, or none.
+template <class Text>
+void readTextArray(DBusMessageIter& array, std::vector<Text>& texts) {
+    DBusMessageIter element;
+    for (dbus_message_iter_recurse(&array, &element);
+         dbus_message_iter_get_arg_type(&element) != DBUS_TYPE_INVALID;
+         dbus_message_iter_next(&element))
+        texts.emplace_back(basicAt<const char*>(element));
+}
+
+bool isDictionary(DBusMessageIter& iter) {
+    return dbus_message_iter_get_arg_type(&iter) == DBUS_TYPE_ARRAY &&
+           dbus_message_iter_get_element_type(&iter) == DBUS_TYPE_DICT_ENTRY;
+}
+
+/// Reads what a variant holds. @return false for a type that Variant has no alternative for
+bool readVariant(DBusMessageIter& inner, Variant& value) {
+    switch (dbus_message_iter_get_arg_type(&inner)) {
+    case DBUS_TYPE_STRING:
+    case DBUS_TYPE_OBJECT_PATH:
+        value = std::string(basicAt<const char*>(inner));
+        return true;
+    case DBUS_TYPE_UINT32:
+        value = std::uint32_t{basicAt<dbus_uint32_t>(inner)};
+        return true;
+    case DBUS_TYPE_UINT16:
+        value = std::uint16_t{basicAt<dbus_uint16_t>(inner)};
+        return true;
+    case DBUS_TYPE_INT16: // on purpose there is no alternative of 16 bits with a sign
+        value = std::int32_t{basicAt<dbus_int16_t>(inner)};
+        return true;
+    case DBUS_TYPE_BOOLEAN:
+        value = basicAt<dbus_bool_t>(inner) != 0;
+        return true;
+    case DBUS_TYPE_ARRAY: {
+        if (!isText(dbus_message_iter_get_element_type(&inner)) && !isEmptyArray(inner))
+            return false;
+        std::vector<std::string> texts;
+        readTextArray(inner, texts);
+        value = std::move(texts);
+        return true;
+    }
+    default:
+        return false;
+    }
+}
+
+/// The D-Bus side of a Variant that can be sent.
+class Outgoing : public boost::static_visitor<bool> {
+public:
+    const char* signature = nullptr; ///< null for what cannot be sent
+    int type = DBUS_TYPE_INVALID;
+    union {
+        dbus_uint32_t number;
+        dbus_uint16_t small;
+        dbus_bool_t boolean;
+        const char* text;
+    } value = {0};
+
+    bool operator()(std::uint32_t held) {
+        value.number = held;
+        return become(DBUS_TYPE_UINT32_AS_STRING);
+    }
+    bool operator()(std::uint16_t held) {
+        value.small = held;
+        return become(DBUS_TYPE_UINT16_AS_STRING);
+    }
+    bool operator()(bool held) {
+        value.boolean = held;
+        return become(DBUS_TYPE_BOOLEAN_AS_STRING);
+    }
+    bool operator()(const std::string& held) {
+        value.text = held.c_str();
+        // libdbus ends the process on a text that is not UTF-8.
+        return become(DBUS_TYPE_STRING_AS_STRING) && dbus_validate_utf8(held.c_str(), nullptr);
+    }
+    bool operator()(const std::vector<std::string>&) { return true; }
+    bool operator()(std::int32_t) { return true; }
+
+private:
+    bool become(const char* is) {
+        signature = is;
+        type = is[0];
+        return true;
+    }
+};
+
+} // namespace
+
+int RemoteObject::parseEntryName(DBusMessageIter& iter, DictEntry& entry) {
+    switch (dbus_message_iter_get_arg_type(&iter)) {
+    case DBUS_TYPE_STRING:
+        entry.first = basicAt<const char*>(iter);
+        return 0;
+    case DBUS_TYPE_UINT32:
+        entry.first = std::to_string(basicAt<dbus_uint32_t>(iter));
+        return 0;
+    default:
+        return recordError(errorReplyValue);
+    }
+}
+
+int RemoteObject::parseEntryValue(DBusMessageIter& iter, DictEntry& entry) {
+    switch (dbus_message_iter_get_arg_type(&iter)) {
+    case DBUS_TYPE_STRING:
+        entry.second = std::string(basicAt<const char*>(iter));
+        return 0;
+    case DBUS_TYPE_VARIANT: {
+        DBusMessageIter inner;
+        dbus_message_iter_recurse(&iter, &inner);
+        return readVariant(inner, entry.second) ? 0 : recordError(errorReplyValue);
+    }
+    default:
+        return recordError(errorReplyValue);
+    }
+}
+
+RemoteObject::DictResult RemoteObject::parseDictionary(DBusMessageIter& iter, Dict& dict) {
+    if (!isDictionary(iter))
+        return DictResult::NoDict;
+    dict.clear();
+    DBusMessageIter item;
+    for (dbus_message_iter_recurse(&iter, &item);
+         dbus_message_iter_get_arg_type(&item) != DBUS_TYPE_INVALID;
+         dbus_message_iter_next(&item)) {
+        DBusMessageIter half;
+        dbus_message_iter_recurse(&item, &half);
+        DictEntry entry;
+        if (parseEntryName(half, entry) != 0)
+            return DictResult::BadName;
+        if (entry.first.empty())
+            return DictResult::Read; // on purpose: an empty name ends the dictionary
+        dbus_message_iter_next(&half);
+        if (parseEntryValue(half, entry) != 0)
+            return DictResult::BadValue;
+        dict.push_back(std::move(entry));
+    }
+    return DictResult::Read;
+}
+
+int RemoteObject::append(const Variant& value) {
+    Outgoing outgoing;
+    const bool valid = boost::apply_visitor(outgoing, value);
+    if (!m_message || !valid)
+        return recordError(errorAppendIterator);
+    if (!outgoing.signature) {
+        recordError(errorAppendIterator);
+        return 0; // callers that test only the result go on without the argument
+    }
+    DBusMessageIter arguments;
+    DBusMessageIter container;
+    dbus_message_iter_init_append(m_message, &arguments);
+    if (!dbus_message_iter_open_container(&arguments, DBUS_TYPE_VARIANT, outgoing.signature,
+                                          &container))
+        return recordError(errorOpenContainer);
+    if (!dbus_message_iter_append_basic(&container, outgoing.type, &outgoing.value)) {
+        dbus_message_iter_abandon_container(&arguments, &container);
+        return recordError(errorAppendIterator);
+    }
+    if (!dbus_message_iter_close_container(&arguments, &container))
+        return recordError(errorAppendIterator);
+    return 0;
+}
+
+template <class Wire, class Value>
+int RemoteObject::readBasic(int type, Value& value) {
+    if (!m_reply)
+        return recordError(errorNullReply);
+    const MessagePtr reply(std::exchange(m_reply, nullptr));
+    DBusMessageIter iter;
+    if (!dbus_message_iter_init(reply.get(), &iter) ||
+        dbus_message_iter_get_arg_type(&iter) != type)
+        return recordError(errorReplyValue);
+    value = static_cast<Value>(basicAt<Wire>(iter));
+    return 0;
+}
+
+int RemoteObject::getReplyValue(std::string& text) {
+    return readBasic<const char*>(DBUS_TYPE_STRING, text);
+}
+
+int RemoteObject::getReplyValue(bool& value) {
+    return readBasic<dbus_bool_t>(DBUS_TYPE_BOOLEAN, value);
+}
+
+int RemoteObject::getReplyValue(ObjectPath& path) {
+    if (!m_reply)
+        return recordError(errorNullReply);
+    const MessagePtr reply(std::exchange(m_reply, nullptr));
+    DBusMessageIter iter;
+    const int type = dbus_message_iter_init(reply.get(), &iter)
+                         ? dbus_message_iter_get_arg_type(&iter)
+                         : DBUS_TYPE_INVALID;
+    if (!isText(type))
+        return recordError(errorDBus); // on purpose not the error of the other overloads
+    const char* text = basicAt<const char*>(iter);
+    path = ObjectPath(text);
+    if (type == DBUS_TYPE_OBJECT_PATH)
+        return 0;
+    // A text where a path was asked for is the service's error message.
+    recordError(errorDBus, text);
+    return -2;
+}
+
+template <class Text>
+int RemoteObject::readTexts(std::vector<Text>& texts) {
+    if (!m_reply)
+        return recordError(errorNullReply);
+    const MessagePtr reply(std::exchange(m_reply, nullptr));
+    DBusMessageIter iter;
+    if (!dbus_message_iter_init(reply.get(), &iter) ||
+        dbus_message_iter_get_arg_type(&iter) != DBUS_TYPE_ARRAY)
+        return recordError(errorReplyValue);
+    const int element = dbus_message_iter_get_element_type(&iter);
+    if (!isText(element) && element != DBUS_TYPE_SIGNATURE && !isEmptyArray(iter))
+        return recordError(errorReplyValue);
+    texts.clear();
+    readTextArray(iter, texts);
+    return 0;
+}
+
+int RemoteObject::getReplyValue(std::vector<std::string>& texts) {
+    return readTexts(texts);
+}
+
+int RemoteObject::getReplyValue(std::vector<ObjectPath>& paths) {
+    return readTexts(paths);
+}
+
+int RemoteObject::getReplyValue(Dict& dict) {
+    if (!m_reply)
+        return recordError(errorNullReply);
+    const MessagePtr reply(std::exchange(m_reply, nullptr));
+    DBusMessageIter iter;
+    dbus_message_iter_init(reply.get(), &iter); // of a reply without arguments: type 0
+    const DictResult result = parseDictionary(iter, dict);
+    if (result == DictResult::NoDict)
+        return recordError(errorReplyFormat);
+    return result == DictResult::Read ? 0 : -1;
+}
+
+} // namespace Bluetooth
