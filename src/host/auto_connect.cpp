@@ -1,0 +1,276 @@
+#include <bluetooth/auto_connect.h>
+
+#include "core/log.h"
+#include "host/auto_connect_file.h"
+
+#include <bluetooth/adapter.h>
+#include <bluetooth/adapter_list.h>
+#include <bluetooth/device.h>
+#include <bluetooth/dict_codec.h>
+#include <bluetooth/fifo.h>
+#include <bluetooth/manager.h>
+
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstring>
+#include <memory>
+#include <string>
+#include <vector>
+
+namespace Bluetooth {
+
+namespace {
+
+constexpr const char* COMMAND_PIPE = "/tmp/kes_bluetooth_autoconnect";
+constexpr mode_t FOLDER_MODE = 0755;
+
+bool createConfigFile(const char* path) {
+    if (mkdir(AUTO_CONNECT_FOLDER, FOLDER_MODE) != 0 && errno != EEXIST) {
+        logError(KES_HERE, "Can not create config path '%s'", AUTO_CONNECT_FOLDER);
+        return false;
+    }
+    std::ofstream file(path, std::ios::binary);
+    if (!file) {
+        logError(KES_HERE, "Config '%s' can not be open.", path);
+        return false;
+    }
+    if (!writeAutoConnectFile(file, "0")) {
+        logError(KES_HERE, "Config '%s' can not be written.", path);
+        return false;
+    }
+    return true;
+}
+
+/// AutoConnect::set() for a list that may hold any byte.
+bool rewrite(const AutoConnect& config, const char* adapter, bool enable, const std::string& list) {
+    const std::string path = autoConnectPath(adapter);
+    if (!config.checkConfigFile(path.c_str()))
+        return false;
+    std::ofstream file(path, std::ios::binary);
+    if (!file) {
+        logError(KES_HERE, "Can not open config file '%s'.", path.c_str());
+        return false;
+    }
+    if (!writeAutoConnectFile(file, (enable ? '1' : '0') + list)) {
+        logError(KES_HERE, "Can not write config file '%s'.", path.c_str());
+        return false;
+    }
+    config.reload();
+    return true;
+}
+
+/// Opens an adapter's file for reading. @return null (logged) when that cannot be done
+std::unique_ptr<AutoConnectFile> openFile(const std::string& path, std::ios::openmode mode) {
+    auto file = std::make_unique<AutoConnectFile>(path, mode);
+    if (!file->isOpen()) {
+        logError(KES_HERE, "Cannot open config file '%s'", path.c_str());
+        return nullptr;
+    }
+    if (file->isTooLarge()) {
+        logError(KES_HERE, "Config '%s' is too large.", path.c_str());
+        return nullptr;
+    }
+    return file;
+}
+
+/// AutoConnect::removeDevice() for an entry that may hold any byte.
+bool removeEntry(const AutoConnect& config, const char* adapter, const std::string& device) {
+    const std::string path = autoConnectPath(adapter);
+    if (!config.checkConfigFile(path.c_str()))
+        return false;
+    const auto file = openFile(path, std::ios::in | std::ios::out);
+    if (!file)
+        return false;
+    // The list of a disabled adapter is left alone on purpose.
+    if (!file->readsEnabled())
+        return true;
+    std::string kept;
+    for (const std::string& entry : file->readEntries()) {
+        if (entry != device)
+            kept += ',' + entry;
+    }
+    // Callers learn that the file was processed, not whether it could be rewritten.
+    rewrite(config, adapter, true, kept);
+    return true;
+}
+
+/// Whether the daemon still has this very adapter. Its path changes when the daemon restarts.
+bool isStillThere(Manager& manager, const char* address, const Adapter& adapter) {
+    const std::unique_ptr<Adapter> now(manager.findAdapter(address));
+    return now && strcmp(now->getPath(), adapter.getPath()) == 0;
+}
+
+/// Appends the devices that the adapter knows, in the file's order.
+/// @return the entries that it does not know
+std::vector<std::string> appendKnown(Adapter& adapter, const std::vector<std::string>& entries,
+                                     DeviceList& devices) {
+    std::vector<std::string> unknown;
+    for (const std::string& entry : entries) {
+        const bool isText = entry.find('\0') == std::string::npos;
+        if (!isText)
+            logError(KES_HERE, "An entry of the config file holds a NUL byte.");
+        Device* const device = isText ? adapter.findDevice(entry.c_str(), true) : nullptr;
+        if (device)
+            devices.push_back(device);
+        else
+            unknown.push_back(entry);
+    }
+    return unknown;
+}
+
+void removeUnknown(const AutoConnect& config, Manager& manager, const char* address,
+                   const Adapter& adapter, const std::vector<std::string>& unknown) {
+    // An adapter that was pulled out, or a daemon that restarts, knows no device at all: the
+    // user's list must survive that.
+    if (!unknown.empty() && !isStillThere(manager, address, adapter)) {
+        logError(KES_HERE, "Adapter '%s' has gone; its device list is kept.", address);
+        return;
+    }
+    for (const std::string& entry : unknown)
+        removeEntry(config, address, entry);
+}
+
+/// One adapter's part of AutoConnect::getAutoConnectDeviceList().
+void appendTargets(const AutoConnect& config, Manager& manager, Adapter& adapter,
+                   DeviceList& devices) {
+    const std::unique_ptr<Dict> properties(adapter.getProperties());
+    const std::string address = find(properties.get(), "Address");
+    if (find(properties.get(), "Powered") != "1")
+        return;
+    const std::string path = autoConnectPath(address.c_str());
+    if (!config.checkConfigFile(path.c_str()))
+        return;
+    auto file = openFile(path, std::ios::in);
+    if (!file || !file->readsEnabled())
+        return;
+    const std::vector<std::string> entries = file->readEntries();
+    file.reset();
+    const std::vector<std::string> unknown = appendKnown(adapter, entries, devices);
+    removeUnknown(config, manager, address.c_str(), adapter, unknown);
+}
+
+} // namespace
+
+bool AutoConnect::checkConfigFile(const char* path) const {
+    if (!path) {
+        logError(KES_HERE, "Config '%s' can not be open.", "(null)");
+        return false;
+    }
+    struct stat status {};
+    if (stat(path, &status) != 0)
+        return createConfigFile(path);
+    if (!S_ISREG(status.st_mode)) {
+        logError(KES_HERE, "Config '%s' is not regular file.", path);
+        return false;
+    }
+    if (access(path, R_OK | W_OK) != 0) {
+        logError(KES_HERE, "Config '%s' can not be write/read.", path);
+        return false;
+    }
+    return true;
+}
+
+bool AutoConnect::getEnable(const char* adapter) const {
+    if (!adapter) {
+        logError(KES_HERE, "Adapter address is null.");
+        return false;
+    }
+    const std::string path = autoConnectPath(adapter);
+    if (!checkConfigFile(path.c_str()))
+        return false;
+    AutoConnectFile file(path, std::ios::in);
+    return file.isOpen() && file.readsNonZero();
+}
+
+bool AutoConnect::set(const char* adapter, bool enable, const char* deviceList) {
+    if (!adapter) {
+        logError(KES_HERE, "Adapter address is null.");
+        return false;
+    }
+    if (!deviceList) {
+        logError(KES_HERE, "Device address list is null.");
+        return false;
+    }
+    return rewrite(*this, adapter, enable, deviceList);
+}
+
+bool AutoConnect::removeDevice(const char* adapter, const char* device) {
+    if (!adapter) {
+        logError(KES_HERE, "Adapter address is null.");
+        return false;
+    }
+    if (!device) {
+        logError(KES_HERE, "Device address is null.");
+        return false;
+    }
+    return removeEntry(*this, adapter, device);
+}
+
+DeviceList* AutoConnect::getDeviceList(const char* adapter) {
+    if (!adapter) {
+        logError(KES_HERE, "Adapter address is null.");
+        return nullptr;
+    }
+    const std::unique_ptr<Manager> manager(Manager::getManager());
+    if (!manager) {
+        logError(KES_HERE, "Failed to get manager.");
+        return nullptr;
+    }
+    const std::unique_ptr<Adapter> proxy(manager->findAdapter(adapter));
+    if (!proxy) {
+        logError(KES_HERE, "Failed to get adapter.");
+        return nullptr;
+    }
+    const std::string path = autoConnectPath(adapter);
+    if (!checkConfigFile(path.c_str()))
+        return nullptr;
+    auto file = openFile(path, std::ios::in);
+    if (!file)
+        return nullptr;
+    const std::vector<std::string> entries = file->readEntries();
+    file.reset();
+    auto devices = std::make_unique<DeviceList>();
+    const std::vector<std::string> unknown = appendKnown(*proxy, entries, *devices);
+    removeUnknown(*this, *manager, adapter, *proxy, unknown);
+    return devices.release();
+}
+
+DeviceList* AutoConnect::getAutoConnectDeviceList() {
+    const std::unique_ptr<Manager> manager(Manager::getManager());
+    if (!manager) {
+        logError(KES_HERE, "Failed to get manager.");
+        return nullptr;
+    }
+    const std::unique_ptr<AdapterList> adapters(manager->listAdapters());
+    if (!adapters) {
+        logError(KES_HERE, "Failed to get adapter list");
+        return nullptr;
+    }
+    auto devices = std::make_unique<DeviceList>();
+    for (Adapter* adapter : *adapters) {
+        if (adapter) // null: the daemon left the bus while the list was made
+            appendTargets(*this, *manager, *adapter, *devices);
+    }
+    return devices.release();
+}
+
+bool AutoConnect::sendCommand(const char* command) const {
+    const std::unique_ptr<Fifo> pipe(Fifo::getWriteFifo(COMMAND_PIPE));
+    return pipe && command && pipe->writeData(command, static_cast<int>(strlen(command))) == 0;
+}
+
+bool AutoConnect::reload() const {
+    return sendCommand("1");
+}
+
+bool AutoConnect::pause() const {
+    return sendCommand("pause");
+}
+
+bool AutoConnect::resume() const {
+    return sendCommand("resume");
+}
+
+} // namespace Bluetooth

@@ -1,0 +1,65 @@
+#include "host/auto_connect_file.h"
+
+#include <locale>
+
+namespace Bluetooth {
+
+namespace {
+
+constexpr std::streamoff MAX_SIZE = 1024 * 1024;
+constexpr std::streamoff FIRST_ENTRY = 2; // after the flag and one comma, whatever they are
+constexpr char SEPARATOR = ',';
+
+} // namespace
+
+std::string autoConnectPath(const char* adapter) {
+    return std::string(AUTO_CONNECT_FOLDER) + adapter;
+}
+
+AutoConnectFile::AutoConnectFile(const std::string& path, std::ios::openmode mode)
+    : m_file(path, mode | std::ios::binary) {
+    // Where the program's locale groups digits by commas, "1,112" would be read as one number.
+    m_file.imbue(std::locale::classic());
+}
+
+bool AutoConnectFile::isTooLarge() {
+    m_file.clear();
+    m_file.seekg(0, std::ios::end);
+    const bool tooLarge = m_file.tellg() > MAX_SIZE;
+    m_file.seekg(0);
+    return tooLarge;
+}
+
+bool AutoConnectFile::readsNonZero() {
+    m_file.clear();
+    m_file.seekg(0);
+    int number = 0;
+    return (m_file >> number) && number != 0;
+}
+
+bool AutoConnectFile::readsEnabled() {
+    m_file.clear();
+    m_file.seekg(0);
+    bool flag = false;
+    return (m_file >> flag) && flag;
+}
+
+std::vector<std::string> AutoConnectFile::readEntries() {
+    m_file.clear();
+    m_file.seekg(FIRST_ENTRY);
+    std::vector<std::string> entries;
+    while (m_file.peek() != std::fstream::traits_type::eof()) {
+        std::string entry;
+        std::getline(m_file, entry, SEPARATOR);
+        entries.push_back(std::move(entry));
+    }
+    return entries;
+}
+
+bool writeAutoConnectFile(std::ofstream& file, const std::string& content) {
+    file << content;
+    file.close();
+    return !file.fail();
+}
+
+} // namespace Bluetooth
