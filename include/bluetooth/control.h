@@ -1,0 +1,47 @@
+#ifndef KESBLUETOOTH_CONTROL_H
+#define KESBLUETOOTH_CONTROL_H
+
+#include <bluetooth/bluez_object.h>
+
+namespace Bluetooth {
+
+/// The proxy of one remote device's remote control (interface org.bluez.Control).
+///
+/// Properties, threads, errors and what blocks: see BluezObject.
+/// Lifetime: created by getControl() and deleted by the caller.
+class KESBLUETOOTH_API Control : public BluezObject {
+public:
+    /// Prefer getControl(), which tells when the daemon is absent.
+    explicit Control(const char* path);
+    ~Control() override;
+
+    /// @param path the device's, e.g. "/org/bluez/1234/hci0/dev_00_11_22_33_44_55"; not checked
+    /// @return a new Control, deleted by the caller; null when the daemon is not on the bus
+    static Control* getControl(const char* path);
+
+    /// Asks whether the remote control is connected (IsConnected).
+    /// @param connected receives the answer; unchanged on failure
+    /// @return 0, or -1 on any failure
+    /// Blocks until the daemon answers, at most 25 s.
+    int isConnected(bool& connected);
+
+    /// Presses and releases a volume key (VolumeDown, VolumeUp).
+    /// @return 0 when the call was handed to the bus, whether or not the device reacts; else -1
+    int volumeDown();
+    int volumeUp();
+
+    /// Each subscribes to the signal of its name: the remote control was connected or disconnected.
+    /// @param callback gets the proxy that runs the loop, which need not be this one; null selects
+    ///                 the default callback below
+    /// @return 0, or -1 when the bus refuses (logged)
+    int setConnectedHandler(NoArgumentCallback callback);
+    int setDisconnectedHandler(NoArgumentCallback callback);
+
+    /// Default callbacks. They print "Connected from PATH" and "Disconnected from PATH".
+    static void connectedHandler(RemoteObject* sender);
+    static void disconnectedHandler(RemoteObject* sender);
+};
+
+} // namespace Bluetooth
+
+#endif

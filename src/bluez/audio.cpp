@@ -1,0 +1,24 @@
+#include <bluetooth/audio.h>
+
+#include "bluez/factory.h"
+#include "bluez/method_call.h"
+
+namespace Bluetooth {
+
+Audio::Audio(const char* path) : BluezObject(path, "org.bluez.Audio") {}
+
+Audio::~Audio() = default;
+
+Audio* Audio::getAudio(const char* path) {
+    return makeProxy<Audio>(path);
+}
+
+int Audio::connect() {
+    return callMethod(KES_HERE, *this, "Connect");
+}
+
+int Audio::disconnect() {
+    return callMethod(KES_HERE, *this, "Disconnect");
+}
+
+} // namespace Bluetooth

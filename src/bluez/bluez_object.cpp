@@ -1,0 +1,47 @@
+#include <bluetooth/bluez_object.h>
+
+#include <bluetooth/dbus_object.h>
+#include <bluetooth/dict_codec.h>
+
+#include "bluez/method_call.h"
+#include "bluez/print.h"
+
+#include <algorithm>
+#include <memory>
+
+namespace Bluetooth {
+
+namespace {
+constexpr const char* daemonName = "org.bluez";
+}
+
+BluezObject::BluezObject(const char* path, const char* interface)
+    : RemoteObject(daemonName, path, interface, DBUS_BUS_SYSTEM) {}
+
+BluezObject::~BluezObject() = default;
+
+Dict* BluezObject::getProperties() {
+    return readDict(KES_HERE, *this, "GetProperties");
+}
+
+int BluezObject::setProperty(const char* name, const Variant& value) {
+    return callMethod(KES_HERE, *this, "SetProperty", name, value);
+}
+
+int BluezObject::setPropertyChangedHandler(StringVariantCallback callback) {
+    return setSignalHandlerStringVariant("PropertyChanged",
+                                         callback ? callback : propertyChangedHandler);
+}
+
+void BluezObject::propertyChangedHandler(RemoteObject* sender, const char* name,
+                                         const Variant* value) {
+    printLine({name, " was changed in ", sender->getPath(), " with ", variantToString(*value)});
+}
+
+bool BluezObject::hasBluetoothd() {
+    DBusObject bus;
+    const std::unique_ptr<std::vector<std::string>> names(bus.listNames());
+    return names && std::find(names->begin(), names->end(), daemonName) != names->end();
+}
+
+} // namespace Bluetooth

@@ -1,0 +1,12 @@
+#include <bluetooth/device_list.h>
+
+#include <bluetooth/device.h>
+
+namespace Bluetooth {
+
+DeviceList::~DeviceList() {
+    for (const Device* device : *this)
+        delete device;
+}
+
+} // namespace Bluetooth

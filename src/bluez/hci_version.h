@@ -1,0 +1,21 @@
+#ifndef KESBLUETOOTH_BLUEZ_HCI_VERSION_H
+#define KESBLUETOOTH_BLUEZ_HCI_VERSION_H
+
+#include <string>
+
+namespace Bluetooth {
+
+/// What tells a controller's HCI version, which the daemon does not.
+extern const char* const hciconfigProgram;
+
+/// @return the last component of an adapter's object path, e.g. "hci0"
+std::string controllerName(const char* path);
+
+/// Asks hciconfig for a controller's HCI version.
+/// @param version receives e.g. "2.1"; "" when the program prints none
+/// @return false when the program could not be started
+bool readHciVersion(const std::string& controller, std::string& version);
+
+} // namespace Bluetooth
+
+#endif
