@@ -1,0 +1,48 @@
+# Shared by the scripts of this folder; sourced, not run.
+set -euo pipefail
+root=$(cd "$(dirname "${BASH_SOURCE[0]}")/.." && pwd)
+
+die() {
+    printf '%s: %s\n' "$(basename "$0")" "$*" >&2
+    exit 1
+}
+
+build_packages=(g++ cmake ninja-build pkg-config dbus libdbus-1-dev libglib2.0-dev
+    libdbus-glib-1-dev libbluetooth-dev libboost-dev libcli11-dev nlohmann-json3-dev)
+test_packages=(libgtest-dev bubblewrap)
+lint_packages=(clang-format-14 clang-tidy-14)
+
+# Installs the named Debian packages that are missing; quiet when none is.
+need_packages() {
+    local missing=() package
+    for package in "$@"; do
+        if ! dpkg-query -W -f '${db:Status-Status}' "$package" 2>/dev/null | grep -qx installed; then
+            missing+=("$package")
+        fi
+    done
+    [ ${#missing[@]} -eq 0 ] && return
+    local sudo=()
+    if [ "$(id -u)" -ne 0 ]; then
+        command -v sudo >/dev/null || die "packages are missing, and installing them takes root: ${missing[*]}"
+        sudo=(sudo)
+    fi
+    printf 'Installing: %s\n' "${missing[*]}"
+    "${sudo[@]}" apt-get update -qq
+    "${sudo[@]}" env DEBIAN_FRONTEND=noninteractive \
+        apt-get install -y -qq --no-install-recommends "${missing[@]}" >/dev/null
+}
+
+# build FOLDER [cmake option...]: configures and builds, showing output only when that fails.
+build() {
+    local folder=$1 log
+    shift
+    log=$(mktemp)
+    local launcher=()
+    command -v ccache >/dev/null && launcher=(-DCMAKE_CXX_COMPILER_LAUNCHER=ccache)
+    if ! { cmake -S "$root" -B "$folder" -G Ninja "${launcher[@]}" "$@" && cmake --build "$folder"; } >"$log" 2>&1; then
+        cat "$log" >&2
+        rm -f "$log"
+        die "the build in $folder failed; its output is above"
+    fi
+    rm -f "$log"
+}

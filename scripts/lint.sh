@@ -1,0 +1,19 @@
+#!/usr/bin/env bash
+# Checks the layout with clang-format and the code with clang-tidy; --fix lays the files out.
+source "$(dirname "$0")/lib.sh"
+
+need_packages "${build_packages[@]}" "${test_packages[@]}" "${lint_packages[@]}"
+cd "$root"
+mapfile -t files < <(git ls-files '*.cpp' '*.h')
+if [ "${1:-}" = --fix ]; then
+    clang-format-14 -i "${files[@]}"
+    exit
+fi
+clang-format-14 --dry-run --Werror "${files[@]}"
+echo "clang-format: ${#files[@]} files are clean"
+
+build "$root/build"
+mapfile -t sources < <(git ls-files '*.cpp')
+printf '%s\n' "${sources[@]}" |
+    xargs -P "$(nproc)" -n 4 clang-tidy-14 -p "$root/build" --quiet 2>/dev/null
+echo "clang-tidy: ${#sources[@]} files are clean"
