@@ -225,6 +225,7 @@ private:
     pthread_t m_loopThread = 0;
     std::atomic<int> m_errorNumber{0}; // a loop proxy's is also set by the receive thread
     std::string m_errorText;
+    bool m_usable; // destination, path and interface are valid names
 
     // Shared by all proxies; never destroyed, since a receive thread may outlive main().
     static Registry<NoArgumentCallback>& signalHandlerVectorNoArgument;

@@ -55,7 +55,11 @@ RemoteObject::RemoteObject(const char* destination, const char* path, const char
       m_path(textOf(path)),
       m_interface(textOf(interface)),
       m_connection(Connection::get(busType)),
-      m_busType(busType) {}
+      m_busType(busType),
+      // libdbus ends the process on names that are none.
+      m_usable(dbus_validate_bus_name(m_destination.c_str(), nullptr) &&
+               dbus_validate_path(m_path.c_str(), nullptr) &&
+               dbus_validate_interface(m_interface.c_str(), nullptr)) {}
 
 RemoteObject::~RemoteObject() {
     unsubscribeAll();
@@ -75,11 +79,7 @@ int RemoteObject::newMessage(const char* method) {
         return recordError(errorNullParameter);
     if (m_message)
         dbus_message_unref(m_message);
-    // libdbus ends the process on names that are none.
-    const bool usable = dbus_validate_bus_name(m_destination.c_str(), nullptr) &&
-                        dbus_validate_path(m_path.c_str(), nullptr) &&
-                        dbus_validate_interface(m_interface.c_str(), nullptr) &&
-                        dbus_validate_member(method, nullptr);
+    const bool usable = m_usable && dbus_validate_member(method, nullptr);
     m_message = usable ? dbus_message_new_method_call(m_destination.c_str(), m_path.c_str(),
                                                       m_interface.c_str(), method)
                        : nullptr;
