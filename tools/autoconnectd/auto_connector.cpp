@@ -1,0 +1,169 @@
+#include "auto_connector.h"
+
+#include "wakeup.h"
+
+#include <bluetooth/adapter.h>
+#include <bluetooth/device.h>
+#include <bluetooth/dict_codec.h>
+
+#include <syslog.h>
+
+#include <algorithm>
+#include <cstring>
+#include <set>
+#include <string>
+#include <utility>
+
+namespace autoconnectd {
+
+namespace {
+
+void onAdapterAddedOrRemoved(Bluetooth::RemoteObject* /*sender*/,
+                             const Bluetooth::ObjectPath* /*adapter*/) {
+    wakeup::requestReload();
+}
+
+void onAdapterChanged(Bluetooth::RemoteObject* /*sender*/, const char* name,
+                      const Bluetooth::Variant* /*value*/) {
+    if (strcmp(name, "Powered") == 0)
+        wakeup::requestReload();
+}
+
+} // namespace
+
+AutoConnector::~AutoConnector() {
+    if (!m_loopRuns)
+        return;
+    m_manager.stopLoop();
+    m_manager.waitLoop();
+}
+
+bool AutoConnector::hasBus() const {
+    return m_manager.getConnection() && dbus_connection_get_is_connected(m_manager.getConnection());
+}
+
+bool AutoConnector::start() {
+    if (!hasBus() || m_manager.setAdapterAddedHandler(onAdapterAddedOrRemoved) != 0 ||
+        m_manager.setAdapterRemovedHandler(onAdapterAddedOrRemoved) != 0)
+        return false;
+    m_loopRuns = m_manager.startLoop() == 0;
+    return m_loopRuns;
+}
+
+void AutoConnector::handle(Command command) {
+    switch (command) {
+    case Command::Reload:
+        reload();
+        break;
+    case Command::Pause:
+        m_paused = true;
+        syslog(LOG_NOTICE, "paused");
+        break;
+    case Command::Resume:
+        m_paused = false;
+        syslog(LOG_NOTICE, "resumed");
+        for (const auto& target : m_targets)
+            target->hurry();
+        break;
+    }
+}
+
+/// Asked first, since every call to a daemon that is absent is logged as a failure.
+bool AutoConnector::hasDaemon() {
+    const bool present = Bluetooth::BluezObject::hasBluetoothd();
+    if (present == m_daemonMissed)
+        syslog(LOG_NOTICE,
+               present ? "bluetoothd is back" : "bluetoothd is not running; waiting for it");
+    m_daemonMissed = !present;
+    return present;
+}
+
+void AutoConnector::watchAdapters() {
+    m_adapters.reset(m_manager.listAdapters());
+    if (!m_adapters)
+        return;
+    for (Bluetooth::Adapter* adapter : *m_adapters) {
+        if (adapter)
+            adapter->setPropertyChangedHandler(onAdapterChanged);
+    }
+}
+
+void AutoConnector::retryLater() {
+    m_reloadDue = true;
+    m_retryAt = Clock::now() + m_retryDelay;
+    m_retryDelay = std::min(m_retryDelay * 2, m_pace.longest);
+}
+
+std::unique_ptr<Target> AutoConnector::takeOrCreate(Bluetooth::Device& device) {
+    for (auto& target : m_targets) {
+        if (target && target->path() == device.getPath()) {
+            target->hurry();
+            return std::move(target);
+        }
+    }
+    auto target = Target::create(device, m_pace);
+    if (target)
+        syslog(LOG_INFO, "watching %s", target->address().c_str());
+    else
+        syslog(LOG_WARNING, "%s offers no audio; it is not connected", device.getPath());
+    return target;
+}
+
+void AutoConnector::reload() {
+    m_reloadDue = false;
+    if (!hasDaemon()) {
+        m_targets.clear();
+        m_adapters.reset();
+        retryLater();
+        return;
+    }
+    // Watched before the files are read: an adapter that is switched on meanwhile is not missed.
+    watchAdapters();
+    const std::unique_ptr<Bluetooth::DeviceList> devices(m_files.getAutoConnectDeviceList());
+    if (!devices) {
+        retryLater();
+        return;
+    }
+    std::vector<std::unique_ptr<Target>> targets;
+    std::set<std::string> paths; // an entry may stand twice in a file
+    for (Bluetooth::Device* device : *devices) {
+        auto target = paths.insert(device->getPath()).second ? takeOrCreate(*device) : nullptr;
+        if (target)
+            targets.push_back(std::move(target));
+    }
+    for (const auto& target : m_targets) {
+        if (target) // no longer listed, or its adapter was switched off: log what became of it
+            target->check(Clock::now(), false);
+    }
+    m_targets = std::move(targets);
+}
+
+void AutoConnector::work() {
+    const Clock::time_point now = Clock::now();
+    if (m_reloadDue ? now >= m_retryAt : !hasDaemon())
+        reload();
+    const auto lost = std::remove_if(
+        m_targets.begin(), m_targets.end(),
+        [&](const std::unique_ptr<Target>& target) { return !target->check(now, !m_paused); });
+    if (lost == m_targets.end()) {
+        if (!m_reloadDue)
+            m_retryDelay = m_pace.first;
+        return;
+    }
+    // Removed from the daemon, or the daemon was restarted and all paths are new.
+    m_targets.erase(lost, m_targets.end());
+    retryLater();
+}
+
+Clock::time_point AutoConnector::nextDue() const {
+    Clock::time_point due = Clock::now() + m_pace.longest;
+    if (m_reloadDue)
+        due = std::min(due, m_retryAt);
+    for (const auto& target : m_targets) {
+        if (!target->isConnected() && !m_paused)
+            due = std::min(due, target->due());
+    }
+    return due;
+}
+
+} // namespace autoconnectd

@@ -1,0 +1,60 @@
+#ifndef KESBT_AUTOCONNECTD_AUTO_CONNECTOR_H
+#define KESBT_AUTOCONNECTD_AUTO_CONNECTOR_H
+
+#include "command_splitter.h"
+#include "target.h"
+
+#include <bluetooth/adapter_list.h>
+#include <bluetooth/auto_connect.h>
+#include <bluetooth/manager.h>
+
+#include <memory>
+#include <vector>
+
+namespace autoconnectd {
+
+/// Keeps the devices of the auto-connect files connected.
+///
+/// The main loop calls work() when wakeup or nextDue() says so. A restart of the Bluetooth daemon,
+/// an adapter that comes or goes or is switched on, and a connection that begins or ends are
+/// learnt from signals; where one is missed, the longest pause between two attempts bounds the
+/// delay.
+class AutoConnector {
+public:
+    explicit AutoConnector(Pace pace) : m_pace(pace), m_retryDelay(pace.first) {}
+    ~AutoConnector();
+
+    /// Subscribes and starts the receive thread. @return false when the system bus is not there
+    bool start();
+    /// Whether the connection to the system bus still stands. It does not come back.
+    bool hasBus() const;
+
+    void handle(Command command);
+    /// Reads the files again and connects what is not connected.
+    void reload();
+    /// Looks at all targets and makes the attempts that are due.
+    void work();
+    Clock::time_point nextDue() const;
+
+private:
+    bool hasDaemon();
+    void watchAdapters();
+    void retryLater();
+    std::unique_ptr<Target> takeOrCreate(Bluetooth::Device& device);
+
+    Pace m_pace;
+    Bluetooth::Manager m_manager; // its signals need no daemon on the bus yet
+    Bluetooth::AutoConnect m_files;
+    bool m_loopRuns = false;
+    bool m_paused = false;
+    bool m_daemonMissed = false;
+    bool m_reloadDue = false;
+    Clock::time_point m_retryAt{};
+    std::chrono::seconds m_retryDelay;
+    std::unique_ptr<Bluetooth::AdapterList> m_adapters;
+    std::vector<std::unique_ptr<Target>> m_targets;
+};
+
+} // namespace autoconnectd
+
+#endif

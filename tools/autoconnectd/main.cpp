@@ -1,0 +1,154 @@
+#include "auto_connector.h"
+#include "background.h"
+#include "command_pipe.h"
+#include "wakeup.h"
+
+#include <bluetooth/commandlib.h>
+
+#include <CLI/CLI.hpp>
+#include <poll.h>
+#include <syslog.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+#include <memory>
+#include <string>
+
+namespace {
+
+using autoconnectd::AutoConnector;
+using autoconnectd::Background;
+using autoconnectd::Clock;
+using autoconnectd::Command;
+using autoconnectd::CommandPipe;
+namespace wakeup = autoconnectd::wakeup;
+
+constexpr const char* PROGRAM = "kesbt-autoconnectd";
+constexpr const char* PIPE = "/tmp/kes_bluetooth_autoconnect";
+constexpr int PID_FILE_CLOSE_ON_EXEC = 1;
+constexpr int WRONG_USAGE = 2;
+constexpr int DAY = 24 * 60 * 60;
+
+struct Options {
+    bool foreground = false;
+    std::string pidFile = "/run/kesbt-autoconnectd.pid";
+    int interval = 10;
+    int maxInterval = 120;
+};
+
+int fail(const std::string& problem) {
+    fprintf(stderr, "%s: %s\n", PROGRAM, problem.c_str());
+    syslog(LOG_ERR, "%s", problem.c_str());
+    return EXIT_FAILURE;
+}
+
+/// @return -1 to go on, otherwise the exit status
+int parse(int argc, char** argv, Options& options) {
+    CLI::App app("Connects the Bluetooth devices of the auto-connect files "
+                 "(/etc/bluetooth/autoconnect/) and keeps them connected.",
+                 PROGRAM);
+    app.set_version_flag("--version", std::string(PROGRAM) + ' ' + KESBLUETOOTH_VERSION);
+    app.add_flag("-f,--foreground", options.foreground,
+                 "Stay in the foreground and log to standard error too");
+    app.add_option("--pid-file", options.pidFile, "PID file and lock of the only instance")
+        ->capture_default_str();
+    app.add_option("--interval", options.interval,
+                   "Seconds to the second attempt at a device that is away; doubles each time")
+        ->capture_default_str()
+        ->check(CLI::Range(1, DAY));
+    app.add_option("--max-interval", options.maxInterval, "Longest time between two attempts")
+        ->capture_default_str()
+        ->check(CLI::Range(1, DAY));
+    try {
+        app.parse(argc, argv);
+    } catch (const CLI::ParseError& problem) {
+        return app.exit(problem) == 0 ? EXIT_SUCCESS : WRONG_USAGE;
+    }
+    options.maxInterval = std::max(options.maxInterval, options.interval);
+    return -1;
+}
+
+std::string pidFileProblem(const std::string& path, int error) {
+    if (error == EAGAIN)
+        return "already running (" + path +
+               " is locked); stop the other one, or choose another file with --pid-file";
+    return "cannot write " + path + ": " + strerror(error) +
+           "; run as root, or choose another file with --pid-file";
+}
+
+/// The pipe was removed from its folder: commands come through a new one now.
+void renewPipe(std::unique_ptr<CommandPipe>& pipe) {
+    std::string problem;
+    auto next = CommandPipe::open(PIPE, problem);
+    if (next)
+        pipe = std::move(next);
+    else
+        syslog(LOG_ERR, "%s", problem.c_str());
+}
+
+/// Waits for a command, for news, or until an attempt is due.
+/// @return whether there are commands to read
+bool wait(const CommandPipe& pipe, Clock::time_point until) {
+    pollfd watched[] = {{pipe.descriptor(), POLLIN, 0}, {wakeup::descriptor(), POLLIN, 0}};
+    const auto left = std::chrono::ceil<std::chrono::milliseconds>(until - Clock::now()).count();
+    const int ready = poll(watched, 2, static_cast<int>(std::max<std::int64_t>(left, 0)));
+    return ready > 0 && (watched[0].revents & POLLIN) != 0;
+}
+
+int run(AutoConnector& connector, std::unique_ptr<CommandPipe>& pipe) {
+    connector.reload();
+    while (!wakeup::stopRequested()) {
+        connector.work();
+        if (wait(*pipe, connector.nextDue())) {
+            for (const Command command : pipe->read())
+                connector.handle(command);
+        }
+        if (wakeup::takeReload())
+            connector.reload();
+        if (!pipe->isCurrent())
+            renewPipe(pipe);
+        if (!connector.hasBus())
+            return fail("the system bus has gone; start again when it is back");
+    }
+    syslog(LOG_NOTICE, "stopped");
+    return EXIT_SUCCESS;
+}
+
+int start(const Options& options) {
+    Background background;
+    if (!options.foreground && !background.enter())
+        return fail(std::string("cannot go into the background: ") + strerror(errno));
+    if (Bluetooth::createPidFile(options.pidFile.c_str(), PID_FILE_CLOSE_ON_EXEC, true) < 0)
+        return fail(pidFileProblem(options.pidFile, errno));
+    std::string problem;
+    auto pipe = CommandPipe::open(PIPE, problem);
+    if (!pipe)
+        return fail(problem);
+    if (!wakeup::open())
+        return fail(std::string("cannot make an event descriptor: ") + strerror(errno));
+    wakeup::handleSignals();
+    AutoConnector connector(
+        {std::chrono::seconds(options.interval), std::chrono::seconds(options.maxInterval)});
+    if (!connector.start())
+        return fail("cannot reach the system bus; start dbus-daemon, or set "
+                    "DBUS_SYSTEM_BUS_ADDRESS");
+    background.ready();
+    if (options.foreground) // not before: a failed start is told in one line
+        openlog(PROGRAM, LOG_PID | LOG_PERROR, LOG_DAEMON);
+    syslog(LOG_NOTICE, "started");
+    return run(connector, pipe);
+}
+
+} // namespace
+
+int main(int argc, char** argv) {
+    Options options;
+    const int status = parse(argc, argv, options);
+    if (status >= 0)
+        return status;
+    openlog(PROGRAM, LOG_PID, LOG_DAEMON);
+    return start(options);
+}
