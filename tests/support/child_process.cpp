@@ -1,0 +1,138 @@
+#include "support/child_process.h"
+
+#include <fcntl.h>
+#include <poll.h>
+#include <signal.h>
+#include <sys/prctl.h>
+#include <sys/syscall.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <cstdlib>
+#include <stdexcept>
+
+namespace Bluetooth::Test {
+
+namespace {
+
+std::vector<char*> pointers(std::vector<std::string>& texts) {
+    std::vector<char*> result;
+    for (std::string& text : texts)
+        result.push_back(text.data());
+    result.push_back(nullptr);
+    return result;
+}
+
+std::vector<std::string> fullEnvironment(std::vector<std::string> added) {
+    for (char** entry = environ; *entry; ++entry)
+        added.emplace_back(*entry); // the first of a name counts
+    return added;
+}
+
+} // namespace
+
+bool readMore(int descriptor, std::string& buffer, Milliseconds limit) {
+    pollfd input{descriptor, POLLIN, 0};
+    char bytes[4096];
+    if (poll(&input, 1, static_cast<int>(limit.count())) <= 0)
+        return false;
+    const ssize_t length = read(descriptor, bytes, sizeof bytes);
+    if (length <= 0)
+        return false;
+    buffer.append(bytes, static_cast<std::size_t>(length));
+    return true;
+}
+
+bool takeLine(std::string& buffer, std::string& line) {
+    const std::size_t end = buffer.find('\n');
+    if (end == std::string::npos)
+        return false;
+    line = buffer.substr(0, end);
+    buffer.erase(0, end + 1);
+    return true;
+}
+
+ChildProcess::ChildProcess(std::vector<std::string> command, Output output,
+                           std::vector<std::string> environment) {
+    environment = fullEnvironment(std::move(environment));
+    const std::vector<char*> argv = pointers(command);
+    const std::vector<char*> envp = pointers(environment);
+    int out[2] = {-1, -1};
+    int err[2] = {-1, -1};
+    if (output == Output::Capture && (pipe2(out, O_CLOEXEC) != 0 || pipe2(err, O_CLOEXEC) != 0))
+        throw std::runtime_error("no pipe for the output of " + command[0]);
+
+    m_pid = fork();
+    if (m_pid == 0) {
+        prctl(PR_SET_PDEATHSIG, SIGKILL);
+        if (output == Output::Capture) {
+            dup2(out[1], STDOUT_FILENO);
+            dup2(err[1], STDERR_FILENO);
+        }
+        execvpe(argv[0], argv.data(), envp.data());
+        _exit(127);
+    }
+    if (output == Output::Capture) {
+        close(out[1]);
+        close(err[1]);
+        m_output = out[0];
+        m_errors = err[0];
+    }
+    if (m_pid < 0)
+        throw std::runtime_error("cannot start " + command[0]);
+}
+
+ChildProcess::~ChildProcess() {
+    kill();
+    for (const int descriptor : {m_output, m_errors}) {
+        if (descriptor >= 0)
+            close(descriptor);
+    }
+}
+
+void ChildProcess::signal(int number) const {
+    if (m_status < 0)
+        ::kill(m_pid, number);
+}
+
+void ChildProcess::kill() {
+    signal(SIGKILL);
+    wait();
+}
+
+int ChildProcess::wait(Milliseconds limit) {
+    if (m_status >= 0)
+        return m_status;
+    const auto descriptor = static_cast<int>(syscall(SYS_pidfd_open, m_pid, 0));
+    pollfd ended{descriptor, POLLIN, 0};
+    poll(&ended, 1, static_cast<int>(limit.count()));
+    close(descriptor);
+    int status = 0;
+    if (waitpid(m_pid, &status, WNOHANG) == m_pid)
+        m_status = WIFEXITED(status) ? WEXITSTATUS(status) : 128 + WTERMSIG(status);
+    return m_status;
+}
+
+std::string ChildProcess::readLine(Milliseconds limit) {
+    std::string line;
+    while (!takeLine(m_buffer, line)) {
+        if (!readMore(m_output, m_buffer, limit))
+            return std::exchange(m_buffer, {});
+    }
+    return line;
+}
+
+std::string ChildProcess::readAll(Milliseconds limit) {
+    while (readMore(m_output, m_buffer, limit)) {
+    }
+    return std::exchange(m_buffer, {});
+}
+
+std::string ChildProcess::readErrors(Milliseconds limit) {
+    std::string text;
+    while (readMore(m_errors, text, limit)) {
+    }
+    return text;
+}
+
+} // namespace Bluetooth::Test

@@ -1,0 +1,57 @@
+#ifndef KESBLUETOOTH_TESTS_CHILD_PROCESS_H
+#define KESBLUETOOTH_TESTS_CHILD_PROCESS_H
+
+#include "support/latch.h"
+
+#include <sys/types.h>
+
+#include <string>
+#include <vector>
+
+namespace Bluetooth::Test {
+
+/// A program that runs beside the test. It is killed when this object or the test's process ends.
+class ChildProcess {
+public:
+    enum class Output { Inherit, Capture };
+
+    /// Starts a program found through PATH. A failure to start throws std::runtime_error.
+    /// @param environment "NAME=VALUE" each, added to the test's own
+    explicit ChildProcess(std::vector<std::string> command, Output output = Output::Inherit,
+                          std::vector<std::string> environment = {});
+    ~ChildProcess();
+    ChildProcess(const ChildProcess&) = delete;
+    ChildProcess& operator=(const ChildProcess&) = delete;
+
+    pid_t pid() const { return m_pid; }
+    void signal(int number) const;
+    /// Ends it at once (SIGKILL) and waits.
+    void kill();
+    /// @return the exit status, 128 + N after signal N, -1 when it has not ended in time
+    int wait(Milliseconds limit = patience);
+    bool hasEnded() { return wait(Milliseconds(0)) >= 0; }
+
+    /// @return the next line of standard output without its newline; "" at its end or in time-out
+    std::string readLine(Milliseconds limit = patience);
+    /// @return all that is left of standard output, read to its end
+    std::string readAll(Milliseconds limit = patience);
+    /// The same for standard error, only after standard output has been read to its end.
+    std::string readErrors(Milliseconds limit = patience);
+
+private:
+    pid_t m_pid = -1;
+    int m_status = -1;
+    int m_output = -1;
+    int m_errors = -1;
+    std::string m_buffer;
+};
+
+/// Appends what can be read from a descriptor. @return false at its end or in time-out
+bool readMore(int descriptor, std::string& buffer, Milliseconds limit);
+
+/// Takes the first line out of a buffer. @return false when it holds no whole line
+bool takeLine(std::string& buffer, std::string& line);
+
+} // namespace Bluetooth::Test
+
+#endif

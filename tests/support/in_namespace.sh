@@ -1,0 +1,51 @@
+#!/bin/sh
+# Runs a command in a mount and PID namespace of its own, where the library's fixed paths are free
+# to be written:
+#   in_namespace.sh BUILD_FOLDER COMMAND [ARGUMENT...]
+# /etc, /tmp, /run and /usr/sbin are empty there, /usr/bin can be added to, /usr/bin/hciconfig is
+# missing, /small holds 64 KiB. The build folder is there, read-only. Works for root and for plain
+# users. Fails when the command fails, or when it changed anything of the real machine.
+set -eu
+
+build=$1
+shift
+
+# What the library would touch if it ran outside: names, owners, sizes, times.
+fingerprint() {
+    for path in /etc/bluetooth /etc/bluetooth/autoconnect /etc/bluetooth/autoconnect/* \
+        /tmp/kes_bluetooth_autoconnect /tmp/bluetooth.info_* /run/kesbt* \
+        /usr/sbin/bluetoothd /usr/bin/hciconfig; do
+        stat -c '%n %f %u %s %y %z' "$path" 2>/dev/null || echo "no $path"
+    done
+}
+
+set -- --unshare-pid --die-with-parent --tmpfs / \
+    --ro-bind /usr /usr --ro-bind /usr/bin /real-bin --tmpfs /usr/bin --tmpfs /usr/sbin \
+    --proc /proc --dev /dev --tmpfs /tmp --dir /var/tmp --dir /run --dir /etc \
+    --size 65536 --tmpfs /small --ro-bind "$build" "$build" \
+    --unsetenv DBUS_SYSTEM_BUS_ADDRESS --unsetenv DBUS_SESSION_BUS_ADDRESS \
+    --setenv HOME /tmp --setenv KESBLUETOOTH_TEST_NAMESPACE 1 --chdir / \
+    /real-bin/sh -c '
+        /real-bin/ln -s /real-bin/* /usr/bin/
+        /real-bin/rm -f /usr/bin/hciconfig
+        exec "$@"' sh "$@"
+for path in /etc/passwd /etc/group /etc/nsswitch.conf /etc/ld.so.cache /etc/machine-id \
+    /etc/alternatives; do
+    [ ! -e "$path" ] || set -- --ro-bind "$path" "$path" "$@"
+done
+for path in /bin /sbin /lib /lib32 /lib64 /libx32; do
+    if [ -L "$path" ]; then
+        set -- --symlink "usr$path" "$path" "$@"
+    elif [ -d "$path" ]; then
+        set -- --ro-bind "$path" "$path" "$@"
+    fi
+done
+
+before=$(fingerprint)
+status=0
+bwrap "$@" || status=$?
+if [ "$before" != "$(fingerprint)" ]; then
+    echo "in_namespace.sh: the command changed files of the real machine" >&2
+    exit 1
+fi
+exit "$status"

@@ -1,0 +1,74 @@
+#ifndef KESBLUETOOTH_TESTS_LATCH_H
+#define KESBLUETOOTH_TESTS_LATCH_H
+
+#include <chrono>
+#include <condition_variable>
+#include <cstddef>
+#include <mutex>
+#include <utility>
+#include <vector>
+
+namespace Bluetooth::Test {
+
+using Milliseconds = std::chrono::milliseconds;
+
+/// How long tests wait for what must come. Only a failing test waits this long.
+inline constexpr Milliseconds patience{20000};
+
+/// What callbacks report, in order, awaited by the test. Plain function pointers carry no data, so
+/// the tests' callbacks write into one of these with static lifetime.
+template <class Event>
+class Recorder {
+public:
+    void add(Event event) {
+        const std::lock_guard<std::mutex> lock(m_mutex);
+        m_events.push_back(std::move(event));
+        m_changed.notify_all();
+    }
+
+    /// @return whether at least `count` events have come
+    bool waitFor(std::size_t count, Milliseconds limit = patience) const {
+        return waitUntil([count](const auto& events) { return events.size() >= count; }, limit);
+    }
+
+    template <class Condition>
+    bool waitUntil(Condition condition, Milliseconds limit = patience) const {
+        std::unique_lock<std::mutex> lock(m_mutex);
+        return m_changed.wait_for(lock, limit, [&] { return condition(m_events); });
+    }
+
+    std::vector<Event> events() const {
+        const std::lock_guard<std::mutex> lock(m_mutex);
+        return m_events;
+    }
+
+    std::size_t count() const {
+        const std::lock_guard<std::mutex> lock(m_mutex);
+        return m_events.size();
+    }
+
+    void clear() {
+        const std::lock_guard<std::mutex> lock(m_mutex);
+        m_events.clear();
+    }
+
+private:
+    mutable std::mutex m_mutex;
+    mutable std::condition_variable m_changed;
+    std::vector<Event> m_events;
+};
+
+/// Opens once and stays open.
+class Latch {
+public:
+    void open() { m_opened.add(true); }
+    bool wait(Milliseconds limit = patience) const { return m_opened.waitFor(1, limit); }
+    bool isOpen() const { return m_opened.count() > 0; }
+
+private:
+    Recorder<bool> m_opened;
+};
+
+} // namespace Bluetooth::Test
+
+#endif

@@ -1,0 +1,310 @@
+#include "support/raw_peer.h"
+
+#include <poll.h>
+#include <sys/eventfd.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <stdexcept>
+
+namespace Bluetooth::Test {
+
+namespace {
+
+std::string textOf(const char* text) {
+    return text ? text : "";
+}
+
+MessagePtr methodCall(const std::string& destination, const std::string& path,
+                      const std::string& interface, const std::string& member) {
+    return MessagePtr(dbus_message_new_method_call(destination.c_str(), path.c_str(),
+                                                   interface.c_str(), member.c_str()));
+}
+
+void build(const MessagePtr& message, const Writer::Build& arguments) {
+    Writer writer(message.get());
+    if (arguments)
+        arguments(writer);
+}
+
+} // namespace
+
+std::string SeenCall::text() const {
+    return member + (wantsReply ? "" : "!") + (arguments.empty() ? "" : " ") + arguments;
+}
+
+RawPeer::RawPeer(const std::string& address, const std::string& name) {
+    ScopedError error;
+    m_wakeFd = eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK);
+    m_connection = dbus_connection_open_private(address.c_str(), error);
+    if (!m_connection || !dbus_bus_register(m_connection, error))
+        throw std::runtime_error(std::string("no connection for a peer: ") + error.message());
+    dbus_connection_set_exit_on_disconnect(m_connection, false);
+    dbus_connection_add_filter(m_connection, filter, this, nullptr);
+    m_thread = std::thread([this] { loop(); });
+    if (!name.empty() && !own(name))
+        throw std::runtime_error("a peer cannot own " + name);
+}
+
+RawPeer::~RawPeer() {
+    m_stop = true;
+    eventfd_write(m_wakeFd, 1);
+    m_thread.join();
+    dbus_connection_remove_filter(m_connection, filter, this);
+    dbus_connection_close(m_connection);
+    dbus_connection_unref(m_connection);
+    close(m_wakeFd);
+}
+
+void RawPeer::handle(const std::string& member, Handler handler, Milliseconds delay) {
+    const std::lock_guard<std::mutex> lock(m_mutex);
+    m_answers[member] = {std::move(handler), delay};
+}
+
+void RawPeer::reply(const std::string& member, Build arguments, Milliseconds delay) {
+    handle(
+        member,
+        [arguments = std::move(arguments)](DBusMessage* call) {
+            MessagePtr reply(dbus_message_new_method_return(call));
+            build(reply, arguments);
+            return reply;
+        },
+        delay);
+}
+
+void RawPeer::replyError(const std::string& member, const char* name, const char* text) {
+    handle(member, [name = std::string(name), text = std::string(text)](DBusMessage* call) {
+        return MessagePtr(dbus_message_new_error(call, name.c_str(), text.c_str()));
+    });
+}
+
+void RawPeer::neverReply(const std::string& member) {
+    handle(member, [](DBusMessage*) { return MessagePtr(); });
+}
+
+void RawPeer::post(Task task) {
+    const std::lock_guard<std::mutex> lock(m_mutex);
+    m_tasks.push_back(std::move(task));
+    eventfd_write(m_wakeFd, 1);
+}
+
+void RawPeer::run(const std::function<void(DBusConnection*)>& task) {
+    std::promise<void> done;
+    post([&](DBusConnection* connection) {
+        task(connection);
+        done.set_value();
+    });
+    done.get_future().wait();
+}
+
+void RawPeer::send(MessagePtr message) {
+    post([held = std::shared_ptr<DBusMessage>(std::move(message))](DBusConnection* connection) {
+        dbus_connection_send(connection, held.get(), nullptr);
+    });
+}
+
+void RawPeer::emit(const std::string& path, const std::string& interface, const std::string& member,
+                   const Build& arguments) {
+    MessagePtr signal(dbus_message_new_signal(path.c_str(), interface.c_str(), member.c_str()));
+    build(signal, arguments);
+    send(std::move(signal));
+}
+
+std::future<MessagePtr> RawPeer::call(const std::string& destination, const std::string& path,
+                                      const std::string& interface, const std::string& member,
+                                      const Build& arguments, Milliseconds timeout) {
+    auto message = std::make_shared<MessagePtr>(methodCall(destination, path, interface, member));
+    build(*message, arguments);
+    auto* promise = new std::promise<MessagePtr>;
+    std::future<MessagePtr> result = promise->get_future();
+    post([message, promise, timeout](DBusConnection* connection) {
+        DBusPendingCall* pending = nullptr;
+        dbus_connection_send_with_reply(connection, message->get(), &pending,
+                                        static_cast<int>(timeout.count()));
+        if (!pending) {
+            promise->set_value(nullptr);
+            delete promise;
+            return;
+        }
+        dbus_pending_call_set_notify(
+            pending,
+            [](DBusPendingCall* done, void* data) {
+                static_cast<std::promise<MessagePtr>*>(data)->set_value(
+                    MessagePtr(dbus_pending_call_steal_reply(done)));
+            },
+            promise, [](void* data) { delete static_cast<std::promise<MessagePtr>*>(data); });
+        dbus_pending_call_unref(pending);
+    });
+    return result;
+}
+
+bool RawPeer::own(const std::string& name) {
+    bool owned = false;
+    run([&](DBusConnection* connection) {
+        owned = dbus_bus_request_name(connection, name.c_str(), DBUS_NAME_FLAG_DO_NOT_QUEUE,
+                                      nullptr) == DBUS_REQUEST_NAME_REPLY_PRIMARY_OWNER;
+    });
+    return owned;
+}
+
+void RawPeer::disown(const std::string& name) {
+    run([&](DBusConnection* connection) {
+        dbus_bus_release_name(connection, name.c_str(), nullptr);
+    });
+}
+
+bool RawPeer::hasOwner(const std::string& name) {
+    bool owned = false;
+    run([&](DBusConnection* connection) {
+        owned = dbus_bus_name_has_owner(connection, name.c_str(), nullptr);
+    });
+    return owned;
+}
+
+void RawPeer::addMatch(const std::string& rule) {
+    run([&](DBusConnection* connection) {
+        dbus_bus_add_match(connection, rule.c_str(), nullptr);
+        dbus_connection_flush(connection);
+    });
+}
+
+bool RawPeer::waitForOwner(const std::string& name, bool owned, Milliseconds limit) {
+    addMatch("type='signal',sender='org.freedesktop.DBus',member='NameOwnerChanged',arg0='" + name +
+             "'");
+    const auto deadline = Clock::now() + limit;
+    while (true) {
+        const std::size_t seen = m_signals.count();
+        if (hasOwner(name) == owned)
+            return true;
+        const auto left = std::chrono::duration_cast<Milliseconds>(deadline - Clock::now());
+        if (left.count() <= 0 || !m_signals.waitFor(seen + 1, left))
+            return false;
+    }
+}
+
+std::string RawPeer::uniqueName() {
+    return dbus_bus_get_unique_name(m_connection);
+}
+
+void RawPeer::becomeMonitor() {
+    run([this](DBusConnection* connection) {
+        const MessagePtr call = methodCall(DBUS_SERVICE_DBUS, DBUS_PATH_DBUS,
+                                           "org.freedesktop.DBus.Monitoring", "BecomeMonitor");
+        Writer(call.get()).array("s")(std::uint32_t{0});
+        ScopedError error;
+        const MessagePtr reply(
+            dbus_connection_send_with_reply_and_block(connection, call.get(), 5000, error));
+        if (!reply)
+            throw std::runtime_error(error.message());
+        m_isMonitor = true;
+    });
+}
+
+std::vector<std::string> RawPeer::callTexts() const {
+    std::vector<std::string> texts;
+    for (const SeenCall& call : m_calls.events()) {
+        if (call.destination != DBUS_SERVICE_DBUS)
+            texts.push_back(call.text());
+    }
+    return texts;
+}
+
+std::size_t RawPeer::count(const std::string& member) const {
+    const std::vector<SeenCall> seen = m_calls.events();
+    return static_cast<std::size_t>(std::count_if(
+        seen.begin(), seen.end(), [&](const SeenCall& call) { return call.member == member; }));
+}
+
+bool RawPeer::waitForCalls(const std::string& member, std::size_t expected,
+                           Milliseconds limit) const {
+    return m_calls.waitUntil(
+        [&](const std::vector<SeenCall>& seen) {
+            return static_cast<std::size_t>(
+                       std::count_if(seen.begin(), seen.end(), [&](const SeenCall& call) {
+                           return call.member == member;
+                       })) >= expected;
+        },
+        limit);
+}
+
+void RawPeer::loop() {
+    while (!m_stop) {
+        std::deque<Task> tasks;
+        {
+            const std::lock_guard<std::mutex> lock(m_mutex);
+            tasks.swap(m_tasks);
+        }
+        for (const Task& task : tasks)
+            task(m_connection);
+        sendDueReplies();
+        wait();
+        dbus_connection_read_write(m_connection, 0);
+        while (dbus_connection_dispatch(m_connection) == DBUS_DISPATCH_DATA_REMAINS) {
+        }
+    }
+}
+
+/// Waits for input, a task or the next reply that is due.
+void RawPeer::wait() {
+    if (dbus_connection_get_dispatch_status(m_connection) == DBUS_DISPATCH_DATA_REMAINS)
+        return;
+    pollfd fds[] = {{m_wakeFd, POLLIN, 0}, {-1, POLLIN, 0}};
+    if (dbus_connection_get_is_connected(m_connection))
+        dbus_connection_get_unix_fd(m_connection, &fds[1].fd);
+    if (dbus_connection_has_messages_to_send(m_connection))
+        fds[1].events |= POLLOUT;
+    auto limit = Milliseconds(100); // time-outs of calls are looked after by reading
+    if (!m_dueReplies.empty())
+        limit =
+            std::clamp(std::chrono::ceil<Milliseconds>(m_dueReplies.begin()->first - Clock::now()),
+                       Milliseconds(0), limit);
+    poll(fds, 2, static_cast<int>(limit.count()));
+    eventfd_t count = 0;
+    eventfd_read(m_wakeFd, &count);
+}
+
+void RawPeer::sendDueReplies() {
+    while (!m_dueReplies.empty() && m_dueReplies.begin()->first <= Clock::now()) {
+        dbus_connection_send(m_connection, m_dueReplies.begin()->second.get(), nullptr);
+        m_dueReplies.erase(m_dueReplies.begin());
+    }
+}
+
+DBusHandlerResult RawPeer::filter(DBusConnection*, DBusMessage* message, void* peer) {
+    return static_cast<RawPeer*>(peer)->take(message);
+}
+
+DBusHandlerResult RawPeer::take(DBusMessage* message) {
+    switch (dbus_message_get_type(message)) {
+    case DBUS_MESSAGE_TYPE_METHOD_CALL:
+        m_calls.add(
+            {textOf(dbus_message_get_destination(message)), textOf(dbus_message_get_path(message)),
+             textOf(dbus_message_get_interface(message)), textOf(dbus_message_get_member(message)),
+             argumentsOf(message), !dbus_message_get_no_reply(message)});
+        if (!m_isMonitor)
+            answerCall(message);
+        return DBUS_HANDLER_RESULT_HANDLED;
+    case DBUS_MESSAGE_TYPE_SIGNAL:
+        m_signals.add(textOf(dbus_message_get_member(message)) + " " + argumentsOf(message));
+        return DBUS_HANDLER_RESULT_NOT_YET_HANDLED;
+    default:
+        return DBUS_HANDLER_RESULT_NOT_YET_HANDLED;
+    }
+}
+
+void RawPeer::answerCall(DBusMessage* message) {
+    Answer answer;
+    {
+        const std::lock_guard<std::mutex> lock(m_mutex);
+        const auto known = m_answers.find(textOf(dbus_message_get_member(message)));
+        if (known != m_answers.end())
+            answer = known->second;
+    }
+    MessagePtr reply = answer.handler ? answer.handler(message)
+                                      : MessagePtr(dbus_message_new_error(
+                                            message, DBUS_ERROR_UNKNOWN_METHOD, "No such method"));
+    if (reply && !dbus_message_get_no_reply(message))
+        m_dueReplies.emplace(Clock::now() + answer.delay, std::move(reply));
+}
+
+} // namespace Bluetooth::Test

@@ -1,0 +1,95 @@
+#include "support/syslog_capture.h"
+
+#include <syslog.h>
+
+#include <algorithm>
+#include <cstdarg>
+#include <cstdio>
+#include <regex>
+
+namespace Bluetooth::Test {
+
+namespace {
+
+Recorder<LogLine>& lines() {
+    static auto& recorder = *new Recorder<LogLine>; // logged to until the very end
+    return recorder;
+}
+
+void record(int priority, const char* format, va_list args) {
+    va_list again;
+    va_copy(again, args);
+    const int length = vsnprintf(nullptr, 0, format, again);
+    va_end(again);
+    std::string text(static_cast<std::size_t>(std::max(length, 0)) + 1, '\0');
+    vsnprintf(text.data(), text.size(), format, args);
+    text.pop_back();
+    lines().add({priority, text});
+}
+
+} // namespace
+
+std::string LogLine::withoutNumber() const {
+    static const std::regex place("^([a-z0-9_]+\\.cpp):[1-9][0-9]* ");
+    std::string result = std::regex_replace(text, place, "$1 ");
+    if (priority != LOG_ERR)
+        result += " (priority " + std::to_string(priority) + ")";
+    return result;
+}
+
+SyslogCapture::SyslogCapture() {
+    lines().clear();
+}
+
+SyslogCapture::~SyslogCapture() {
+    lines().clear();
+}
+
+std::vector<std::string> SyslogCapture::take() {
+    std::vector<std::string> texts;
+    for (const LogLine& line : lines().events())
+        texts.push_back(line.withoutNumber());
+    lines().clear();
+    return texts;
+}
+
+bool SyslogCapture::waitFor(const std::string& text, Milliseconds limit) const {
+    return lines().waitUntil(
+        [&](const std::vector<LogLine>& all) {
+            return std::any_of(all.begin(), all.end(),
+                               [&](const LogLine& line) { return line.withoutNumber() == text; });
+        },
+        limit);
+}
+
+bool SyslogCapture::waitForCount(std::size_t count, Milliseconds limit) const {
+    return lines().waitFor(count, limit);
+}
+
+} // namespace Bluetooth::Test
+
+// The library's calls end here, however it was compiled.
+extern "C" {
+
+void syslog(int priority, const char* format, ...) {
+    va_list args;
+    va_start(args, format);
+    Bluetooth::Test::record(priority, format, args);
+    va_end(args);
+}
+
+void vsyslog(int priority, const char* format, va_list args) {
+    Bluetooth::Test::record(priority, format, args);
+}
+
+void __syslog_chk(int priority, int /*flag*/, const char* format, ...) {
+    va_list args;
+    va_start(args, format);
+    Bluetooth::Test::record(priority, format, args);
+    va_end(args);
+}
+
+void __vsyslog_chk(int priority, int /*flag*/, const char* format, va_list args) {
+    Bluetooth::Test::record(priority, format, args);
+}
+}
