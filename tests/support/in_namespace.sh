@@ -19,9 +19,9 @@ fingerprint() {
     done
 }
 
-set -- --unshare-pid --die-with-parent --tmpfs / \
+set -- --unshare-pid --die-with-parent \
     --ro-bind /usr /usr --ro-bind /usr/bin /real-bin --tmpfs /usr/bin --tmpfs /usr/sbin \
-    --proc /proc --dev /dev --tmpfs /tmp --dir /var/tmp --dir /run --dir /etc \
+    --proc /proc --dev /dev --perms 1777 --tmpfs /tmp --dir /var/tmp --dir /run \
     --size 65536 --tmpfs /small --ro-bind "$build" "$build" \
     --unsetenv DBUS_SYSTEM_BUS_ADDRESS --unsetenv DBUS_SESSION_BUS_ADDRESS \
     --setenv HOME /tmp --setenv KESBLUETOOTH_TEST_NAMESPACE 1 --chdir / \
@@ -40,6 +40,7 @@ for path in /bin /sbin /lib /lib32 /lib64 /libx32; do
         set -- --ro-bind "$path" "$path" "$@"
     fi
 done
+set -- --perms 0755 --dir /etc "$@"
 
 before=$(fingerprint)
 status=0
