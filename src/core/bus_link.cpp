@@ -44,6 +44,14 @@ void setNoMemory(DBusError& error) {
     dbus_set_error_const(&error, DBUS_ERROR_NO_MEMORY, "Not enough memory");
 }
 
+/// @return the reply; null, and none will come any more, when the call is not answered
+MessagePtr takeReply(DBusPendingCall* pending) {
+    if (dbus_pending_call_get_completed(pending)) // libdbus ends the process otherwise
+        return MessagePtr(dbus_pending_call_steal_reply(pending));
+    dbus_pending_call_cancel(pending);
+    return nullptr;
+}
+
 } // namespace
 
 std::atomic<bool> BusLink::stopRequested{false};
@@ -138,9 +146,8 @@ MessagePtr BusLink::call(DBusMessage* message, int timeoutMs, DBusError& error) 
     }
     wait(waiter);
 
-    MessagePtr reply(dbus_pending_call_steal_reply(begun));
+    MessagePtr reply = takeReply(begun);
     if (!reply) {
-        dbus_pending_call_cancel(begun);
         if (dbus_connection_get_is_connected(m_connection))
             dbus_set_error_const(
                 &error, DBUS_ERROR_NO_REPLY,
@@ -187,10 +194,7 @@ MessagePtr BusLink::finish(PendingPtr pending, const std::atomic<bool>& interrup
         waiter.leadsAlways = true;
         wait(waiter);
     }
-    MessagePtr reply(dbus_pending_call_steal_reply(pending.get()));
-    if (!reply)
-        dbus_pending_call_cancel(pending.get());
-    return reply;
+    return takeReply(pending.get());
 }
 
 void BusLink::flush() {

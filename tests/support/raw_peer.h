@@ -82,6 +82,8 @@ public:
     bool waitForCalls(const std::string& member, std::size_t count,
                       Milliseconds limit = patience) const;
     void forgetCalls() { m_calls.clear(); }
+    /// Calls are no longer recorded: there will be very many.
+    void stopRecording() { m_recording = false; }
     /// Signals that came for match rules of the peer, as "MEMBER arguments".
     const Recorder<std::string>& signals() const { return m_signals; }
     void addMatch(const std::string& rule);
@@ -105,6 +107,7 @@ private:
     DBusConnection* m_connection = nullptr;
     int m_wakeFd = -1;
     std::atomic<bool> m_stop{false};
+    std::atomic<bool> m_recording{true};
     std::mutex m_mutex; // guards m_tasks and m_answers
     std::deque<Task> m_tasks;
     std::map<std::string, Answer> m_answers;

@@ -1,0 +1,369 @@
+// Method calls: how they are built and sent, what failures record, how replies are read.
+
+#include "support/core_test.h"
+#include "support/stdout_capture.h"
+
+#include <bluetooth/connection.h>
+
+#include <limits>
+#include <memory>
+
+namespace Bluetooth::Test {
+
+namespace {
+
+constexpr const char* notUtf8 = "\xff\xfe";
+
+using Texts = std::vector<std::string>;
+
+std::string listed(const Texts& texts) {
+    std::string all;
+    for (const std::string& text : texts)
+        all += text + ";";
+    return all;
+}
+
+std::string listed(const std::vector<ObjectPath>& paths) {
+    return listed(Texts(paths.begin(), paths.end()));
+}
+
+} // namespace
+
+TEST(ObjectPathTest, HoldsAnyTextAndIsNeverNull) {
+    const ObjectPath none;
+    EXPECT_STREQ(none, "");
+    EXPECT_STREQ(none.c_str(), "");
+    ObjectPath path("hci0");
+    EXPECT_EQ(path.str(), "hci0");
+    path = ObjectPath(std::string("/org"));
+    EXPECT_STREQ(path, "/org");
+    EXPECT_EQ(std::string(path), "/org");
+}
+
+class CallTest : public CoreTest {
+protected:
+    /// Holds a reply with these arguments for the proxy.
+    void hold(const Writer::Build& arguments) {
+        MessagePtr reply(dbus_message_new(DBUS_MESSAGE_TYPE_METHOD_RETURN));
+        Writer writer(reply.get());
+        if (arguments)
+            arguments(writer);
+        ASSERT_EQ(proxy.setReplyMessage(reply.release()), 0);
+    }
+
+    /// Reads the held reply and then once more, when none may be left.
+    template <class Value>
+    int readOnce(Value& value) {
+        proxy.resetError();
+        const int result = proxy.getReplyValue(value);
+        const int number = proxy.getErrorNumber();
+        const std::string text = proxy.getErrorMessage();
+        Value another{};
+        EXPECT_EQ(proxy.getReplyValue(another), -1);
+        EXPECT_EQ(proxy.getErrorNumber(), 2);
+        EXPECT_EQ(proxy.getErrorMessage(), "Reply message is null");
+        readError = {number, text};
+        return result;
+    }
+
+    std::pair<int, std::string> readError;
+    const std::pair<int, std::string> noError{0, ""};
+    const std::pair<int, std::string> wrongType{4, "Invalid reply value"};
+};
+
+TEST_F(CallTest, ArgumentsArriveWithTheirTypesInOrder) {
+    peer.reply("Take");
+    ASSERT_EQ(proxy.newMessage("Take"), 0);
+    EXPECT_EQ(proxy.append(true), 0);
+    EXPECT_EQ(proxy.append("naïve"), 0);
+    EXPECT_EQ(proxy.append(ObjectPath("/")), 0);
+    EXPECT_EQ(proxy.append(std::numeric_limits<unsigned int>::max()), 0);
+    EXPECT_EQ(proxy.append(std::numeric_limits<unsigned short>::max()), 0);
+    EXPECT_EQ(proxy.append(Variant(7u)), 0);
+    EXPECT_EQ(proxy.append(Variant(std::uint16_t{8})), 0);
+    EXPECT_EQ(proxy.append(Variant(true)), 0);
+    EXPECT_EQ(proxy.append(Variant(std::string())), 0);
+    EXPECT_EQ(proxy.sendMessage(true, -1), 0);
+    EXPECT_FALSE(proxy.hasError());
+    ASSERT_EQ(peer.calls().size(), 1u);
+    const SeenCall seen = peer.calls()[0];
+    EXPECT_EQ(seen.text(), "Take b:1 s:naïve o:/ u:4294967295 q:65535 v(u:7) v(q:8) v(b:1) v(s:)");
+    EXPECT_EQ(seen.path, peerPath);
+    EXPECT_EQ(seen.interface, peerInterface);
+}
+
+TEST_F(CallTest, ArraysAndSignedNumbersAreLeftOutOfTheCallWithSuccessAndAnError) {
+    peer.reply("SetProperty");
+    for (const Variant& value : {Variant(Texts{"a"}), Variant(std::int32_t{-1})}) {
+        proxy.resetError();
+        ASSERT_EQ(proxy.newMessage("SetProperty"), 0);
+        ASSERT_EQ(proxy.append("Name"), 0);
+        EXPECT_EQ(proxy.append(value), 0);
+        EXPECT_EQ(proxy.getErrorNumber(), 8);
+        EXPECT_EQ(proxy.getErrorMessage(), "Failed to append args = iterator");
+        EXPECT_EQ(proxy.sendMessage(true, -1), 0);
+    }
+    EXPECT_EQ(peer.callTexts(), (Texts{"SetProperty s:Name", "SetProperty s:Name"}));
+}
+
+TEST_F(CallTest, UnusableArgumentsAreRefusedAndTheCallCanStillBeMade) {
+    peer.reply("Take");
+    ASSERT_EQ(proxy.newMessage("Take"), 0);
+    const struct {
+        std::function<int()> append;
+        int number;
+        const char* text;
+    } cases[] = {
+        {[&] { return proxy.newMessage(nullptr); }, 1, "Parameter is null"},
+        {[&] { return proxy.append(static_cast<const char*>(nullptr)); }, 1, "Parameter is null"},
+        {[&] { return proxy.append(notUtf8); }, 7, "Failed to append args to message"},
+        {[&] { return proxy.append(ObjectPath("dev")); }, 3, "Invalid path"},
+        {[&] { return proxy.append(ObjectPath("")); }, 3, "Invalid path"},
+        {[&] { return proxy.append(ObjectPath("/a//b")); }, 7, "Failed to append args to message"},
+        {[&] { return proxy.append(Variant(std::string(notUtf8))); }, 8,
+         "Failed to append args = iterator"},
+        {[&] { return proxy.setReplyMessage(nullptr); }, 2, "Reply message is null"},
+    };
+    for (const auto& refused : cases) {
+        proxy.resetError();
+        EXPECT_EQ(refused.append(), -1) << refused.text;
+        EXPECT_EQ(proxy.getErrorNumber(), refused.number);
+        EXPECT_EQ(proxy.getErrorMessage(), refused.text);
+    }
+    // Errors stay until they are reset; the call that was begun is still there.
+    EXPECT_EQ(proxy.append(1u), 0);
+    EXPECT_EQ(proxy.sendMessage(true, -1), 0);
+    EXPECT_TRUE(proxy.hasError());
+    EXPECT_EQ(proxy.getErrorMessage(), "Reply message is null");
+    proxy.resetError();
+    EXPECT_FALSE(proxy.hasError());
+    EXPECT_EQ(proxy.getErrorMessage(), "");
+    EXPECT_EQ(peer.callTexts(), Texts{"Take u:1"});
+}
+
+TEST_F(CallTest, UnusableNamesMakeNoMessageAndEveryStepAfterFails) {
+    const struct {
+        const char* destination;
+        const char* path;
+        const char* interface;
+        const char* method;
+    } cases[] = {
+        {"no name", peerPath, peerInterface, "Take"}, {"", peerPath, peerInterface, "Take"},
+        {peerName, "dev", peerInterface, "Take"},     {peerName, "/a/", peerInterface, "Take"},
+        {peerName, peerPath, "nodot", "Take"},        {peerName, peerPath, notUtf8, "Take"},
+        {peerName, peerPath, peerInterface, "a.b"},   {peerName, peerPath, peerInterface, ""},
+    };
+    for (const auto& unusable : cases) {
+        RemoteObject object(unusable.destination, unusable.path, unusable.interface, busType);
+        EXPECT_EQ(object.newMessage(unusable.method), -1);
+        EXPECT_EQ(object.getErrorMessage(), "Failed to create message");
+        const struct {
+            std::function<int()> step;
+            int number;
+        } steps[] = {
+            {[&] { return object.append(1u); }, 7},
+            {[&] { return object.append("text"); }, 7},
+            {[&] { return object.append(Variant(1u)); }, 8},
+            {[&] { return object.append(Variant(Texts{})); }, 8},
+            {[&] { return object.sendMessage(false, -1); }, 10},
+            {[&] { return object.sendMessage(true, -1); }, 11},
+            {[&] { return object.sendMessagePending(); }, 11},
+        };
+        for (const auto& step : steps) {
+            object.resetError();
+            EXPECT_EQ(step.step(), -1);
+            EXPECT_EQ(object.getErrorNumber(), step.number);
+        }
+    }
+    // A name that is none also ends the call that was begun before.
+    ASSERT_EQ(proxy.newMessage("Take"), 0);
+    EXPECT_EQ(proxy.newMessage("a.b"), -1);
+    EXPECT_EQ(proxy.sendMessage(false, -1), -1);
+    EXPECT_EQ(proxy.getErrorMessage(), "Failed to send message");
+    EXPECT_EQ(peer.calls().size(), 0u);
+}
+
+TEST_F(CallTest, WithoutABusEveryCallFailsAndNothingAborts) {
+    PrivateBus::address(PrivateBus::Kind::System); // where nobody listens
+    const std::string noBus = "connection.cpp Failed to get bus connection";
+    EXPECT_EQ(Connection::get(DBUS_BUS_SYSTEM), nullptr);
+    Connection::unref(nullptr);
+    RemoteObject object(peerName, peerPath, peerInterface, DBUS_BUS_SYSTEM);
+    EXPECT_EQ(log.take(), (Texts{noBus, noBus}));
+    EXPECT_EQ(object.getConnection(), nullptr);
+    EXPECT_STREQ(object.getConnectionName(), "");
+
+    ASSERT_EQ(object.newMessage("Take"), 0);
+    EXPECT_EQ(object.sendMessage(true, -1), -1);
+    EXPECT_EQ(object.getErrorNumber(), 11);
+    EXPECT_NE(object.getErrorMessage(), "");
+    ASSERT_EQ(object.newMessage("Take"), 0);
+    EXPECT_EQ(object.sendMessage(false, -1), -1);
+    EXPECT_EQ(object.getErrorNumber(), 10);
+    ASSERT_EQ(object.newMessage("Take"), 0);
+    EXPECT_EQ(object.sendMessagePending(), -1);
+    EXPECT_EQ(object.getErrorNumber(), 11);
+    std::string text;
+    EXPECT_EQ(object.getReplyValue(text), -1);
+    EXPECT_EQ(object.getErrorNumber(), 2);
+
+    EXPECT_EQ(object.setSignalHandlerNoArgument("Changed", [](RemoteObject*) {}), -1);
+    EXPECT_EQ(log.take(), Texts{"remote_object.cpp Match error (Not connected to the bus)"});
+    EXPECT_EQ(object.startLoop(), 0);
+    EXPECT_EQ(object.waitLoop(), 0);
+}
+
+TEST_F(CallTest, AllProxiesOfABusShareOneConnection) {
+    DBusConnection* connection = Connection::get(busType);
+    EXPECT_EQ(connection, proxy.getConnection());
+    Connection::unref(connection);
+    EXPECT_STREQ(proxy.getConnectionName(), dbus_bus_get_unique_name(connection));
+}
+
+TEST_F(CallTest, InfoNamesDestinationPathAndInterface) {
+    const std::string info = "RemoteObject name: com.example.Peer\n"
+                             "Path: /com/example/peer\n"
+                             "Interface: com.example.Peer\n";
+    EXPECT_EQ(proxy.getInfo(), info);
+    StdoutCapture output;
+    proxy.printInfo();
+    EXPECT_EQ(output.take(), info);
+}
+
+TEST_F(CallTest, AFailedCallRecordsTheServicesOwnText) {
+    peer.replyError("Refuse", "com.example.Error.No", "not today");
+    EXPECT_EQ(call("Refuse"), -1);
+    EXPECT_EQ(proxy.getErrorNumber(), 11);
+    EXPECT_EQ(proxy.getErrorMessage(), "not today");
+    EXPECT_EQ(call("NoSuchMethod"), -1);
+    EXPECT_EQ(proxy.getErrorMessage(), "No such method");
+    RemoteObject absent("com.example.Absent", peerPath, peerInterface, busType);
+    EXPECT_EQ(call(absent, "Take"), -1);
+    EXPECT_NE(absent.getErrorMessage().find("com.example.Absent"), std::string::npos);
+}
+
+TEST_F(CallTest, CallsWithoutReplyAreWrittenAtOnceAndLeaveNoReply) {
+    peer.reply("Ask", [](Writer& w) { w("old"); });
+    peer.reply("Take");
+    ASSERT_EQ(call("Ask"), 0);
+    ASSERT_EQ(proxy.newMessage("Take"), 0);
+    ASSERT_EQ(proxy.append(std::string(5'000'000, 'x').c_str()), 0); // more than a socket takes
+    EXPECT_EQ(proxy.sendMessage(false, 1), 0);
+    EXPECT_FALSE(dbus_connection_has_messages_to_send(proxy.getConnection()));
+    ASSERT_TRUE(peer.waitForCalls("Take", 1));
+    EXPECT_FALSE(peer.calls()[1].wantsReply);
+    std::string text;
+    EXPECT_EQ(proxy.getReplyValue(text), -1);
+    EXPECT_EQ(proxy.getErrorMessage(), "Reply message is null");
+    EXPECT_EQ(proxy.sendMessage(false, -1), -1); // the message was used up
+    EXPECT_EQ(proxy.getErrorNumber(), 10);
+}
+
+TEST_F(CallTest, TimeOutsAreKeptAndALateReplyIsNobodys) {
+    peer.reply(
+        "Slow", [](Writer& w) { w("late"); }, Milliseconds(400));
+    peer.reply("Quick", [](Writer& w) { w("mine"); });
+    const auto begin = std::chrono::steady_clock::now();
+    EXPECT_EQ(call("Slow", 100), -1);
+    EXPECT_GE(std::chrono::steady_clock::now() - begin, Milliseconds(100));
+    EXPECT_EQ(proxy.getErrorMessage().substr(0, 23), "Did not receive a reply");
+    proxy.resetError();
+    EXPECT_EQ(call("Quick", 0x7fffffff), 0);
+    EXPECT_EQ(call("Slow", -1), 0); // by now the first one's reply has come
+    std::string text;
+    EXPECT_EQ(call("Quick"), 0);
+    EXPECT_EQ(readOnce(text), 0);
+    EXPECT_EQ(text, "mine");
+    EXPECT_EQ(call("Quick", -2), -1);
+    EXPECT_EQ(proxy.getErrorNumber(), 11);
+}
+
+TEST_F(CallTest, TextsAndBooleansAreReadFromTheirOwnTypeOnly) {
+    std::string text;
+    hold([](Writer& w) { w("hello")(5u); }); // what follows the first argument is not looked at
+    EXPECT_EQ(readOnce(text), 0);
+    EXPECT_EQ(text, "hello");
+    EXPECT_EQ(readError, noError);
+    for (const bool value : {true, false}) {
+        bool read = !value;
+        hold([value](Writer& w) { w(value); });
+        EXPECT_EQ(readOnce(read), 0);
+        EXPECT_EQ(read, value);
+    }
+    bool flag = true;
+    const Writer::Build neither[] = {{},
+                                     [](Writer& w) { w(Path{"/"}); },
+                                     [](Writer& w) { w(1u); },
+                                     [](Writer& w) { w(Var{"text"}); },
+                                     [](Writer& w) { w.array("s"); }};
+    for (const auto& reply : neither) {
+        hold(reply);
+        EXPECT_EQ(readOnce(text), -1);
+        EXPECT_EQ(readError, wrongType);
+        hold(reply);
+        EXPECT_EQ(readOnce(flag), -1);
+        EXPECT_EQ(readError, wrongType);
+    }
+    EXPECT_EQ(text, "hello");
+    EXPECT_TRUE(flag);
+}
+
+TEST_F(CallTest, ATextWhereAPathWasAskedForIsTheServicesError) {
+    ObjectPath path;
+    hold([](Writer& w) { w(Path{"/org/bluez"}); });
+    EXPECT_EQ(readOnce(path), 0);
+    EXPECT_STREQ(path, "/org/bluez");
+    EXPECT_EQ(readError, noError);
+
+    hold([](Writer& w) { w("No such adapter"); });
+    EXPECT_EQ(readOnce(path), -2);
+    EXPECT_STREQ(path, "No such adapter");
+    EXPECT_EQ(readError, std::make_pair(11, std::string("No such adapter")));
+
+    // Of any other type: number 11 as well, and whatever text there was before stays.
+    for (const Writer::Build& reply : {Writer::Build(), Writer::Build([](Writer& w) { w(3u); })}) {
+        path = ObjectPath("/kept");
+        hold(reply);
+        EXPECT_EQ(readOnce(path), -1);
+        EXPECT_EQ(readError, std::make_pair(11, std::string()));
+        EXPECT_STREQ(path, "/kept");
+    }
+    hold([](Writer& w) { w("older text"); });
+    EXPECT_EQ(proxy.getReplyValue(path), -2);
+    hold([](Writer& w) { w(true); });
+    EXPECT_EQ(proxy.getReplyValue(path), -1);
+    EXPECT_EQ(proxy.getErrorMessage(), "older text");
+}
+
+TEST_F(CallTest, ListsAreReadFromArraysOfTexts) {
+    const struct {
+        Writer::Build reply;
+        int result;
+        const char* list;
+    } cases[] = {
+        {[](Writer& w) { w.array("s", [](Writer& a) { a("a")("")("b"); }); }, 0, "a;;b;"},
+        {[](Writer& w) { w.array("o", [](Writer& a) { a(Path{"/a"})(Path{"/"}); }); }, 0, "/a;/;"},
+        {[](Writer& w) { w.array("s"); }, 0, ""},
+        {[](Writer& w) { w.array("u"); }, 0, ""}, // empty of whatever type
+        {[](Writer& w) { w.dict("sv"); }, 0, ""},
+        {[](Writer& w) { w.array("u", [](Writer& a) { a(1u); }); }, -1, "before;"},
+        {[](Writer& w) { w.array("x", [](Writer& a) { a(std::int64_t{-1}); }); }, -1, "before;"},
+        {[](Writer& w) { w.dict("sv", [](Writer& d) { d.entry("a", Var{1u}); }); }, -1, "before;"},
+        {[](Writer& w) { w.array("as", [](Writer& a) { a.array("s"); }); }, -1, "before;"},
+        {[](Writer& w) { w("a"); }, -1, "before;"},
+        {{}, -1, "before;"},
+    };
+    for (const auto& given : cases) {
+        Texts texts{"before"};
+        hold(given.reply);
+        EXPECT_EQ(readOnce(texts), given.result);
+        EXPECT_EQ(listed(texts), given.list);
+        EXPECT_EQ(readError, given.result == 0 ? noError : wrongType);
+        std::vector<ObjectPath> paths{ObjectPath("before")};
+        hold(given.reply);
+        EXPECT_EQ(readOnce(paths), given.result);
+        EXPECT_EQ(listed(paths), given.list);
+    }
+}
+
+} // namespace Bluetooth::Test

@@ -1,0 +1,253 @@
+#include "host/namespace_test.h"
+
+#include <bluetooth/auto_connect.h>
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <locale>
+
+namespace Bluetooth::Test {
+
+namespace {
+
+using Lines = std::vector<std::string>;
+
+constexpr const char* adapter = "AA:BB:CC:DD:EE:FF";
+
+std::string line(const std::string& message) {
+    return "auto_connect.cpp " + message;
+}
+
+} // namespace
+
+/// The configuration file of one adapter, and a daemon's end of the command pipe.
+class AutoConnectFileTest : public NamespaceTest {
+protected:
+    void SetUp() override {
+        NamespaceTest::SetUp();
+        mkfifo(commandPipe, 0600);
+        m_pipe = open(commandPipe, O_RDONLY | O_NONBLOCK | O_CLOEXEC);
+        std::filesystem::remove_all("/small/x");
+    }
+    void TearDown() override { close(m_pipe); }
+
+    void write(const std::string& content) {
+        std::filesystem::create_directory(configFolder);
+        writeFile(file, content);
+    }
+    std::string content() const { return readFile(file); }
+    /// The commands that the daemon got since the last call.
+    std::string commands() const {
+        char bytes[100];
+        const ssize_t length = read(m_pipe, bytes, sizeof bytes);
+        return std::string(bytes, length < 0 ? 0 : static_cast<std::size_t>(length));
+    }
+
+    /// Every operation on the adapter's file fails with the same line.
+    void expectAllFail(const std::string& message) {
+        const Lines lines{line(message)};
+        EXPECT_FALSE(config.checkConfigFile(file.c_str()));
+        EXPECT_EQ(log.take(), lines);
+        EXPECT_FALSE(config.getEnable(adapter));
+        EXPECT_EQ(log.take(), lines);
+        EXPECT_FALSE(config.set(adapter, true, ",X"));
+        EXPECT_EQ(log.take(), lines);
+        EXPECT_FALSE(config.removeDevice(adapter, "X"));
+        EXPECT_EQ(log.take(), lines);
+        EXPECT_EQ(commands(), "");
+    }
+
+    const std::string file = std::string(configFolder) + adapter;
+    AutoConnect config;
+
+private:
+    int m_pipe = -1;
+};
+
+TEST_F(AutoConnectFileTest, MissingFileIsCreatedDisabledAndEmpty) {
+    EXPECT_FALSE(config.getEnable(adapter));
+    EXPECT_EQ(content(), "0");
+    struct stat status {};
+    ASSERT_EQ(stat(configFolder, &status), 0);
+    EXPECT_EQ(status.st_mode, static_cast<mode_t>(S_IFDIR | 0755));
+    EXPECT_FALSE(config.getEnable("aa:bb:cc:dd:ee:ff"));
+    EXPECT_EQ(readFile(std::string(configFolder) + "aa:bb:cc:dd:ee:ff"), "0") << "no case folding";
+    EXPECT_EQ(commands(), "");
+    EXPECT_EQ(log.take(), Lines());
+}
+
+TEST_F(AutoConnectFileTest, SetWritesFlagAndListAsGivenAndTellsTheDaemon) {
+    const struct {
+        bool enable;
+        const char* list;
+        const char* content;
+    } cases[] = {
+        {true, ",11:22:33:44:55:66,77:88:99:AA:BB:CC", "1,11:22:33:44:55:66,77:88:99:AA:BB:CC"},
+        {false, ",11:22:33:44:55:66", "0,11:22:33:44:55:66"},
+        {true, "", "1"},
+        {true, "11:22", "111:22"}, // no comma is added
+    };
+    for (const auto& testCase : cases) {
+        EXPECT_TRUE(config.set(adapter, testCase.enable, testCase.list));
+        EXPECT_EQ(content(), testCase.content);
+        EXPECT_EQ(commands(), "1");
+        EXPECT_EQ(config.getEnable(adapter), testCase.enable);
+    }
+    EXPECT_EQ(log.take(), Lines());
+}
+
+TEST_F(AutoConnectFileTest, SetSucceedsWithoutADaemon) {
+    TearDown();
+    EXPECT_TRUE(config.set(adapter, true, ",A"));
+    EXPECT_EQ(content(), "1,A");
+    EXPECT_EQ(log.take().size(), 1u) << "the pipe's line only";
+}
+
+TEST_F(AutoConnectFileTest, EnableIsANumberOtherThanZero) {
+    // In such a locale a stream would read "1,112" as one number.
+    struct Grouping : std::numpunct<char> {
+        char do_thousands_sep() const override { return ','; }
+        std::string do_grouping() const override { return "\3"; }
+    };
+    const std::locale before = std::locale::global(std::locale(std::locale(), new Grouping));
+    const struct {
+        std::string content;
+        bool enabled;
+    } cases[] = {{"1,112,A", true},
+                 {"1", true},
+                 {"0,A", false},
+                 {"111:22", true},
+                 {" \n1,A", true},
+                 {"-5,A", true},
+                 {"", false},
+                 {"yes,A", false},
+                 {",A", false},
+                 {"99999999999999,A", false},
+                 {std::string("\0001,A", 4), false}};
+    for (const auto& testCase : cases) {
+        write(testCase.content);
+        EXPECT_EQ(config.getEnable(adapter), testCase.enabled) << testCase.content;
+    }
+    EXPECT_TRUE(config.set(adapter, true, ",A"));
+    EXPECT_EQ(content(), "1,A");
+    std::locale::global(before);
+    EXPECT_EQ(log.take(), Lines());
+}
+
+TEST_F(AutoConnectFileTest, RemoveDeviceDropsExactMatchesOfAnEnabledList) {
+    const struct {
+        std::string before;
+        std::string after;
+    } cases[] = {
+        {"1,A,B,A", "1,B"},
+        {"1,A", "1"},
+        {"1,B,a,AA", "1,B,a,AA"},
+        {"1,A,,B,", "1,,B"}, // nothing is read after the last comma
+        {"1xA,B", "1,B"},    // two bytes are skipped whatever they are
+        {"1", "1"},
+        {std::string("1,A,B\0C,D", 9), std::string("1,B\0C,D", 7)},
+        {"1,A\n", "1,A\n"}, // a line end belongs to the last entry
+    };
+    for (const auto& testCase : cases) {
+        write(testCase.before);
+        EXPECT_TRUE(config.removeDevice(adapter, "A"));
+        EXPECT_EQ(content(), testCase.after) << testCase.before;
+        EXPECT_EQ(commands(), "1");
+    }
+    // Disabled, or no flag at all: untouched.
+    for (const char* before : {"0,A,B", "", "2,A", "111:22,A", "yes,A", "-1,A"}) {
+        write(before);
+        EXPECT_TRUE(config.removeDevice(adapter, "A"));
+        EXPECT_EQ(content(), before);
+        EXPECT_EQ(commands(), "");
+    }
+    EXPECT_EQ(log.take(), Lines());
+}
+
+TEST_F(AutoConnectFileTest, NullArgumentsAreLogged) {
+    const Lines noAdapter{line("Adapter address is null.")};
+    EXPECT_FALSE(config.getEnable(nullptr));
+    EXPECT_EQ(log.take(), noAdapter);
+    EXPECT_FALSE(config.set(nullptr, true, nullptr));
+    EXPECT_EQ(log.take(), noAdapter);
+    EXPECT_FALSE(config.removeDevice(nullptr, nullptr));
+    EXPECT_EQ(log.take(), noAdapter);
+    EXPECT_EQ(config.getDeviceList(nullptr), nullptr);
+    EXPECT_EQ(log.take(), noAdapter);
+    EXPECT_FALSE(config.set(adapter, true, nullptr));
+    EXPECT_EQ(log.take(), Lines{line("Device address list is null.")});
+    EXPECT_FALSE(config.removeDevice(adapter, nullptr));
+    EXPECT_EQ(log.take(), Lines{line("Device address is null.")});
+    EXPECT_FALSE(config.checkConfigFile(nullptr));
+    EXPECT_EQ(log.take(), Lines{line("Config '(null)' can not be open.")});
+    EXPECT_FALSE(std::filesystem::exists(configFolder));
+}
+
+TEST_F(AutoConnectFileTest, WhatIsNoUsableFileIsRefusedAndKept) {
+    std::filesystem::create_directories(file + "/inside");
+    expectAllFail("Config '" + file + "' is not regular file.");
+    EXPECT_TRUE(std::filesystem::exists(file + "/inside"));
+
+    std::filesystem::remove_all(file);
+    std::filesystem::create_symlink("/nowhere/file", file);
+    expectAllFail("Config '" + file + "' can not be open.");
+
+    std::filesystem::remove(file);
+    std::filesystem::create_symlink(STANDIN_DAEMON, file); // on a read-only file system
+    expectAllFail("Config '" + file + "' can not be write/read.");
+
+    std::filesystem::remove_all(configFolder);
+    std::filesystem::remove("/etc/bluetooth");
+    expectAllFail("Can not create config path '/etc/bluetooth/autoconnect/'");
+
+    writeFile("/etc/bluetooth", "a file where the folder should be");
+    expectAllFail("Can not create config path '/etc/bluetooth/autoconnect/'");
+}
+
+TEST_F(AutoConnectFileTest, AFullDiskIsReportedAndDoesNoMore) {
+    writeFile("/small/x", "1,A,B");
+    writeFile("/small/filler", std::string(100000, 'x'));
+    std::filesystem::create_directory(configFolder);
+    std::filesystem::create_symlink("/small/x", file);
+    EXPECT_FALSE(config.set(adapter, true, std::string(70000, ',').c_str()));
+    EXPECT_EQ(log.take(), Lines{line("Can not write config file '" + file + "'.")});
+    EXPECT_EQ(commands(), "") << "nothing that is worth reading again";
+    EXPECT_FALSE(config.removeDevice(nullptr, "A"));
+    log.take();
+
+    std::filesystem::remove("/small/x");
+    std::filesystem::resize_file("/small/filler", 0);
+    writeFile("/small/filler", std::string(100000, 'x'));
+    EXPECT_FALSE(config.getEnable(adapter)) << "the file can be made, but not its one byte";
+    EXPECT_EQ(log.take(), Lines{line("Config '" + file + "' can not be written.")});
+    std::filesystem::remove("/small/filler");
+}
+
+TEST_F(AutoConnectFileTest, LongListsAreKeptAndHugeFilesNotRead) {
+    std::string list;
+    for (int number = 0; number < 20000; ++number)
+        list += ',' + std::to_string(number);
+    ASSERT_TRUE(config.set(adapter, true, (list + ",A").c_str()));
+    EXPECT_TRUE(config.removeDevice(adapter, "A"));
+    EXPECT_EQ(content(), '1' + list);
+    commands();
+
+    const std::string longLine = "1," + std::string(500000, 'x');
+    write(longLine + ",A");
+    EXPECT_TRUE(config.removeDevice(adapter, "A"));
+    EXPECT_EQ(content(), longLine);
+    commands();
+
+    write("1,A,B");
+    std::filesystem::resize_file(file, std::uintmax_t(100) << 30); // a hole, and no comma in it
+    EXPECT_TRUE(config.getEnable(adapter));
+    EXPECT_FALSE(config.removeDevice(adapter, "A"));
+    EXPECT_EQ(log.take(), Lines{line("Config '" + file + "' is too large.")});
+    EXPECT_EQ(std::filesystem::file_size(file), std::uintmax_t(100) << 30);
+    EXPECT_TRUE(config.set(adapter, true, ",A")) << "and it can be replaced";
+    EXPECT_EQ(content(), "1,A");
+}
+
+} // namespace Bluetooth::Test
