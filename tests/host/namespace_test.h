@@ -27,13 +27,13 @@ inline void writeFile(const std::string& path, const std::string& content) {
 }
 
 /// Uses the library's fixed paths, which are this test's own: ctest runs it through
-/// tests/support/in_namespace.sh. Begins with an empty /etc/bluetooth and /tmp.
+/// tests/host/in_namespace.sh. Begins with an empty /etc/bluetooth and /tmp.
 class NamespaceTest : public ::testing::Test {
 protected:
     void SetUp() override {
         ASSERT_NE(getenv("KESBLUETOOTH_TEST_NAMESPACE"), nullptr)
             << "this would change the machine's own files: run it with ctest, or through "
-               "tests/support/in_namespace.sh BUILD_FOLDER";
+               "tests/host/in_namespace.sh BUILD_FOLDER";
         std::filesystem::remove_all("/etc/bluetooth");
         std::filesystem::create_directory("/etc/bluetooth");
         for (const auto& entry : std::filesystem::directory_iterator("/tmp")) {
