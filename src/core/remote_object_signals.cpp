@@ -45,6 +45,8 @@ int walkers = 0;
 /// one returns false. The guard is not held in visit().
 template <class Callback, class Visit>
 void forEachMatch(std::list<SignalHandler<Callback>>& registry, DBusMessage* message, Visit visit) {
+    if (!message)
+        return; // libdbus would end the process
     std::unique_lock<std::mutex> lock(guard().mutex);
     ++walkers<Callback>;
     bool more = true;

@@ -1,0 +1,465 @@
+// Subscriptions: who is told of which signal, in which order, and what bad signals do.
+
+#include "support/core_test.h"
+#include "support/receive_loop.h"
+
+#include <bluetooth/dict_codec.h>
+
+#include <atomic>
+#include <memory>
+#include <set>
+#include <thread>
+
+namespace Bluetooth::Test {
+
+namespace {
+
+using Texts = std::vector<std::string>;
+
+/// What the callbacks report: "KIND RECEIVER'S-PATH VALUES".
+Recorder<std::string>& seen() {
+    static Recorder<std::string> recorder;
+    return recorder;
+}
+
+std::string to(const char* kind, RemoteObject* receiver) {
+    return std::string(kind) + " " + receiver->getPath();
+}
+
+void onNothing(RemoteObject* receiver) {
+    seen().add(to("nothing", receiver));
+}
+void onString(RemoteObject* receiver, const char* text) {
+    seen().add(to("string", receiver) + " " + text);
+}
+void onPath(RemoteObject* receiver, const ObjectPath* path) {
+    seen().add(to("path", receiver) + " " + path->str());
+}
+void onVariant(RemoteObject* receiver, const char* name, const Variant* value) {
+    seen().add(to("variant", receiver) + " " + name + "=" + variantToString(*value));
+}
+void onDict(RemoteObject* receiver, const char* text, const Dict* dict) {
+    seen().add(to("dict", receiver) + " " + text + " " + dictConquerToString(*dict, ";"));
+}
+
+std::string rule(const char* member, const char* path) {
+    return std::string("s:type='signal',interface='com.example.Peer',member='") + member +
+           "',path='" + path + "'";
+}
+
+} // namespace
+
+class SignalTest : public CoreTest {
+protected:
+    void SetUp() override {
+        KES_NEEDS_RECEIVE_LOOP();
+        seen().clear();
+    }
+
+    void emit(const char* member, const Writer::Build& arguments = {},
+              const char* path = peerPath) {
+        peer.emit(path, peerInterface, member, arguments);
+    }
+
+    static MessagePtr signal(const Writer::Build& arguments) {
+        MessagePtr message(dbus_message_new_signal(peerPath, peerInterface, "Changed"));
+        Writer writer(message.get());
+        if (arguments)
+            arguments(writer);
+        return message;
+    }
+
+    /// Offers a signal to all dispatchers as the receive thread of `loop` does.
+    static void dispatch(RemoteObject& loop, DBusMessage* message) {
+        loop.signalHandlerDispatcherObjectPath(message);
+        loop.signalHandlerDispatcherStringVariant(message);
+        loop.signalHandlerDispatcherString(message);
+        loop.signalHandlerDispatcherStringDict(message);
+        loop.signalHandlerDispatcherNoArgument(message);
+    }
+
+    /// Waits until the receive thread has delivered everything emitted so far.
+    void settle() {
+        static Recorder<int> done;
+        done.clear();
+        RemoteObject marker(peerName, "/marker", "com.example.Marker", busType);
+        marker.setSignalHandlerNoArgument("Done", [](RemoteObject*) { done.add(1); });
+        peer.emit("/marker", "com.example.Marker", "Done");
+        EXPECT_TRUE(done.waitFor(1));
+    }
+
+    RemoteObject loop{peerName, "/loop", "com.example.Loop", busType};
+};
+
+TEST_F(SignalTest, EachKindGetsItsArgumentsAndTheProxyThatSubscribed) {
+    const auto one = [](Writer& w) { w("hello")("more"); };
+    const auto pair = [](Writer& w) { w("RSSI")(Var{std::int16_t{-60}}); };
+    const auto found = [](Writer& w) {
+        w("00:11").dict("sv", [](Writer& d) {
+            d.entry("Name", Var{"x"}).entry("Class", Var{5u}).entry("", Var{1.5});
+            d.entry("Never", Var{1u});
+        });
+    };
+    ASSERT_EQ(proxy.setSignalHandlerNoArgument("Nothing", onNothing), 0);
+    ASSERT_EQ(proxy.setSignalHandlerString("Text", onString), 0);
+    ASSERT_EQ(proxy.setSignalHandlerObjectPath("Path", onPath), 0);
+    ASSERT_EQ(proxy.setSignalHandlerStringVariant("Property", onVariant), 0);
+    ASSERT_EQ(proxy.setSignalHandlerStringDict("Found", onDict), 0);
+    const ReceiveLoop running(loop);
+    emit("Nothing", one); // its arguments are not read
+    emit("Text", one);
+    emit("Path", [](Writer& w) { w(Path{"/new"}); });
+    emit("Property", pair);
+    emit("Property", [](Writer& w) { w("State")("bare"); });
+    emit("Found", found);
+    ASSERT_TRUE(seen().waitFor(6));
+    // Without arguments it is, on purpose, the proxy that runs the loop.
+    EXPECT_EQ(
+        seen().events(),
+        (Texts{"nothing /loop", "string /com/example/peer hello", "path /com/example/peer /new",
+               "variant /com/example/peer RSSI=-60", "variant /com/example/peer State=bare",
+               "dict /com/example/peer 00:11 Name: x;Class: 5;"}));
+    EXPECT_EQ(log.take(), Texts{});
+}
+
+TEST_F(SignalTest, EverySubscribedProxyOfTheInterfaceIsToldTheLatestSubscriberFirst) {
+    RemoteObject other(peerName, "/other", peerInterface, busType);
+    RemoteObject stranger(peerName, peerPath, "com.example.Other", busType);
+    for (RemoteObject* object : {&proxy, &other, &stranger})
+        ASSERT_EQ(object->setSignalHandlerString("Changed", onString), 0);
+    ASSERT_EQ(proxy.setSignalHandlerString("Changed", onString), 0); // once more: fires twice
+    const ReceiveLoop running(loop);
+    emit("Changed", [](Writer& w) { w("a"); });
+    emit(
+        "Changed", [](Writer& w) { w("b"); }, "/nobody"); // no rule: the bus does not send it
+    emit(
+        "Changed", [](Writer& w) { w("c"); }, "/other");
+    settle();
+    EXPECT_EQ(seen().events(), (Texts{"string /com/example/peer a", "string /other a",
+                                      "string /com/example/peer a", "string /com/example/peer c",
+                                      "string /other c", "string /com/example/peer c"}));
+}
+
+TEST_F(SignalTest, TheKindsAreServedInAFixedOrder) {
+    ASSERT_EQ(proxy.setSignalHandlerNoArgument("Changed", onNothing), 0);
+    ASSERT_EQ(proxy.setSignalHandlerStringDict("Changed", onDict), 0);
+    ASSERT_EQ(proxy.setSignalHandlerString("Changed", onString), 0);
+    ASSERT_EQ(proxy.setSignalHandlerStringVariant("Changed", onVariant), 0);
+    ASSERT_EQ(proxy.setSignalHandlerObjectPath("Changed", onPath), 0);
+    const ReceiveLoop running(loop);
+    const Texts notAString(3, "remote_object.cpp Argument is not string");
+    emit("Changed", [](Writer& w) { w("a")(Var{1u}); });
+    emit("Changed", [](Writer& w) { w(Path{"/p"}); });
+    settle();
+    EXPECT_EQ(seen().events(),
+              (Texts{"variant /com/example/peer a=1", "string /com/example/peer a", "nothing /loop",
+                     "path /com/example/peer /p", "nothing /loop"}));
+    Texts lines{"remote_object.cpp Argument is not object path",
+                "remote_object.cpp Argument is not dict"};
+    lines.insert(lines.end(), notAString.begin(), notAString.end());
+    EXPECT_EQ(log.take(), lines);
+}
+
+TEST_F(SignalTest, ABadSignalIsLoggedOnceAndSkippedByItsKindOnly) {
+    RemoteObject other(peerName, "/other", peerInterface, busType);
+    for (RemoteObject* object : {&proxy, &other})
+        ASSERT_EQ(object->setSignalHandlerNoArgument("Changed", onNothing), 0);
+    const auto subscribeString = [](RemoteObject& o) {
+        return o.setSignalHandlerString("Changed", onString);
+    };
+    const auto subscribePath = [](RemoteObject& o) {
+        return o.setSignalHandlerObjectPath("Changed", onPath);
+    };
+    const auto subscribeVariant = [](RemoteObject& o) {
+        return o.setSignalHandlerStringVariant("Changed", onVariant);
+    };
+    const auto subscribeDict = [](RemoteObject& o) {
+        return o.setSignalHandlerStringDict("Changed", onDict);
+    };
+    const auto dictOf = [](const char* types, const Writer::Build& entries) {
+        return [types, entries](Writer& w) { w("text").dict(types, entries); };
+    };
+    const struct {
+        std::function<int(RemoteObject&)> subscribe;
+        Writer::Build arguments;
+        const char* line;
+        bool decodingError;
+    } cases[] = {
+        {subscribeString, {}, "Signal has no arguments", false},
+        {subscribePath, {}, "Signal has no arguments", false},
+        {subscribeVariant, {}, "Signal has no arguments", false},
+        {subscribeDict, {}, "Signal has no arguments", false},
+        {subscribeString, [](Writer& w) { w(Path{"/"}); }, "Argument is not string", false},
+        {subscribeVariant, [](Writer& w) { w(1u)(Var{1u}); }, "Argument is not string", false},
+        {subscribeDict, [](Writer& w) { w.dict("sv"); }, "Argument is not string", false},
+        {subscribePath, [](Writer& w) { w("/"); }, "Argument is not object path", false},
+        {subscribeVariant, [](Writer& w) { w("a"); }, "Failed to parse variant in signal", true},
+        {subscribeVariant, [](Writer& w) { w("a")(Var{std::int32_t{1}}); },
+         "Failed to parse variant in signal", true},
+        {subscribeDict, [](Writer& w) { w("a"); }, "Argument is not dict", false},
+        {subscribeDict, [](Writer& w) { w("a").array("s"); }, "Argument is not dict", false},
+        {subscribeDict, dictOf("ov", [](Writer& d) { d.entry(Path{"/"}, Var{1u}); }),
+         "Failed to parse entry name", true},
+        {subscribeDict, dictOf("sv", [](Writer& d) { d.entry("a", Var{1.5}); }),
+         "Failed to parse entry value", true},
+    };
+    for (const auto& bad : cases) {
+        seen().clear();
+        loop.resetError();
+        RemoteObject first(peerName, "/first", peerInterface, busType);
+        RemoteObject second(peerName, "/second", peerInterface, busType);
+        ASSERT_EQ(bad.subscribe(second), 0);
+        ASSERT_EQ(bad.subscribe(first), 0);
+        dispatch(loop, signal(bad.arguments).get());
+        EXPECT_EQ(log.take(), Texts{std::string("remote_object.cpp ") + bad.line});
+        EXPECT_EQ(seen().events(), (Texts{"nothing /loop", "nothing /loop"}));
+        // It is the loop's proxy that remembers a decoding error, not the subscriber.
+        EXPECT_EQ(loop.getErrorNumber(), bad.decodingError ? 4 : 0) << bad.line;
+        EXPECT_FALSE(first.hasError());
+    }
+}
+
+TEST_F(SignalTest, OnlyMatchingSignalsAreLookedAt) {
+    ASSERT_EQ(proxy.setSignalHandlerString("Changed", onString), 0);
+    const MessagePtr call(
+        dbus_message_new_method_call(peerName, peerPath, peerInterface, "Changed"));
+    const MessagePtr otherMember(dbus_message_new_signal(peerPath, peerInterface, "Other"));
+    const MessagePtr otherInterface(dbus_message_new_signal(peerPath, "com.example.X", "Changed"));
+    for (DBusMessage* message :
+         {call.get(), otherMember.get(), otherInterface.get(), static_cast<DBusMessage*>(nullptr)})
+        dispatch(loop, message);
+    EXPECT_EQ(seen().count(), 0u);
+    EXPECT_EQ(log.take(), Texts{});
+}
+
+TEST_F(SignalTest, AProxysSubscriptionsEndWithItAndNoOthers) {
+    RawPeer monitor(bus.address());
+    monitor.becomeMonitor();
+    auto leaving = std::make_unique<RemoteObject>(peerName, "/leaving", peerInterface, busType);
+    for (RemoteObject* object : {leaving.get(), &proxy}) {
+        ASSERT_EQ(object->setSignalHandlerNoArgument("A", onNothing), 0);
+        ASSERT_EQ(object->setSignalHandlerString("A", onString), 0);
+        ASSERT_EQ(object->setSignalHandlerObjectPath("A", onPath), 0);
+        ASSERT_EQ(object->setSignalHandlerStringVariant("A", onVariant), 0);
+        ASSERT_EQ(object->setSignalHandlerStringDict("A", onDict), 0);
+    }
+    ASSERT_EQ(leaving->setSignalHandlerNoArgument("B", onNothing), 0);
+    leaving.reset();
+    Texts expected;
+    for (int i = 0; i < 5; ++i)
+        expected.push_back("AddMatch " + rule("A", "/leaving"));
+    for (int i = 0; i < 5; ++i)
+        expected.push_back("AddMatch " + rule("A", peerPath));
+    expected.push_back("AddMatch " + rule("B", "/leaving"));
+    std::multiset<std::string> removed;
+    for (int i = 0; i < 5; ++i)
+        removed.insert("RemoveMatch " + rule("A", "/leaving"));
+    removed.insert("RemoveMatch " + rule("B", "/leaving"));
+
+    ASSERT_TRUE(monitor.waitForCalls("RemoveMatch", 6));
+    Texts added;
+    std::multiset<std::string> gone;
+    for (const SeenCall& change : monitor.calls()) {
+        if (change.member == "AddMatch")
+            added.push_back(change.text());
+        else if (change.member == "RemoveMatch")
+            gone.insert(change.text());
+    }
+    EXPECT_EQ(added, expected);
+    EXPECT_EQ(gone, removed);
+
+    const MessagePtr text(dbus_message_new_signal(peerPath, peerInterface, "A"));
+    Writer(text.get())("x");
+    loop.signalHandlerDispatcherString(text.get());
+    loop.signalHandlerDispatcherNoArgument(text.get());
+    EXPECT_EQ(seen().events(), (Texts{"string /com/example/peer x", "nothing /loop"}));
+    EXPECT_EQ(log.take(), Texts{});
+}
+
+TEST_F(SignalTest, ARefusedSubscriptionIsLoggedAndNotRegistered) {
+    const struct {
+        const char* path;
+        const char* interface;
+        const char* member;
+    } cases[] = {
+        {peerPath, peerInterface, "not a member"},
+        {peerPath, peerInterface, ""},
+        {peerPath, peerInterface, nullptr},
+        {peerPath, "nodot", "Changed"},
+        {"no/path", peerInterface, "Changed"},
+        {"/it's", peerInterface, "Changed"},
+        {peerPath, "\xff", "Changed"},
+    };
+    for (const auto& bad : cases) {
+        RemoteObject object(peerName, bad.path, bad.interface, busType);
+        EXPECT_EQ(object.setSignalHandlerString(bad.member, onString), -1);
+        const Texts lines = log.take();
+        ASSERT_EQ(lines.size(), 1u);
+        EXPECT_EQ(lines[0].find("remote_object.cpp Match error ("), 0u) << lines[0];
+        EXPECT_EQ(lines[0].back(), ')');
+        EXPECT_NE(lines[0], "remote_object.cpp Match error ()");
+        dispatch(loop, signal([](Writer& w) { w("x"); }).get());
+        EXPECT_EQ(seen().count(), 0u);
+    }
+    EXPECT_EQ(proxy.setSignalHandlerString("Changed", nullptr), -1);
+    log.take(); // the refused ones leave nothing to remove either
+}
+
+TEST_F(SignalTest, SignalsThatComeBeforeTheLoopStartsAreDelivered) {
+    peer.reply("Ask");
+    ASSERT_EQ(proxy.setSignalHandlerString("Changed", onString), 0);
+    emit("Changed", [](Writer& w) { w("read by a call"); });
+    ASSERT_EQ(call("Ask"), 0);
+    emit("Changed", [](Writer& w) { w("still in the socket"); });
+    peer.run([](DBusConnection* connection) { dbus_connection_flush(connection); });
+    const ReceiveLoop running(loop);
+    ASSERT_TRUE(seen().waitFor(2));
+    EXPECT_EQ(seen().events(), (Texts{"string /com/example/peer read by a call",
+                                      "string /com/example/peer still in the socket"}));
+}
+
+TEST_F(SignalTest, CallbacksMayCallAndSubscribe) {
+    static std::unique_ptr<RemoteObject> inner;
+    inner = std::make_unique<RemoteObject>(peerName, "/inner", peerInterface, busType);
+    peer.reply("Ask", [](Writer& w) { w("answer"); });
+    ASSERT_EQ(proxy.setSignalHandlerString("Changed",
+                                           [](RemoteObject*, const char* text) {
+                                               std::string answer;
+                                               inner->newMessage("Ask");
+                                               inner->sendMessage(true, -1);
+                                               inner->getReplyValue(answer);
+                                               seen().add(text + (" " + answer));
+                                               inner->setSignalHandlerString("Changed", onString);
+                                           }),
+              0);
+    const ReceiveLoop running(loop);
+    emit("Changed", [](Writer& w) { w("1"); });
+    emit("Changed", [](Writer& w) { w("2"); });
+    settle();
+    // The new record stands in front of the one being called, so it sees the next signal only.
+    EXPECT_EQ(seen().events(), (Texts{"1 answer", "string /inner 2", "2 answer"}));
+    inner.reset();
+}
+
+TEST_F(SignalTest, CallbacksMayDestroyProxiesTheirOwnToo) {
+    static std::unique_ptr<RemoteObject> first, second, third;
+    for (auto* object : {&first, &second, &third})
+        *object = std::make_unique<RemoteObject>(peerName, "/doomed", peerInterface, busType);
+    ASSERT_EQ(first->setSignalHandlerString("Changed", onString), 0);
+    ASSERT_EQ(second->setSignalHandlerString("Changed", onString), 0);
+    ASSERT_EQ(third->setSignalHandlerString("Changed",
+                                            [](RemoteObject*, const char* text) {
+                                                second.reset();
+                                                third.reset();
+                                                seen().add(text);
+                                            }),
+              0);
+    const ReceiveLoop running(loop);
+    for (const char* text : {"1", "2"})
+        emit(
+            "Changed", [text](Writer& w) { w(text); }, "/doomed");
+    settle();
+    EXPECT_EQ(seen().events(), (Texts{"1", "string /doomed 1", "string /doomed 2"}));
+    EXPECT_EQ(log.take(), Texts{});
+    first.reset();
+}
+
+TEST_F(SignalTest, DestroyingAProxyWaitsForItsCallbackInAnotherThread) {
+    static Latch entered, leave;
+    auto doomed = std::make_unique<RemoteObject>(peerName, peerPath, peerInterface, busType);
+    ASSERT_EQ(doomed->setSignalHandlerString("Changed",
+                                             [](RemoteObject* receiver, const char*) {
+                                                 entered.open();
+                                                 leave.wait();
+                                                 seen().add(receiver->getPath());
+                                             }),
+              0);
+    const ReceiveLoop running(loop);
+    emit("Changed", [](Writer& w) { w("x"); });
+    ASSERT_TRUE(entered.wait());
+    Latch destroyed;
+    std::thread destroyer([&] {
+        doomed.reset();
+        EXPECT_EQ(seen().count(), 1u); // the callback had its proxy to the end
+        destroyed.open();
+    });
+    EXPECT_FALSE(destroyed.wait(Milliseconds(50)));
+    leave.open();
+    EXPECT_TRUE(destroyed.wait());
+    destroyer.join();
+    emit("Changed", [](Writer& w) { w("y"); });
+    settle();
+    EXPECT_EQ(seen().events(), Texts{peerPath});
+}
+
+TEST_F(SignalTest, ProxiesComeAndGoInOtherThreadsWhileSignalsAreDelivered) {
+    ASSERT_EQ(proxy.setSignalHandlerString("Changed", onString), 0);
+    static std::atomic<int> calls;
+    const auto count = [](RemoteObject* receiver, const char*) {
+        calls += receiver->getPath()[0] == '/'; // is alive
+    };
+    const ReceiveLoop running(loop);
+    std::vector<std::thread> threads;
+    for (int i = 0; i < 3; ++i) {
+        threads.emplace_back([&] {
+            for (int round = 0; round < 50; ++round) {
+                RemoteObject object(peerName, peerPath, peerInterface, busType);
+                object.setSignalHandlerString("Changed", count);
+                emit("Changed", [](Writer& w) { w("x"); });
+                object.setSignalHandlerString("Changed", count);
+            }
+        });
+    }
+    for (std::thread& thread : threads)
+        thread.join();
+    settle();
+    EXPECT_EQ(seen().count(), 150u); // the constant subscriber missed none
+    EXPECT_GT(calls, 0);
+    EXPECT_EQ(log.take(), Texts{});
+}
+
+TEST_F(SignalTest, StoppingLeavesTheRestUndeliveredForGood) {
+    ASSERT_EQ(proxy.setSignalHandlerString("Changed",
+                                           [](RemoteObject* receiver, const char* text) {
+                                               onString(receiver, text);
+                                               receiver->stopLoop();
+                                           }),
+              0);
+    for (const char* text : {"1", "2", "3"})
+        emit("Changed", [text](Writer& w) { w(text); });
+    EXPECT_NE(loop.waitLoop(), 0); // never started
+    ASSERT_EQ(loop.startLoop(), 0);
+    EXPECT_EQ(loop.waitLoop(), 0);
+    EXPECT_NE(loop.waitLoop(), 0); // joined already
+    EXPECT_EQ(seen().events(), Texts{"string /com/example/peer 1"});
+    ASSERT_EQ(proxy.startLoop(), 0); // a new thread ends at once
+    EXPECT_EQ(proxy.waitLoop(), 0);
+    EXPECT_EQ(seen().count(), 1u);
+    EXPECT_TRUE(BusLink::isStopRequested());
+}
+
+TEST_F(SignalTest, AnIdleLoopStopsAtOnceAndCallsGoOnAfterwards) {
+    peer.reply("Ask");
+    ASSERT_EQ(loop.startLoop(), 0);
+    ASSERT_EQ(call("Ask"), 0);
+    const auto begin = std::chrono::steady_clock::now();
+    loop.stopLoop();
+    EXPECT_EQ(loop.waitLoop(), 0);
+    EXPECT_LT(std::chrono::steady_clock::now() - begin, Milliseconds(1000)); // 100 and a busy host
+    EXPECT_EQ(call("Ask"), 0);
+}
+
+/// A bus that lets a connection have one match rule.
+TEST(SignalLimitTest, TheBusRefusalOfARuleIsTold) {
+    SyslogCapture log;
+    PrivateBus bus(PrivateBus::Kind::Session,
+                   "<limit name=\"max_match_rules_per_connection\">1</limit>");
+    RemoteObject proxy(peerName, peerPath, peerInterface, DBUS_BUS_SESSION);
+    EXPECT_EQ(proxy.setSignalHandlerString("A", onString), 0);
+    EXPECT_EQ(proxy.setSignalHandlerString("B", onString), -1);
+    const Texts lines = log.take();
+    ASSERT_EQ(lines.size(), 1u);
+    EXPECT_NE(lines[0].find("(Connection \""), std::string::npos) << lines[0];
+}
+
+} // namespace Bluetooth::Test
