@@ -27,7 +27,7 @@ inline void writeFile(const std::string& path, const std::string& content) {
 }
 
 /// Uses the library's fixed paths, which are this test's own: ctest runs it through
-/// tests/host/in_namespace.sh. Begins with an empty /etc/bluetooth and /tmp.
+/// tests/host/in_namespace.sh. Begins with an empty /etc/bluetooth.
 class NamespaceTest : public ::testing::Test {
 protected:
     void SetUp() override {
@@ -36,10 +36,9 @@ protected:
                "tests/host/in_namespace.sh BUILD_FOLDER";
         std::filesystem::remove_all("/etc/bluetooth");
         std::filesystem::create_directory("/etc/bluetooth");
-        for (const auto& entry : std::filesystem::directory_iterator("/tmp")) {
-            std::error_code inUse; // the build folder may be mounted there
-            std::filesystem::remove(entry, inUse);
-        }
+        for (const char* left : {commandPipe, "/tmp/test_pipe", "/tmp/test.pid",
+                                 "/tmp/bluetooth.info_0", "/tmp/bluetoothd-tool"})
+            std::filesystem::remove(left);
     }
 
     SyslogCapture log;

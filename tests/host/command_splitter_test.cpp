@@ -1,0 +1,65 @@
+#include "command_splitter.h"
+
+#include <gtest/gtest.h>
+
+namespace autoconnectd::Test {
+
+namespace {
+
+/// The commands as one letter each.
+std::string feed(CommandSplitter& splitter, std::string_view bytes) {
+    std::string letters;
+    for (const Command command : splitter.feed(bytes))
+        letters += command == Command::Reload ? '1' : command == Command::Pause ? 'p' : 'r';
+    return letters;
+}
+
+} // namespace
+
+TEST(CommandSplitterTest, TellsCommandsApartThatRunTogether) {
+    const struct {
+        std::string bytes;
+        const char* commands;
+        const char* unknown;
+    } cases[] = {
+        {"1", "1", ""},
+        {"1pause1", "1p1", ""},
+        {"pauseresume11", "pr11", ""},
+        {"resumepauseresume", "rpr", ""},
+        {"1\npause\r\n 1\t", "1p1", ""},
+        {std::string("1\0pause\0", 8), "1p", ""},
+        {"ppause", "p", "p"},
+        {"paupause1", "p1", "pau"},
+        {"rerresume", "r", "rer"},
+        {"stop1PAUSE", "1", "stopPAUSE"},
+        {"pa use1", "1", "pause"}, // a command has no space within
+        {"", "", ""},
+    };
+    for (const auto& testCase : cases) {
+        CommandSplitter splitter;
+        EXPECT_EQ(feed(splitter, testCase.bytes), testCase.commands) << testCase.bytes;
+        EXPECT_EQ(splitter.takeUnknown(), testCase.unknown) << testCase.bytes;
+        EXPECT_EQ(splitter.takeUnknown(), "");
+    }
+}
+
+TEST(CommandSplitterTest, PiecesOfAnySizeGiveTheSameCommands) {
+    const std::string bytes = "1pause1resume1pausexresume1";
+    for (std::size_t size = 1; size <= bytes.size(); ++size) {
+        CommandSplitter splitter;
+        std::string commands;
+        for (std::size_t from = 0; from < bytes.size(); from += size)
+            commands += feed(splitter, std::string_view(bytes).substr(from, size));
+        EXPECT_EQ(commands, "1p1r1pr1") << size;
+        EXPECT_EQ(splitter.takeUnknown(), "x");
+    }
+}
+
+TEST(CommandSplitterTest, MemoryIsBoundedByWhatIsNotTaken) {
+    CommandSplitter splitter;
+    EXPECT_EQ(feed(splitter, std::string(100000, 'p')), "");
+    EXPECT_EQ(splitter.takeUnknown().size(), 99999u);
+    EXPECT_EQ(feed(splitter, "ause"), "p");
+}
+
+} // namespace autoconnectd::Test
