@@ -1,0 +1,111 @@
+#ifndef KESBLUETOOTH_SCANNER_SERVER_H
+#define KESBLUETOOTH_SCANNER_SERVER_H
+
+#include <bluetooth/scanner_object.h>
+#include <bluetooth/server_object.h>
+
+#include <map>
+#include <memory>
+#include <mutex>
+#include <string>
+#include <vector>
+
+namespace Bluetooth {
+
+class Adapter;
+class Manager;
+
+/// The scanner service: lets several programs share the discovery of Bluetooth devices. It serves
+/// com.kestrine.bluetooth.Scanner (see scanner_object.h for its methods, Scanner for the client)
+/// on the session bus under the name com.kestrine.bluetooth, at the path "/".
+/// @code
+///     ScannerServer server;
+///     server.startLoop();    // ends by itself
+///     server.stopDiscovery();
+/// @endcode
+/// kesbt-scannerd is this program with what a daemon needs around it.
+///
+/// LIFE. The loop ends 30 s after the last finder was made, even while clients keep asking about
+/// adapters that have one. Only reaching exactly 0 ends it: a startLoop() after that, without a new
+/// finder, counts on below 0 and does not end by itself.
+///
+/// DAEMON. Without the Bluetooth daemon the service runs all the same: ListDevices answers that
+/// the adapter is not found, and each call looks for the daemon again. After the daemon's restart
+/// its adapters have other paths, and so other finders.
+///
+/// MEMORY. The properties of each device ever found are kept, as text, until the service ends:
+/// about 0.5 KiB a device.
+///
+/// TWO ADAPTERS. Signals of one adapter are told to the finders of all: a device that one adapter
+/// found is in the others' answers too.
+///
+/// THREADS. One ScannerServer at a time is the current one, to which handlers and callbacks go: the
+/// one made last. Handlers and timer run on the thread that is in startLoop(), the callbacks for
+/// found devices on the receive thread. The operations below may be called from any thread, but
+/// the constructor, the destructor and stopDiscovery().
+class KESBLUETOOTH_API ScannerServer : public ServerObject {
+public:
+    /// Serves the object and becomes the current server. When something of that fails, or the
+    /// Bluetooth daemon is absent, this is logged and the rest works.
+    /// Blocks until the bus and the daemon have answered.
+    ScannerServer();
+    /// Discoveries end with the process's bus connection, or before by stopDiscovery().
+    ~ScannerServer() override;
+
+    /// Counts down to the end of the loop. @return 0 when it ends, otherwise 1
+    int callbackThreadHandler(void* data) override;
+
+    /// Makes a finder for an adapter before anybody asks for it (ScannerObject::addFinder).
+    /// @param adapterId the adapter's name or address; nothing happens when there is no such
+    void addAdapterFounder(const char* adapterId);
+
+    /// Reads from the daemon which devices it knows: they are left out of all answers. Done for
+    /// each ListDevices. Without the daemon this is logged and none is left out.
+    void updateFilterSet();
+    bool isInFilterSet(const std::string& address);
+
+    /// Keeps the properties of a found device, in place of those before.
+    void putInfoToMap(const std::string& address, const std::string& text);
+    /// @return the text kept; "" for an unknown address, for which an empty entry is kept from then
+    std::string getInfoFromMap(const std::string& address);
+
+    /// Ends all discoveries that were started for finders, and what receives for them: for the end
+    /// of the program. Stops the receive thread of the process (see RemoteObject::stopLoop()).
+    void stopDiscovery();
+
+private:
+    friend class ServerObject; // startLoop() begins and ends the receiving
+    friend class Finders;
+
+    /// A discovery that was started for a finder.
+    struct Discovery {
+        std::shared_ptr<Adapter> adapter;  // subscribed; destroying it ends the subscriptions
+        std::shared_ptr<AddressSet> found; // the finder's, or nobody's when there was a finder
+    };
+
+    Manager* fetchManager();
+    void startReceiver();
+    void startReceiving();
+    void stopReceiving();
+    void joinReceiver();
+    std::vector<Discovery> takeDiscoveries();
+
+    static constexpr int ticksToLive = 30;
+
+    ScannerObject* m_scannerObject;
+
+    // Guards what follows and the scanner object's finders. Nothing is called while it is held: no
+    // bus, no GLib, no callback. It is the only lock of the service.
+    std::mutex m_mutex;
+    std::unique_ptr<Manager> m_manager; // set once
+    bool m_receives = false;            // startLoop() runs
+    bool m_hasReceiver = false;         // the manager has a receive thread that nobody joined
+    std::vector<Discovery> m_discoveries;
+    AddressSet m_filterSet;
+    std::map<std::string, std::string> m_deviceInfo;
+    int m_idleCountdown = ticksToLive;
+};
+
+} // namespace Bluetooth
+
+#endif

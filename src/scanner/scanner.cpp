@@ -1,0 +1,57 @@
+#include <bluetooth/scanner.h>
+
+#include <bluetooth/adapter.h>
+#include <bluetooth/dict_codec.h>
+#include <bluetooth/manager.h>
+
+#include "bluez/method_call.h"
+#include "scanner/names.h"
+
+#include <memory>
+
+namespace Bluetooth {
+
+namespace {
+
+/// Whether the Bluetooth daemon knows the adapter: otherwise the service need not be started.
+bool isAdapter(const char* adapterId) {
+    const std::unique_ptr<Manager> manager(Manager::getManager());
+    return manager && std::unique_ptr<Adapter>(manager->findAdapter(adapterId));
+}
+
+} // namespace
+
+Scanner::Scanner()
+    : RemoteObject(scannerBusName, scannerPath, scannerInterface, DBUS_BUS_SESSION) {}
+
+Scanner::~Scanner() = default;
+
+std::vector<std::pair<std::string, Dict*>>* Scanner::listDevices(const char* adapterId,
+                                                                 bool logErrors) {
+    resetError();
+    Dict reply;
+    if (!isAdapter(adapterId))
+        return nullptr;
+    const bool answered = askFor(*this, "ListDevices", reply, adapterId);
+    if (logErrors)
+        logAnyError(KES_HERE, *this);
+    if (!answered)
+        return nullptr;
+
+    auto devices = std::make_unique<std::vector<std::pair<std::string, Dict*>>>();
+    devices->reserve(reply.size());
+    for (const auto& [address, text] : reply) {
+        // Null for a text without any entry, as in the pair that an empty answer consists of.
+        if (Dict* properties = stringDivideToDict(variantToString(text), ";"))
+            devices->emplace_back(address, properties);
+    }
+    return devices.release();
+}
+
+bool Scanner::removeFinder(const char* adapterId) {
+    resetError();
+    // Not waited for: the program is done with the service, whatever that answers.
+    return isAdapter(adapterId) && callMethod(KES_HERE, *this, "RemoveFinder", adapterId) == 0;
+}
+
+} // namespace Bluetooth

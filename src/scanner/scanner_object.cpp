@@ -1,0 +1,110 @@
+#include <bluetooth/scanner_object.h>
+
+#include <bluetooth/adapter.h>
+#include <bluetooth/scanner_server.h>
+
+#include "scanner/finders.h"
+#include "scanner/scanner_object_info.h"
+
+#include <new>
+
+namespace Bluetooth {
+
+#include "scanner_object_glue.h" // generated: the method table and its marshallers
+
+namespace {
+
+constexpr GQuark errorDomain = 3; // clients see it in the error's name
+constexpr gint errorCode = 0;
+
+gpointer parentClass = nullptr;
+
+void finalize(GObject* object) {
+    using FinderMap = decltype(ScannerObject::finders);
+    reinterpret_cast<ScannerObject*>(object)->finders.~FinderMap();
+    G_OBJECT_CLASS(parentClass)->finalize(object);
+}
+
+void initClass(gpointer type, gpointer) {
+    parentClass = g_type_class_peek_parent(type);
+    G_OBJECT_CLASS(type)->finalize = finalize;
+}
+
+void initInstance(GTypeInstance* instance, gpointer) {
+    auto* object = reinterpret_cast<ScannerObject*>(instance);
+    new (&object->finders) decltype(object->finders);
+}
+
+gboolean notFound(GError** error, const char* what, const char* adapterId) {
+    g_set_error(error, errorDomain, errorCode, "%s %s not found", what, adapterId);
+    return FALSE;
+}
+
+} // namespace
+
+GType scanner_object_get_type() {
+    static gsize type = 0;
+    if (g_once_init_enter(&type)) {
+        const GType registered = g_type_register_static_simple(
+            G_TYPE_OBJECT, "ScannerObject", sizeof(GObjectClass), initClass, sizeof(ScannerObject),
+            initInstance, GTypeFlags{});
+        g_once_init_leave(&type, registered);
+    }
+    return type;
+}
+
+const DBusGObjectInfo& scannerObjectInfo() {
+    return dbus_glib_scanner_object_object_info;
+}
+
+AddressSet* ScannerObject::addFinder(const char* adapterId) {
+    ScannerServer* server = currentServer();
+    return server && adapterId ? Finders(*server, *this).add(adapterId).get() : nullptr;
+}
+
+AddressSet* ScannerObject::getListByName(std::string path) {
+    ScannerServer* server = currentServer();
+    return server ? Finders(*server, *this).of(path).get() : nullptr;
+}
+
+gboolean scanner_object_list_devices(ScannerObject* object, const char* adapterId,
+                                     GHashTable** devices, GError** error) {
+    if (!object)
+        return notFound(error, "Object", adapterId);
+    ScannerServer* server = currentServer();
+    if (!server)
+        return notFound(error, "Server", adapterId);
+    const std::unique_ptr<Adapter> adapter = Finders::findAdapter(*server, adapterId);
+    if (!adapter)
+        return notFound(error, "Adapter", adapterId);
+    Finders finders(*server, *object);
+    const Finders::Set set = finders.of(adapter->getPath());
+    if (!set)
+        return notFound(error, "Set", adapterId);
+    server->updateFilterSet();
+
+    // dbus-glib unrefs the table and leaves its texts to it.
+    *devices = g_hash_table_new_full(g_str_hash, g_str_equal, g_free, g_free);
+    for (const auto& [address, text] : finders.unknownDevices(*set))
+        g_hash_table_insert(*devices, g_strdup(address.c_str()), g_strdup(text.c_str()));
+    if (g_hash_table_size(*devices) == 0) // clients know an answer by its never being empty
+        g_hash_table_insert(*devices, g_strdup(""), g_strdup(""));
+    return TRUE;
+}
+
+gboolean scanner_object_remove_finder(ScannerObject* object, const char* adapterId,
+                                      GError** error) {
+    if (!object || !adapterId) {
+        g_set_error_literal(error, errorDomain, errorCode, "Scanner or AdapterId is null");
+        return FALSE;
+    }
+    ScannerServer* server = currentServer();
+    const std::unique_ptr<Adapter> adapter =
+        server ? Finders::findAdapter(*server, adapterId) : nullptr;
+    if (!adapter)
+        return FALSE; // on purpose without an error: clients remove finders of adapters long gone
+    Finders(*server, *object).remove(*adapter);
+    return TRUE;
+}
+
+} // namespace Bluetooth

@@ -1,0 +1,164 @@
+#include <bluetooth/server_object.h>
+
+#include <bluetooth/scanner_server.h>
+
+#include "core/log.h"
+
+#include <dbus/dbus-glib-lowlevel.h>
+
+#include <iostream>
+
+namespace Bluetooth {
+
+namespace {
+
+constexpr guint timerInterval = 1000; // ms
+
+const char* textOf(const char* text) {
+    return text ? text : "";
+}
+
+/// Calls updateTimer() on the default main context, at most as long as this lives.
+class Timer {
+public:
+    explicit Timer(ServerObject* object) : m_source(g_timeout_source_new(timerInterval)) {
+        g_source_set_callback(m_source, updateTimer, object, nullptr);
+        g_source_attach(m_source, nullptr);
+    }
+    ~Timer() {
+        g_source_destroy(m_source);
+        g_source_unref(m_source);
+    }
+    Timer(const Timer&) = delete;
+    Timer& operator=(const Timer&) = delete;
+
+private:
+    GSource* m_source;
+};
+
+} // namespace
+
+ServerObject::ServerObject(const char* busName, const char* path, DBusBusType type)
+    : m_busType(type), m_busName(busName), m_path(path) {
+    getConnection();
+    if (m_connection)
+        m_busProxy = dbus_g_proxy_new_for_name(m_connection, DBUS_SERVICE_DBUS, DBUS_PATH_DBUS,
+                                               DBUS_INTERFACE_DBUS);
+}
+
+ServerObject::~ServerObject() {
+    if (m_busProxy)
+        g_object_unref(m_busProxy);
+}
+
+void ServerObject::getConnection() {
+    if (m_connection)
+        return;
+    m_connection = dbus_g_bus_get(m_busType, nullptr);
+    if (m_connection)
+        dbus_connection_set_exit_on_disconnect(dbus_g_connection_get_connection(m_connection),
+                                               false);
+}
+
+bool ServerObject::prepareObjectInfo(GType type, const DBusGObjectInfo* info, GObject* object) {
+    dbus_g_object_type_install_info(type, info);
+
+    constexpr guint noFlags = 0;
+    guint result = 0; // whether the name is owned, or waited for, makes no difference here
+    GError* error = nullptr;
+    if (!m_busProxy ||
+        !dbus_g_proxy_call(m_busProxy, "RequestName", &error, G_TYPE_STRING, m_busName, G_TYPE_UINT,
+                           noFlags, G_TYPE_INVALID, G_TYPE_UINT, &result, G_TYPE_INVALID)) {
+        logError(KES_HERE, "Failed to acquire %s, %s", m_busName,
+                 error ? error->message : "Not connected to the bus");
+        g_clear_error(&error);
+        return false;
+    }
+
+    // dbus-glib ends the process when something is served at the path already.
+    void* served = nullptr;
+    DBusConnection* connection = dbus_g_connection_get_connection(m_connection);
+    if (dbus_connection_get_object_path_data(connection, m_path, &served) && served) {
+        logError(KES_HERE, "Failed to serve %s, another object is there", m_path);
+        return false;
+    }
+    dbus_g_connection_register_g_object(m_connection, m_path, object);
+    return true;
+}
+
+/// @return false when a loop is set already
+bool ServerObject::setLoop(const std::shared_ptr<GMainLoop>& loop) {
+    const std::lock_guard<std::mutex> lock(m_loopMutex);
+    if (m_loop)
+        return false;
+    m_loop = loop;
+    return true;
+}
+
+void ServerObject::startLoop() {
+    // The frame runs a loop for the scanner service only: it is the one that has a manager.
+    auto* scanner = dynamic_cast<ScannerServer*>(this);
+    if (!scanner)
+        return;
+    std::shared_ptr<GMainLoop> loop(g_main_loop_new(nullptr, false), g_main_loop_unref);
+    if (!setLoop(loop))
+        return;
+
+    scanner->startReceiving();
+    dbus_g_thread_init();
+    {
+        const Timer timer(this);
+        g_main_loop_run(loop.get());
+    }
+    {
+        const std::lock_guard<std::mutex> lock(m_loopMutex);
+        m_loop = nullptr; // `loop` holds it still: it is not destroyed under the lock
+    }
+    scanner->stopReceiving();
+}
+
+void ServerObject::quitLoop() {
+    std::shared_ptr<GMainLoop> loop;
+    {
+        const std::lock_guard<std::mutex> lock(m_loopMutex);
+        loop = m_loop;
+    }
+    if (loop)
+        g_main_loop_quit(loop.get());
+}
+
+void ServerObject::printInfo() const {
+    std::cout << "ServerObject name: " << getBusName() << std::endl;
+    std::cout << "Path: " << getPath() << std::endl;
+    std::cout << "Interface: " << getInterface() << std::endl;
+}
+
+const char* ServerObject::getConnectionName() const {
+    return m_connection
+               ? textOf(dbus_bus_get_unique_name(dbus_g_connection_get_connection(m_connection)))
+               : "";
+}
+
+// These tell about the bus, not about what is served: programs know them so.
+
+const char* ServerObject::getBusName() const {
+    return m_busProxy ? textOf(dbus_g_proxy_get_bus_name(m_busProxy)) : "";
+}
+
+const char* ServerObject::getPath() const {
+    return m_busProxy ? textOf(dbus_g_proxy_get_path(m_busProxy)) : "";
+}
+
+const char* ServerObject::getInterface() const {
+    return m_busProxy ? textOf(dbus_g_proxy_get_interface(m_busProxy)) : "";
+}
+
+int ServerObject::callbackThreadHandler(void*) {
+    return 1;
+}
+
+int updateTimer(void* data) {
+    return static_cast<ServerObject*>(data)->callbackThreadHandler(data);
+}
+
+} // namespace Bluetooth
