@@ -1,0 +1,183 @@
+#include "bus/bus_link.h"
+
+#include <stdexcept>
+
+namespace Bluetooth::Sim {
+
+namespace {
+
+constexpr const char* kBus = "org.freedesktop.DBus";
+constexpr const char* kBusPath = "/org/freedesktop/DBus";
+
+[[noreturn]] void raise(const std::string& what, const ErrorOut& error) {
+    throw std::runtime_error(what + ": " + error->message);
+}
+
+/// Splits GDBus's error into the name and the text that came over the bus.
+BusError fromGlib(const GError* error) {
+    const GlibPtr<GError> copy(g_error_copy(error));
+    const GlibPtr<char> name(g_dbus_error_get_remote_error(copy.get()));
+    if (name)
+        g_dbus_error_strip_remote_error(copy.get());
+    else if (g_error_matches(copy.get(), G_IO_ERROR, G_IO_ERROR_TIMED_OUT))
+        return {"org.freedesktop.DBus.Error.NoReply", copy->message};
+    return {name ? name.get() : "org.freedesktop.DBus.Error.Failed", copy->message};
+}
+
+} // namespace
+
+/// Where the reading thread leaves calls. `link` is used on the main loop only, and null once the
+/// link is gone; calls that are still under way are dropped then.
+struct BusLink::Inbox {
+    BusLink* link;
+    CallHandler onCall;
+};
+
+namespace {
+
+struct Delivery {
+    std::shared_ptr<void> inbox;
+    CallPtr call;
+};
+
+} // namespace
+
+BusLink::BusLink(const std::string& address, CallHandler onCall)
+    : inbox_(std::make_shared<Inbox>(Inbox{this, std::move(onCall)})) {
+    ErrorOut error;
+    const auto flags =
+        static_cast<GDBusConnectionFlags>(G_DBUS_CONNECTION_FLAGS_AUTHENTICATION_CLIENT |
+                                          G_DBUS_CONNECTION_FLAGS_MESSAGE_BUS_CONNECTION);
+    connection_ = g_dbus_connection_new_for_address_sync(address.c_str(), flags, nullptr, nullptr,
+                                                         error.out());
+    if (!connection_)
+        raise("cannot connect to the bus at " + address, error);
+    filter_ = g_dbus_connection_add_filter(
+        connection_, onMessage, new std::shared_ptr<Inbox>(inbox_),
+        [](gpointer data) { delete static_cast<std::shared_ptr<Inbox>*>(data); });
+}
+
+BusLink::~BusLink() {
+    inbox_->link = nullptr;
+    g_signal_handlers_disconnect_by_data(connection_, this);
+    if (clients_)
+        g_dbus_connection_signal_unsubscribe(connection_, clients_);
+    g_dbus_connection_remove_filter(connection_, filter_);
+    if (!g_dbus_connection_is_closed(connection_)) {
+        g_dbus_connection_flush_sync(connection_, nullptr, nullptr);
+        g_dbus_connection_close_sync(connection_, nullptr, nullptr);
+    }
+    g_object_unref(connection_);
+}
+
+GDBusMessage* BusLink::onMessage(GDBusConnection* connection, GDBusMessage* message,
+                                 gboolean incoming, gpointer data) {
+    const char* interface = g_dbus_message_get_interface(message);
+    // GDBus answers org.freedesktop.DBus.Peer on every path, as libdbus does.
+    if (!incoming || g_dbus_message_get_message_type(message) != G_DBUS_MESSAGE_TYPE_METHOD_CALL ||
+        (interface && g_str_equal(interface, "org.freedesktop.DBus.Peer")))
+        return message;
+
+    auto* delivery = new Delivery{*static_cast<std::shared_ptr<Inbox>*>(data),
+                                  std::make_shared<Call>(connection, message)};
+    GSource* source = g_idle_source_new();
+    g_source_set_priority(source, G_PRIORITY_DEFAULT);
+    g_source_set_callback(source, deliver, delivery,
+                          [](gpointer done) { delete static_cast<Delivery*>(done); });
+    g_source_attach(source, nullptr);
+    g_source_unref(source);
+    g_object_unref(message);
+    return nullptr;
+}
+
+gboolean BusLink::deliver(gpointer data) {
+    const auto* delivery = static_cast<Delivery*>(data);
+    const auto* inbox = static_cast<Inbox*>(delivery->inbox.get());
+    if (inbox->link)
+        inbox->onCall(delivery->call);
+    return G_SOURCE_REMOVE;
+}
+
+void BusLink::own(const char* name) {
+    constexpr guint32 doNotQueue = 4;
+    constexpr guint32 owned = 1;
+    ErrorOut error;
+    const GlibPtr<GVariant> reply(g_dbus_connection_call_sync(
+        connection_, kBus, kBusPath, kBus, "RequestName", g_variant_new("(su)", name, doNotQueue),
+        G_VARIANT_TYPE("(u)"), G_DBUS_CALL_FLAGS_NONE, -1, nullptr, error.out()));
+    if (!reply)
+        raise(std::string("cannot own ") + name, error);
+    guint32 result = 0;
+    g_variant_get(reply.get(), "(u)", &result);
+    if (result != owned)
+        throw std::runtime_error(std::string(name) +
+                                 " is already owned on this bus; stop its owner first");
+}
+
+void BusLink::watchClients(ClientGone onGone) {
+    clientGone_ = std::move(onGone);
+    clients_ = g_dbus_connection_signal_subscribe(
+        connection_, kBus, kBus, "NameOwnerChanged", kBusPath, nullptr, G_DBUS_SIGNAL_FLAGS_NONE,
+        [](GDBusConnection*, const gchar*, const gchar*, const gchar*, const gchar*,
+           GVariant* arguments, gpointer data) {
+            const char* name = nullptr;
+            const char* newOwner = nullptr;
+            g_variant_get(arguments, "(&s&s&s)", &name, nullptr, &newOwner);
+            if (*name == ':' && !*newOwner)
+                static_cast<BusLink*>(data)->clientGone_(name);
+        },
+        this, nullptr);
+}
+
+void BusLink::watchBus(std::function<void()> onEnd) {
+    busEnded_ = std::move(onEnd);
+    const auto closed = +[](GDBusConnection*, gboolean, GError*, gpointer data) {
+        static_cast<BusLink*>(data)->busEnded_();
+    };
+    g_signal_connect(connection_, "closed", G_CALLBACK(closed), this);
+}
+
+void BusLink::emit(const std::string& path, const std::string& interface, const std::string& member,
+                   const Value& arguments) {
+    GDBusMessage* message =
+        g_dbus_message_new_signal(path.c_str(), interface.c_str(), member.c_str());
+    if (arguments)
+        g_dbus_message_set_body(message, arguments.get());
+    g_dbus_connection_send_message(connection_, message, G_DBUS_SEND_MESSAGE_FLAGS_NONE, nullptr,
+                                   nullptr);
+    g_object_unref(message);
+}
+
+void BusLink::call(const std::string& destination, const std::string& path,
+                   const std::string& interface, const std::string& member, const Value& arguments,
+                   int timeout, GCancellable* cancellable, AnswerHandler answered) {
+    const auto finished = [](GObject* source, GAsyncResult* result, gpointer data) {
+        const std::unique_ptr<AnswerHandler> handler(static_cast<AnswerHandler*>(data));
+        ErrorOut error;
+        const GlibPtr<GVariant> reply(
+            g_dbus_connection_call_finish(G_DBUS_CONNECTION(source), result, error.out()));
+        if (reply)
+            (*handler)({Value(reply.get()), {}, false});
+        else if (!g_error_matches(error.get(), G_IO_ERROR, G_IO_ERROR_CANCELLED))
+            (*handler)({{}, fromGlib(error.get()), true});
+    };
+    g_dbus_connection_call(connection_, destination.c_str(), path.c_str(), interface.c_str(),
+                           member.c_str(), arguments.get(), nullptr,
+                           G_DBUS_CALL_FLAGS_NO_AUTO_START, timeout, cancellable, finished,
+                           new AnswerHandler(std::move(answered)));
+}
+
+void BusLink::send(const std::string& destination, const std::string& path,
+                   const std::string& interface, const std::string& member,
+                   const Value& arguments) {
+    g_dbus_connection_call(connection_, destination.c_str(), path.c_str(), interface.c_str(),
+                           member.c_str(), arguments.get(), nullptr,
+                           G_DBUS_CALL_FLAGS_NO_AUTO_START, -1, nullptr, nullptr, nullptr);
+}
+
+void BusLink::afterRoundTrip(std::function<void()> next) {
+    call(kBus, kBusPath, kBus, "GetId", {}, -1, nullptr,
+         [next = std::move(next)](const Answer&) { next(); });
+}
+
+} // namespace Bluetooth::Sim

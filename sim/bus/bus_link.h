@@ -1,0 +1,72 @@
+#pragma once
+
+#include "bus/call.h"
+
+#include <functional>
+#include <memory>
+#include <string>
+
+namespace Bluetooth::Sim {
+
+/// What a method call of ours was answered: results, or an error.
+struct Answer {
+    Value results;
+    BusError error;
+    bool failed = false;
+};
+
+/// One connection to a bus under a well-known name.
+///
+/// Threads: everything runs on the main loop. GDBus reads on a thread of its own; calls are handed
+/// over in the order in which they came. What is sent leaves in the order in which it was sent.
+class BusLink {
+public:
+    using CallHandler = std::function<void(const CallPtr&)>;
+    using ClientGone = std::function<void(const std::string& uniqueName)>;
+    using AnswerHandler = std::function<void(const Answer&)>;
+
+    /// Connects and starts reading; no name is owned yet.
+    /// @throw std::runtime_error  with a text for the user
+    BusLink(const std::string& address, CallHandler onCall);
+    BusLink(const BusLink&) = delete;
+    BusLink& operator=(const BusLink&) = delete;
+    /// Sends what is queued, then closes the connection.
+    ~BusLink();
+
+    /// Owns a name, or throws std::runtime_error when it is taken or refused.
+    void own(const char* name);
+    /// Called for each client that leaves the bus.
+    void watchClients(ClientGone onGone);
+    /// Called when the bus itself ends.
+    void watchBus(std::function<void()> onEnd);
+
+    void emit(const std::string& path, const std::string& interface, const std::string& member,
+              const Value& arguments = {});
+    /// Calls a method of another client.
+    /// @param timeout  milliseconds
+    /// @param answered  called with the answer, unless the cancellable is cancelled before
+    void call(const std::string& destination, const std::string& path, const std::string& interface,
+              const std::string& member, const Value& arguments, int timeout,
+              GCancellable* cancellable, AnswerHandler answered);
+    /// Sends a call whose answer nobody waits for.
+    void send(const std::string& destination, const std::string& path, const std::string& interface,
+              const std::string& member, const Value& arguments = {});
+    /// Runs what follows once all that was sent to us or by us before has passed the bus.
+    void afterRoundTrip(std::function<void()> next);
+
+private:
+    struct Inbox;
+
+    static GDBusMessage* onMessage(GDBusConnection* connection, GDBusMessage* message,
+                                   gboolean incoming, gpointer data);
+    static gboolean deliver(gpointer data);
+
+    std::shared_ptr<Inbox> inbox_;
+    GDBusConnection* connection_ = nullptr;
+    guint filter_ = 0;
+    guint clients_ = 0;
+    ClientGone clientGone_;
+    std::function<void()> busEnded_;
+};
+
+} // namespace Bluetooth::Sim

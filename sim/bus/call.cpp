@@ -1,0 +1,86 @@
+#include "bus/call.h"
+
+namespace Bluetooth::Sim {
+
+namespace {
+
+std::string orEmpty(const char* text) {
+    return text ? text : "";
+}
+
+} // namespace
+
+Call::Call(GDBusConnection* connection, GDBusMessage* message)
+    : connection_(G_DBUS_CONNECTION(g_object_ref(connection))),
+      message_(G_DBUS_MESSAGE(g_object_ref(message))) {}
+
+Call::~Call() {
+    g_object_unref(message_);
+    g_object_unref(connection_);
+}
+
+std::string Call::sender() const {
+    return orEmpty(g_dbus_message_get_sender(message_));
+}
+
+std::string Call::path() const {
+    return orEmpty(g_dbus_message_get_path(message_));
+}
+
+std::string Call::interface() const {
+    return orEmpty(g_dbus_message_get_interface(message_));
+}
+
+std::string Call::member() const {
+    return orEmpty(g_dbus_message_get_member(message_));
+}
+
+std::string Call::signature() const {
+    return orEmpty(g_dbus_message_get_signature(message_));
+}
+
+Value Call::arguments() const {
+    GVariant* body = g_dbus_message_get_body(message_);
+    return body ? Value(body) : Value(g_variant_new_tuple(nullptr, 0));
+}
+
+std::string Call::text(gsize index) const {
+    const Value child(g_variant_get_child_value(arguments().get(), index));
+    return g_variant_get_string(child.get(), nullptr);
+}
+
+guint32 Call::number(gsize index) const {
+    const Value child(g_variant_get_child_value(arguments().get(), index));
+    return g_variant_get_uint32(child.get());
+}
+
+Value Call::content(gsize index) const {
+    const GlibPtr<GVariant> child(g_variant_get_child_value(arguments().get(), index));
+    const GlibPtr<GVariant> inner(g_variant_get_variant(child.get()));
+    return inner.get();
+}
+
+bool Call::expectsReply() const {
+    return (g_dbus_message_get_flags(message_) & G_DBUS_MESSAGE_FLAGS_NO_REPLY_EXPECTED) == 0;
+}
+
+void Call::reply(const Value& results) {
+    GDBusMessage* reply = g_dbus_message_new_method_reply(message_);
+    if (results)
+        g_dbus_message_set_body(reply, results.get());
+    send(reply);
+}
+
+void Call::fail(const BusError& error) {
+    send(g_dbus_message_new_method_error_literal(message_, error.name.c_str(), error.text.c_str()));
+}
+
+void Call::send(GDBusMessage* reply) {
+    if (!answered_ && expectsReply())
+        g_dbus_connection_send_message(connection_, reply, G_DBUS_SEND_MESSAGE_FLAGS_NONE, nullptr,
+                                       nullptr);
+    answered_ = true;
+    g_object_unref(reply);
+}
+
+} // namespace Bluetooth::Sim

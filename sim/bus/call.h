@@ -1,0 +1,51 @@
+#pragma once
+
+#include "bus/bus_error.h"
+#include "bus/glib_ptr.h"
+
+#include <memory>
+#include <string>
+
+namespace Bluetooth::Sim {
+
+/// A method call that came in and is answered once, now or later.
+///
+/// A call that is never answered stays so: its caller learns of it when the daemon leaves the bus.
+class Call {
+public:
+    Call(GDBusConnection* connection, GDBusMessage* message);
+    Call(const Call&) = delete;
+    Call& operator=(const Call&) = delete;
+    ~Call();
+
+    std::string sender() const;
+    std::string path() const;
+    /// The interface, or "" when the caller named none.
+    std::string interface() const;
+    std::string member() const;
+    /// The signature of the arguments, without parentheses.
+    std::string signature() const;
+
+    /// The arguments as one tuple; "()" when there are none.
+    Value arguments() const;
+    std::string text(gsize index) const;
+    guint32 number(gsize index) const;
+    /// The content of a variant argument.
+    Value content(gsize index) const;
+
+    bool expectsReply() const;
+    /// @param results  a tuple, or nothing for an empty reply
+    void reply(const Value& results = {});
+    void fail(const BusError& error);
+
+private:
+    void send(GDBusMessage* reply);
+
+    GDBusConnection* connection_;
+    GDBusMessage* message_;
+    bool answered_ = false;
+};
+
+using CallPtr = std::shared_ptr<Call>;
+
+} // namespace Bluetooth::Sim

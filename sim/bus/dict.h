@@ -1,0 +1,48 @@
+#pragma once
+
+#include "bus/glib_ptr.h"
+
+#include <string>
+#include <vector>
+
+namespace Bluetooth::Sim {
+
+/// Builds an a{sv} whose entries keep their order.
+class Dict {
+public:
+    Dict() { g_variant_builder_init(&builder_, G_VARIANT_TYPE("a{sv}")); }
+    Dict(const Dict&) = delete;
+    Dict& operator=(const Dict&) = delete;
+    ~Dict() { g_variant_builder_clear(&builder_); }
+
+    Dict& add(const char* name, const Value& value) {
+        g_variant_builder_add(&builder_, "{sv}", name, value.get());
+        return *this;
+    }
+    Value end() { return g_variant_builder_end(&builder_); }
+
+private:
+    GVariantBuilder builder_;
+};
+
+/// An array of texts or object paths, typed also when it is empty.
+inline Value listValue(const char* elementType, const std::vector<std::string>& texts) {
+    GVariantBuilder builder;
+    const std::string type = std::string("a") + elementType;
+    g_variant_builder_init(&builder, G_VARIANT_TYPE(type.c_str()));
+    for (const std::string& text : texts)
+        g_variant_builder_add(&builder, elementType, text.c_str());
+    return g_variant_builder_end(&builder);
+}
+
+inline Value pathValue(const std::string& path) {
+    return g_variant_new_object_path(path.c_str());
+}
+
+/// One value as the only result or argument.
+inline Value tuple(const Value& only) {
+    GVariant* child = only.get();
+    return g_variant_new_tuple(&child, 1);
+}
+
+} // namespace Bluetooth::Sim

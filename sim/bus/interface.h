@@ -1,0 +1,61 @@
+#pragma once
+
+#include "bus/call.h"
+
+#include <string>
+#include <vector>
+
+namespace Bluetooth::Sim {
+
+struct Argument {
+    const char* name;
+    const char* type;
+};
+
+using Arguments = std::vector<Argument>;
+
+/// Runs one method on the object that serves it.
+using Handler = void (*)(void* object, const CallPtr& call);
+
+struct Method {
+    const char* name;
+    Arguments in;
+    Arguments out;
+    Handler handler;
+    bool deprecated = false;
+
+    std::string inSignature() const;
+};
+
+struct Signal {
+    const char* name;
+    Arguments arguments;
+    bool deprecated = false;
+};
+
+/// One interface as a table: dispatch, argument checks and introspection all come from it.
+struct Interface {
+    const char* name;
+    std::vector<Method> methods;
+    std::vector<Signal> signals;
+
+    /// The method of that name and exactly that signature, or null.
+    const Method* find(const std::string& member, const std::string& signature) const;
+    /// The `<interface>` element of the introspection data.
+    std::string introspection() const;
+};
+
+template <auto Function>
+struct HandlerOf;
+template <class T, void (T::*Function)(const CallPtr&)>
+struct HandlerOf<Function> {
+    static void run(void* object, const CallPtr& call) {
+        (static_cast<T*>(object)->*Function)(call);
+    }
+};
+
+/// A table entry's handler: `handle<&Adapter::startDiscovery>`.
+template <auto Function>
+constexpr Handler handle = &HandlerOf<Function>::run;
+
+} // namespace Bluetooth::Sim

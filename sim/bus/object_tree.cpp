@@ -1,0 +1,91 @@
+#include "bus/object_tree.h"
+
+#include <algorithm>
+
+namespace Bluetooth::Sim {
+
+namespace {
+
+constexpr const char* kIntrospectable = "org.freedesktop.DBus.Introspectable";
+
+BusError unknown(const Call& call, bool objectExists) {
+    const std::string interface = call.interface().empty() ? "(null)" : call.interface();
+    return {std::string("org.freedesktop.DBus.Error.") +
+                (objectExists ? "UnknownMethod" : "UnknownObject"),
+            "Method \"" + call.member() + "\" with signature \"" + call.signature() +
+                "\" on interface \"" + interface + "\" doesn't exist\n"};
+}
+
+} // namespace
+
+void ObjectTree::add(const std::string& path, const Interface& interface, void* object) {
+    objects_[path].push_back({&interface, object});
+}
+
+void ObjectTree::remove(const std::string& path) {
+    objects_.erase(path);
+}
+
+void ObjectTree::remove(const std::string& path, const Interface& interface) {
+    const auto object = objects_.find(path);
+    if (object == objects_.end())
+        return;
+    auto& served = object->second;
+    served.erase(std::remove_if(served.begin(), served.end(),
+                                [&](const Served& entry) { return entry.interface == &interface; }),
+                 served.end());
+}
+
+void ObjectTree::dispatch(const CallPtr& call) const {
+    if (call->interface() == kIntrospectable && call->member() == "Introspect")
+        return introspect(call);
+    const auto object = objects_.find(call->path());
+    if (object == objects_.end())
+        return call->fail(unknown(*call, false));
+    for (const Served& served : object->second) {
+        if (call->interface() != served.interface->name)
+            continue;
+        if (const Method* method = served.interface->find(call->member(), call->signature())) {
+            // The handler may remove the object: nothing of the tree is used after it.
+            const Handler handler = method->handler;
+            return handler(served.object, call);
+        }
+    }
+    call->fail(unknown(*call, true));
+}
+
+void ObjectTree::introspect(const CallPtr& call) const {
+    const auto object = objects_.find(call->path());
+    const std::vector<std::string> children = childrenOf(call->path());
+    if (object == objects_.end() && children.empty())
+        return call->fail(unknown(*call, false));
+
+    std::string xml = "<!DOCTYPE node PUBLIC \"-//freedesktop//DTD D-BUS Object Introspection "
+                      "1.0//EN\"\n\"http://www.freedesktop.org/standards/dbus/1.0/"
+                      "introspect.dtd\">\n<node>\n";
+    xml += std::string("\t<interface name=\"") + kIntrospectable +
+           "\">\n\t\t<method name=\"Introspect\">\n\t\t\t<arg name=\"xml\" type=\"s\" "
+           "direction=\"out\"/>\n\t\t</method>\n\t</interface>\n";
+    if (object != objects_.end())
+        for (const Served& served : object->second)
+            xml += served.interface->introspection();
+    for (const std::string& child : children)
+        xml += "\t<node name=\"" + child + "\"/>\n";
+    call->reply(g_variant_new("(s)", (xml + "</node>\n").c_str()));
+}
+
+std::vector<std::string> ObjectTree::childrenOf(const std::string& path) const {
+    const std::string prefix = path == "/" ? path : path + "/";
+    std::vector<std::string> children;
+    for (const auto& [other, served] : objects_) {
+        if (other.size() <= prefix.size() || other.compare(0, prefix.size(), prefix) != 0)
+            continue;
+        std::string child =
+            other.substr(prefix.size(), other.find('/', prefix.size()) - prefix.size());
+        if (children.empty() || children.back() != child)
+            children.push_back(std::move(child));
+    }
+    return children;
+}
+
+} // namespace Bluetooth::Sim

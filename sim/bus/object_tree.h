@@ -1,0 +1,37 @@
+#pragma once
+
+#include "bus/interface.h"
+
+#include <map>
+#include <string>
+#include <vector>
+
+namespace Bluetooth::Sim {
+
+/// Which object serves which interfaces at which path.
+///
+/// Answers as libdbus and the daemon do: an unknown interface, method or signature is
+/// UnknownMethod, an unknown path UnknownObject, and each path with something at or below it can be
+/// introspected.
+class ObjectTree {
+public:
+    /// @param object  what the table's handlers cast back to; not owned
+    void add(const std::string& path, const Interface& interface, void* object);
+    void remove(const std::string& path);
+    void remove(const std::string& path, const Interface& interface);
+
+    void dispatch(const CallPtr& call) const;
+
+private:
+    struct Served {
+        const Interface* interface;
+        void* object;
+    };
+
+    void introspect(const CallPtr& call) const;
+    std::vector<std::string> childrenOf(const std::string& path) const;
+
+    std::map<std::string, std::vector<Served>> objects_;
+};
+
+} // namespace Bluetooth::Sim

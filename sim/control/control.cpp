@@ -1,0 +1,391 @@
+#include "control/control.h"
+
+#include "bus/dict.h"
+#include "daemon/adapter.h"
+#include "daemon/agent.h"
+#include "daemon/audio_device.h"
+#include "daemon/device.h"
+#include "daemon/pairing.h"
+#include "world/address.h"
+#include "world/settings.h"
+
+#include <algorithm>
+#include <stdexcept>
+
+namespace Bluetooth::Sim {
+
+namespace {
+
+constexpr const char* kName = "com.kestrine.bluetooth.Sim";
+constexpr const char* kPath = "/com/kestrine/bluetooth/Sim";
+constexpr const char* kBus = "org.freedesktop.DBus";
+constexpr const char* kBusPath = "/org/freedesktop/DBus";
+
+std::string asSetting(GVariant* value) {
+    if (g_variant_is_of_type(value, G_VARIANT_TYPE_STRING))
+        return g_variant_get_string(value, nullptr);
+    if (g_variant_is_of_type(value, G_VARIANT_TYPE_STRING_ARRAY)) {
+        const GlibPtr<char*> texts(g_variant_dup_strv(value, nullptr));
+        const GlibPtr<char> joined(g_strjoinv(";", texts.get()));
+        return joined.get();
+    }
+    const GlibPtr<char> printed(g_variant_print(value, FALSE));
+    return printed.get();
+}
+
+/// The a{sv} at that place of a call's arguments.
+Settings settingsOf(const CallPtr& call, gsize index) {
+    Settings settings;
+    const GlibPtr<GVariant> dict(g_variant_get_child_value(call->arguments().get(), index));
+    GVariantIter entries;
+    g_variant_iter_init(&entries, dict.get());
+    const char* key = nullptr;
+    GVariant* value = nullptr;
+    while (g_variant_iter_loop(&entries, "{&sv}", &key, &value))
+        settings.emplace_back(key, asSetting(value));
+    return settings;
+}
+
+/// A variant argument as a message body: a tuple stands for itself, anything else for one argument.
+Value bodyOf(const CallPtr& call, gsize index) {
+    const Value content = call->content(index);
+    return g_variant_is_of_type(content.get(), G_VARIANT_TYPE_TUPLE) ? content : tuple(content);
+}
+
+} // namespace
+
+const Interface& Control::table() {
+    static const Arguments device = {{"adapter", "s"}, {"address", "s"}};
+    static const Interface table = {
+        kName,
+        {{"AddAdapter", {{"settings", "a{sv}"}}, {{"id", "s"}}, handle<&Control::addAdapter>},
+         {"RemoveAdapter", {{"id", "s"}}, {}, handle<&Control::removeAdapter>},
+         {"AddDevice", {{"address", "s"}, {"settings", "a{sv}"}}, {}, handle<&Control::addDevice>},
+         {"SetDevice", {{"address", "s"}, {"settings", "a{sv}"}}, {}, handle<&Control::setDevice>},
+         {"RemoveDevice", {{"address", "s"}}, {}, handle<&Control::removeDevice>},
+         {"ConnectDevice", device, {}, handle<&Control::connectDevice>},
+         {"StartIncomingPairing", device, {}, handle<&Control::startIncomingPairing>},
+         {"ConnectService",
+          {{"adapter", "s"}, {"address", "s"}, {"uuid", "s"}},
+          {},
+          handle<&Control::connectService>},
+         {"DropLink", device, {}, handle<&Control::dropLink>},
+         {"SetPlaying",
+          {{"adapter", "s"}, {"address", "s"}, {"playing", "b"}},
+          {},
+          handle<&Control::setPlaying>},
+         {"EmitSignal",
+          {{"path", "o"}, {"interface", "s"}, {"member", "s"}, {"arguments", "v"}},
+          {},
+          handle<&Control::emitSignal>},
+         {"CallAgent",
+          {{"adapter", "s"}, {"interface", "s"}, {"member", "s"}, {"arguments", "v"}},
+          {{"errorName", "s"}, {"errorText", "s"}, {"results", "v"}},
+          handle<&Control::callAgent>},
+         {"FailNext",
+          {{"interface", "s"}, {"method", "s"}, {"errorName", "s"}, {"errorText", "s"}},
+          {},
+          handle<&Control::failNext>},
+         {"DelayNext",
+          {{"interface", "s"}, {"method", "s"}, {"milliseconds", "u"}},
+          {},
+          handle<&Control::delayNext>},
+         {"ClearFaults", {}, {}, handle<&Control::clearFaults>},
+         {"GetCalls", {}, {{"calls", "a(ossv)"}}, handle<&Control::getCalls>},
+         {"ClearCalls", {}, {}, handle<&Control::clearCalls>},
+         {"SetTimeScale", {{"scale", "d"}}, {}, handle<&Control::setTimeScale>},
+         {"SetTimes", {{"milliseconds", "a{sv}"}}, {}, handle<&Control::setTimes>},
+         {"DropName", {}, {}, handle<&Control::dropName>},
+         {"RegainName", {}, {}, handle<&Control::regainName>},
+         {"Restart", {}, {{"pid", "u"}}, handle<&Control::restart>},
+         {"Quit", {}, {}, handle<&Control::quit>}},
+        {{"CallReceived", {{"path", "o"}, {"interface", "s"}, {"member", "s"}, {"sender", "s"}}}}};
+    return table;
+}
+
+Control::Control(World& world, const std::string& busAddress, bool verbose)
+    : world_(world),
+      verbose_(verbose),
+      daemon_(world, busAddress, [this](const CallPtr& call) { return beforeCall(call); }),
+      faults_([this](const CallPtr& call) {
+          if (daemon_.running())
+              daemon_.dispatch(call);
+      }),
+      bus_(busAddress, [this](const CallPtr& call) { received(call); }) {
+    objects_.add(kPath, table(), this);
+    bus_.own(kName);
+}
+
+Control::~Control() = default;
+
+bool Control::beforeCall(const CallPtr& call) {
+    if (verbose_)
+        g_printerr("%s %s.%s%s\n", call->path().c_str(), call->interface().c_str(),
+                   call->member().c_str(),
+                   GlibPtr<char>(g_variant_print(call->arguments().get(), FALSE)).get());
+    calls_.add(call);
+    bus_.emit(kPath, kName, "CallReceived",
+              g_variant_new("(osss)", call->path().c_str(), call->interface().c_str(),
+                            call->member().c_str(), call->sender().c_str()));
+    return faults_.take(call);
+}
+
+void Control::received(const CallPtr& call) {
+    const auto run = [this, call] { carryOut(call, [&] { objects_.dispatch(call); }); };
+    if (daemon_.running())
+        daemon_.bus().afterRoundTrip(run);
+    else
+        run();
+}
+
+void Control::carryOut(const CallPtr& call, const std::function<void()>& what) {
+    try {
+        what();
+    } catch (const std::exception& wrong) {
+        call->fail({std::string(kName) + ".Error.Failed", wrong.what()});
+    }
+}
+
+void Control::done(const CallPtr& call, const Value& results) {
+    if (!call->expectsReply() || !daemon_.running())
+        return call->reply(results);
+    daemon_.bus().afterRoundTrip([call, results] { call->reply(results); });
+}
+
+Adapter& Control::adapter(const std::string& id) {
+    Adapter* found = daemon_.find(id);
+    if (!found)
+        throw std::runtime_error("there is no adapter \"" + id + "\"");
+    return *found;
+}
+
+std::shared_ptr<Peer> Control::peer(const std::string& address) {
+    auto found = world_.peer(upperCase(address));
+    if (!found)
+        throw std::runtime_error("there is no device \"" + address + "\"");
+    return found;
+}
+
+std::shared_ptr<Device> Control::device(const CallPtr& call) {
+    auto found = adapter(call->text(0)).find(upperCase(call->text(1)));
+    if (!found)
+        throw std::runtime_error("the daemon does not know \"" + call->text(1) + "\"");
+    return found;
+}
+
+void Control::peerChanged(const std::shared_ptr<Peer>& peer) {
+    for (const auto& adapter : daemon_.adapters())
+        adapter->discovery().peerChanged(peer);
+}
+
+void Control::addAdapter(const CallPtr& call) {
+    auto hardware = std::make_shared<AdapterHardware>();
+    hardware->index = world_.freeIndex();
+    hardware->name = hardware->id();
+    const GlibPtr<char> address(g_strdup_printf("00:1A:7D:DA:72:%02X", hardware->index));
+    hardware->address = address.get();
+    applySettings(*hardware, settingsOf(call, 0));
+    for (const auto& peer : world_.peers)
+        World::store(*hardware, *peer);
+    world_.adapters.push_back(hardware);
+    if (daemon_.running())
+        daemon_.plugIn(hardware);
+    done(call, tuple(textValue(hardware->id())));
+}
+
+void Control::removeAdapter(const CallPtr& call) {
+    const auto hardware = world_.adapter(call->text(0));
+    if (!hardware)
+        throw std::runtime_error("there is no adapter \"" + call->text(0) + "\"");
+    if (Adapter* plugged = daemon_.find(hardware->id()))
+        daemon_.pullOut(*plugged);
+    auto& all = world_.adapters;
+    all.erase(std::find(all.begin(), all.end(), hardware));
+    done(call);
+}
+
+void Control::addDevice(const CallPtr& call) {
+    const std::string address = upperCase(call->text(0));
+    if (!isAddress(address))
+        throw std::runtime_error("\"" + address + "\" is not an address");
+    if (world_.peer(address))
+        throw std::runtime_error("there is a device " + address + " already");
+    auto peer = std::make_shared<Peer>();
+    peer->address = address;
+    applySettings(*peer, settingsOf(call, 1));
+    world_.peers.push_back(peer);
+    peerChanged(peer);
+    done(call);
+}
+
+void Control::setDevice(const CallPtr& call) {
+    const auto changed = peer(call->text(0));
+    Peer copy = *changed; // nothing changes unless everything can
+    applySettings(copy, settingsOf(call, 1));
+    *changed = copy;
+    peerChanged(changed);
+    done(call);
+}
+
+void Control::removeDevice(const CallPtr& call) {
+    const auto gone = peer(call->text(0));
+    auto& all = world_.peers;
+    all.erase(std::find(all.begin(), all.end(), gone));
+    done(call);
+}
+
+void Control::comeIn(const CallPtr& call, bool pairing) {
+    Adapter& to = adapter(call->text(0));
+    const auto from = peer(call->text(1));
+    if (!to.mode().powered())
+        throw std::runtime_error("the adapter is off");
+    auto known = to.find(from->address);
+    if (known && known->busy())
+        throw std::runtime_error("the device is busy");
+    if (!known)
+        known = to.createDevice(from->address);
+    known->comeIn(pairing);
+    done(call);
+}
+
+void Control::connectDevice(const CallPtr& call) {
+    comeIn(call, false);
+}
+
+void Control::startIncomingPairing(const CallPtr& call) {
+    comeIn(call, true);
+}
+
+void Control::connectService(const CallPtr& call) {
+    const std::string uuid = fullUuid(call->text(2));
+    if (uuid.empty())
+        throw std::runtime_error("\"" + call->text(2) + "\" is not a UUID");
+    device(call)->audio().serviceConnects(uuid);
+    done(call);
+}
+
+void Control::dropLink(const CallPtr& call) {
+    device(call)->link().drop();
+    done(call);
+}
+
+void Control::setPlaying(const CallPtr& call) {
+    const Value playing(g_variant_get_child_value(call->arguments().get(), 2));
+    device(call)->audio().setPlaying(g_variant_get_boolean(playing.get()) != FALSE);
+    done(call);
+}
+
+void Control::emitSignal(const CallPtr& call) {
+    const std::string interface = call->text(1);
+    const std::string member = call->text(2);
+    if (!g_dbus_is_interface_name(interface.c_str()) || !g_dbus_is_member_name(member.c_str()))
+        throw std::runtime_error("\"" + interface + "." + member + "\" cannot name a signal");
+    if (!daemon_.running())
+        throw std::runtime_error("the daemon is not on the bus");
+    daemon_.bus().emit(call->text(0), interface, member, bodyOf(call, 3));
+    done(call);
+}
+
+void Control::callAgent(const CallPtr& call) {
+    Adapter& of = adapter(call->text(0));
+    const Agent* agent = of.currentAgent();
+    if (!agent)
+        throw std::runtime_error("the adapter has no agent");
+    const std::string interface = call->text(1).empty() ? "org.bluez.Agent" : call->text(1);
+    const std::string member = call->text(2);
+    if (!g_dbus_is_interface_name(interface.c_str()) || !g_dbus_is_member_name(member.c_str()))
+        throw std::runtime_error("\"" + interface + "." + member + "\" cannot name a method");
+    daemon_.bus().call(
+        agent->owner(), agent->path(), interface, member, bodyOf(call, 3),
+        static_cast<int>(world_.times.agentTimeout), nullptr, [call](const Answer& answer) {
+            const Value none = g_variant_new_tuple(nullptr, 0);
+            call->reply(g_variant_new("(ssv)", answer.error.name.c_str(), answer.error.text.c_str(),
+                                      answer.failed ? none.get() : answer.results.get()));
+        });
+}
+
+void Control::failNext(const CallPtr& call) {
+    const BusError error = {call->text(2), call->text(3)};
+    if (!g_dbus_is_interface_name(error.name.c_str()))
+        throw std::runtime_error("\"" + error.name + "\" is not an error name");
+    faults_.failNext(call->text(0), call->text(1), error);
+    done(call);
+}
+
+void Control::delayNext(const CallPtr& call) {
+    faults_.delayNext(call->text(0), call->text(1), call->number(2));
+    done(call);
+}
+
+void Control::clearFaults(const CallPtr& call) {
+    faults_.clear();
+    done(call);
+}
+
+void Control::getCalls(const CallPtr& call) {
+    done(call, tuple(calls_.list()));
+}
+
+void Control::clearCalls(const CallPtr& call) {
+    calls_.clear();
+    done(call);
+}
+
+void Control::setTimeScale(const CallPtr& call) {
+    double scale = 0;
+    g_variant_get(call->arguments().get(), "(d)", &scale);
+    if (!(scale >= 0 && scale <= 1000))
+        throw std::runtime_error("a time scale is from 0 to 1000");
+    world_.times.scale = scale;
+    done(call);
+}
+
+void Control::setTimes(const CallPtr& call) {
+    Times copy = world_.times;
+    applySettings(copy, settingsOf(call, 0));
+    world_.times = copy;
+    done(call);
+}
+
+/// The bus learns of a closed connection in its own time: what follows comes after that.
+void Control::whenGone(std::function<void()> next) {
+    bus_.call(kBus, kBusPath, kBus, "NameHasOwner", tuple(textValue("org.bluez")), -1, nullptr,
+              [this, next = std::move(next)](const Answer& answer) {
+                  gboolean owned = FALSE;
+                  if (!answer.failed)
+                      g_variant_get(answer.results.get(), "(b)", &owned);
+                  if (owned)
+                      whenGone(next);
+                  else
+                      next();
+              });
+}
+
+void Control::dropName(const CallPtr& call) {
+    daemon_.vanish();
+    whenGone([call] { call->reply(); });
+}
+
+void Control::regainName(const CallPtr& call) {
+    if (!daemon_.running())
+        daemon_.start(daemon_.pid());
+    done(call);
+}
+
+void Control::restart(const CallPtr& call) {
+    const int pid = daemon_.pid() + 1;
+    daemon_.stop();
+    whenGone([this, call, pid] {
+        carryOut(call, [&] {
+            daemon_.start(pid);
+            done(call, tuple(g_variant_new_uint32(static_cast<guint32>(pid))));
+        });
+    });
+}
+
+void Control::quit(const CallPtr& call) {
+    call->reply();
+    quit_();
+}
+
+} // namespace Bluetooth::Sim

@@ -1,0 +1,83 @@
+#pragma once
+
+#include "bus/bus_link.h"
+#include "bus/object_tree.h"
+#include "control/call_log.h"
+#include "control/faults.h"
+#include "daemon/daemon.h"
+
+#include <functional>
+#include <memory>
+#include <string>
+
+namespace Bluetooth::Sim {
+
+class Adapter;
+class Device;
+
+/// com.kestrine.bluetooth.Sim: what tests and people do to the simulation, apart from what it
+/// simulates, on a connection and under a name of its own.
+///
+/// Each call is carried out after everything that its caller sent to the daemon before, and is
+/// answered after everything that the daemon sent because of it has passed the bus.
+class Control {
+public:
+    /// @param verbose  whether each call to the daemon is written to stderr
+    Control(World& world, const std::string& busAddress, bool verbose);
+    Control(const Control&) = delete;
+    Control& operator=(const Control&) = delete;
+    ~Control();
+
+    Daemon& daemon() { return daemon_; }
+    void watchQuit(std::function<void()> onQuit) { quit_ = std::move(onQuit); }
+
+private:
+    static const Interface& table();
+
+    bool beforeCall(const CallPtr& call);
+    void received(const CallPtr& call);
+    void whenGone(std::function<void()> next);
+    static void carryOut(const CallPtr& call, const std::function<void()>& what);
+
+    void addAdapter(const CallPtr& call);
+    void removeAdapter(const CallPtr& call);
+    void addDevice(const CallPtr& call);
+    void setDevice(const CallPtr& call);
+    void removeDevice(const CallPtr& call);
+    void connectDevice(const CallPtr& call);
+    void startIncomingPairing(const CallPtr& call);
+    void connectService(const CallPtr& call);
+    void dropLink(const CallPtr& call);
+    void setPlaying(const CallPtr& call);
+    void emitSignal(const CallPtr& call);
+    void callAgent(const CallPtr& call);
+    void failNext(const CallPtr& call);
+    void delayNext(const CallPtr& call);
+    void clearFaults(const CallPtr& call);
+    void getCalls(const CallPtr& call);
+    void clearCalls(const CallPtr& call);
+    void setTimeScale(const CallPtr& call);
+    void setTimes(const CallPtr& call);
+    void dropName(const CallPtr& call);
+    void regainName(const CallPtr& call);
+    void restart(const CallPtr& call);
+    void quit(const CallPtr& call);
+
+    void done(const CallPtr& call, const Value& results = {});
+    void comeIn(const CallPtr& call, bool pairing);
+    Adapter& adapter(const std::string& id);
+    std::shared_ptr<Device> device(const CallPtr& call);
+    std::shared_ptr<Peer> peer(const std::string& address);
+    void peerChanged(const std::shared_ptr<Peer>& peer);
+
+    World& world_;
+    bool verbose_;
+    Daemon daemon_;
+    Faults faults_;
+    CallLog calls_;
+    std::function<void()> quit_;
+    ObjectTree objects_;
+    BusLink bus_;
+};
+
+} // namespace Bluetooth::Sim

@@ -1,0 +1,91 @@
+#pragma once
+
+#include "bus/interface.h"
+#include "daemon/adapter_mode.h"
+#include "daemon/discovery.h"
+#include "world/world.h"
+
+#include <memory>
+#include <string>
+#include <vector>
+
+namespace Bluetooth::Sim {
+
+class Agent;
+class Daemon;
+class Device;
+
+/// org.bluez.Adapter: one controller with the devices that the daemon knows on it.
+class Adapter {
+public:
+    Adapter(Daemon& daemon, std::shared_ptr<AdapterHardware> hardware);
+    Adapter(const Adapter&) = delete;
+    Adapter& operator=(const Adapter&) = delete;
+    ~Adapter();
+
+    Daemon& daemon() const { return daemon_; }
+    AdapterHardware& hardware() const { return *hardware_; }
+    const std::string& path() const { return path_; }
+    AdapterMode& mode() { return mode_; }
+    Discovery& discovery() { return discovery_; }
+    /// The agent that RegisterAgent gave, or null.
+    Agent* agent() const { return agent_.get(); }
+    std::shared_ptr<Agent> sharedAgent() const { return agent_; }
+    /// The agent of the pairing under way, else the registered one, or null.
+    const Agent* currentAgent() const;
+
+    /// What is said of the stored devices before the adapter itself is announced.
+    void announce();
+    /// What is said once the adapter is up.
+    void comeUp();
+    /// What is said before the adapter goes; also ends all that runs on it.
+    void goDown();
+    /// Ends what runs over the air when the power goes.
+    void loseDevices();
+    void clientGone(const std::string& client);
+    void releaseAgents();
+
+    /// The device in the air at that address that this adapter can reach or see, or null.
+    std::shared_ptr<Peer> peerAt(const std::string& address) const;
+    std::shared_ptr<Device> find(const std::string& address) const;
+    /// Makes the object of a device and announces it.
+    std::shared_ptr<Device> createDevice(const std::string& address);
+    /// Takes a device off the bus and out of storage, and announces that.
+    void removeDevice(const std::shared_ptr<Device>& device);
+
+    void emit(const char* member, const Value& arguments);
+    void changed(const char* property, const Value& value);
+    void uuidsChanged();
+
+private:
+    static const Interface& table();
+
+    void getProperties(const CallPtr& call);
+    void setProperty(const CallPtr& call);
+    void requestSession(const CallPtr& call);
+    void releaseSession(const CallPtr& call);
+    void startDiscovery(const CallPtr& call);
+    void stopDiscovery(const CallPtr& call);
+    void listDevices(const CallPtr& call);
+    void createDeviceCalled(const CallPtr& call);
+    void createPairedDevice(const CallPtr& call);
+    void cancelDeviceCreation(const CallPtr& call);
+    void removeDeviceCalled(const CallPtr& call);
+    void findDevice(const CallPtr& call);
+    void registerAgent(const CallPtr& call);
+    void unregisterAgent(const CallPtr& call);
+
+    void setName(const CallPtr& call, const Value& value);
+    void devicesChanged();
+    Value devicePaths() const;
+
+    Daemon& daemon_;
+    std::shared_ptr<AdapterHardware> hardware_;
+    std::string path_;
+    AdapterMode mode_;
+    Discovery discovery_;
+    std::shared_ptr<Agent> agent_;
+    std::vector<std::shared_ptr<Device>> devices_;
+};
+
+} // namespace Bluetooth::Sim

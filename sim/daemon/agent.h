@@ -1,0 +1,50 @@
+#pragma once
+
+#include "bus/bus_link.h"
+#include "world/capability.h"
+
+#include <string>
+
+namespace Bluetooth::Sim {
+
+/// An agent of a client, as the daemon sees it. It has at most one request open.
+class Agent {
+public:
+    using OnAnswer = BusLink::AnswerHandler;
+
+    Agent(BusLink& bus, std::string owner, std::string path, Capability capability);
+    Agent(const Agent&) = delete;
+    Agent& operator=(const Agent&) = delete;
+    ~Agent();
+
+    const std::string& owner() const { return owner_; }
+    const std::string& path() const { return path_; }
+    Capability capability() const { return capability_; }
+    bool busy() const { return request_ != nullptr; }
+
+    /// Asks, and hands the answer on once; results of another signature become an error.
+    /// @param timeout  milliseconds
+    void ask(const char* member, const Value& arguments, const char* resultSignature, guint timeout,
+             OnAnswer onAnswer);
+    /// Shows something; whatever the agent answers changes nothing.
+    void show(const char* member, const Value& arguments);
+    /// Tells the agent that what it is asked or shows is over; an open request is forgotten.
+    void cancel();
+    /// The daemon drops the agent: an open request fails, then Release.
+    void release();
+    /// The agent's owner has left the bus: an open request fails, nothing is sent.
+    void ownerGone();
+
+private:
+    void forgetRequest();
+    void failRequest();
+
+    BusLink& bus_;
+    std::string owner_;
+    std::string path_;
+    Capability capability_;
+    GCancellable* request_ = nullptr;
+    OnAnswer onAnswer_;
+};
+
+} // namespace Bluetooth::Sim

@@ -1,0 +1,74 @@
+#pragma once
+
+#include "bus/interface.h"
+#include "world/timer.h"
+
+#include <string>
+
+namespace Bluetooth::Sim {
+
+class Device;
+
+/// The audio side of a device: org.bluez.Audio, and org.bluez.AudioSink and org.bluez.Control when
+/// its service classes have them.
+class AudioDevice {
+public:
+    explicit AudioDevice(Device& device) : device_(device) {}
+
+    /// Serves the interfaces that the device's UUIDs call for and that are not served yet.
+    void serve();
+    /// The device opens a service of its own: the agent is asked unless the device is trusted.
+    void serviceConnects(const std::string& uuid);
+    /// A stream starts or stops.
+    void setPlaying(bool playing);
+    void linkLost();
+    void abandon();
+
+private:
+    enum class State { Disconnected, Connecting, Connected, Playing };
+
+    static const Interface& audioTable();
+    static const Interface& sinkTable();
+    static const Interface& controlTable();
+    static const char* text(State state);
+
+    void connectAudio(const CallPtr& call);
+    void disconnectAudio(const CallPtr& call);
+    void audioProperties(const CallPtr& call);
+    void connectSink(const CallPtr& call);
+    void disconnectSink(const CallPtr& call);
+    void sinkIsConnected(const CallPtr& call);
+    void sinkProperties(const CallPtr& call);
+    void controlIsConnected(const CallPtr& call);
+    void controlProperties(const CallPtr& call);
+    void volume(const CallPtr& call);
+
+    bool has(const char* uuid) const;
+    void beginConnecting();
+    void linkReached();
+    void authorize(const std::string& uuid);
+    void setUpStream();
+    void connected();
+    void failed();
+    void disconnected();
+    void setSink(State state);
+    void setAudio(State state);
+    void setControl(bool connected);
+    void emit(const Interface& interface, const char* member, const Value& arguments = {});
+    void changed(const Interface& interface, const char* property, const Value& value);
+
+    Device& device_;
+    bool audioServed_ = false;
+    bool sinkServed_ = false;
+    bool controlServed_ = false;
+    State audio_ = State::Disconnected;
+    State sink_ = State::Disconnected;
+    bool control_ = false;
+    bool holdsLink_ = false;
+    CallPtr audioCall_; ///< Audio.Connect that waits
+    CallPtr sinkCall_;  ///< AudioSink.Connect that waits
+    Timer setUp_;
+    Timer controlSetUp_;
+};
+
+} // namespace Bluetooth::Sim

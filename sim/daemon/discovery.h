@@ -1,0 +1,72 @@
+#pragma once
+
+#include "bus/call.h"
+#include "world/peer.h"
+#include "world/timer.h"
+
+#include <deque>
+#include <map>
+#include <memory>
+#include <string>
+#include <vector>
+
+namespace Bluetooth::Sim {
+
+class Adapter;
+
+/// The discovery of one adapter, shared by the clients that started it.
+///
+/// It runs in rounds: an inquiry that finds devices, then the names that did not come with it.
+class Discovery {
+public:
+    explicit Discovery(Adapter& adapter) : adapter_(adapter) {}
+
+    bool active() const { return active_; }
+
+    void startSession(const CallPtr& call);
+    void stopSession(const CallPtr& call);
+    void clientGone(const std::string& client);
+    /// Ends all sessions.
+    void stop();
+
+    /// Ends the running round while a device is being connected, and starts anew after it.
+    void suspend();
+    void resume();
+
+    /// A device in the air came, went or changed.
+    void peerChanged(const std::shared_ptr<Peer>& peer);
+
+private:
+    struct Found {
+        gint16 rssi;
+        std::string name;
+        bool inThisRound;
+    };
+
+    void begin();
+    void end();
+    void setActive(bool active);
+    void startRound();
+    void findNext();
+    void askNames();
+    void askNextName();
+    void endRound();
+    void see(Peer& peer);
+    void report(const Peer& peer, gint16 rssi);
+    bool visible(const Peer& peer) const;
+
+    Adapter& adapter_;
+    std::map<std::string, unsigned> sessions_; ///< how often each client started it
+    std::map<std::string, Found> found_;
+    std::deque<std::shared_ptr<Peer>> toFind_;
+    std::deque<std::shared_ptr<Peer>> toName_;
+    bool active_ = false;
+    bool inquiring_ = false;
+    unsigned suspensions_ = 0;
+    unsigned round_ = 0;
+    gint64 began_ = 0;
+    Timer finder_;
+    Timer roundEnd_;
+};
+
+} // namespace Bluetooth::Sim

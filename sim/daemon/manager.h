@@ -1,0 +1,38 @@
+#pragma once
+
+#include "bus/interface.h"
+
+#include <string>
+
+namespace Bluetooth::Sim {
+
+class Adapter;
+class Daemon;
+
+/// org.bluez.Manager at "/".
+class Manager {
+public:
+    explicit Manager(Daemon& daemon);
+    Manager(const Manager&) = delete;
+    Manager& operator=(const Manager&) = delete;
+    ~Manager();
+
+    void adapterAdded(const Adapter& adapter);
+    void adapterRemoved(const std::string& path, bool wasDefault);
+
+private:
+    static const Interface& table();
+
+    void getProperties(const CallPtr& call);
+    void defaultAdapter(const CallPtr& call);
+    void findAdapter(const CallPtr& call);
+    void listAdapters(const CallPtr& call);
+
+    Value adapterPaths() const;
+    void emit(const char* member, const Value& arguments);
+    void adaptersChanged();
+
+    Daemon& daemon_;
+};
+
+} // namespace Bluetooth::Sim

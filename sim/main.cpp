@@ -1,0 +1,50 @@
+#include "options.h"
+#include "run/foreground.h"
+#include "run/session.h"
+#include "world/behaviour.h"
+#include "world/scenario.h"
+
+#include <glib.h>
+
+#include <exception>
+
+using namespace Bluetooth::Sim;
+
+namespace {
+
+constexpr int kWrongUsage = 2;
+
+int run(const Options& options) {
+    if (options.version) {
+        g_print("bluez4-sim " KESBLUETOOTH_VERSION ", simulating BlueZ 4.101\n");
+        return 0;
+    }
+    if (options.listScenario) {
+        g_print("%s", defaultScenarioText());
+        return 0;
+    }
+    if (options.listBehaviours) {
+        for (const Behaviour& behaviour : behaviours())
+            g_print("%-22s%s\n", behaviour.name, behaviour.description);
+        return 0;
+    }
+    return options.command.empty() ? serveInForeground(options) : runSession(options);
+}
+
+} // namespace
+
+int main(int argc, char** argv) {
+    Options options;
+    try {
+        options = parseOptions(argc, argv);
+    } catch (const std::exception& wrong) {
+        g_printerr("bluez4-sim: %s; see bluez4-sim --help\n", wrong.what());
+        return kWrongUsage;
+    }
+    try {
+        return run(options);
+    } catch (const std::exception& failure) {
+        g_printerr("bluez4-sim: %s\n", failure.what());
+        return 1;
+    }
+}

@@ -1,0 +1,12 @@
+#pragma once
+
+#include "options.h"
+
+namespace Bluetooth::Sim {
+
+/// Serves org.bluez on the system bus until SIGTERM, SIGINT or Quit.
+/// @return the exit status
+/// @throw std::runtime_error  when it cannot start, or loses the bus
+int serveInForeground(const Options& options);
+
+} // namespace Bluetooth::Sim

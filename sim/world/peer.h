@@ -1,0 +1,61 @@
+#pragma once
+
+#include "world/capability.h"
+
+#include <glib.h>
+
+#include <optional>
+#include <string>
+#include <vector>
+
+namespace Bluetooth::Sim {
+
+/// How a pairing with a device ends, whatever the user of the agent answers.
+enum class PairingEnd {
+    AsAnswered,       ///< well, when the agent's answer is right
+    Rejected,         ///< the device does not allow pairing
+    Refused,          ///< its user says no
+    NeverAnswers,     ///< it falls silent: the pairing times out
+    CancelledByPeer,  ///< its user stops the pairing
+    RepeatedAttempts, ///< it wants fewer attempts
+    LinkLost          ///< it goes out of range while the agent is asked
+};
+
+/// A device in the air: what it is, not what a daemon knows of it.
+struct Peer {
+    std::string address; ///< upper case
+    std::string name;
+    std::string adapter; ///< "hci0" when only that adapter can see it, "" for all
+    guint32 deviceClass = 0;
+    gint16 rssi = -60;
+    guint rssiVariation = 0; ///< most that the RSSI differs from `rssi` from round to round
+    std::vector<std::string> uuids;
+    std::optional<guint16> vendor;
+    std::optional<guint16> product;
+    std::optional<guint16> version;
+
+    bool present = true;
+    bool connectable = true;
+    bool nameInInquiry = true; ///< whether the name comes with the first DeviceFound
+    bool lowEnergy = false;
+    bool broadcaster = false;
+    bool connectsBack = false; ///< opens a channel of its own while we connect audio
+    guint visibleFor = 0;      ///< vanishes so long after a discovery began; 0: never
+
+    bool legacy = false;
+    bool displaysPin = false; ///< a legacy keyboard: we choose the PIN and show it
+    Capability capability = Capability::DisplayYesNo;
+    PairingEnd pairingEnd = PairingEnd::AsAnswered;
+    std::string pin = "0000";
+    std::optional<guint32> passkey; ///< random when not set
+    std::optional<guint> pairingTime;
+
+    // What an adapter's daemon has stored of it when it first starts.
+    bool known = false;
+    bool paired = false;
+    bool trusted = false;
+    bool blocked = false;
+    std::string alias;
+};
+
+} // namespace Bluetooth::Sim

@@ -1,0 +1,126 @@
+#include "world/scenario.h"
+
+#include "bus/glib_ptr.h"
+#include "world/address.h"
+#include "world/settings.h"
+
+#include <stdexcept>
+
+namespace Bluetooth::Sim {
+
+namespace {
+
+/// Reads one key file into a world; errors name where they were found.
+class ScenarioReader {
+public:
+    ScenarioReader(std::string file, GKeyFile* keys) : file_(std::move(file)), keys_(keys) {}
+
+    World read() {
+        const GlibPtr<char*> groups(g_key_file_get_groups(keys_, nullptr));
+        for (char** group = groups.get(); *group; ++group)
+            readGroup(*group);
+        for (const auto& peer : world_.peers) {
+            if (!peer->adapter.empty() && !world_.adapter(peer->adapter))
+                fail("Device " + peer->address, "Adapter",
+                     "there is no adapter \"" + peer->adapter + "\"");
+            for (const auto& adapter : world_.adapters)
+                World::store(*adapter, *peer);
+        }
+        return std::move(world_);
+    }
+
+private:
+    [[noreturn]] void fail(const std::string& group, const std::string& key,
+                           const std::string& what) const {
+        throw std::runtime_error(file_ + ": [" + group + "]" +
+                                 (key.empty() ? std::string() : " " + key) + ": " + what);
+    }
+
+    Settings settingsOf(const std::string& group) const {
+        Settings settings;
+        const GlibPtr<char*> names(g_key_file_get_keys(keys_, group.c_str(), nullptr, nullptr));
+        for (char** name = names.get(); *name; ++name) {
+            ErrorOut error;
+            const GlibPtr<char> value(
+                g_key_file_get_string(keys_, group.c_str(), *name, error.out()));
+            if (error)
+                fail(group, *name, error->message);
+            settings.emplace_back(*name, value.get());
+        }
+        return settings;
+    }
+
+    template <class T>
+    void apply(T& target, const std::string& group) const {
+        try {
+            applySettings(target, settingsOf(group));
+        } catch (const SettingError& wrong) {
+            fail(group, wrong.key(), wrong.what());
+        }
+    }
+
+    void readGroup(const std::string& group) {
+        if (group == "Times")
+            apply(world_.times, group);
+        else if (group.compare(0, 8, "Adapter ") == 0)
+            readAdapter(group, group.substr(8));
+        else if (group.compare(0, 7, "Device ") == 0)
+            readDevice(group, upperCase(group.substr(7)));
+        else
+            fail(group, "", "is neither [Times], [Adapter hciN] nor [Device ADDRESS]");
+    }
+
+    void readAdapter(const std::string& group, const std::string& id) {
+        guint64 index = 0;
+        if (id.compare(0, 3, "hci") != 0 ||
+            !g_ascii_string_to_unsigned(id.c_str() + 3, 10, 0, 99, &index, nullptr))
+            fail(group, "", "an adapter is named hci0 to hci99");
+        auto adapter = std::make_shared<AdapterHardware>();
+        adapter->index = static_cast<unsigned>(index);
+        adapter->name = id;
+        apply(*adapter, group);
+        if (adapter->address.empty())
+            fail(group, "Address", "is missing");
+        world_.adapters.push_back(adapter);
+    }
+
+    void readDevice(const std::string& group, const std::string& address) {
+        if (!isAddress(address))
+            fail(group, "", "a device is named by its address");
+        auto peer = std::make_shared<Peer>();
+        peer->address = address;
+        apply(*peer, group);
+        world_.peers.push_back(peer);
+    }
+
+    std::string file_;
+    GKeyFile* keys_;
+    World world_;
+};
+
+World readLoaded(const std::string& name, GKeyFile* keys, bool loaded, const ErrorOut& error) {
+    if (!loaded)
+        throw std::runtime_error(name + ": " + error->message);
+    return ScenarioReader(name, keys).read();
+}
+
+} // namespace
+
+World loadScenario(const std::string& file) {
+    const GlibPtr<GKeyFile> keys(g_key_file_new());
+    ErrorOut error;
+    const bool loaded =
+        g_key_file_load_from_file(keys.get(), file.c_str(), G_KEY_FILE_NONE, error.out()) != FALSE;
+    return readLoaded(file, keys.get(), loaded, error);
+}
+
+World loadDefaultScenario() {
+    const GlibPtr<GKeyFile> keys(g_key_file_new());
+    ErrorOut error;
+    const bool loaded =
+        g_key_file_load_from_data(keys.get(), defaultScenarioText(), static_cast<gsize>(-1),
+                                  G_KEY_FILE_NONE, error.out()) != FALSE;
+    return readLoaded("default scenario", keys.get(), loaded, error);
+}
+
+} // namespace Bluetooth::Sim

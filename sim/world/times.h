@@ -1,0 +1,50 @@
+#pragma once
+
+#include <glib.h>
+
+#include <string>
+#include <vector>
+
+namespace Bluetooth::Sim {
+
+/// How long things take, in milliseconds. All but the two last are multiplied by `scale`.
+struct Times {
+    double scale = 1.0;
+
+    guint inquiry = 10240;          ///< one round of a discovery
+    guint inquiryGap = 60;          ///< between the end of a round and Discovering=false
+    guint firstFound = 100;         ///< from the start of a round to its first device
+    guint foundInterval = 150;      ///< between the devices of a round
+    guint nameRequest = 400;        ///< to ask one device for its name after a round
+    guint connect = 600;            ///< to reach a device that answers
+    guint pageTimeout = 5120;       ///< until a device that does not answer is given up
+    guint serviceSearch = 500;      ///< to read a device's service records
+    guint reverseSearch = 2000;     ///< from a device's own connection to our search
+    guint pairing = 800;            ///< from the last answer to the end of a pairing
+    guint keyPress = 300;           ///< between two keys that are typed on a device
+    guint linkLoss = 5000;          ///< until the loss of a link is noticed
+    guint idleDisconnect = 4000;    ///< until an unused link drops
+    guint disconnectRequest = 2000; ///< from DisconnectRequested to the end of the link
+    guint audioConnect = 700;       ///< to set up an audio stream
+    guint controlConnect = 2000;    ///< from a stream to the remote control
+
+    guint pairingTimeout = 30000; ///< until a pairing whose agent does not answer is given up
+    guint agentTimeout = 60000;   ///< until any other request to an agent is given up
+
+    struct Key {
+        const char* name;
+        guint Times::*time;
+    };
+    /// The names by which scenarios and the control interface set the times.
+    static const std::vector<Key>& keys();
+
+    guint scaledSeconds(guint32 seconds) const {
+        const double milliseconds = 1000.0 * static_cast<double>(seconds) * scale;
+        return milliseconds < G_MAXUINT ? static_cast<guint>(milliseconds) : G_MAXUINT;
+    }
+    guint scaled(guint milliseconds) const {
+        return static_cast<guint>(static_cast<double>(milliseconds) * scale);
+    }
+};
+
+} // namespace Bluetooth::Sim

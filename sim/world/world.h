@@ -1,0 +1,61 @@
+#pragma once
+
+#include "world/peer.h"
+#include "world/times.h"
+
+#include <map>
+#include <memory>
+#include <optional>
+#include <string>
+#include <vector>
+
+namespace Bluetooth::Sim {
+
+/// What the daemon's storage holds of one device; it outlives the daemon.
+struct StoredDevice {
+    bool known = false; ///< it was created, and not removed since
+    bool paired = false;
+    bool trusted = false;
+    bool blocked = false;
+    std::string name;
+    std::string alias;
+    std::optional<guint32> deviceClass; ///< known once the device was seen in a discovery
+    std::vector<std::string> uuids;
+    std::optional<guint16> vendor;
+    std::optional<guint16> product;
+    std::optional<guint16> version;
+};
+
+/// One controller with the settings and devices that are stored for it.
+struct AdapterHardware {
+    unsigned index = 0;
+    std::string address;
+    std::string name;
+    guint32 deviceClass = 0x6e0100;
+    bool powered = true;
+    bool discoverable = false;
+    bool pairable = true;
+    guint32 discoverableTimeout = 180;
+    guint32 pairableTimeout = 0;
+    std::vector<std::string> uuids;
+    std::map<std::string, StoredDevice> storage; ///< by address
+
+    std::string id() const { return "hci" + std::to_string(index); }
+};
+
+/// Everything that exists apart from the daemon: controllers, devices in the air, and how long
+/// things take. A daemon that restarts finds it as it was.
+struct World {
+    Times times;
+    std::vector<std::shared_ptr<AdapterHardware>> adapters;
+    std::vector<std::shared_ptr<Peer>> peers;
+
+    std::shared_ptr<AdapterHardware> adapter(const std::string& id) const;
+    std::shared_ptr<Peer> peer(const std::string& address) const;
+    /// The lowest index that no adapter has.
+    unsigned freeIndex() const;
+    /// Stores what an adapter shall know of a device from the start.
+    static void store(AdapterHardware& adapter, const Peer& peer);
+};
+
+} // namespace Bluetooth::Sim
