@@ -12,7 +12,7 @@ using namespace Bluetooth::Sim;
 
 namespace {
 
-constexpr int kWrongUsage = 2;
+constexpr int wrongUsage = 2;
 
 int run(const Options& options) {
     if (options.version) {
@@ -39,7 +39,7 @@ int main(int argc, char** argv) {
         options = parseOptions(argc, argv);
     } catch (const std::exception& wrong) {
         g_printerr("bluez4-sim: %s; see bluez4-sim --help\n", wrong.what());
-        return kWrongUsage;
+        return wrongUsage;
     }
     try {
         return run(options);

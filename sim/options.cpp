@@ -8,7 +8,7 @@ namespace Bluetooth::Sim {
 
 namespace {
 
-constexpr const char* kSummary =
+constexpr const char* summary =
     "A simulated BlueZ 4 daemon: org.bluez without hardware.\n\n"
     "With COMMAND, starts a private system bus and session bus with the daemon on them, runs the\n"
     "command there and exits with its status. Without, serves on the system bus until SIGTERM.";
@@ -70,7 +70,7 @@ Options parseOptions(int argc, char** argv) {
         {nullptr, 0, 0, G_OPTION_ARG_NONE, nullptr, nullptr, nullptr}};
 
     const GlibPtr<GOptionContext> context(g_option_context_new("[-- COMMAND [ARGUMENT...]]"));
-    g_option_context_set_summary(context.get(), kSummary);
+    g_option_context_set_summary(context.get(), summary);
     g_option_context_set_strict_posix(context.get(), TRUE);
     g_option_context_add_main_entries(context.get(), entries, nullptr);
     ErrorOut error;

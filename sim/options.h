@@ -1,4 +1,5 @@
-#pragma once
+#ifndef KESBLUETOOTH_SIM_OPTIONS_H
+#define KESBLUETOOTH_SIM_OPTIONS_H
 
 #include <string>
 #include <vector>
@@ -25,3 +26,5 @@ struct Options {
 Options parseOptions(int argc, char** argv);
 
 } // namespace Bluetooth::Sim
+
+#endif

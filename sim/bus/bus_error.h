@@ -1,4 +1,5 @@
-#pragma once
+#ifndef KESBLUETOOTH_SIM_BUS_BUS_ERROR_H
+#define KESBLUETOOTH_SIM_BUS_BUS_ERROR_H
 
 #include <string>
 
@@ -56,3 +57,5 @@ inline BusError failed(const char* text) {
 
 } // namespace Errors
 } // namespace Bluetooth::Sim
+
+#endif

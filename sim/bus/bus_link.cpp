@@ -6,8 +6,8 @@ namespace Bluetooth::Sim {
 
 namespace {
 
-constexpr const char* kBus = "org.freedesktop.DBus";
-constexpr const char* kBusPath = "/org/freedesktop/DBus";
+constexpr const char* busName = "org.freedesktop.DBus";
+constexpr const char* busPath = "/org/freedesktop/DBus";
 
 [[noreturn]] void raise(const std::string& what, const ErrorOut& error) {
     throw std::runtime_error(what + ": " + error->message);
@@ -43,31 +43,31 @@ struct Delivery {
 } // namespace
 
 BusLink::BusLink(const std::string& address, CallHandler onCall)
-    : inbox_(std::make_shared<Inbox>(Inbox{this, std::move(onCall)})) {
+    : m_inbox(std::make_shared<Inbox>(Inbox{this, std::move(onCall)})) {
     ErrorOut error;
     const auto flags =
         static_cast<GDBusConnectionFlags>(G_DBUS_CONNECTION_FLAGS_AUTHENTICATION_CLIENT |
                                           G_DBUS_CONNECTION_FLAGS_MESSAGE_BUS_CONNECTION);
-    connection_ = g_dbus_connection_new_for_address_sync(address.c_str(), flags, nullptr, nullptr,
-                                                         error.out());
-    if (!connection_)
+    m_connection = g_dbus_connection_new_for_address_sync(address.c_str(), flags, nullptr, nullptr,
+                                                          error.out());
+    if (!m_connection)
         raise("cannot connect to the bus at " + address, error);
-    filter_ = g_dbus_connection_add_filter(
-        connection_, onMessage, new std::shared_ptr<Inbox>(inbox_),
+    m_filter = g_dbus_connection_add_filter(
+        m_connection, onMessage, new std::shared_ptr<Inbox>(m_inbox),
         [](gpointer data) { delete static_cast<std::shared_ptr<Inbox>*>(data); });
 }
 
 BusLink::~BusLink() {
-    inbox_->link = nullptr;
-    g_signal_handlers_disconnect_by_data(connection_, this);
-    if (clients_)
-        g_dbus_connection_signal_unsubscribe(connection_, clients_);
-    g_dbus_connection_remove_filter(connection_, filter_);
-    if (!g_dbus_connection_is_closed(connection_)) {
-        g_dbus_connection_flush_sync(connection_, nullptr, nullptr);
-        g_dbus_connection_close_sync(connection_, nullptr, nullptr);
+    m_inbox->link = nullptr;
+    g_signal_handlers_disconnect_by_data(m_connection, this);
+    if (m_clients)
+        g_dbus_connection_signal_unsubscribe(m_connection, m_clients);
+    g_dbus_connection_remove_filter(m_connection, m_filter);
+    if (!g_dbus_connection_is_closed(m_connection)) {
+        g_dbus_connection_flush_sync(m_connection, nullptr, nullptr);
+        g_dbus_connection_close_sync(m_connection, nullptr, nullptr);
     }
-    g_object_unref(connection_);
+    g_object_unref(m_connection);
 }
 
 GDBusMessage* BusLink::onMessage(GDBusConnection* connection, GDBusMessage* message,
@@ -102,9 +102,10 @@ void BusLink::own(const char* name) {
     constexpr guint32 doNotQueue = 4;
     constexpr guint32 owned = 1;
     ErrorOut error;
-    const GlibPtr<GVariant> reply(g_dbus_connection_call_sync(
-        connection_, kBus, kBusPath, kBus, "RequestName", g_variant_new("(su)", name, doNotQueue),
-        G_VARIANT_TYPE("(u)"), G_DBUS_CALL_FLAGS_NONE, -1, nullptr, error.out()));
+    const GlibPtr<GVariant> reply(
+        g_dbus_connection_call_sync(m_connection, busName, busPath, busName, "RequestName",
+                                    g_variant_new("(su)", name, doNotQueue), G_VARIANT_TYPE("(u)"),
+                                    G_DBUS_CALL_FLAGS_NONE, -1, nullptr, error.out()));
     if (!reply)
         raise(std::string("cannot own ") + name, error);
     guint32 result = 0;
@@ -115,26 +116,27 @@ void BusLink::own(const char* name) {
 }
 
 void BusLink::watchClients(ClientGone onGone) {
-    clientGone_ = std::move(onGone);
-    clients_ = g_dbus_connection_signal_subscribe(
-        connection_, kBus, kBus, "NameOwnerChanged", kBusPath, nullptr, G_DBUS_SIGNAL_FLAGS_NONE,
+    m_clientGone = std::move(onGone);
+    m_clients = g_dbus_connection_signal_subscribe(
+        m_connection, busName, busName, "NameOwnerChanged", busPath, nullptr,
+        G_DBUS_SIGNAL_FLAGS_NONE,
         [](GDBusConnection*, const gchar*, const gchar*, const gchar*, const gchar*,
            GVariant* arguments, gpointer data) {
             const char* name = nullptr;
             const char* newOwner = nullptr;
             g_variant_get(arguments, "(&s&s&s)", &name, nullptr, &newOwner);
             if (*name == ':' && !*newOwner)
-                static_cast<BusLink*>(data)->clientGone_(name);
+                static_cast<BusLink*>(data)->m_clientGone(name);
         },
         this, nullptr);
 }
 
 void BusLink::watchBus(std::function<void()> onEnd) {
-    busEnded_ = std::move(onEnd);
+    m_busEnded = std::move(onEnd);
     const auto closed = +[](GDBusConnection*, gboolean, GError*, gpointer data) {
-        static_cast<BusLink*>(data)->busEnded_();
+        static_cast<BusLink*>(data)->m_busEnded();
     };
-    g_signal_connect(connection_, "closed", G_CALLBACK(closed), this);
+    g_signal_connect(m_connection, "closed", G_CALLBACK(closed), this);
 }
 
 void BusLink::emit(const std::string& path, const std::string& interface, const std::string& member,
@@ -143,7 +145,7 @@ void BusLink::emit(const std::string& path, const std::string& interface, const 
         g_dbus_message_new_signal(path.c_str(), interface.c_str(), member.c_str());
     if (arguments)
         g_dbus_message_set_body(message, arguments.get());
-    g_dbus_connection_send_message(connection_, message, G_DBUS_SEND_MESSAGE_FLAGS_NONE, nullptr,
+    g_dbus_connection_send_message(m_connection, message, G_DBUS_SEND_MESSAGE_FLAGS_NONE, nullptr,
                                    nullptr);
     g_object_unref(message);
 }
@@ -161,7 +163,7 @@ void BusLink::call(const std::string& destination, const std::string& path,
         else if (!g_error_matches(error.get(), G_IO_ERROR, G_IO_ERROR_CANCELLED))
             (*handler)({{}, fromGlib(error.get()), true});
     };
-    g_dbus_connection_call(connection_, destination.c_str(), path.c_str(), interface.c_str(),
+    g_dbus_connection_call(m_connection, destination.c_str(), path.c_str(), interface.c_str(),
                            member.c_str(), arguments.get(), nullptr,
                            G_DBUS_CALL_FLAGS_NO_AUTO_START, timeout, cancellable, finished,
                            new AnswerHandler(std::move(answered)));
@@ -170,13 +172,13 @@ void BusLink::call(const std::string& destination, const std::string& path,
 void BusLink::send(const std::string& destination, const std::string& path,
                    const std::string& interface, const std::string& member,
                    const Value& arguments) {
-    g_dbus_connection_call(connection_, destination.c_str(), path.c_str(), interface.c_str(),
+    g_dbus_connection_call(m_connection, destination.c_str(), path.c_str(), interface.c_str(),
                            member.c_str(), arguments.get(), nullptr,
                            G_DBUS_CALL_FLAGS_NO_AUTO_START, -1, nullptr, nullptr, nullptr);
 }
 
 void BusLink::afterRoundTrip(std::function<void()> next) {
-    call(kBus, kBusPath, kBus, "GetId", {}, -1, nullptr,
+    call(busName, busPath, busName, "GetId", {}, -1, nullptr,
          [next = std::move(next)](const Answer&) { next(); });
 }
 

@@ -1,4 +1,5 @@
-#pragma once
+#ifndef KESBLUETOOTH_SIM_BUS_BUS_LINK_H
+#define KESBLUETOOTH_SIM_BUS_BUS_LINK_H
 
 #include "bus/call.h"
 
@@ -61,12 +62,14 @@ private:
                                    gboolean incoming, gpointer data);
     static gboolean deliver(gpointer data);
 
-    std::shared_ptr<Inbox> inbox_;
-    GDBusConnection* connection_ = nullptr;
-    guint filter_ = 0;
-    guint clients_ = 0;
-    ClientGone clientGone_;
-    std::function<void()> busEnded_;
+    std::shared_ptr<Inbox> m_inbox;
+    GDBusConnection* m_connection = nullptr;
+    guint m_filter = 0;
+    guint m_clients = 0;
+    ClientGone m_clientGone;
+    std::function<void()> m_busEnded;
 };
 
 } // namespace Bluetooth::Sim
+
+#endif

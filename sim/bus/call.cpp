@@ -11,36 +11,36 @@ std::string orEmpty(const char* text) {
 } // namespace
 
 Call::Call(GDBusConnection* connection, GDBusMessage* message)
-    : connection_(G_DBUS_CONNECTION(g_object_ref(connection))),
-      message_(G_DBUS_MESSAGE(g_object_ref(message))) {}
+    : m_connection(G_DBUS_CONNECTION(g_object_ref(connection))),
+      m_message(G_DBUS_MESSAGE(g_object_ref(message))) {}
 
 Call::~Call() {
-    g_object_unref(message_);
-    g_object_unref(connection_);
+    g_object_unref(m_message);
+    g_object_unref(m_connection);
 }
 
 std::string Call::sender() const {
-    return orEmpty(g_dbus_message_get_sender(message_));
+    return orEmpty(g_dbus_message_get_sender(m_message));
 }
 
 std::string Call::path() const {
-    return orEmpty(g_dbus_message_get_path(message_));
+    return orEmpty(g_dbus_message_get_path(m_message));
 }
 
 std::string Call::interface() const {
-    return orEmpty(g_dbus_message_get_interface(message_));
+    return orEmpty(g_dbus_message_get_interface(m_message));
 }
 
 std::string Call::member() const {
-    return orEmpty(g_dbus_message_get_member(message_));
+    return orEmpty(g_dbus_message_get_member(m_message));
 }
 
 std::string Call::signature() const {
-    return orEmpty(g_dbus_message_get_signature(message_));
+    return orEmpty(g_dbus_message_get_signature(m_message));
 }
 
 Value Call::arguments() const {
-    GVariant* body = g_dbus_message_get_body(message_);
+    GVariant* body = g_dbus_message_get_body(m_message);
     return body ? Value(body) : Value(g_variant_new_tuple(nullptr, 0));
 }
 
@@ -61,25 +61,26 @@ Value Call::content(gsize index) const {
 }
 
 bool Call::expectsReply() const {
-    return (g_dbus_message_get_flags(message_) & G_DBUS_MESSAGE_FLAGS_NO_REPLY_EXPECTED) == 0;
+    return (g_dbus_message_get_flags(m_message) & G_DBUS_MESSAGE_FLAGS_NO_REPLY_EXPECTED) == 0;
 }
 
 void Call::reply(const Value& results) {
-    GDBusMessage* reply = g_dbus_message_new_method_reply(message_);
+    GDBusMessage* reply = g_dbus_message_new_method_reply(m_message);
     if (results)
         g_dbus_message_set_body(reply, results.get());
     send(reply);
 }
 
 void Call::fail(const BusError& error) {
-    send(g_dbus_message_new_method_error_literal(message_, error.name.c_str(), error.text.c_str()));
+    send(
+        g_dbus_message_new_method_error_literal(m_message, error.name.c_str(), error.text.c_str()));
 }
 
 void Call::send(GDBusMessage* reply) {
-    if (!answered_ && expectsReply())
-        g_dbus_connection_send_message(connection_, reply, G_DBUS_SEND_MESSAGE_FLAGS_NONE, nullptr,
+    if (!m_answered && expectsReply())
+        g_dbus_connection_send_message(m_connection, reply, G_DBUS_SEND_MESSAGE_FLAGS_NONE, nullptr,
                                        nullptr);
-    answered_ = true;
+    m_answered = true;
     g_object_unref(reply);
 }
 

@@ -1,4 +1,5 @@
-#pragma once
+#ifndef KESBLUETOOTH_SIM_BUS_CALL_H
+#define KESBLUETOOTH_SIM_BUS_CALL_H
 
 #include "bus/bus_error.h"
 #include "bus/glib_ptr.h"
@@ -41,11 +42,13 @@ public:
 private:
     void send(GDBusMessage* reply);
 
-    GDBusConnection* connection_;
-    GDBusMessage* message_;
-    bool answered_ = false;
+    GDBusConnection* m_connection;
+    GDBusMessage* m_message;
+    bool m_answered = false;
 };
 
 using CallPtr = std::shared_ptr<Call>;
 
 } // namespace Bluetooth::Sim
+
+#endif

@@ -1,4 +1,5 @@
-#pragma once
+#ifndef KESBLUETOOTH_SIM_BUS_DICT_H
+#define KESBLUETOOTH_SIM_BUS_DICT_H
 
 #include "bus/glib_ptr.h"
 
@@ -10,19 +11,19 @@ namespace Bluetooth::Sim {
 /// Builds an a{sv} whose entries keep their order.
 class Dict {
 public:
-    Dict() { g_variant_builder_init(&builder_, G_VARIANT_TYPE("a{sv}")); }
+    Dict() { g_variant_builder_init(&m_builder, G_VARIANT_TYPE("a{sv}")); }
     Dict(const Dict&) = delete;
     Dict& operator=(const Dict&) = delete;
-    ~Dict() { g_variant_builder_clear(&builder_); }
+    ~Dict() { g_variant_builder_clear(&m_builder); }
 
     Dict& add(const char* name, const Value& value) {
-        g_variant_builder_add(&builder_, "{sv}", name, value.get());
+        g_variant_builder_add(&m_builder, "{sv}", name, value.get());
         return *this;
     }
-    Value end() { return g_variant_builder_end(&builder_); }
+    Value end() { return g_variant_builder_end(&m_builder); }
 
 private:
-    GVariantBuilder builder_;
+    GVariantBuilder m_builder;
 };
 
 /// An array of texts or object paths, typed also when it is empty.
@@ -46,3 +47,5 @@ inline Value tuple(const Value& only) {
 }
 
 } // namespace Bluetooth::Sim
+
+#endif

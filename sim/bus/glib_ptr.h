@@ -1,4 +1,5 @@
-#pragma once
+#ifndef KESBLUETOOTH_SIM_BUS_GLIB_PTR_H
+#define KESBLUETOOTH_SIM_BUS_GLIB_PTR_H
 
 #include <gio/gio.h>
 
@@ -31,23 +32,23 @@ class Value {
 public:
     Value() = default;
     // Implicit: a Value stands wherever GLib's constructors hand over a new variant.
-    Value(GVariant* variant) : variant_(variant ? g_variant_ref_sink(variant) : nullptr) {}
-    Value(const Value& other) : variant_(other ? g_variant_ref(other.get()) : nullptr) {}
+    Value(GVariant* variant) : m_variant(variant ? g_variant_ref_sink(variant) : nullptr) {}
+    Value(const Value& other) : m_variant(other ? g_variant_ref(other.get()) : nullptr) {}
     Value(Value&& other) noexcept = default;
     Value& operator=(Value other) noexcept {
-        variant_.swap(other.variant_);
+        m_variant.swap(other.m_variant);
         return *this;
     }
     ~Value() = default;
 
-    GVariant* get() const { return variant_.get(); }
-    explicit operator bool() const { return variant_ != nullptr; }
+    GVariant* get() const { return m_variant.get(); }
+    explicit operator bool() const { return m_variant != nullptr; }
     bool is(const char* type) const {
-        return variant_ && g_variant_is_of_type(variant_.get(), G_VARIANT_TYPE(type));
+        return m_variant && g_variant_is_of_type(m_variant.get(), G_VARIANT_TYPE(type));
     }
 
 private:
-    GlibPtr<GVariant> variant_;
+    GlibPtr<GVariant> m_variant;
 };
 
 inline Value textValue(const std::string& text) {
@@ -64,15 +65,17 @@ public:
     ErrorOut() = default;
     ErrorOut(const ErrorOut&) = delete;
     ErrorOut& operator=(const ErrorOut&) = delete;
-    ~ErrorOut() { g_clear_error(&error_); }
+    ~ErrorOut() { g_clear_error(&m_error); }
 
-    GError** out() { return &error_; }
-    explicit operator bool() const { return error_ != nullptr; }
-    const GError* operator->() const { return error_; }
-    const GError* get() const { return error_; }
+    GError** out() { return &m_error; }
+    explicit operator bool() const { return m_error != nullptr; }
+    const GError* operator->() const { return m_error; }
+    const GError* get() const { return m_error; }
 
 private:
-    GError* error_ = nullptr;
+    GError* m_error = nullptr;
 };
 
 } // namespace Bluetooth::Sim
+
+#endif

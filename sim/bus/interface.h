@@ -1,4 +1,5 @@
-#pragma once
+#ifndef KESBLUETOOTH_SIM_BUS_INTERFACE_H
+#define KESBLUETOOTH_SIM_BUS_INTERFACE_H
 
 #include "bus/call.h"
 
@@ -59,3 +60,5 @@ template <auto Function>
 constexpr Handler handle = &HandlerOf<Function>::run;
 
 } // namespace Bluetooth::Sim
+
+#endif

@@ -6,7 +6,7 @@ namespace Bluetooth::Sim {
 
 namespace {
 
-constexpr const char* kIntrospectable = "org.freedesktop.DBus.Introspectable";
+constexpr const char* introspectable = "org.freedesktop.DBus.Introspectable";
 
 BusError unknown(const Call& call, bool objectExists) {
     const std::string interface = call.interface().empty() ? "(null)" : call.interface();
@@ -19,16 +19,16 @@ BusError unknown(const Call& call, bool objectExists) {
 } // namespace
 
 void ObjectTree::add(const std::string& path, const Interface& interface, void* object) {
-    objects_[path].push_back({&interface, object});
+    m_objects[path].push_back({&interface, object});
 }
 
 void ObjectTree::remove(const std::string& path) {
-    objects_.erase(path);
+    m_objects.erase(path);
 }
 
 void ObjectTree::remove(const std::string& path, const Interface& interface) {
-    const auto object = objects_.find(path);
-    if (object == objects_.end())
+    const auto object = m_objects.find(path);
+    if (object == m_objects.end())
         return;
     auto& served = object->second;
     served.erase(std::remove_if(served.begin(), served.end(),
@@ -37,10 +37,10 @@ void ObjectTree::remove(const std::string& path, const Interface& interface) {
 }
 
 void ObjectTree::dispatch(const CallPtr& call) const {
-    if (call->interface() == kIntrospectable && call->member() == "Introspect")
+    if (call->interface() == introspectable && call->member() == "Introspect")
         return introspect(call);
-    const auto object = objects_.find(call->path());
-    if (object == objects_.end())
+    const auto object = m_objects.find(call->path());
+    if (object == m_objects.end())
         return call->fail(unknown(*call, false));
     for (const Served& served : object->second) {
         if (call->interface() != served.interface->name)
@@ -55,18 +55,18 @@ void ObjectTree::dispatch(const CallPtr& call) const {
 }
 
 void ObjectTree::introspect(const CallPtr& call) const {
-    const auto object = objects_.find(call->path());
+    const auto object = m_objects.find(call->path());
     const std::vector<std::string> children = childrenOf(call->path());
-    if (object == objects_.end() && children.empty())
+    if (object == m_objects.end() && children.empty())
         return call->fail(unknown(*call, false));
 
     std::string xml = "<!DOCTYPE node PUBLIC \"-//freedesktop//DTD D-BUS Object Introspection "
                       "1.0//EN\"\n\"http://www.freedesktop.org/standards/dbus/1.0/"
                       "introspect.dtd\">\n<node>\n";
-    xml += std::string("\t<interface name=\"") + kIntrospectable +
+    xml += std::string("\t<interface name=\"") + introspectable +
            "\">\n\t\t<method name=\"Introspect\">\n\t\t\t<arg name=\"xml\" type=\"s\" "
            "direction=\"out\"/>\n\t\t</method>\n\t</interface>\n";
-    if (object != objects_.end())
+    if (object != m_objects.end())
         for (const Served& served : object->second)
             xml += served.interface->introspection();
     for (const std::string& child : children)
@@ -77,7 +77,7 @@ void ObjectTree::introspect(const CallPtr& call) const {
 std::vector<std::string> ObjectTree::childrenOf(const std::string& path) const {
     const std::string prefix = path == "/" ? path : path + "/";
     std::vector<std::string> children;
-    for (const auto& [other, served] : objects_) {
+    for (const auto& [other, served] : m_objects) {
         if (other.size() <= prefix.size() || other.compare(0, prefix.size(), prefix) != 0)
             continue;
         std::string child =

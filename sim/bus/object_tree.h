@@ -1,4 +1,5 @@
-#pragma once
+#ifndef KESBLUETOOTH_SIM_BUS_OBJECT_TREE_H
+#define KESBLUETOOTH_SIM_BUS_OBJECT_TREE_H
 
 #include "bus/interface.h"
 
@@ -31,7 +32,9 @@ private:
     void introspect(const CallPtr& call) const;
     std::vector<std::string> childrenOf(const std::string& path) const;
 
-    std::map<std::string, std::vector<Served>> objects_;
+    std::map<std::string, std::vector<Served>> m_objects;
 };
 
 } // namespace Bluetooth::Sim
+
+#endif

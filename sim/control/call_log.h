@@ -1,4 +1,5 @@
-#pragma once
+#ifndef KESBLUETOOTH_SIM_CONTROL_CALL_LOG_H
+#define KESBLUETOOTH_SIM_CONTROL_CALL_LOG_H
 
 #include "bus/call.h"
 
@@ -10,17 +11,17 @@ namespace Bluetooth::Sim {
 class CallLog {
 public:
     void add(const CallPtr& call) {
-        calls_.push_back(call);
-        if (calls_.size() > kMost)
-            calls_.pop_front();
+        m_calls.push_back(call);
+        if (m_calls.size() > most)
+            m_calls.pop_front();
     }
-    void clear() { calls_.clear(); }
+    void clear() { m_calls.clear(); }
 
     /// As a(ossv): path, interface, member, and the arguments as one tuple.
     Value list() const {
         GVariantBuilder builder;
         g_variant_builder_init(&builder, G_VARIANT_TYPE("a(ossv)"));
-        for (const CallPtr& call : calls_)
+        for (const CallPtr& call : m_calls)
             g_variant_builder_add(&builder, "(ossv)", call->path().c_str(),
                                   call->interface().c_str(), call->member().c_str(),
                                   call->arguments().get());
@@ -28,8 +29,10 @@ public:
     }
 
 private:
-    static constexpr std::size_t kMost = 10000;
-    std::deque<CallPtr> calls_;
+    static constexpr std::size_t most = 10000;
+    std::deque<CallPtr> m_calls;
 };
 
 } // namespace Bluetooth::Sim
+
+#endif

@@ -16,10 +16,10 @@ namespace Bluetooth::Sim {
 
 namespace {
 
-constexpr const char* kName = "com.kestrine.bluetooth.Sim";
-constexpr const char* kPath = "/com/kestrine/bluetooth/Sim";
-constexpr const char* kBus = "org.freedesktop.DBus";
-constexpr const char* kBusPath = "/org/freedesktop/DBus";
+constexpr const char* controlName = "com.kestrine.bluetooth.Sim";
+constexpr const char* controlPath = "/com/kestrine/bluetooth/Sim";
+constexpr const char* busName = "org.freedesktop.DBus";
+constexpr const char* busPath = "/org/freedesktop/DBus";
 
 std::string asSetting(GVariant* value) {
     if (g_variant_is_of_type(value, G_VARIANT_TYPE_STRING))
@@ -57,7 +57,7 @@ Value bodyOf(const CallPtr& call, gsize index) {
 const Interface& Control::table() {
     static const Arguments device = {{"adapter", "s"}, {"address", "s"}};
     static const Interface table = {
-        kName,
+        controlName,
         {{"AddAdapter", {{"settings", "a{sv}"}}, {{"id", "s"}}, handle<&Control::addAdapter>},
          {"RemoveAdapter", {{"id", "s"}}, {}, handle<&Control::removeAdapter>},
          {"AddDevice", {{"address", "s"}, {"settings", "a{sv}"}}, {}, handle<&Control::addDevice>},
@@ -104,36 +104,36 @@ const Interface& Control::table() {
 }
 
 Control::Control(World& world, const std::string& busAddress, bool verbose)
-    : world_(world),
-      verbose_(verbose),
-      daemon_(world, busAddress, [this](const CallPtr& call) { return beforeCall(call); }),
-      faults_([this](const CallPtr& call) {
-          if (daemon_.running())
-              daemon_.dispatch(call);
+    : m_world(world),
+      m_verbose(verbose),
+      m_daemon(world, busAddress, [this](const CallPtr& call) { return beforeCall(call); }),
+      m_faults([this](const CallPtr& call) {
+          if (m_daemon.running())
+              m_daemon.dispatch(call);
       }),
-      bus_(busAddress, [this](const CallPtr& call) { received(call); }) {
-    objects_.add(kPath, table(), this);
-    bus_.own(kName);
+      m_bus(busAddress, [this](const CallPtr& call) { received(call); }) {
+    m_objects.add(controlPath, table(), this);
+    m_bus.own(controlName);
 }
 
 Control::~Control() = default;
 
 bool Control::beforeCall(const CallPtr& call) {
-    if (verbose_)
+    if (m_verbose)
         g_printerr("%s %s.%s%s\n", call->path().c_str(), call->interface().c_str(),
                    call->member().c_str(),
                    GlibPtr<char>(g_variant_print(call->arguments().get(), FALSE)).get());
-    calls_.add(call);
-    bus_.emit(kPath, kName, "CallReceived",
-              g_variant_new("(osss)", call->path().c_str(), call->interface().c_str(),
-                            call->member().c_str(), call->sender().c_str()));
-    return faults_.take(call);
+    m_calls.add(call);
+    m_bus.emit(controlPath, controlName, "CallReceived",
+               g_variant_new("(osss)", call->path().c_str(), call->interface().c_str(),
+                             call->member().c_str(), call->sender().c_str()));
+    return m_faults.take(call);
 }
 
 void Control::received(const CallPtr& call) {
-    const auto run = [this, call] { carryOut(call, [&] { objects_.dispatch(call); }); };
-    if (daemon_.running())
-        daemon_.bus().afterRoundTrip(run);
+    const auto run = [this, call] { carryOut(call, [&] { m_objects.dispatch(call); }); };
+    if (m_daemon.running())
+        m_daemon.bus().afterRoundTrip(run);
     else
         run();
 }
@@ -142,25 +142,25 @@ void Control::carryOut(const CallPtr& call, const std::function<void()>& what) {
     try {
         what();
     } catch (const std::exception& wrong) {
-        call->fail({std::string(kName) + ".Error.Failed", wrong.what()});
+        call->fail({std::string(controlName) + ".Error.Failed", wrong.what()});
     }
 }
 
 void Control::done(const CallPtr& call, const Value& results) {
-    if (!call->expectsReply() || !daemon_.running())
+    if (!call->expectsReply() || !m_daemon.running())
         return call->reply(results);
-    daemon_.bus().afterRoundTrip([call, results] { call->reply(results); });
+    m_daemon.bus().afterRoundTrip([call, results] { call->reply(results); });
 }
 
 Adapter& Control::adapter(const std::string& id) {
-    Adapter* found = daemon_.find(id);
+    Adapter* found = m_daemon.find(id);
     if (!found)
         throw std::runtime_error("there is no adapter \"" + id + "\"");
     return *found;
 }
 
 std::shared_ptr<Peer> Control::peer(const std::string& address) {
-    auto found = world_.peer(upperCase(address));
+    auto found = m_world.peer(upperCase(address));
     if (!found)
         throw std::runtime_error("there is no device \"" + address + "\"");
     return found;
@@ -174,32 +174,32 @@ std::shared_ptr<Device> Control::device(const CallPtr& call) {
 }
 
 void Control::peerChanged(const std::shared_ptr<Peer>& peer) {
-    for (const auto& adapter : daemon_.adapters())
+    for (const auto& adapter : m_daemon.adapters())
         adapter->discovery().peerChanged(peer);
 }
 
 void Control::addAdapter(const CallPtr& call) {
     auto hardware = std::make_shared<AdapterHardware>();
-    hardware->index = world_.freeIndex();
+    hardware->index = m_world.freeIndex();
     hardware->name = hardware->id();
     const GlibPtr<char> address(g_strdup_printf("00:1A:7D:DA:72:%02X", hardware->index));
     hardware->address = address.get();
     applySettings(*hardware, settingsOf(call, 0));
-    for (const auto& peer : world_.peers)
+    for (const auto& peer : m_world.peers)
         World::store(*hardware, *peer);
-    world_.adapters.push_back(hardware);
-    if (daemon_.running())
-        daemon_.plugIn(hardware);
+    m_world.adapters.push_back(hardware);
+    if (m_daemon.running())
+        m_daemon.plugIn(hardware);
     done(call, tuple(textValue(hardware->id())));
 }
 
 void Control::removeAdapter(const CallPtr& call) {
-    const auto hardware = world_.adapter(call->text(0));
+    const auto hardware = m_world.adapter(call->text(0));
     if (!hardware)
         throw std::runtime_error("there is no adapter \"" + call->text(0) + "\"");
-    if (Adapter* plugged = daemon_.find(hardware->id()))
-        daemon_.pullOut(*plugged);
-    auto& all = world_.adapters;
+    if (Adapter* plugged = m_daemon.find(hardware->id()))
+        m_daemon.pullOut(*plugged);
+    auto& all = m_world.adapters;
     all.erase(std::find(all.begin(), all.end(), hardware));
     done(call);
 }
@@ -208,12 +208,12 @@ void Control::addDevice(const CallPtr& call) {
     const std::string address = upperCase(call->text(0));
     if (!isAddress(address))
         throw std::runtime_error("\"" + address + "\" is not an address");
-    if (world_.peer(address))
+    if (m_world.peer(address))
         throw std::runtime_error("there is a device " + address + " already");
     auto peer = std::make_shared<Peer>();
     peer->address = address;
     applySettings(*peer, settingsOf(call, 1));
-    world_.peers.push_back(peer);
+    m_world.peers.push_back(peer);
     peerChanged(peer);
     done(call);
 }
@@ -229,7 +229,7 @@ void Control::setDevice(const CallPtr& call) {
 
 void Control::removeDevice(const CallPtr& call) {
     const auto gone = peer(call->text(0));
-    auto& all = world_.peers;
+    auto& all = m_world.peers;
     all.erase(std::find(all.begin(), all.end(), gone));
     done(call);
 }
@@ -280,9 +280,9 @@ void Control::emitSignal(const CallPtr& call) {
     const std::string member = call->text(2);
     if (!g_dbus_is_interface_name(interface.c_str()) || !g_dbus_is_member_name(member.c_str()))
         throw std::runtime_error("\"" + interface + "." + member + "\" cannot name a signal");
-    if (!daemon_.running())
+    if (!m_daemon.running())
         throw std::runtime_error("the daemon is not on the bus");
-    daemon_.bus().emit(call->text(0), interface, member, bodyOf(call, 3));
+    m_daemon.bus().emit(call->text(0), interface, member, bodyOf(call, 3));
     done(call);
 }
 
@@ -295,9 +295,9 @@ void Control::callAgent(const CallPtr& call) {
     const std::string member = call->text(2);
     if (!g_dbus_is_interface_name(interface.c_str()) || !g_dbus_is_member_name(member.c_str()))
         throw std::runtime_error("\"" + interface + "." + member + "\" cannot name a method");
-    daemon_.bus().call(
+    m_daemon.bus().call(
         agent->owner(), agent->path(), interface, member, bodyOf(call, 3),
-        static_cast<int>(world_.times.agentTimeout), nullptr, [call](const Answer& answer) {
+        static_cast<int>(m_world.times.agentTimeout), nullptr, [call](const Answer& answer) {
             const Value none = g_variant_new_tuple(nullptr, 0);
             call->reply(g_variant_new("(ssv)", answer.error.name.c_str(), answer.error.text.c_str(),
                                       answer.failed ? none.get() : answer.results.get()));
@@ -308,26 +308,26 @@ void Control::failNext(const CallPtr& call) {
     const BusError error = {call->text(2), call->text(3)};
     if (!g_dbus_is_interface_name(error.name.c_str()))
         throw std::runtime_error("\"" + error.name + "\" is not an error name");
-    faults_.failNext(call->text(0), call->text(1), error);
+    m_faults.failNext(call->text(0), call->text(1), error);
     done(call);
 }
 
 void Control::delayNext(const CallPtr& call) {
-    faults_.delayNext(call->text(0), call->text(1), call->number(2));
+    m_faults.delayNext(call->text(0), call->text(1), call->number(2));
     done(call);
 }
 
 void Control::clearFaults(const CallPtr& call) {
-    faults_.clear();
+    m_faults.clear();
     done(call);
 }
 
 void Control::getCalls(const CallPtr& call) {
-    done(call, tuple(calls_.list()));
+    done(call, tuple(m_calls.list()));
 }
 
 void Control::clearCalls(const CallPtr& call) {
-    calls_.clear();
+    m_calls.clear();
     done(call);
 }
 
@@ -336,48 +336,48 @@ void Control::setTimeScale(const CallPtr& call) {
     g_variant_get(call->arguments().get(), "(d)", &scale);
     if (!(scale >= 0 && scale <= 1000))
         throw std::runtime_error("a time scale is from 0 to 1000");
-    world_.times.scale = scale;
+    m_world.times.scale = scale;
     done(call);
 }
 
 void Control::setTimes(const CallPtr& call) {
-    Times copy = world_.times;
+    Times copy = m_world.times;
     applySettings(copy, settingsOf(call, 0));
-    world_.times = copy;
+    m_world.times = copy;
     done(call);
 }
 
 /// The bus learns of a closed connection in its own time: what follows comes after that.
 void Control::whenGone(std::function<void()> next) {
-    bus_.call(kBus, kBusPath, kBus, "NameHasOwner", tuple(textValue("org.bluez")), -1, nullptr,
-              [this, next = std::move(next)](const Answer& answer) {
-                  gboolean owned = FALSE;
-                  if (!answer.failed)
-                      g_variant_get(answer.results.get(), "(b)", &owned);
-                  if (owned)
-                      whenGone(next);
-                  else
-                      next();
-              });
+    m_bus.call(busName, busPath, busName, "NameHasOwner", tuple(textValue("org.bluez")), -1,
+               nullptr, [this, next = std::move(next)](const Answer& answer) {
+                   gboolean owned = FALSE;
+                   if (!answer.failed)
+                       g_variant_get(answer.results.get(), "(b)", &owned);
+                   if (owned)
+                       whenGone(next);
+                   else
+                       next();
+               });
 }
 
 void Control::dropName(const CallPtr& call) {
-    daemon_.vanish();
+    m_daemon.vanish();
     whenGone([call] { call->reply(); });
 }
 
 void Control::regainName(const CallPtr& call) {
-    if (!daemon_.running())
-        daemon_.start(daemon_.pid());
+    if (!m_daemon.running())
+        m_daemon.start(m_daemon.pid());
     done(call);
 }
 
 void Control::restart(const CallPtr& call) {
-    const int pid = daemon_.pid() + 1;
-    daemon_.stop();
+    const int pid = m_daemon.pid() + 1;
+    m_daemon.stop();
     whenGone([this, call, pid] {
         carryOut(call, [&] {
-            daemon_.start(pid);
+            m_daemon.start(pid);
             done(call, tuple(g_variant_new_uint32(static_cast<guint32>(pid))));
         });
     });
@@ -385,7 +385,7 @@ void Control::restart(const CallPtr& call) {
 
 void Control::quit(const CallPtr& call) {
     call->reply();
-    quit_();
+    m_quit();
 }
 
 } // namespace Bluetooth::Sim

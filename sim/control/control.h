@@ -1,4 +1,5 @@
-#pragma once
+#ifndef KESBLUETOOTH_SIM_CONTROL_CONTROL_H
+#define KESBLUETOOTH_SIM_CONTROL_CONTROL_H
 
 #include "bus/bus_link.h"
 #include "bus/object_tree.h"
@@ -28,8 +29,8 @@ public:
     Control& operator=(const Control&) = delete;
     ~Control();
 
-    Daemon& daemon() { return daemon_; }
-    void watchQuit(std::function<void()> onQuit) { quit_ = std::move(onQuit); }
+    Daemon& daemon() { return m_daemon; }
+    void watchQuit(std::function<void()> onQuit) { m_quit = std::move(onQuit); }
 
 private:
     static const Interface& table();
@@ -70,14 +71,16 @@ private:
     std::shared_ptr<Peer> peer(const std::string& address);
     void peerChanged(const std::shared_ptr<Peer>& peer);
 
-    World& world_;
-    bool verbose_;
-    Daemon daemon_;
-    Faults faults_;
-    CallLog calls_;
-    std::function<void()> quit_;
-    ObjectTree objects_;
-    BusLink bus_;
+    World& m_world;
+    bool m_verbose;
+    Daemon m_daemon;
+    Faults m_faults;
+    CallLog m_calls;
+    std::function<void()> m_quit;
+    ObjectTree m_objects;
+    BusLink m_bus;
 };
 
 } // namespace Bluetooth::Sim
+
+#endif

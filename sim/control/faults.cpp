@@ -5,37 +5,37 @@
 namespace Bluetooth::Sim {
 
 void Faults::failNext(const std::string& interface, const std::string& member, BusError error) {
-    faults_.push_back({interface, member, std::move(error), 0});
+    m_faults.push_back({interface, member, std::move(error), 0});
 }
 
 void Faults::delayNext(const std::string& interface, const std::string& member,
                        guint milliseconds) {
-    faults_.push_back({interface, member, {}, milliseconds});
+    m_faults.push_back({interface, member, {}, milliseconds});
 }
 
 void Faults::clear() {
-    faults_.clear();
+    m_faults.clear();
 }
 
 bool Faults::take(const CallPtr& call) {
-    const auto found = std::find_if(faults_.begin(), faults_.end(), [&](const Fault& fault) {
+    const auto found = std::find_if(m_faults.begin(), m_faults.end(), [&](const Fault& fault) {
         return fault.interface == call->interface() && fault.member == call->member();
     });
-    if (found == faults_.end())
+    if (found == m_faults.end())
         return false;
     const Fault fault = *found;
-    faults_.erase(found);
+    m_faults.erase(found);
     if (!fault.error.name.empty()) {
         call->fail(fault.error);
         return true;
     }
-    waiting_.emplace_back();
-    const auto entry = std::prev(waiting_.end());
+    m_waiting.emplace_back();
+    const auto entry = std::prev(m_waiting.end());
     entry->call = call;
     entry->timer.start(fault.delay, [this, entry] {
         const CallPtr delayed = entry->call;
-        waiting_.erase(entry);
-        dispatch_(delayed);
+        m_waiting.erase(entry);
+        m_dispatch(delayed);
     });
     return true;
 }

@@ -1,4 +1,5 @@
-#pragma once
+#ifndef KESBLUETOOTH_SIM_CONTROL_FAULTS_H
+#define KESBLUETOOTH_SIM_CONTROL_FAULTS_H
 
 #include "bus/call.h"
 #include "world/timer.h"
@@ -15,7 +16,7 @@ class Faults {
 public:
     using Dispatch = std::function<void(const CallPtr&)>;
 
-    explicit Faults(Dispatch dispatch) : dispatch_(std::move(dispatch)) {}
+    explicit Faults(Dispatch dispatch) : m_dispatch(std::move(dispatch)) {}
 
     void failNext(const std::string& interface, const std::string& member, BusError error);
     void delayNext(const std::string& interface, const std::string& member, guint milliseconds);
@@ -36,9 +37,11 @@ private:
         Timer timer;
     };
 
-    Dispatch dispatch_;
-    std::vector<Fault> faults_;
-    std::list<Waiting> waiting_;
+    Dispatch m_dispatch;
+    std::vector<Fault> m_faults;
+    std::list<Waiting> m_waiting;
 };
 
 } // namespace Bluetooth::Sim
+
+#endif

@@ -14,13 +14,13 @@ namespace Bluetooth::Sim {
 
 namespace {
 
-constexpr std::size_t kLongestName = 248;
+constexpr std::size_t longestName = 248;
 
 /// Cuts a name to what a controller stores, between two characters.
 std::string cut(const std::string& name) {
-    if (name.size() <= kLongestName)
+    if (name.size() <= longestName)
         return name;
-    const char* end = name.c_str() + kLongestName;
+    const char* end = name.c_str() + longestName;
     const gchar* valid = nullptr;
     g_utf8_validate(name.c_str(), end - name.c_str(), &valid);
     return {name.c_str(), valid};
@@ -63,46 +63,46 @@ const Interface& Adapter::table() {
 }
 
 Adapter::Adapter(Daemon& daemon, std::shared_ptr<AdapterHardware> hardware)
-    : daemon_(daemon),
-      hardware_(std::move(hardware)),
-      path_(daemon.basePath() + "/" + hardware_->id()),
-      mode_(*this),
-      discovery_(*this) {
-    daemon_.objects().add(path_, table(), this);
-    for (auto& [address, stored] : hardware_->storage) {
+    : m_daemon(daemon),
+      m_hardware(std::move(hardware)),
+      m_path(daemon.basePath() + "/" + m_hardware->id()),
+      m_mode(*this),
+      m_discovery(*this) {
+    m_daemon.objects().add(m_path, table(), this);
+    for (auto& [address, stored] : m_hardware->storage) {
         if (!stored.known)
             continue;
-        devices_.push_back(std::make_shared<Device>(*this, address));
-        devices_.back()->setTemporary(false);
+        m_devices.push_back(std::make_shared<Device>(*this, address));
+        m_devices.back()->setTemporary(false);
     }
 }
 
 Adapter::~Adapter() {
-    devices_.clear();
-    daemon_.objects().remove(path_);
+    m_devices.clear();
+    m_daemon.objects().remove(m_path);
 }
 
 void Adapter::announce() {
-    for (const auto& device : devices_)
+    for (const auto& device : m_devices)
         if (device->stored().paired)
             device->changed("Paired", boolValue(true));
 }
 
 void Adapter::comeUp() {
-    mode_.comeUp();
+    m_mode.comeUp();
 }
 
 void Adapter::goDown() {
-    mode_.goDown();
+    m_mode.goDown();
     releaseAgents();
-    agent_.reset();
-    for (const auto& device : devices_)
+    m_agent.reset();
+    for (const auto& device : m_devices)
         device->retire();
-    daemon_.objects().remove(path_);
+    m_daemon.objects().remove(m_path);
 }
 
 void Adapter::loseDevices() {
-    const auto devices = devices_;
+    const auto devices = m_devices;
     for (const auto& device : devices) {
         if (device->pairing())
             device->pairing()->powerLost();
@@ -113,59 +113,59 @@ void Adapter::loseDevices() {
 }
 
 void Adapter::clientGone(const std::string& client) {
-    discovery_.clientGone(client);
-    mode_.clientGone(client);
-    const auto devices = devices_;
+    m_discovery.clientGone(client);
+    m_mode.clientGone(client);
+    const auto devices = m_devices;
     for (const auto& device : devices)
         device->clientGone(client);
-    if (agent_ && agent_->owner() == client) {
-        const auto agent = std::move(agent_);
+    if (m_agent && m_agent->owner() == client) {
+        const auto agent = std::move(m_agent);
         agent->ownerGone();
     }
 }
 
 void Adapter::releaseAgents() {
-    for (const auto& device : devices_)
+    for (const auto& device : m_devices)
         if (device->pairing())
             device->pairing()->releaseAgent();
-    if (agent_)
-        agent_->release();
+    if (m_agent)
+        m_agent->release();
 }
 
 const Agent* Adapter::currentAgent() const {
-    for (const auto& device : devices_)
+    for (const auto& device : m_devices)
         if (device->pairing() && device->pairing()->agent())
             return device->pairing()->agent();
-    return agent_.get();
+    return m_agent.get();
 }
 
 std::shared_ptr<Peer> Adapter::peerAt(const std::string& address) const {
-    auto peer = daemon_.world().peer(address);
-    if (peer && !peer->adapter.empty() && peer->adapter != hardware_->id())
+    auto peer = m_daemon.world().peer(address);
+    if (peer && !peer->adapter.empty() && peer->adapter != m_hardware->id())
         return nullptr;
     return peer;
 }
 
 std::shared_ptr<Device> Adapter::find(const std::string& address) const {
-    const auto found = std::find_if(devices_.begin(), devices_.end(), [&](const auto& device) {
+    const auto found = std::find_if(m_devices.begin(), m_devices.end(), [&](const auto& device) {
         return device->address() == address;
     });
-    return found == devices_.end() ? nullptr : *found;
+    return found == m_devices.end() ? nullptr : *found;
 }
 
 std::shared_ptr<Device> Adapter::createDevice(const std::string& address) {
     auto device = std::make_shared<Device>(*this, address);
-    devices_.push_back(device);
+    m_devices.push_back(device);
     emit("DeviceCreated", tuple(pathValue(device->path())));
     devicesChanged();
     return device;
 }
 
 void Adapter::removeDevice(const std::shared_ptr<Device>& device) {
-    const auto found = std::find(devices_.begin(), devices_.end(), device);
-    if (found == devices_.end())
+    const auto found = std::find(m_devices.begin(), m_devices.end(), device);
+    if (found == m_devices.end())
         return;
-    devices_.erase(found);
+    m_devices.erase(found);
     device->retire();
     devicesChanged();
     emit("DeviceRemoved", tuple(pathValue(device->path())));
@@ -176,11 +176,11 @@ void Adapter::removeDevice(const std::shared_ptr<Device>& device) {
     stored.trusted = false;
     stored.blocked = false;
     stored.uuids.clear();
-    daemon_.bury(device);
+    m_daemon.bury(device);
 }
 
 void Adapter::emit(const char* member, const Value& arguments) {
-    daemon_.bus().emit(path_, table().name, member, arguments);
+    m_daemon.bus().emit(m_path, table().name, member, arguments);
 }
 
 void Adapter::changed(const char* property, const Value& value) {
@@ -188,7 +188,7 @@ void Adapter::changed(const char* property, const Value& value) {
 }
 
 void Adapter::uuidsChanged() {
-    changed("UUIDs", listValue("s", hardware_->uuids));
+    changed("UUIDs", listValue("s", m_hardware->uuids));
 }
 
 void Adapter::devicesChanged() {
@@ -197,24 +197,24 @@ void Adapter::devicesChanged() {
 
 Value Adapter::devicePaths() const {
     std::vector<std::string> paths;
-    for (const auto& device : devices_)
+    for (const auto& device : m_devices)
         paths.push_back(device->path());
     return listValue("o", paths);
 }
 
 void Adapter::getProperties(const CallPtr& call) {
     Dict properties;
-    properties.add("Address", textValue(hardware_->address))
-        .add("Name", textValue(hardware_->name))
-        .add("Class", g_variant_new_uint32(mode_.deviceClass()))
-        .add("Powered", boolValue(mode_.powered()))
-        .add("Discoverable", boolValue(mode_.discoverable()))
-        .add("Pairable", boolValue(mode_.pairable()))
-        .add("DiscoverableTimeout", g_variant_new_uint32(hardware_->discoverableTimeout))
-        .add("PairableTimeout", g_variant_new_uint32(hardware_->pairableTimeout))
-        .add("Discovering", boolValue(discovery_.active()))
+    properties.add("Address", textValue(m_hardware->address))
+        .add("Name", textValue(m_hardware->name))
+        .add("Class", g_variant_new_uint32(m_mode.deviceClass()))
+        .add("Powered", boolValue(m_mode.powered()))
+        .add("Discoverable", boolValue(m_mode.discoverable()))
+        .add("Pairable", boolValue(m_mode.pairable()))
+        .add("DiscoverableTimeout", g_variant_new_uint32(m_hardware->discoverableTimeout))
+        .add("PairableTimeout", g_variant_new_uint32(m_hardware->pairableTimeout))
+        .add("Discovering", boolValue(m_discovery.active()))
         .add("Devices", devicePaths())
-        .add("UUIDs", listValue("s", hardware_->uuids));
+        .add("UUIDs", listValue("s", m_hardware->uuids));
     call->reply(tuple(properties.end()));
 }
 
@@ -224,45 +224,45 @@ void Adapter::setProperty(const CallPtr& call) {
     if (name == "Name" && value.is("s"))
         return setName(call, value);
     if (name == "Powered" && value.is("b"))
-        return mode_.setPowered(call, value);
+        return m_mode.setPowered(call, value);
     if (name == "Discoverable" && value.is("b"))
-        return mode_.setDiscoverable(call, value);
+        return m_mode.setDiscoverable(call, value);
     if (name == "Pairable" && value.is("b"))
-        return mode_.setPairable(call, value);
+        return m_mode.setPairable(call, value);
     if (name == "DiscoverableTimeout" && value.is("u"))
-        return mode_.setDiscoverableTimeout(call, value);
+        return m_mode.setDiscoverableTimeout(call, value);
     if (name == "PairableTimeout" && value.is("u"))
-        return mode_.setPairableTimeout(call, value);
+        return m_mode.setPairableTimeout(call, value);
     call->fail(Errors::invalidArguments());
 }
 
 void Adapter::setName(const CallPtr& call, const Value& value) {
     const std::string name = cut(g_variant_get_string(value.get(), nullptr));
     call->reply();
-    if (name == hardware_->name)
+    if (name == m_hardware->name)
         return;
-    hardware_->name = name;
+    m_hardware->name = name;
     changed("Name", textValue(name));
 }
 
 void Adapter::requestSession(const CallPtr& call) {
-    mode_.requestSession(call);
+    m_mode.requestSession(call);
 }
 
 void Adapter::releaseSession(const CallPtr& call) {
-    mode_.releaseSession(call);
+    m_mode.releaseSession(call);
 }
 
 void Adapter::startDiscovery(const CallPtr& call) {
-    if (!mode_.powered())
+    if (!m_mode.powered())
         return call->fail(Errors::notReady());
-    discovery_.startSession(call);
+    m_discovery.startSession(call);
 }
 
 void Adapter::stopDiscovery(const CallPtr& call) {
-    if (!mode_.powered())
+    if (!m_mode.powered())
         return call->fail(Errors::notReady());
-    discovery_.stopSession(call);
+    m_discovery.stopSession(call);
 }
 
 void Adapter::listDevices(const CallPtr& call) {
@@ -273,7 +273,7 @@ void Adapter::createDeviceCalled(const CallPtr& call) {
     const std::string address = call->text(0);
     if (!isAddress(address))
         return call->fail(Errors::invalidArguments());
-    if (!mode_.powered())
+    if (!m_mode.powered())
         return call->fail(Errors::notReady());
     if (find(upperCase(address)))
         return call->fail(Errors::alreadyExists());
@@ -284,10 +284,10 @@ void Adapter::createPairedDevice(const CallPtr& call) {
     const std::string address = call->text(0);
     if (!isAddress(address))
         return call->fail(Errors::invalidArguments());
-    if (!mode_.powered())
+    if (!m_mode.powered())
         return call->fail(Errors::notReady());
     const bool isOurAgent =
-        agent_ && agent_->owner() == call->sender() && agent_->path() == call->text(1);
+        m_agent && m_agent->owner() == call->sender() && m_agent->path() == call->text(1);
     if (isOurAgent || !parseCapability(call->text(2)))
         return call->fail(Errors::invalidArguments());
     auto device = find(upperCase(address));
@@ -319,9 +319,9 @@ void Adapter::cancelDeviceCreation(const CallPtr& call) {
 
 void Adapter::removeDeviceCalled(const CallPtr& call) {
     const std::string path = call->text(0);
-    const auto found = std::find_if(devices_.begin(), devices_.end(),
+    const auto found = std::find_if(m_devices.begin(), m_devices.end(),
                                     [&](const auto& device) { return device->path() == path; });
-    if (found == devices_.end())
+    if (found == m_devices.end())
         return call->fail(Errors::doesNotExist());
     const auto device = *found;
     if (device->temporary() || device->busy())
@@ -342,19 +342,19 @@ void Adapter::findDevice(const CallPtr& call) {
 }
 
 void Adapter::registerAgent(const CallPtr& call) {
-    if (agent_)
+    if (m_agent)
         return call->fail(Errors::alreadyExists());
     const auto capability = parseCapability(call->text(1));
     if (!capability)
         return call->fail(Errors::invalidArguments());
-    agent_ = std::make_shared<Agent>(daemon_.bus(), call->sender(), call->text(0), *capability);
+    m_agent = std::make_shared<Agent>(m_daemon.bus(), call->sender(), call->text(0), *capability);
     call->reply();
 }
 
 void Adapter::unregisterAgent(const CallPtr& call) {
-    if (!agent_ || agent_->owner() != call->sender() || agent_->path() != call->text(0))
+    if (!m_agent || m_agent->owner() != call->sender() || m_agent->path() != call->text(0))
         return call->fail(Errors::doesNotExist());
-    const auto agent = std::move(agent_);
+    const auto agent = std::move(m_agent);
     agent->release();
     call->reply();
 }

@@ -1,4 +1,5 @@
-#pragma once
+#ifndef KESBLUETOOTH_SIM_DAEMON_ADAPTER_H
+#define KESBLUETOOTH_SIM_DAEMON_ADAPTER_H
 
 #include "bus/interface.h"
 #include "daemon/adapter_mode.h"
@@ -23,14 +24,14 @@ public:
     Adapter& operator=(const Adapter&) = delete;
     ~Adapter();
 
-    Daemon& daemon() const { return daemon_; }
-    AdapterHardware& hardware() const { return *hardware_; }
-    const std::string& path() const { return path_; }
-    AdapterMode& mode() { return mode_; }
-    Discovery& discovery() { return discovery_; }
+    Daemon& daemon() const { return m_daemon; }
+    AdapterHardware& hardware() const { return *m_hardware; }
+    const std::string& path() const { return m_path; }
+    AdapterMode& mode() { return m_mode; }
+    Discovery& discovery() { return m_discovery; }
     /// The agent that RegisterAgent gave, or null.
-    Agent* agent() const { return agent_.get(); }
-    std::shared_ptr<Agent> sharedAgent() const { return agent_; }
+    Agent* agent() const { return m_agent.get(); }
+    std::shared_ptr<Agent> sharedAgent() const { return m_agent; }
     /// The agent of the pairing under way, else the registered one, or null.
     const Agent* currentAgent() const;
 
@@ -79,13 +80,15 @@ private:
     void devicesChanged();
     Value devicePaths() const;
 
-    Daemon& daemon_;
-    std::shared_ptr<AdapterHardware> hardware_;
-    std::string path_;
-    AdapterMode mode_;
-    Discovery discovery_;
-    std::shared_ptr<Agent> agent_;
-    std::vector<std::shared_ptr<Device>> devices_;
+    Daemon& m_daemon;
+    std::shared_ptr<AdapterHardware> m_hardware;
+    std::string m_path;
+    AdapterMode m_mode;
+    Discovery m_discovery;
+    std::shared_ptr<Agent> m_agent;
+    std::vector<std::shared_ptr<Device>> m_devices;
 };
 
 } // namespace Bluetooth::Sim
+
+#endif

@@ -11,7 +11,7 @@ namespace Bluetooth::Sim {
 
 namespace {
 
-constexpr guint32 kLimitedDiscoverable = 0x2000;
+constexpr guint32 limitedDiscoverable = 0x2000;
 
 guint32 number(const Value& value) {
     return g_variant_get_uint32(value.get());
@@ -23,77 +23,77 @@ bool flag(const Value& value) {
 
 } // namespace
 
-AdapterMode::AdapterMode(Adapter& adapter) : adapter_(adapter) {}
+AdapterMode::AdapterMode(Adapter& adapter) : m_adapter(adapter) {}
 
 bool AdapterMode::pairable() const {
-    return adapter_.hardware().pairable;
+    return m_adapter.hardware().pairable;
 }
 
 bool AdapterMode::limited() const {
-    return discoverable_ && adapter_.hardware().discoverableTimeout != 0;
+    return m_discoverable && m_adapter.hardware().discoverableTimeout != 0;
 }
 
 guint32 AdapterMode::deviceClass() const {
-    return adapter_.hardware().deviceClass | (limited() ? kLimitedDiscoverable : 0);
+    return m_adapter.hardware().deviceClass | (limited() ? limitedDiscoverable : 0);
 }
 
 void AdapterMode::comeUp() {
-    if (!adapter_.hardware().powered)
+    if (!m_adapter.hardware().powered)
         return;
-    powered_ = true;
-    adapter_.changed("Powered", boolValue(true));
-    adapter_.changed("Pairable", boolValue(pairable()));
-    adapter_.changed("Class", g_variant_new_uint32(deviceClass()));
-    adapter_.changed("Name", textValue(adapter_.hardware().name));
-    adapter_.changed("Pairable", boolValue(pairable()));
-    discoverable_ = adapter_.hardware().discoverable;
-    adapter_.changed("Discoverable", boolValue(discoverable_));
+    m_powered = true;
+    m_adapter.changed("Powered", boolValue(true));
+    m_adapter.changed("Pairable", boolValue(pairable()));
+    m_adapter.changed("Class", g_variant_new_uint32(deviceClass()));
+    m_adapter.changed("Name", textValue(m_adapter.hardware().name));
+    m_adapter.changed("Pairable", boolValue(pairable()));
+    m_discoverable = m_adapter.hardware().discoverable;
+    m_adapter.changed("Discoverable", boolValue(m_discoverable));
     startDiscoverableTimeout();
 }
 
 void AdapterMode::goDown() {
-    if (powered_)
+    if (m_powered)
         powerOff();
-    sessions_.clear();
+    m_sessions.clear();
 }
 
 void AdapterMode::powerOn() {
-    powered_ = true;
-    adapter_.hardware().powered = true;
-    adapter_.changed("Powered", boolValue(true));
-    adapter_.changed("Pairable", boolValue(pairable()));
+    m_powered = true;
+    m_adapter.hardware().powered = true;
+    m_adapter.changed("Powered", boolValue(true));
+    m_adapter.changed("Pairable", boolValue(pairable()));
 }
 
 void AdapterMode::powerOff() {
-    adapter_.loseDevices();
-    restoreDiscoverable_ = discoverable_;
-    discoverableTimer_.stop();
-    pairableTimer_.stop();
-    if (discoverable_) {
-        discoverable_ = false;
-        adapter_.changed("Discoverable", boolValue(false));
+    m_adapter.loseDevices();
+    m_restoreDiscoverable = m_discoverable;
+    m_discoverableTimer.stop();
+    m_pairableTimer.stop();
+    if (m_discoverable) {
+        m_discoverable = false;
+        m_adapter.changed("Discoverable", boolValue(false));
     }
     // Only the signal says so: GetProperties keeps the value that the next power-on brings back.
-    adapter_.changed("Pairable", boolValue(false));
-    adapter_.discovery().stop();
-    powered_ = false;
-    adapter_.changed("Powered", boolValue(false));
-    powerFromSession_ = false;
+    m_adapter.changed("Pairable", boolValue(false));
+    m_adapter.discovery().stop();
+    m_powered = false;
+    m_adapter.changed("Powered", boolValue(false));
+    m_powerFromSession = false;
 }
 
 void AdapterMode::setPowered(const CallPtr& call, const Value& value) {
-    if (flag(value) == powered_)
+    if (flag(value) == m_powered)
         return call->reply();
-    if (powered_) {
+    if (m_powered) {
         powerOff();
-        adapter_.hardware().powered = false;
-        sessions_.clear();
+        m_adapter.hardware().powered = false;
+        m_sessions.clear();
     } else {
         powerOn();
-        adapter_.changed("Class", g_variant_new_uint32(deviceClass()));
-        adapter_.changed("Pairable", boolValue(pairable()));
-        discoverable_ = restoreDiscoverable_;
-        adapter_.changed("Discoverable", boolValue(discoverable_));
+        m_adapter.changed("Class", g_variant_new_uint32(deviceClass()));
+        m_adapter.changed("Pairable", boolValue(pairable()));
+        m_discoverable = m_restoreDiscoverable;
+        m_adapter.changed("Discoverable", boolValue(m_discoverable));
         startDiscoverableTimeout();
     }
     call->reply();
@@ -101,14 +101,14 @@ void AdapterMode::setPowered(const CallPtr& call, const Value& value) {
 
 void AdapterMode::setDiscoverable(const CallPtr& call, const Value& value) {
     const bool wanted = flag(value);
-    if (wanted == discoverable_)
+    if (wanted == m_discoverable)
         return call->reply();
-    if (wanted && !powered_)
+    if (wanted && !m_powered)
         powerOn();
     const bool wasLimited = limited();
-    discoverable_ = wanted;
-    adapter_.hardware().discoverable = wanted;
-    adapter_.changed("Discoverable", boolValue(wanted));
+    m_discoverable = wanted;
+    m_adapter.hardware().discoverable = wanted;
+    m_adapter.changed("Discoverable", boolValue(wanted));
     startDiscoverableTimeout();
     call->reply();
     classChangedFrom(wasLimited);
@@ -117,106 +117,106 @@ void AdapterMode::setDiscoverable(const CallPtr& call, const Value& value) {
 void AdapterMode::setPairable(const CallPtr& call, const Value& value) {
     if (flag(value) == pairable())
         return call->reply();
-    adapter_.hardware().pairable = flag(value);
-    adapter_.changed("Pairable", value);
+    m_adapter.hardware().pairable = flag(value);
+    m_adapter.changed("Pairable", value);
     startPairableTimeout();
     call->reply();
 }
 
 void AdapterMode::setDiscoverableTimeout(const CallPtr& call, const Value& value) {
-    if (number(value) == adapter_.hardware().discoverableTimeout)
+    if (number(value) == m_adapter.hardware().discoverableTimeout)
         return call->reply();
     const bool wasLimited = limited();
-    adapter_.hardware().discoverableTimeout = number(value);
-    adapter_.changed("DiscoverableTimeout", value);
+    m_adapter.hardware().discoverableTimeout = number(value);
+    m_adapter.changed("DiscoverableTimeout", value);
     startDiscoverableTimeout();
     call->reply();
     classChangedFrom(wasLimited);
 }
 
 void AdapterMode::setPairableTimeout(const CallPtr& call, const Value& value) {
-    if (number(value) == adapter_.hardware().pairableTimeout)
+    if (number(value) == m_adapter.hardware().pairableTimeout)
         return call->reply();
-    adapter_.hardware().pairableTimeout = number(value);
-    adapter_.changed("PairableTimeout", value);
+    m_adapter.hardware().pairableTimeout = number(value);
+    m_adapter.changed("PairableTimeout", value);
     startPairableTimeout();
     call->reply();
 }
 
 void AdapterMode::startDiscoverableTimeout() {
-    discoverableTimer_.stop();
-    const guint32 seconds = adapter_.hardware().discoverableTimeout;
-    if (!discoverable_ || seconds == 0)
+    m_discoverableTimer.stop();
+    const guint32 seconds = m_adapter.hardware().discoverableTimeout;
+    if (!m_discoverable || seconds == 0)
         return;
-    discoverableTimer_.start(adapter_.daemon().times().scaledSeconds(seconds), [this] {
+    m_discoverableTimer.start(m_adapter.daemon().times().scaledSeconds(seconds), [this] {
         const bool wasLimited = limited();
-        discoverable_ = false;
-        adapter_.hardware().discoverable = false;
-        adapter_.changed("Discoverable", boolValue(false));
+        m_discoverable = false;
+        m_adapter.hardware().discoverable = false;
+        m_adapter.changed("Discoverable", boolValue(false));
         classChangedFrom(wasLimited);
     });
 }
 
 void AdapterMode::startPairableTimeout() {
-    pairableTimer_.stop();
-    const guint32 seconds = adapter_.hardware().pairableTimeout;
-    if (!powered_ || !pairable() || seconds == 0)
+    m_pairableTimer.stop();
+    const guint32 seconds = m_adapter.hardware().pairableTimeout;
+    if (!m_powered || !pairable() || seconds == 0)
         return;
-    pairableTimer_.start(adapter_.daemon().times().scaledSeconds(seconds), [this] {
-        adapter_.hardware().pairable = false;
-        adapter_.changed("Pairable", boolValue(false));
+    m_pairableTimer.start(m_adapter.daemon().times().scaledSeconds(seconds), [this] {
+        m_adapter.hardware().pairable = false;
+        m_adapter.changed("Pairable", boolValue(false));
     });
 }
 
 void AdapterMode::classChangedFrom(bool wasLimited) {
     if (limited() != wasLimited)
-        adapter_.changed("Class", g_variant_new_uint32(deviceClass()));
+        m_adapter.changed("Class", g_variant_new_uint32(deviceClass()));
 }
 
 void AdapterMode::requestSession(const CallPtr& call) {
-    Agent* agent = adapter_.agent();
+    Agent* agent = m_adapter.agent();
     if (!agent)
         return call->fail(Errors::agentNotAvailable());
-    if (powered_) {
-        sessions_.push_back(call->sender());
+    if (m_powered) {
+        m_sessions.push_back(call->sender());
         return call->reply();
     }
     if (agent->busy())
         return call->fail(Errors::failed("Device or resource busy"));
-    const char* mode = restoreDiscoverable_ ? "discoverable" : "connectable";
+    const char* mode = m_restoreDiscoverable ? "discoverable" : "connectable";
     agent->ask("ConfirmModeChange", tuple(textValue(mode)), "",
-               adapter_.daemon().times().agentTimeout, [this, call](const Answer& answer) {
+               m_adapter.daemon().times().agentTimeout, [this, call](const Answer& answer) {
                    if (answer.failed)
                        return call->fail(answer.error);
-                   sessions_.push_back(call->sender());
-                   powerFromSession_ = true;
+                   m_sessions.push_back(call->sender());
+                   m_powerFromSession = true;
                    const Value on = boolValue(true);
                    setPowered(call, on);
                });
 }
 
 void AdapterMode::releaseSession(const CallPtr& call) {
-    const auto session = std::find(sessions_.begin(), sessions_.end(), call->sender());
-    if (session == sessions_.end())
+    const auto session = std::find(m_sessions.begin(), m_sessions.end(), call->sender());
+    if (session == m_sessions.end())
         return call->fail(Errors::failed("Invalid Session"));
-    sessions_.erase(session);
+    m_sessions.erase(session);
     call->reply();
     sessionEnded();
 }
 
 void AdapterMode::clientGone(const std::string& client) {
-    const auto end = std::remove(sessions_.begin(), sessions_.end(), client);
-    if (end == sessions_.end())
+    const auto end = std::remove(m_sessions.begin(), m_sessions.end(), client);
+    if (end == m_sessions.end())
         return;
-    sessions_.erase(end, sessions_.end());
+    m_sessions.erase(end, m_sessions.end());
     sessionEnded();
 }
 
 void AdapterMode::sessionEnded() {
-    if (!sessions_.empty() || !powerFromSession_ || !powered_)
+    if (!m_sessions.empty() || !m_powerFromSession || !m_powered)
         return;
     powerOff();
-    adapter_.hardware().powered = false;
+    m_adapter.hardware().powered = false;
 }
 
 } // namespace Bluetooth::Sim

@@ -1,4 +1,5 @@
-#pragma once
+#ifndef KESBLUETOOTH_SIM_DAEMON_ADAPTER_MODE_H
+#define KESBLUETOOTH_SIM_DAEMON_ADAPTER_MODE_H
 
 #include "bus/call.h"
 #include "world/timer.h"
@@ -16,8 +17,8 @@ class AdapterMode {
 public:
     explicit AdapterMode(Adapter& adapter);
 
-    bool powered() const { return powered_; }
-    bool discoverable() const { return discoverable_; }
+    bool powered() const { return m_powered; }
+    bool discoverable() const { return m_discoverable; }
     bool pairable() const;
     guint32 deviceClass() const;
 
@@ -44,14 +45,16 @@ private:
     void classChangedFrom(bool wasLimited);
     void sessionEnded();
 
-    Adapter& adapter_;
-    bool powered_ = false;
-    bool discoverable_ = false;
-    bool restoreDiscoverable_ = false; ///< what the next power-on brings back
-    bool powerFromSession_ = false;
-    Timer discoverableTimer_;
-    Timer pairableTimer_;
-    std::vector<std::string> sessions_; ///< owners, once for each session
+    Adapter& m_adapter;
+    bool m_powered = false;
+    bool m_discoverable = false;
+    bool m_restoreDiscoverable = false; ///< what the next power-on brings back
+    bool m_powerFromSession = false;
+    Timer m_discoverableTimer;
+    Timer m_pairableTimer;
+    std::vector<std::string> m_sessions; ///< owners, once for each session
 };
 
 } // namespace Bluetooth::Sim
+
+#endif

@@ -4,12 +4,12 @@ namespace Bluetooth::Sim {
 
 namespace {
 
-constexpr const char* kInterface = "org.bluez.Agent";
+constexpr const char* agentInterface = "org.bluez.Agent";
 
 } // namespace
 
 Agent::Agent(BusLink& bus, std::string owner, std::string path, Capability capability)
-    : bus_(bus), owner_(std::move(owner)), path_(std::move(path)), capability_(capability) {}
+    : m_bus(bus), m_owner(std::move(owner)), m_path(std::move(path)), m_capability(capability) {}
 
 Agent::~Agent() {
     forgetRequest();
@@ -18,34 +18,34 @@ Agent::~Agent() {
 void Agent::ask(const char* member, const Value& arguments, const char* resultSignature,
                 guint timeout, OnAnswer onAnswer) {
     forgetRequest();
-    request_ = g_cancellable_new();
-    onAnswer_ = std::move(onAnswer);
+    m_request = g_cancellable_new();
+    m_onAnswer = std::move(onAnswer);
     const std::string expected = std::string("(") + resultSignature + ")";
-    bus_.call(owner_, path_, kInterface, member, arguments, static_cast<int>(timeout), request_,
-              [this, expected](const Answer& answer) {
-                  const OnAnswer handler = std::move(onAnswer_);
-                  g_clear_object(&request_);
-                  if (answer.failed || answer.results.is(expected.c_str()))
-                      return handler(answer);
-                  handler({{}, {"org.freedesktop.DBus.Error.InvalidArgs", "Wrong reply"}, true});
-              });
+    m_bus.call(m_owner, m_path, agentInterface, member, arguments, static_cast<int>(timeout),
+               m_request, [this, expected](const Answer& answer) {
+                   const OnAnswer handler = std::move(m_onAnswer);
+                   g_clear_object(&m_request);
+                   if (answer.failed || answer.results.is(expected.c_str()))
+                       return handler(answer);
+                   handler({{}, {"org.freedesktop.DBus.Error.InvalidArgs", "Wrong reply"}, true});
+               });
 }
 
 void Agent::show(const char* member, const Value& arguments) {
-    bus_.send(owner_, path_, kInterface, member, arguments);
+    m_bus.send(m_owner, m_path, agentInterface, member, arguments);
 }
 
 void Agent::cancel() {
     forgetRequest();
-    bus_.send(owner_, path_, kInterface, "Cancel");
+    m_bus.send(m_owner, m_path, agentInterface, "Cancel");
 }
 
 void Agent::release() {
     if (busy()) {
         failRequest();
-        bus_.send(owner_, path_, kInterface, "Cancel");
+        m_bus.send(m_owner, m_path, agentInterface, "Cancel");
     }
-    bus_.send(owner_, path_, kInterface, "Release");
+    m_bus.send(m_owner, m_path, agentInterface, "Release");
 }
 
 void Agent::ownerGone() {
@@ -54,16 +54,16 @@ void Agent::ownerGone() {
 }
 
 void Agent::failRequest() {
-    const OnAnswer handler = std::move(onAnswer_);
+    const OnAnswer handler = std::move(m_onAnswer);
     forgetRequest();
     handler({{}, Errors::failed("Canceled"), true});
 }
 
 void Agent::forgetRequest() {
-    if (request_)
-        g_cancellable_cancel(request_);
-    g_clear_object(&request_);
-    onAnswer_ = nullptr;
+    if (m_request)
+        g_cancellable_cancel(m_request);
+    g_clear_object(&m_request);
+    m_onAnswer = nullptr;
 }
 
 } // namespace Bluetooth::Sim

@@ -1,4 +1,5 @@
-#pragma once
+#ifndef KESBLUETOOTH_SIM_DAEMON_AGENT_H
+#define KESBLUETOOTH_SIM_DAEMON_AGENT_H
 
 #include "bus/bus_link.h"
 #include "world/capability.h"
@@ -17,10 +18,10 @@ public:
     Agent& operator=(const Agent&) = delete;
     ~Agent();
 
-    const std::string& owner() const { return owner_; }
-    const std::string& path() const { return path_; }
-    Capability capability() const { return capability_; }
-    bool busy() const { return request_ != nullptr; }
+    const std::string& owner() const { return m_owner; }
+    const std::string& path() const { return m_path; }
+    Capability capability() const { return m_capability; }
+    bool busy() const { return m_request != nullptr; }
 
     /// Asks, and hands the answer on once; results of another signature become an error.
     /// @param timeout  milliseconds
@@ -39,12 +40,14 @@ private:
     void forgetRequest();
     void failRequest();
 
-    BusLink& bus_;
-    std::string owner_;
-    std::string path_;
-    Capability capability_;
-    GCancellable* request_ = nullptr;
-    OnAnswer onAnswer_;
+    BusLink& m_bus;
+    std::string m_owner;
+    std::string m_path;
+    Capability m_capability;
+    GCancellable* m_request = nullptr;
+    OnAnswer m_onAnswer;
 };
 
 } // namespace Bluetooth::Sim
+
+#endif

@@ -13,17 +13,17 @@ namespace Bluetooth::Sim {
 
 namespace {
 
-constexpr const char* kHeadset = "1108";
-constexpr const char* kAudioSource = "110a";
-constexpr const char* kAudioSink = "110b";
-constexpr const char* kRemoteTarget = "110c";
-constexpr const char* kAdvancedAudio = "110d";
-constexpr const char* kRemoteControl = "110e";
-constexpr const char* kHeadsetGateway = "1112";
-constexpr const char* kHandsFree = "111e";
-constexpr const char* kHandsFreeGateway = "111f";
+constexpr const char* headset = "1108";
+constexpr const char* audioSource = "110a";
+constexpr const char* audioSink = "110b";
+constexpr const char* remoteTarget = "110c";
+constexpr const char* advancedAudio = "110d";
+constexpr const char* remoteControl = "110e";
+constexpr const char* headsetGateway = "1112";
+constexpr const char* handsFree = "111e";
+constexpr const char* handsFreeGateway = "111f";
 
-const Signal kPropertyChanged = {"PropertyChanged", {{"name", "s"}, {"value", "v"}}};
+const Signal propertyChanged = {"PropertyChanged", {{"name", "s"}, {"value", "v"}}};
 
 } // namespace
 
@@ -33,7 +33,7 @@ const Interface& AudioDevice::audioTable() {
         {{"Connect", {}, {}, handle<&AudioDevice::connectAudio>},
          {"Disconnect", {}, {}, handle<&AudioDevice::disconnectAudio>},
          {"GetProperties", {}, {{"properties", "a{sv}"}}, handle<&AudioDevice::audioProperties>}},
-        {kPropertyChanged}};
+        {propertyChanged}};
     return table;
 }
 
@@ -48,7 +48,7 @@ const Interface& AudioDevice::sinkTable() {
          {"Disconnected", {}, true},
          {"Playing", {}, true},
          {"Stopped", {}, true},
-         kPropertyChanged}};
+         propertyChanged}};
     return table;
 }
 
@@ -59,7 +59,7 @@ const Interface& AudioDevice::controlTable() {
          {"GetProperties", {}, {{"properties", "a{sv}"}}, handle<&AudioDevice::controlProperties>},
          {"VolumeUp", {}, {}, handle<&AudioDevice::volume>},
          {"VolumeDown", {}, {}, handle<&AudioDevice::volume>}},
-        {{"Connected", {}, true}, {"Disconnected", {}, true}, kPropertyChanged}};
+        {{"Connected", {}, true}, {"Disconnected", {}, true}, propertyChanged}};
     return table;
 }
 
@@ -77,28 +77,28 @@ const char* AudioDevice::text(State state) {
 }
 
 bool AudioDevice::has(const char* uuid) const {
-    const auto& uuids = device_.stored().uuids;
+    const auto& uuids = m_device.stored().uuids;
     return std::find(uuids.begin(), uuids.end(), fullUuid(uuid)) != uuids.end();
 }
 
 void AudioDevice::serve() {
-    ObjectTree& objects = device_.adapter().daemon().objects();
-    const bool sink = has(kAudioSink);
-    const bool control = has(kRemoteTarget) || has(kRemoteControl);
-    const bool audio = sink || control || has(kHeadset) || has(kHandsFree) || has(kAudioSource) ||
-                       has(kHeadsetGateway) || has(kHandsFreeGateway);
+    ObjectTree& objects = m_device.adapter().daemon().objects();
+    const bool sink = has(audioSink);
+    const bool control = has(remoteTarget) || has(remoteControl);
+    const bool audio = sink || control || has(headset) || has(handsFree) || has(audioSource) ||
+                       has(headsetGateway) || has(handsFreeGateway);
     const auto add = [&](bool wanted, bool& served, const Interface& table) {
         if (wanted && !served)
-            objects.add(device_.path(), table, this);
+            objects.add(m_device.path(), table, this);
         served = served || wanted;
     };
-    add(audio, audioServed_, audioTable());
-    add(sink, sinkServed_, sinkTable());
-    add(control, controlServed_, controlTable());
+    add(audio, m_audioServed, audioTable());
+    add(sink, m_sinkServed, sinkTable());
+    add(control, m_controlServed, controlTable());
 }
 
 void AudioDevice::emit(const Interface& interface, const char* member, const Value& arguments) {
-    device_.adapter().daemon().bus().emit(device_.path(), interface.name, member, arguments);
+    m_device.adapter().daemon().bus().emit(m_device.path(), interface.name, member, arguments);
 }
 
 void AudioDevice::changed(const Interface& interface, const char* property, const Value& value) {
@@ -106,64 +106,64 @@ void AudioDevice::changed(const Interface& interface, const char* property, cons
 }
 
 void AudioDevice::setSink(State state) {
-    if (!sinkServed_ || sink_ == state)
+    if (!m_sinkServed || m_sink == state)
         return;
-    sink_ = state;
+    m_sink = state;
     changed(sinkTable(), "State", g_variant_new_string(text(state)));
 }
 
 void AudioDevice::setAudio(State state) {
-    if (audio_ == state)
+    if (m_audio == state)
         return;
-    audio_ = state;
+    m_audio = state;
     // Audio answers before it says so, AudioSink after.
-    if (state != State::Connecting && audioCall_) {
+    if (state != State::Connecting && m_audioCall) {
         if (state == State::Connected)
-            audioCall_->reply();
+            m_audioCall->reply();
         else
-            audioCall_->fail(Errors::failed("Connect Failed"));
-        audioCall_.reset();
+            m_audioCall->fail(Errors::failed("Connect Failed"));
+        m_audioCall.reset();
     }
     changed(audioTable(), "State", g_variant_new_string(text(state)));
 }
 
 void AudioDevice::setControl(bool connected) {
-    controlSetUp_.stop();
-    if (!controlServed_ || control_ == connected)
+    m_controlSetUp.stop();
+    if (!m_controlServed || m_control == connected)
         return;
-    control_ = connected;
+    m_control = connected;
     emit(controlTable(), connected ? "Connected" : "Disconnected");
     changed(controlTable(), "Connected", boolValue(connected));
 }
 
 void AudioDevice::connectAudio(const CallPtr& call) {
-    if (audio_ == State::Connecting)
+    if (m_audio == State::Connecting)
         return call->fail(Errors::inProgress());
-    if (audio_ == State::Connected)
+    if (m_audio == State::Connected)
         return call->fail(Errors::alreadyConnected());
-    if (!sinkServed_ && !has(kHeadset) && !has(kHandsFree))
+    if (!m_sinkServed && !has(headset) && !has(handsFree))
         return call->fail(Errors::failed("Connect Failed"));
-    audioCall_ = call;
+    m_audioCall = call;
     beginConnecting();
 }
 
 void AudioDevice::connectSink(const CallPtr& call) {
-    if (sink_ == State::Connecting)
+    if (m_sink == State::Connecting)
         return call->fail(Errors::inProgress());
-    if (sink_ != State::Disconnected)
+    if (m_sink != State::Disconnected)
         return call->fail(Errors::alreadyConnected());
-    sinkCall_ = call;
+    m_sinkCall = call;
     beginConnecting();
 }
 
 void AudioDevice::beginConnecting() {
     setSink(State::Connecting);
     setAudio(State::Connecting);
-    holdsLink_ = true;
-    device_.link().hold();
-    if (!device_.adapter().mode().powered())
+    m_holdsLink = true;
+    m_device.link().hold();
+    if (!m_device.adapter().mode().powered())
         return failed();
-    device_.link().connect([this](bool reached) {
+    m_device.link().connect([this](bool reached) {
         if (reached)
             linkReached();
         else
@@ -172,40 +172,40 @@ void AudioDevice::beginConnecting() {
 }
 
 void AudioDevice::linkReached() {
-    const auto peer = device_.peer();
+    const auto peer = m_device.peer();
     if (peer && peer->connectsBack)
-        authorize(fullUuid(kAdvancedAudio));
+        authorize(fullUuid(advancedAudio));
     else
         setUpStream();
 }
 
 void AudioDevice::serviceConnects(const std::string& uuid) {
-    if (sink_ != State::Disconnected || audio_ != State::Disconnected)
+    if (m_sink != State::Disconnected || m_audio != State::Disconnected)
         return;
-    if (!device_.link().up())
-        device_.comeIn(false);
-    holdsLink_ = true;
-    device_.link().hold();
+    if (!m_device.link().up())
+        m_device.comeIn(false);
+    m_holdsLink = true;
+    m_device.link().hold();
     setSink(State::Connecting);
     setAudio(State::Connecting);
     authorize(uuid);
 }
 
 void AudioDevice::authorize(const std::string& uuid) {
-    Agent* agent = device_.adapter().agent();
+    Agent* agent = m_device.adapter().agent();
     // With nobody to ask, a channel that we opened as well is taken as wanted.
-    const bool wanted = sinkCall_ || audioCall_;
-    if (device_.stored().trusted || (!agent && wanted))
+    const bool wanted = m_sinkCall || m_audioCall;
+    if (m_device.stored().trusted || (!agent && wanted))
         return setUpStream();
     if (!agent || agent->busy())
         return failed();
-    const auto& times = device_.adapter().daemon().times();
-    const auto device = device_.weak_from_this();
-    agent->ask("Authorize", g_variant_new("(os)", device_.path().c_str(), uuid.c_str()), "",
+    const auto& times = m_device.adapter().daemon().times();
+    const auto device = m_device.weak_from_this();
+    agent->ask("Authorize", g_variant_new("(os)", m_device.path().c_str(), uuid.c_str()), "",
                times.agentTimeout, [this, device](const Answer& answer) {
                    const auto alive = device.lock();
-                   if (!alive || sink_ == State::Connected ||
-                       (audio_ != State::Connecting && sink_ != State::Connecting))
+                   if (!alive || m_sink == State::Connected ||
+                       (m_audio != State::Connecting && m_sink != State::Connecting))
                        return;
                    if (answer.failed)
                        failed();
@@ -215,41 +215,41 @@ void AudioDevice::authorize(const std::string& uuid) {
 }
 
 void AudioDevice::setUpStream() {
-    const Times& times = device_.adapter().daemon().times();
-    setUp_.start(times.scaled(times.audioConnect), [this] { connected(); });
+    const Times& times = m_device.adapter().daemon().times();
+    m_setUp.start(times.scaled(times.audioConnect), [this] { connected(); });
 }
 
 void AudioDevice::connected() {
-    const Times& times = device_.adapter().daemon().times();
-    if (sinkServed_) {
+    const Times& times = m_device.adapter().daemon().times();
+    if (m_sinkServed) {
         emit(sinkTable(), "Connected");
         changed(sinkTable(), "Connected", boolValue(true));
         setSink(State::Connected);
     }
     setAudio(State::Connected);
-    if (sinkCall_)
-        sinkCall_->reply();
-    sinkCall_.reset();
-    if (controlServed_)
-        controlSetUp_.start(times.scaled(times.controlConnect), [this] { setControl(true); });
+    if (m_sinkCall)
+        m_sinkCall->reply();
+    m_sinkCall.reset();
+    if (m_controlServed)
+        m_controlSetUp.start(times.scaled(times.controlConnect), [this] { setControl(true); });
 }
 
 void AudioDevice::failed() {
-    setUp_.stop();
-    if (sinkCall_)
-        sinkCall_->fail(Errors::failed("Stream setup failed"));
-    sinkCall_.reset();
+    m_setUp.stop();
+    if (m_sinkCall)
+        m_sinkCall->fail(Errors::failed("Stream setup failed"));
+    m_sinkCall.reset();
     setSink(State::Disconnected);
     setAudio(State::Disconnected);
-    if (holdsLink_)
-        device_.link().release();
-    holdsLink_ = false;
+    if (m_holdsLink)
+        m_device.link().release();
+    m_holdsLink = false;
 }
 
 void AudioDevice::disconnected() {
     setPlaying(false);
     setControl(false);
-    if (sink_ == State::Connected) {
+    if (m_sink == State::Connected) {
         emit(sinkTable(), "Disconnected");
         changed(sinkTable(), "Connected", boolValue(false));
     }
@@ -257,23 +257,23 @@ void AudioDevice::disconnected() {
 }
 
 void AudioDevice::disconnectAudio(const CallPtr& call) {
-    if (audio_ == State::Disconnected)
+    if (m_audio == State::Disconnected)
         return call->fail(Errors::notConnected());
     disconnected();
     call->reply();
 }
 
 void AudioDevice::disconnectSink(const CallPtr& call) {
-    if (sink_ == State::Disconnected)
+    if (m_sink == State::Disconnected)
         return call->fail(Errors::notConnected());
-    if (sink_ == State::Connecting)
+    if (m_sink == State::Connecting)
         return call->fail(Errors::inProgress());
     disconnected();
     call->reply();
 }
 
 void AudioDevice::setPlaying(bool playing) {
-    if (sink_ != (playing ? State::Connected : State::Playing))
+    if (m_sink != (playing ? State::Connected : State::Playing))
         return;
     emit(sinkTable(), playing ? "Playing" : "Stopped");
     changed(sinkTable(), "Playing", boolValue(playing));
@@ -281,45 +281,45 @@ void AudioDevice::setPlaying(bool playing) {
 }
 
 void AudioDevice::linkLost() {
-    holdsLink_ = false;
-    if (audio_ != State::Disconnected || sink_ != State::Disconnected)
+    m_holdsLink = false;
+    if (m_audio != State::Disconnected || m_sink != State::Disconnected)
         disconnected();
 }
 
 void AudioDevice::abandon() {
-    setUp_.stop();
-    controlSetUp_.stop();
-    audioCall_.reset();
-    sinkCall_.reset();
+    m_setUp.stop();
+    m_controlSetUp.stop();
+    m_audioCall.reset();
+    m_sinkCall.reset();
 }
 
 void AudioDevice::audioProperties(const CallPtr& call) {
-    call->reply(tuple(Dict().add("State", g_variant_new_string(text(audio_))).end()));
+    call->reply(tuple(Dict().add("State", g_variant_new_string(text(m_audio))).end()));
 }
 
 void AudioDevice::sinkIsConnected(const CallPtr& call) {
-    call->reply(tuple(boolValue(sink_ == State::Connected || sink_ == State::Playing)));
+    call->reply(tuple(boolValue(m_sink == State::Connected || m_sink == State::Playing)));
 }
 
 void AudioDevice::sinkProperties(const CallPtr& call) {
-    const bool connected = sink_ == State::Connected || sink_ == State::Playing;
+    const bool connected = m_sink == State::Connected || m_sink == State::Playing;
     call->reply(tuple(Dict()
-                          .add("State", g_variant_new_string(text(sink_)))
+                          .add("State", g_variant_new_string(text(m_sink)))
                           .add("Connected", boolValue(connected))
-                          .add("Playing", boolValue(sink_ == State::Playing))
+                          .add("Playing", boolValue(m_sink == State::Playing))
                           .end()));
 }
 
 void AudioDevice::controlIsConnected(const CallPtr& call) {
-    call->reply(tuple(boolValue(control_)));
+    call->reply(tuple(boolValue(m_control)));
 }
 
 void AudioDevice::controlProperties(const CallPtr& call) {
-    call->reply(tuple(Dict().add("Connected", boolValue(control_)).end()));
+    call->reply(tuple(Dict().add("Connected", boolValue(m_control)).end()));
 }
 
 void AudioDevice::volume(const CallPtr& call) {
-    if (!control_)
+    if (!m_control)
         return call->fail(Errors::notConnected());
     call->reply();
 }

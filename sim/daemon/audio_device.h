@@ -1,4 +1,5 @@
-#pragma once
+#ifndef KESBLUETOOTH_SIM_DAEMON_AUDIO_DEVICE_H
+#define KESBLUETOOTH_SIM_DAEMON_AUDIO_DEVICE_H
 
 #include "bus/interface.h"
 #include "world/timer.h"
@@ -13,7 +14,7 @@ class Device;
 /// its service classes have them.
 class AudioDevice {
 public:
-    explicit AudioDevice(Device& device) : device_(device) {}
+    explicit AudioDevice(Device& device) : m_device(device) {}
 
     /// Serves the interfaces that the device's UUIDs call for and that are not served yet.
     void serve();
@@ -57,18 +58,20 @@ private:
     void emit(const Interface& interface, const char* member, const Value& arguments = {});
     void changed(const Interface& interface, const char* property, const Value& value);
 
-    Device& device_;
-    bool audioServed_ = false;
-    bool sinkServed_ = false;
-    bool controlServed_ = false;
-    State audio_ = State::Disconnected;
-    State sink_ = State::Disconnected;
-    bool control_ = false;
-    bool holdsLink_ = false;
-    CallPtr audioCall_; ///< Audio.Connect that waits
-    CallPtr sinkCall_;  ///< AudioSink.Connect that waits
-    Timer setUp_;
-    Timer controlSetUp_;
+    Device& m_device;
+    bool m_audioServed = false;
+    bool m_sinkServed = false;
+    bool m_controlServed = false;
+    State m_audio = State::Disconnected;
+    State m_sink = State::Disconnected;
+    bool m_control = false;
+    bool m_holdsLink = false;
+    CallPtr m_audioCall; ///< Audio.Connect that waits
+    CallPtr m_sinkCall;  ///< AudioSink.Connect that waits
+    Timer m_setUp;
+    Timer m_controlSetUp;
 };
 
 } // namespace Bluetooth::Sim
+
+#endif

@@ -9,35 +9,35 @@
 namespace Bluetooth::Sim {
 
 Daemon::Daemon(World& world, std::string busAddress, std::function<bool(const CallPtr&)> beforeCall)
-    : world_(world), busAddress_(std::move(busAddress)), beforeCall_(std::move(beforeCall)) {}
+    : m_world(world), m_busAddress(std::move(busAddress)), m_beforeCall(std::move(beforeCall)) {}
 
 Daemon::~Daemon() {
     clear();
 }
 
 void Daemon::start(int pid) {
-    pid_ = pid;
-    auto bus = std::make_unique<BusLink>(busAddress_, [this](const CallPtr& call) {
-        if (!beforeCall_(call))
+    m_pid = pid;
+    auto bus = std::make_unique<BusLink>(m_busAddress, [this](const CallPtr& call) {
+        if (!m_beforeCall(call))
             dispatch(call);
     });
-    manager_ = std::make_unique<Manager>(*this);
+    m_manager = std::make_unique<Manager>(*this);
     bus->watchClients([this](const std::string& client) {
-        for (const auto& adapter : adapters_)
+        for (const auto& adapter : m_adapters)
             adapter->clientGone(client);
     });
     bus->watchBus([this] {
-        if (busEnded_)
-            busEnded_();
+        if (m_busEnded)
+            m_busEnded();
     });
     try {
         bus->own("org.bluez");
     } catch (const std::exception&) {
-        manager_.reset();
+        m_manager.reset();
         throw;
     }
-    bus_ = std::move(bus);
-    for (const auto& hardware : world_.adapters)
+    m_bus = std::move(bus);
+    for (const auto& hardware : m_world.adapters)
         plugIn(hardware);
 }
 
@@ -46,61 +46,61 @@ void Daemon::vanish() {
 }
 
 void Daemon::stop() {
-    for (const auto& adapter : adapters_)
+    for (const auto& adapter : m_adapters)
         adapter->releaseAgents();
     clear();
 }
 
 void Daemon::clear() {
     // Adapters use the bus until they are gone; nothing of theirs is said on the way out.
-    adapters_.clear();
-    manager_.reset();
-    if (burial_)
-        g_source_remove(burial_);
-    burial_ = 0;
-    ended_.clear();
-    bus_.reset();
+    m_adapters.clear();
+    m_manager.reset();
+    if (m_burial)
+        g_source_remove(m_burial);
+    m_burial = 0;
+    m_ended.clear();
+    m_bus.reset();
 }
 
 void Daemon::plugIn(const std::shared_ptr<AdapterHardware>& hardware) {
-    for (const auto& other : adapters_)
+    for (const auto& other : m_adapters)
         for (int times = 0; times < 2; ++times)
             other->uuidsChanged();
-    adapters_.push_back(std::make_unique<Adapter>(*this, hardware));
-    adapters_.back()->announce();
-    manager_->adapterAdded(*adapters_.back());
-    adapters_.back()->comeUp();
+    m_adapters.push_back(std::make_unique<Adapter>(*this, hardware));
+    m_adapters.back()->announce();
+    m_manager->adapterAdded(*m_adapters.back());
+    m_adapters.back()->comeUp();
 }
 
 void Daemon::pullOut(Adapter& adapter) {
-    const bool wasDefault = adapters_.front().get() == &adapter;
+    const bool wasDefault = m_adapters.front().get() == &adapter;
     const std::string path = adapter.path();
     adapter.goDown();
-    const auto found = std::find_if(adapters_.begin(), adapters_.end(),
+    const auto found = std::find_if(m_adapters.begin(), m_adapters.end(),
                                     [&](const auto& other) { return other.get() == &adapter; });
     bury(std::shared_ptr<Adapter>(std::move(*found)));
-    adapters_.erase(found);
-    manager_->adapterRemoved(path, wasDefault);
+    m_adapters.erase(found);
+    m_manager->adapterRemoved(path, wasDefault);
 }
 
 Adapter* Daemon::find(const std::string& idOrAddress) const {
-    const auto found = std::find_if(adapters_.begin(), adapters_.end(), [&](const auto& adapter) {
+    const auto found = std::find_if(m_adapters.begin(), m_adapters.end(), [&](const auto& adapter) {
         return adapter->hardware().id() == idOrAddress ||
                adapter->hardware().address == upperCase(idOrAddress);
     });
-    return found == adapters_.end() ? nullptr : found->get();
+    return found == m_adapters.end() ? nullptr : found->get();
 }
 
 void Daemon::bury(std::shared_ptr<void> ended) {
-    ended_.push_back(std::move(ended));
-    if (burial_)
+    m_ended.push_back(std::move(ended));
+    if (m_burial)
         return;
-    burial_ = g_idle_add(
+    m_burial = g_idle_add(
         [](gpointer data) -> gboolean {
             auto* daemon = static_cast<Daemon*>(data);
-            daemon->burial_ = 0;
-            const auto buried = std::move(daemon->ended_);
-            daemon->ended_.clear();
+            daemon->m_burial = 0;
+            const auto buried = std::move(daemon->m_ended);
+            daemon->m_ended.clear();
             return G_SOURCE_REMOVE;
         },
         this);

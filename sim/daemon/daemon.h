@@ -1,4 +1,5 @@
-#pragma once
+#ifndef KESBLUETOOTH_SIM_DAEMON_DAEMON_H
+#define KESBLUETOOTH_SIM_DAEMON_DAEMON_H
 
 #include "bus/bus_link.h"
 #include "bus/object_tree.h"
@@ -33,24 +34,24 @@ public:
     void vanish();
     /// Releases the agents first, as a process that is asked to stop.
     void stop();
-    bool running() const { return bus_ != nullptr; }
-    int pid() const { return pid_; }
+    bool running() const { return m_bus != nullptr; }
+    int pid() const { return m_pid; }
     /// Called when the bus itself ends.
-    void watchBus(std::function<void()> onEnd) { busEnded_ = std::move(onEnd); }
+    void watchBus(std::function<void()> onEnd) { m_busEnded = std::move(onEnd); }
 
-    void dispatch(const CallPtr& call) { objects_.dispatch(call); }
+    void dispatch(const CallPtr& call) { m_objects.dispatch(call); }
     void plugIn(const std::shared_ptr<AdapterHardware>& hardware);
     void pullOut(Adapter& adapter);
 
-    World& world() { return world_; }
-    const Times& times() const { return world_.times; }
-    BusLink& bus() { return *bus_; }
-    ObjectTree& objects() { return objects_; }
-    Manager& manager() { return *manager_; }
-    const std::vector<std::unique_ptr<Adapter>>& adapters() const { return adapters_; }
+    World& world() { return m_world; }
+    const Times& times() const { return m_world.times; }
+    BusLink& bus() { return *m_bus; }
+    ObjectTree& objects() { return m_objects; }
+    Manager& manager() { return *m_manager; }
+    const std::vector<std::unique_ptr<Adapter>>& adapters() const { return m_adapters; }
     /// The adapter with that id or address, or null.
     Adapter* find(const std::string& idOrAddress) const;
-    std::string basePath() const { return "/org/bluez/" + std::to_string(pid_); }
+    std::string basePath() const { return "/org/bluez/" + std::to_string(m_pid); }
 
     /// Keeps an object that has ended until the code that runs in it has returned.
     void bury(std::shared_ptr<void> ended);
@@ -58,17 +59,19 @@ public:
 private:
     void clear();
 
-    World& world_;
-    std::string busAddress_;
-    std::function<bool(const CallPtr&)> beforeCall_;
-    std::function<void()> busEnded_;
-    int pid_ = 0;
-    guint burial_ = 0;
-    std::vector<std::shared_ptr<void>> ended_;
-    ObjectTree objects_;
-    std::unique_ptr<BusLink> bus_;
-    std::unique_ptr<Manager> manager_;
-    std::vector<std::unique_ptr<Adapter>> adapters_;
+    World& m_world;
+    std::string m_busAddress;
+    std::function<bool(const CallPtr&)> m_beforeCall;
+    std::function<void()> m_busEnded;
+    int m_pid = 0;
+    guint m_burial = 0;
+    std::vector<std::shared_ptr<void>> m_ended;
+    ObjectTree m_objects;
+    std::unique_ptr<BusLink> m_bus;
+    std::unique_ptr<Manager> m_manager;
+    std::vector<std::unique_ptr<Adapter>> m_adapters;
 };
 
 } // namespace Bluetooth::Sim
+
+#endif

@@ -30,16 +30,16 @@ const Interface& Device::table() {
 }
 
 Device::Device(Adapter& adapter, std::string address)
-    : adapter_(adapter),
-      address_(std::move(address)),
-      path_(adapter.path() + "/dev_" + withSeparator(address_, '_')),
-      stored_(adapter.hardware().storage[address_]),
-      classKnown_(stored_.deviceClass.has_value()),
-      name_(stored_.name),
-      link_(*this) {
-    adapter_.daemon().objects().add(path_, table(), this);
-    audio_ = std::make_unique<AudioDevice>(*this);
-    audio_->serve();
+    : m_adapter(adapter),
+      m_address(std::move(address)),
+      m_path(adapter.path() + "/m_dev" + withSeparator(m_address, '_')),
+      m_stored(adapter.hardware().storage[m_address]),
+      m_classKnown(m_stored.deviceClass.has_value()),
+      m_name(m_stored.name),
+      m_link(*this) {
+    m_adapter.daemon().objects().add(m_path, table(), this);
+    m_audio = std::make_unique<AudioDevice>(*this);
+    m_audio->serve();
 }
 
 Device::~Device() {
@@ -47,37 +47,37 @@ Device::~Device() {
 }
 
 void Device::retire() {
-    if (retired_)
+    if (m_retired)
         return;
-    retired_ = true;
-    link_.abandon();
-    reverseSearch_.stop();
-    Daemon& daemon = adapter_.daemon();
-    audio_->abandon();
-    if (creation_)
-        daemon.bury(std::move(creation_));
-    if (pairing_)
-        daemon.bury(std::move(pairing_));
-    if (search_)
-        daemon.bury(std::move(search_));
-    daemon.objects().remove(path_);
+    m_retired = true;
+    m_link.abandon();
+    m_reverseSearch.stop();
+    Daemon& daemon = m_adapter.daemon();
+    m_audio->abandon();
+    if (m_creation)
+        daemon.bury(std::move(m_creation));
+    if (m_pairing)
+        daemon.bury(std::move(m_pairing));
+    if (m_search)
+        daemon.bury(std::move(m_search));
+    daemon.objects().remove(m_path);
 }
 
 std::shared_ptr<Peer> Device::peer() const {
-    return adapter_.peerAt(address_);
+    return m_adapter.peerAt(m_address);
 }
 
 bool Device::reachable() const {
     const auto peer = this->peer();
-    return peer && peer->present && peer->connectable && !stored_.blocked;
+    return peer && peer->present && peer->connectable && !m_stored.blocked;
 }
 
 bool Device::busy() const {
-    return creation_ || pairing_ || search_;
+    return m_creation || m_pairing || m_search;
 }
 
 void Device::emit(const char* member, const Value& arguments) {
-    adapter_.daemon().bus().emit(path_, table().name, member, arguments);
+    m_adapter.daemon().bus().emit(m_path, table().name, member, arguments);
 }
 
 void Device::changed(const char* property, const Value& value) {
@@ -85,34 +85,34 @@ void Device::changed(const char* property, const Value& value) {
 }
 
 std::string Device::alias() const {
-    if (!stored_.alias.empty())
-        return stored_.alias;
-    return name_.empty() ? withSeparator(address_, '-') : name_;
+    if (!m_stored.alias.empty())
+        return m_stored.alias;
+    return m_name.empty() ? withSeparator(m_address, '-') : m_name;
 }
 
 void Device::getProperties(const CallPtr& call) {
     Dict properties;
-    properties.add("Address", textValue(address_));
-    properties.add("Name", textValue(name_));
+    properties.add("Address", textValue(m_address));
+    properties.add("Name", textValue(m_name));
     properties.add("Alias", textValue(alias()));
-    if (stored_.deviceClass) {
-        properties.add("Class", g_variant_new_uint32(*stored_.deviceClass));
-        if (const char* icon = iconOf(*stored_.deviceClass))
+    if (m_stored.deviceClass) {
+        properties.add("Class", g_variant_new_uint32(*m_stored.deviceClass));
+        if (const char* icon = iconOf(*m_stored.deviceClass))
             properties.add("Icon", g_variant_new_string(icon));
     }
-    if (stored_.vendor)
-        properties.add("Vendor", g_variant_new_uint16(*stored_.vendor));
-    if (stored_.product)
-        properties.add("Product", g_variant_new_uint16(*stored_.product));
-    if (stored_.version)
-        properties.add("Version", g_variant_new_uint16(*stored_.version));
-    properties.add("Paired", boolValue(stored_.paired))
-        .add("Trusted", boolValue(stored_.trusted))
-        .add("Blocked", boolValue(stored_.blocked))
-        .add("Connected", boolValue(link_.up()))
-        .add("UUIDs", listValue("s", stored_.uuids))
+    if (m_stored.vendor)
+        properties.add("Vendor", g_variant_new_uint16(*m_stored.vendor));
+    if (m_stored.product)
+        properties.add("Product", g_variant_new_uint16(*m_stored.product));
+    if (m_stored.version)
+        properties.add("Version", g_variant_new_uint16(*m_stored.version));
+    properties.add("Paired", boolValue(m_stored.paired))
+        .add("Trusted", boolValue(m_stored.trusted))
+        .add("Blocked", boolValue(m_stored.blocked))
+        .add("Connected", boolValue(m_link.up()))
+        .add("UUIDs", listValue("s", m_stored.uuids))
         .add("Services", listValue("o", {}))
-        .add("Adapter", pathValue(adapter_.path()));
+        .add("Adapter", pathValue(m_adapter.path()));
     call->reply(tuple(properties.end()));
 }
 
@@ -130,8 +130,8 @@ void Device::setProperty(const CallPtr& call) {
 
 void Device::setAlias(const CallPtr& call, const Value& value) {
     const std::string alias = g_variant_get_string(value.get(), nullptr);
-    if (alias != stored_.alias) {
-        stored_.alias = alias;
+    if (alias != m_stored.alias) {
+        m_stored.alias = alias;
         // Sent as it was given: "" too, though the name stands for it from now on.
         changed("Alias", value);
     }
@@ -140,8 +140,8 @@ void Device::setAlias(const CallPtr& call, const Value& value) {
 
 void Device::setTrusted(const CallPtr& call, const Value& value) {
     const bool trusted = g_variant_get_boolean(value.get()) != FALSE;
-    if (trusted != stored_.trusted) {
-        stored_.trusted = trusted;
+    if (trusted != m_stored.trusted) {
+        m_stored.trusted = trusted;
         changed("Trusted", value);
     }
     call->reply();
@@ -149,10 +149,10 @@ void Device::setTrusted(const CallPtr& call, const Value& value) {
 
 void Device::setBlocked(const CallPtr& call, const Value& value) {
     const bool blocked = g_variant_get_boolean(value.get()) != FALSE;
-    if (blocked != stored_.blocked) {
-        stored_.blocked = blocked;
+    if (blocked != m_stored.blocked) {
+        m_stored.blocked = blocked;
         if (blocked)
-            link_.drop();
+            m_link.drop();
         changed("Blocked", value);
     }
     call->reply();
@@ -161,63 +161,63 @@ void Device::setBlocked(const CallPtr& call, const Value& value) {
 void Device::discoverServices(const CallPtr& call) {
     if (busy())
         return call->fail(Errors::inProgress());
-    search_ = ServiceSearch::begin(*this, call);
+    m_search = ServiceSearch::begin(*this, call);
 }
 
 void Device::cancelDiscovery(const CallPtr& call) {
-    if (!search_)
+    if (!m_search)
         return call->fail(Errors::doesNotExist());
-    if (search_->owner() != call->sender())
+    if (m_search->owner() != call->sender())
         return call->fail(Errors::notAuthorized());
-    search_->cancel();
+    m_search->cancel();
     call->reply();
 }
 
 void Device::disconnect(const CallPtr& call) {
-    if (!link_.up())
+    if (!m_link.up())
         return call->fail(Errors::notConnected());
-    link_.requestDisconnect(call);
+    m_link.requestDisconnect(call);
 }
 
 void Device::create(const CallPtr& call) {
-    creation_ = std::make_shared<DeviceCreation>(*this, call);
-    creation_->begin();
+    m_creation = std::make_shared<DeviceCreation>(*this, call);
+    m_creation->begin();
 }
 
 void Device::pair(const CallPtr& call) {
-    pairing_ = Pairing::outgoing(*this, call);
-    pairing_->begin();
+    m_pairing = Pairing::outgoing(*this, call);
+    m_pairing->begin();
 }
 
 void Device::comeIn(bool pairing) {
-    const Times& times = adapter_.daemon().times();
-    link_.accept();
+    const Times& times = m_adapter.daemon().times();
+    m_link.accept();
     if (pairing) {
-        pairing_ = Pairing::incoming(*this);
-        pairing_->begin();
+        m_pairing = Pairing::incoming(*this);
+        m_pairing->begin();
         return;
     }
-    link_.hold();
-    reverseSearch_.start(times.scaled(times.reverseSearch), [this] { learnServices(); });
+    m_link.hold();
+    m_reverseSearch.start(times.scaled(times.reverseSearch), [this] { learnServices(); });
 }
 
 void Device::creationEnded() {
-    adapter_.daemon().bury(std::move(creation_));
+    m_adapter.daemon().bury(std::move(m_creation));
 }
 
 void Device::pairingEnded() {
-    adapter_.daemon().bury(std::move(pairing_));
+    m_adapter.daemon().bury(std::move(m_pairing));
 }
 
 void Device::searchEnded() {
-    adapter_.daemon().bury(std::move(search_));
+    m_adapter.daemon().bury(std::move(m_search));
 }
 
 void Device::seen() {
-    if (!classKnown_) {
-        classKnown_ = true;
-        changed("Class", g_variant_new_uint32(*stored_.deviceClass));
-        if (const char* icon = iconOf(*stored_.deviceClass))
+    if (!m_classKnown) {
+        m_classKnown = true;
+        changed("Class", g_variant_new_uint32(*m_stored.deviceClass));
+        if (const char* icon = iconOf(*m_stored.deviceClass))
             changed("Icon", g_variant_new_string(icon));
     }
     learnName();
@@ -225,13 +225,13 @@ void Device::seen() {
 
 void Device::learnName() {
     const auto peer = this->peer();
-    if (link_.up() && peer)
-        stored_.name = peer->name;
-    if (stored_.name == name_)
+    if (m_link.up() && peer)
+        m_stored.name = peer->name;
+    if (m_stored.name == m_name)
         return;
-    name_ = stored_.name;
-    changed("Name", textValue(name_));
-    if (stored_.alias.empty())
+    m_name = m_stored.name;
+    changed("Name", textValue(m_name));
+    if (m_stored.alias.empty())
         changed("Alias", textValue(alias()));
 }
 
@@ -239,50 +239,50 @@ void Device::learnServices() {
     const auto peer = this->peer();
     if (!peer)
         return;
-    if (peer->vendor && !stored_.vendor) {
-        stored_.vendor = peer->vendor;
-        stored_.product = peer->product.value_or(0);
-        stored_.version = peer->version.value_or(0);
-        changed("Vendor", g_variant_new_uint16(*stored_.vendor));
-        changed("Product", g_variant_new_uint16(*stored_.product));
-        changed("Version", g_variant_new_uint16(*stored_.version));
+    if (peer->vendor && !m_stored.vendor) {
+        m_stored.vendor = peer->vendor;
+        m_stored.product = peer->product.value_or(0);
+        m_stored.version = peer->version.value_or(0);
+        changed("Vendor", g_variant_new_uint16(*m_stored.vendor));
+        changed("Product", g_variant_new_uint16(*m_stored.product));
+        changed("Version", g_variant_new_uint16(*m_stored.version));
     }
-    if (stored_.uuids == peer->uuids)
+    if (m_stored.uuids == peer->uuids)
         return;
-    stored_.uuids = peer->uuids;
-    audio_->serve();
-    changed("UUIDs", listValue("s", stored_.uuids));
+    m_stored.uuids = peer->uuids;
+    m_audio->serve();
+    changed("UUIDs", listValue("s", m_stored.uuids));
 }
 
 void Device::setPaired(bool paired) {
-    if (paired == stored_.paired)
+    if (paired == m_stored.paired)
         return;
-    stored_.paired = paired;
+    m_stored.paired = paired;
     changed("Paired", boolValue(paired));
 }
 
 void Device::linkLost() {
     const auto alive = shared_from_this();
-    reverseSearch_.stop();
-    audio_->linkLost();
-    if (search_)
-        search_->linkLost();
-    if (creation_)
-        creation_->linkLost();
-    else if (pairing_)
-        pairing_->linkLost();
-    else if (temporary_)
-        adapter_.removeDevice(alive);
+    m_reverseSearch.stop();
+    m_audio->linkLost();
+    if (m_search)
+        m_search->linkLost();
+    if (m_creation)
+        m_creation->linkLost();
+    else if (m_pairing)
+        m_pairing->linkLost();
+    else if (m_temporary)
+        m_adapter.removeDevice(alive);
 }
 
 void Device::clientGone(const std::string& client) {
     const auto alive = shared_from_this();
-    if (search_ && search_->owner() == client)
-        search_->abandon();
-    if (creation_ && creation_->owner() == client)
-        creation_->ownerGone();
-    if (pairing_ && pairing_->owner() == client)
-        pairing_->ownerGone();
+    if (m_search && m_search->owner() == client)
+        m_search->abandon();
+    if (m_creation && m_creation->owner() == client)
+        m_creation->ownerGone();
+    if (m_pairing && m_pairing->owner() == client)
+        m_pairing->ownerGone();
 }
 
 } // namespace Bluetooth::Sim

@@ -1,4 +1,5 @@
-#pragma once
+#ifndef KESBLUETOOTH_SIM_DAEMON_DEVICE_H
+#define KESBLUETOOTH_SIM_DAEMON_DEVICE_H
 
 #include "bus/interface.h"
 #include "daemon/link.h"
@@ -23,18 +24,18 @@ public:
     Device& operator=(const Device&) = delete;
     ~Device();
 
-    Adapter& adapter() const { return adapter_; }
-    const std::string& address() const { return address_; }
-    const std::string& path() const { return path_; }
-    StoredDevice& stored() const { return stored_; }
-    Link& link() { return link_; }
+    Adapter& adapter() const { return m_adapter; }
+    const std::string& address() const { return m_address; }
+    const std::string& path() const { return m_path; }
+    StoredDevice& stored() const { return m_stored; }
+    Link& link() { return m_link; }
     /// The device in the air, or null when there is none any more.
     std::shared_ptr<Peer> peer() const;
     bool reachable() const;
 
     /// Whether the object goes when its link does: nothing is stored of it yet.
-    bool temporary() const { return temporary_; }
-    void setTemporary(bool temporary) { temporary_ = temporary; }
+    bool temporary() const { return m_temporary; }
+    void setTemporary(bool temporary) { m_temporary = temporary; }
     /// Whether it is being created, paired or searched.
     bool busy() const;
 
@@ -43,9 +44,9 @@ public:
     void pair(const CallPtr& call);
     /// The device connects to us, and pairs when asked to.
     void comeIn(bool pairing);
-    Pairing* pairing() const { return pairing_.get(); }
-    DeviceCreation* creation() const { return creation_.get(); }
-    AudioDevice& audio() const { return *audio_; }
+    Pairing* pairing() const { return m_pairing.get(); }
+    DeviceCreation* creation() const { return m_creation.get(); }
+    AudioDevice& audio() const { return *m_audio; }
     /// Each is called when the work has ended, by the work itself.
     void creationEnded();
     void pairingEnded();
@@ -80,20 +81,22 @@ private:
     void setTrusted(const CallPtr& call, const Value& value);
     void setBlocked(const CallPtr& call, const Value& value);
 
-    Adapter& adapter_;
-    std::string address_;
-    std::string path_;
-    StoredDevice& stored_;
-    bool temporary_ = true;
-    bool classKnown_ = false;
-    bool retired_ = false;
-    std::string name_;
-    Link link_;
-    Timer reverseSearch_;
-    std::shared_ptr<DeviceCreation> creation_;
-    std::shared_ptr<Pairing> pairing_;
-    std::shared_ptr<ServiceSearch> search_;
-    std::unique_ptr<AudioDevice> audio_;
+    Adapter& m_adapter;
+    std::string m_address;
+    std::string m_path;
+    StoredDevice& m_stored;
+    bool m_temporary = true;
+    bool m_classKnown = false;
+    bool m_retired = false;
+    std::string m_name;
+    Link m_link;
+    Timer m_reverseSearch;
+    std::shared_ptr<DeviceCreation> m_creation;
+    std::shared_ptr<Pairing> m_pairing;
+    std::shared_ptr<ServiceSearch> m_search;
+    std::unique_ptr<AudioDevice> m_audio;
 };
 
 } // namespace Bluetooth::Sim
+
+#endif

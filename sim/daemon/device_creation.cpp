@@ -8,9 +8,9 @@
 namespace Bluetooth::Sim {
 
 void DeviceCreation::begin() {
-    device_.adapter().discovery().suspend();
-    device_.link().hold();
-    device_.link().connect([this](bool reached) {
+    m_device.adapter().discovery().suspend();
+    m_device.link().hold();
+    m_device.link().connect([this](bool reached) {
         if (reached)
             search();
         else
@@ -19,35 +19,35 @@ void DeviceCreation::begin() {
 }
 
 void DeviceCreation::search() {
-    const Times& times = device_.adapter().daemon().times();
-    timer_.start(times.scaled(times.serviceSearch), [this] { succeed(); });
+    const Times& times = m_device.adapter().daemon().times();
+    m_timer.start(times.scaled(times.serviceSearch), [this] { succeed(); });
 }
 
 void DeviceCreation::succeed() {
-    Adapter& adapter = device_.adapter();
-    device_.learnServices();
-    device_.setTemporary(false);
-    device_.stored().known = true;
-    call_->reply(tuple(pathValue(device_.path())));
-    device_.link().release();
-    device_.creationEnded();
+    Adapter& adapter = m_device.adapter();
+    m_device.learnServices();
+    m_device.setTemporary(false);
+    m_device.stored().known = true;
+    m_call->reply(tuple(pathValue(m_device.path())));
+    m_device.link().release();
+    m_device.creationEnded();
     adapter.discovery().resume();
 }
 
 void DeviceCreation::fail(const char* text) {
-    call_->fail(Errors::failed(text));
+    m_call->fail(Errors::failed(text));
     removeDevice();
 }
 
 void DeviceCreation::removeDevice() {
-    Adapter& adapter = device_.adapter();
-    timer_.stop();
-    adapter.removeDevice(device_.shared_from_this());
+    Adapter& adapter = m_device.adapter();
+    m_timer.stop();
+    adapter.removeDevice(m_device.shared_from_this());
     adapter.discovery().resume();
 }
 
 void DeviceCreation::cancel(const CallPtr& call) {
-    const CallPtr creating = call_;
+    const CallPtr creating = m_call;
     removeDevice();
     creating->fail(Errors::failed("Operation canceled"));
     call->reply();

@@ -1,4 +1,5 @@
-#pragma once
+#ifndef KESBLUETOOTH_SIM_DAEMON_DEVICE_CREATION_H
+#define KESBLUETOOTH_SIM_DAEMON_DEVICE_CREATION_H
 
 #include "bus/call.h"
 #include "world/timer.h"
@@ -12,9 +13,9 @@ class Device;
 /// One CreateDevice call, from the new object to the reply.
 class DeviceCreation {
 public:
-    DeviceCreation(Device& device, const CallPtr& call) : device_(device), call_(call) {}
+    DeviceCreation(Device& device, const CallPtr& call) : m_device(device), m_call(call) {}
 
-    std::string owner() const { return call_->sender(); }
+    std::string owner() const { return m_call->sender(); }
     void begin();
     /// CancelDeviceCreation: the device goes, then the caller of CreateDevice is told, then of
     /// this.
@@ -30,9 +31,11 @@ private:
     void end();
     void removeDevice();
 
-    Device& device_;
-    CallPtr call_;
-    Timer timer_;
+    Device& m_device;
+    CallPtr m_call;
+    Timer m_timer;
 };
 
 } // namespace Bluetooth::Sim
+
+#endif

@@ -12,120 +12,120 @@
 namespace Bluetooth::Sim {
 
 void Discovery::startSession(const CallPtr& call) {
-    const bool first = sessions_.empty();
-    ++sessions_[call->sender()];
+    const bool first = m_sessions.empty();
+    ++m_sessions[call->sender()];
     call->reply();
     if (first)
         begin();
 }
 
 void Discovery::stopSession(const CallPtr& call) {
-    const auto session = sessions_.find(call->sender());
-    if (session == sessions_.end())
+    const auto session = m_sessions.find(call->sender());
+    if (session == m_sessions.end())
         return call->fail(Errors::failed("Invalid discovery session"));
     if (--session->second == 0)
-        sessions_.erase(session);
+        m_sessions.erase(session);
     call->reply();
-    if (sessions_.empty())
+    if (m_sessions.empty())
         end();
 }
 
 void Discovery::clientGone(const std::string& client) {
-    if (sessions_.erase(client) && sessions_.empty())
+    if (m_sessions.erase(client) && m_sessions.empty())
         end();
 }
 
 void Discovery::stop() {
-    sessions_.clear();
+    m_sessions.clear();
     end();
 }
 
 void Discovery::suspend() {
-    if (suspensions_++ == 0)
+    if (m_suspensions++ == 0)
         end();
 }
 
 void Discovery::resume() {
-    if (--suspensions_ == 0 && !sessions_.empty())
+    if (--m_suspensions == 0 && !m_sessions.empty())
         begin();
 }
 
 void Discovery::begin() {
-    if (suspensions_)
+    if (m_suspensions)
         return;
-    found_.clear();
-    began_ = g_get_monotonic_time();
+    m_found.clear();
+    m_began = g_get_monotonic_time();
     setActive(true);
     startRound();
 }
 
 void Discovery::end() {
-    finder_.stop();
-    roundEnd_.stop();
-    inquiring_ = false;
-    if (active_)
+    m_finder.stop();
+    m_roundEnd.stop();
+    m_inquiring = false;
+    if (m_active)
         setActive(false);
 }
 
 void Discovery::setActive(bool active) {
-    active_ = active;
-    adapter_.changed("Discovering", boolValue(active));
+    m_active = active;
+    m_adapter.changed("Discovering", boolValue(active));
 }
 
 void Discovery::startRound() {
-    const Times& times = adapter_.daemon().times();
-    ++round_;
-    inquiring_ = true;
-    for (auto& [address, found] : found_)
+    const Times& times = m_adapter.daemon().times();
+    ++m_round;
+    m_inquiring = true;
+    for (auto& [address, found] : m_found)
         found.inThisRound = false;
-    const auto& peers = adapter_.daemon().world().peers;
-    toFind_.assign(peers.begin(), peers.end());
-    toName_.clear();
-    finder_.start(times.scaled(times.firstFound), [this] { findNext(); });
-    roundEnd_.start(times.scaled(times.inquiry), [this] {
-        inquiring_ = false;
-        finder_.stop();
+    const auto& peers = m_adapter.daemon().world().peers;
+    m_toFind.assign(peers.begin(), peers.end());
+    m_toName.clear();
+    m_finder.start(times.scaled(times.firstFound), [this] { findNext(); });
+    m_roundEnd.start(times.scaled(times.inquiry), [this] {
+        m_inquiring = false;
+        m_finder.stop();
         askNames();
     });
 }
 
 void Discovery::findNext() {
-    const Times& times = adapter_.daemon().times();
+    const Times& times = m_adapter.daemon().times();
     // However many there are, all are found well before the end of the round.
-    const std::size_t most = std::max<std::size_t>(1, adapter_.daemon().world().peers.size());
+    const std::size_t most = std::max<std::size_t>(1, m_adapter.daemon().world().peers.size());
     const guint interval =
         std::min(times.foundInterval, static_cast<guint>(times.inquiry * 3 / 4 / most));
-    while (!toFind_.empty()) {
-        const auto peer = toFind_.front();
-        toFind_.pop_front();
+    while (!m_toFind.empty()) {
+        const auto peer = m_toFind.front();
+        m_toFind.pop_front();
         if (!visible(*peer))
             continue;
         see(*peer);
         if (!peer->nameInInquiry)
-            toName_.push_back(peer);
+            m_toName.push_back(peer);
         break;
     }
-    if (!toFind_.empty())
-        finder_.start(times.scaled(interval), [this] { findNext(); });
+    if (!m_toFind.empty())
+        m_finder.start(times.scaled(interval), [this] { findNext(); });
 }
 
 void Discovery::askNames() {
     const auto known = [this](const std::shared_ptr<Peer>& peer) {
-        return !adapter_.hardware().storage[peer->address].name.empty();
+        return !m_adapter.hardware().storage[peer->address].name.empty();
     };
-    toName_.erase(std::remove_if(toName_.begin(), toName_.end(), known), toName_.end());
+    m_toName.erase(std::remove_if(m_toName.begin(), m_toName.end(), known), m_toName.end());
     askNextName();
 }
 
 void Discovery::askNextName() {
-    const Times& times = adapter_.daemon().times();
-    if (toName_.empty())
-        return roundEnd_.start(times.scaled(times.inquiryGap), [this] { endRound(); });
-    roundEnd_.start(times.scaled(times.nameRequest), [this] {
-        const auto peer = toName_.front();
-        toName_.pop_front();
+    const Times& times = m_adapter.daemon().times();
+    if (m_toName.empty())
+        return m_roundEnd.start(times.scaled(times.inquiryGap), [this] { endRound(); });
+    m_roundEnd.start(times.scaled(times.nameRequest), [this] {
+        const auto peer = m_toName.front();
+        m_toName.pop_front();
         if (peer->connectable && visible(*peer)) {
-            adapter_.hardware().storage[peer->address].name = peer->name;
+            m_adapter.hardware().storage[peer->address].name = peer->name;
             see(*peer);
         }
         askNextName();
@@ -134,55 +134,55 @@ void Discovery::askNextName() {
 
 void Discovery::endRound() {
     setActive(false);
-    for (auto found = found_.begin(); found != found_.end();) {
+    for (auto found = m_found.begin(); found != m_found.end();) {
         if (found->second.inThisRound) {
             ++found;
             continue;
         }
-        adapter_.emit("DeviceDisappeared", tuple(textValue(found->first)));
-        found = found_.erase(found);
+        m_adapter.emit("DeviceDisappeared", tuple(textValue(found->first)));
+        found = m_found.erase(found);
     }
     setActive(true);
     startRound();
 }
 
 bool Discovery::visible(const Peer& peer) const {
-    if (!peer.present || (!peer.adapter.empty() && peer.adapter != adapter_.hardware().id()))
+    if (!peer.present || (!peer.adapter.empty() && peer.adapter != m_adapter.hardware().id()))
         return false;
-    const gint64 elapsed = (g_get_monotonic_time() - began_) / 1000;
-    return peer.visibleFor == 0 || elapsed < adapter_.daemon().times().scaled(peer.visibleFor);
+    const gint64 elapsed = (g_get_monotonic_time() - m_began) / 1000;
+    return peer.visibleFor == 0 || elapsed < m_adapter.daemon().times().scaled(peer.visibleFor);
 }
 
 void Discovery::peerChanged(const std::shared_ptr<Peer>& peer) {
-    if (active_ && inquiring_ && visible(*peer)) {
+    if (m_active && m_inquiring && visible(*peer)) {
         see(*peer);
         if (!peer->nameInInquiry)
-            toName_.push_back(peer);
+            m_toName.push_back(peer);
     }
 }
 
 void Discovery::see(Peer& peer) {
-    StoredDevice& stored = adapter_.hardware().storage[peer.address];
+    StoredDevice& stored = m_adapter.hardware().storage[peer.address];
     stored.deviceClass = peer.deviceClass;
     if (peer.nameInInquiry)
         stored.name = peer.name;
 
     const int range = static_cast<int>(peer.rssiVariation);
-    const int offset = range ? static_cast<int>(round_ * 3 + 1) % (2 * range + 1) - range : 0;
+    const int offset = range ? static_cast<int>(m_round * 3 + 1) % (2 * range + 1) - range : 0;
     const auto rssi = static_cast<gint16>(peer.rssi + offset);
 
-    const auto before = found_.find(peer.address);
-    const bool news =
-        before == found_.end() || before->second.rssi != rssi || before->second.name != stored.name;
-    found_[peer.address] = {rssi, stored.name, true};
-    if (const auto device = adapter_.find(peer.address))
+    const auto before = m_found.find(peer.address);
+    const bool news = before == m_found.end() || before->second.rssi != rssi ||
+                      before->second.name != stored.name;
+    m_found[peer.address] = {rssi, stored.name, true};
+    if (const auto device = m_adapter.find(peer.address))
         device->seen();
     if (news)
         report(peer, rssi);
 }
 
 void Discovery::report(const Peer& peer, gint16 rssi) {
-    const StoredDevice& stored = adapter_.hardware().storage[peer.address];
+    const StoredDevice& stored = m_adapter.hardware().storage[peer.address];
     Dict values;
     values.add("Address", textValue(peer.address));
     values.add("Class", g_variant_new_uint32(peer.deviceClass));
@@ -203,8 +203,8 @@ void Discovery::report(const Peer& peer, gint16 rssi) {
         values.add("Trusted", boolValue(stored.trusted));
     if (!peer.uuids.empty())
         values.add("UUIDs", listValue("s", peer.uuids));
-    adapter_.emit("DeviceFound",
-                  g_variant_new("(s@a{sv})", peer.address.c_str(), values.end().get()));
+    m_adapter.emit("DeviceFound",
+                   g_variant_new("(s@a{sv})", peer.address.c_str(), values.end().get()));
 }
 
 } // namespace Bluetooth::Sim

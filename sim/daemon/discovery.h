@@ -1,4 +1,5 @@
-#pragma once
+#ifndef KESBLUETOOTH_SIM_DAEMON_DISCOVERY_H
+#define KESBLUETOOTH_SIM_DAEMON_DISCOVERY_H
 
 #include "bus/call.h"
 #include "world/peer.h"
@@ -19,9 +20,9 @@ class Adapter;
 /// It runs in rounds: an inquiry that finds devices, then the names that did not come with it.
 class Discovery {
 public:
-    explicit Discovery(Adapter& adapter) : adapter_(adapter) {}
+    explicit Discovery(Adapter& adapter) : m_adapter(adapter) {}
 
-    bool active() const { return active_; }
+    bool active() const { return m_active; }
 
     void startSession(const CallPtr& call);
     void stopSession(const CallPtr& call);
@@ -55,18 +56,20 @@ private:
     void report(const Peer& peer, gint16 rssi);
     bool visible(const Peer& peer) const;
 
-    Adapter& adapter_;
-    std::map<std::string, unsigned> sessions_; ///< how often each client started it
-    std::map<std::string, Found> found_;
-    std::deque<std::shared_ptr<Peer>> toFind_;
-    std::deque<std::shared_ptr<Peer>> toName_;
-    bool active_ = false;
-    bool inquiring_ = false;
-    unsigned suspensions_ = 0;
-    unsigned round_ = 0;
-    gint64 began_ = 0;
-    Timer finder_;
-    Timer roundEnd_;
+    Adapter& m_adapter;
+    std::map<std::string, unsigned> m_sessions; ///< how often each client started it
+    std::map<std::string, Found> m_found;
+    std::deque<std::shared_ptr<Peer>> m_toFind;
+    std::deque<std::shared_ptr<Peer>> m_toName;
+    bool m_active = false;
+    bool m_inquiring = false;
+    unsigned m_suspensions = 0;
+    unsigned m_round = 0;
+    gint64 m_began = 0;
+    Timer m_finder;
+    Timer m_roundEnd;
 };
 
 } // namespace Bluetooth::Sim
+
+#endif

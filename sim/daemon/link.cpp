@@ -2,25 +2,26 @@
 
 #include "bus/dict.h"
 #include "daemon/adapter.h"
+#include "daemon/audio_device.h"
 #include "daemon/daemon.h"
 #include "daemon/device.h"
 
 namespace Bluetooth::Sim {
 
 void Link::connect(OnPaged onPaged) {
-    if (up_)
+    if (m_up)
         return onPaged(true);
-    waiting_.push_back(std::move(onPaged));
-    if (!pager_.running())
+    m_waiting.push_back(std::move(onPaged));
+    if (!m_pager.running())
         page();
 }
 
 void Link::page() {
-    const Times& times = device_.adapter().daemon().times();
-    if (!device_.reachable())
-        return pager_.start(times.scaled(times.pageTimeout), [this] { paged(false); });
-    pager_.start(times.scaled(times.connect), [this] {
-        if (device_.reachable())
+    const Times& times = m_device.adapter().daemon().times();
+    if (!m_device.reachable())
+        return m_pager.start(times.scaled(times.pageTimeout), [this] { paged(false); });
+    m_pager.start(times.scaled(times.connect), [this] {
+        if (m_device.reachable())
             return paged(true);
         page();
     });
@@ -29,68 +30,69 @@ void Link::page() {
 void Link::paged(bool reached) {
     if (reached)
         comeUp();
-    const auto waiting = std::move(waiting_);
-    waiting_.clear();
+    const auto waiting = std::move(m_waiting);
+    m_waiting.clear();
     for (const OnPaged& onPaged : waiting)
         onPaged(reached);
 }
 
 void Link::accept() {
-    pager_.stop();
+    m_pager.stop();
     paged(true);
 }
 
 void Link::comeUp() {
-    if (up_)
+    if (m_up)
         return;
-    up_ = true;
-    device_.changed("Connected", boolValue(true));
-    device_.learnName();
+    m_up = true;
+    m_device.changed("Connected", boolValue(true));
+    m_device.learnName();
 }
 
 void Link::hold() {
-    ++holds_;
-    idle_.stop();
+    ++m_holds;
+    m_idle.stop();
 }
 
 void Link::release() {
-    if (holds_ && --holds_ == 0 && up_) {
-        const Times& times = device_.adapter().daemon().times();
-        idle_.start(times.scaled(times.idleDisconnect), [this] { drop(); });
+    if (m_holds && --m_holds == 0 && m_up) {
+        const Times& times = m_device.adapter().daemon().times();
+        m_idle.start(times.scaled(times.idleDisconnect), [this] { drop(); });
     }
 }
 
 void Link::drop() {
-    if (!up_)
+    if (!m_up)
         return;
-    idle_.stop();
-    disconnect_.stop();
-    up_ = false;
-    const auto calls = std::move(disconnects_);
-    disconnects_.clear();
+    m_idle.stop();
+    m_disconnect.stop();
+    m_up = false;
+    const auto calls = std::move(m_disconnects);
+    m_disconnects.clear();
     for (const CallPtr& call : calls)
         call->reply();
-    device_.changed("Connected", boolValue(false));
-    device_.linkLost();
+    m_device.changed("Connected", boolValue(false));
+    m_device.linkLost();
 }
 
 void Link::requestDisconnect(const CallPtr& call) {
     if (call)
-        disconnects_.push_back(call);
-    if (disconnect_.running())
+        m_disconnects.push_back(call);
+    if (m_disconnect.running())
         return;
-    const Times& times = device_.adapter().daemon().times();
-    device_.emit("DisconnectRequested", {});
-    disconnect_.start(times.scaled(times.disconnectRequest), [this] { drop(); });
+    const Times& times = m_device.adapter().daemon().times();
+    m_device.emit("DisconnectRequested", {});
+    m_device.audio().linkLost(); // what uses the link lets go of it first
+    m_disconnect.start(times.scaled(times.disconnectRequest), [this] { drop(); });
 }
 
 void Link::abandon() {
-    up_ = false;
-    waiting_.clear();
-    disconnects_.clear();
-    pager_.stop();
-    idle_.stop();
-    disconnect_.stop();
+    m_up = false;
+    m_waiting.clear();
+    m_disconnects.clear();
+    m_pager.stop();
+    m_idle.stop();
+    m_disconnect.stop();
 }
 
 } // namespace Bluetooth::Sim

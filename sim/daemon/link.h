@@ -1,4 +1,5 @@
-#pragma once
+#ifndef KESBLUETOOTH_SIM_DAEMON_LINK_H
+#define KESBLUETOOTH_SIM_DAEMON_LINK_H
 
 #include "bus/call.h"
 #include "world/timer.h"
@@ -15,9 +16,9 @@ class Link {
 public:
     using OnPaged = std::function<void(bool reached)>;
 
-    explicit Link(Device& device) : device_(device) {}
+    explicit Link(Device& device) : m_device(device) {}
 
-    bool up() const { return up_; }
+    bool up() const { return m_up; }
 
     /// Reaches the device, at once when it is connected already.
     void connect(OnPaged onPaged);
@@ -38,14 +39,16 @@ private:
     void paged(bool reached);
     void comeUp();
 
-    Device& device_;
-    bool up_ = false;
-    unsigned holds_ = 0;
-    std::vector<OnPaged> waiting_;
-    std::vector<CallPtr> disconnects_;
-    Timer pager_;
-    Timer idle_;
-    Timer disconnect_;
+    Device& m_device;
+    bool m_up = false;
+    unsigned m_holds = 0;
+    std::vector<OnPaged> m_waiting;
+    std::vector<CallPtr> m_disconnects;
+    Timer m_pager;
+    Timer m_idle;
+    Timer m_disconnect;
 };
 
 } // namespace Bluetooth::Sim
+
+#endif

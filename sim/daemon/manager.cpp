@@ -20,12 +20,12 @@ const Interface& Manager::table() {
     return table;
 }
 
-Manager::Manager(Daemon& daemon) : daemon_(daemon) {
-    daemon_.objects().add("/", table(), this);
+Manager::Manager(Daemon& daemon) : m_daemon(daemon) {
+    m_daemon.objects().add("/", table(), this);
 }
 
 Manager::~Manager() {
-    daemon_.objects().remove("/");
+    m_daemon.objects().remove("/");
 }
 
 void Manager::getProperties(const CallPtr& call) {
@@ -33,16 +33,16 @@ void Manager::getProperties(const CallPtr& call) {
 }
 
 void Manager::defaultAdapter(const CallPtr& call) {
-    if (daemon_.adapters().empty())
+    if (m_daemon.adapters().empty())
         return call->fail(Errors::noSuchAdapter());
-    call->reply(tuple(pathValue(daemon_.adapters().front()->path())));
+    call->reply(tuple(pathValue(m_daemon.adapters().front()->path())));
 }
 
 void Manager::findAdapter(const CallPtr& call) {
     const std::string pattern = call->text(0);
     if (pattern == "any")
-        return call->reply(tuple(pathValue(daemon_.basePath() + "/any")));
-    const Adapter* adapter = daemon_.find(pattern);
+        return call->reply(tuple(pathValue(m_daemon.basePath() + "/any")));
+    const Adapter* adapter = m_daemon.find(pattern);
     if (!adapter)
         return call->fail(Errors::noSuchAdapter());
     call->reply(tuple(pathValue(adapter->path())));
@@ -54,13 +54,13 @@ void Manager::listAdapters(const CallPtr& call) {
 
 Value Manager::adapterPaths() const {
     std::vector<std::string> paths;
-    for (const auto& adapter : daemon_.adapters())
+    for (const auto& adapter : m_daemon.adapters())
         paths.push_back(adapter->path());
     return listValue("o", paths);
 }
 
 void Manager::emit(const char* member, const Value& arguments) {
-    daemon_.bus().emit("/", table().name, member, arguments);
+    m_daemon.bus().emit("/", table().name, member, arguments);
 }
 
 void Manager::adaptersChanged() {
@@ -70,14 +70,14 @@ void Manager::adaptersChanged() {
 void Manager::adapterAdded(const Adapter& adapter) {
     emit("AdapterAdded", tuple(pathValue(adapter.path())));
     adaptersChanged();
-    if (daemon_.adapters().size() == 1)
+    if (m_daemon.adapters().size() == 1)
         emit("DefaultAdapterChanged", tuple(pathValue(adapter.path())));
 }
 
 void Manager::adapterRemoved(const std::string& path, bool wasDefault) {
     adaptersChanged();
-    if (wasDefault && !daemon_.adapters().empty())
-        emit("DefaultAdapterChanged", tuple(pathValue(daemon_.adapters().front()->path())));
+    if (wasDefault && !m_daemon.adapters().empty())
+        emit("DefaultAdapterChanged", tuple(pathValue(m_daemon.adapters().front()->path())));
     emit("AdapterRemoved", tuple(pathValue(path)));
 }
 

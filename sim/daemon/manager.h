@@ -1,4 +1,5 @@
-#pragma once
+#ifndef KESBLUETOOTH_SIM_DAEMON_MANAGER_H
+#define KESBLUETOOTH_SIM_DAEMON_MANAGER_H
 
 #include "bus/interface.h"
 
@@ -32,7 +33,9 @@ private:
     void emit(const char* member, const Value& arguments);
     void adaptersChanged();
 
-    Daemon& daemon_;
+    Daemon& m_daemon;
 };
 
 } // namespace Bluetooth::Sim
+
+#endif

@@ -35,22 +35,22 @@ std::shared_ptr<Pairing> Pairing::incoming(Device& device) {
 }
 
 Pairing::Pairing(Device& device, CallPtr call, std::shared_ptr<Agent> agent)
-    : device_(device),
-      call_(std::move(call)),
-      agent_(std::move(agent)),
-      outgoing_(call_ != nullptr) {}
+    : m_device(device),
+      m_call(std::move(call)),
+      m_agent(std::move(agent)),
+      m_outgoing(m_call != nullptr) {}
 
 Pairing::~Pairing() = default;
 
 std::string Pairing::owner() const {
-    return call_ ? call_->sender() : "";
+    return m_call ? m_call->sender() : "";
 }
 
 void Pairing::begin() {
-    if (outgoing_)
-        device_.adapter().discovery().suspend();
-    device_.link().hold();
-    device_.link().connect([this](bool reached) {
+    if (m_outgoing)
+        m_device.adapter().discovery().suspend();
+    m_device.link().hold();
+    m_device.link().connect([this](bool reached) {
         if (reached)
             negotiate();
         else
@@ -59,38 +59,38 @@ void Pairing::begin() {
 }
 
 guint Pairing::duration() const {
-    const Times& times = device_.adapter().daemon().times();
-    const auto peer = device_.peer();
+    const Times& times = m_device.adapter().daemon().times();
+    const auto peer = m_device.peer();
     return times.scaled(peer && peer->pairingTime ? *peer->pairingTime : times.pairing);
 }
 
 guint32 Pairing::passkey() const {
-    const auto peer = device_.peer();
+    const auto peer = m_device.peer();
     if (peer && peer->passkey)
         return *peer->passkey;
     return static_cast<guint32>(g_random_int_range(0, 1000000));
 }
 
 void Pairing::negotiate() {
-    const Times& times = device_.adapter().daemon().times();
-    const auto peer = device_.peer();
-    if (!outgoing_ && !device_.adapter().mode().pairable())
+    const Times& times = m_device.adapter().daemon().times();
+    const auto peer = m_device.peer();
+    if (!m_outgoing && !m_device.adapter().mode().pairable())
         return fail(authentication("Rejected"));
     switch (peer->pairingEnd) {
     case PairingEnd::Rejected:
-        return timer_.start(duration(), [this] { fail(authentication("Rejected")); });
+        return m_timer.start(duration(), [this] { fail(authentication("Rejected")); });
     case PairingEnd::RepeatedAttempts:
-        return timer_.start(
+        return m_timer.start(
             duration(), [this] { fail(Errors::bluez("RepeatedAttempts", "Repeated Attempts")); });
     case PairingEnd::LinkLost:
-        loss_.start(times.scaled(times.linkLoss), [this] {
+        m_loss.start(times.scaled(times.linkLoss), [this] {
             fail(Errors::bluez("ConnectionAttemptFailed", "Connection Timeout"));
         });
         break;
     default:
         break;
     }
-    if (peer->legacy && peer->displaysPin && outgoing_)
+    if (peer->legacy && peer->displaysPin && m_outgoing)
         displayPin();
     else if (peer->legacy)
         askForPin();
@@ -100,38 +100,38 @@ void Pairing::negotiate() {
 
 void Pairing::ask(const char* member, const Value& arguments, const char* results,
                   Agent::OnAnswer onAnswer) {
-    const Times& times = device_.adapter().daemon().times();
-    if (agent_->busy())
+    const Times& times = m_device.adapter().daemon().times();
+    if (m_agent->busy())
         return answered(false);
-    timeout_.start(times.pairingTimeout, [this] { fail(authentication("Timeout")); });
-    agent_->ask(member, arguments, results, times.agentTimeout,
-                [this, onAnswer = std::move(onAnswer)](const Answer& answer) {
-                    timeout_.stop();
-                    if (!cancelled_)
-                        onAnswer(answer);
-                });
+    m_timeout.start(times.pairingTimeout, [this] { fail(authentication("Timeout")); });
+    m_agent->ask(member, arguments, results, times.agentTimeout,
+                 [this, onAnswer = std::move(onAnswer)](const Answer& answer) {
+                     m_timeout.stop();
+                     if (!m_cancelled)
+                         onAnswer(answer);
+                 });
 }
 
 void Pairing::askForPin() {
-    if (!agent_)
+    if (!m_agent)
         return answered(false);
-    ask("RequestPinCode", tuple(pathValue(device_.path())), "s", [this](const Answer& answer) {
+    ask("RequestPinCode", tuple(pathValue(m_device.path())), "s", [this](const Answer& answer) {
         const char* pin = "";
         if (!answer.failed)
             g_variant_get(answer.results.get(), "(&s)", &pin);
         if (!usablePin(pin))
             return fail(authentication("Rejected"));
-        const auto peer = device_.peer();
+        const auto peer = m_device.peer();
         answered(peer && !peer->pin.empty() && peer->pin == pin);
     });
 }
 
 void Pairing::displayPin() {
     const GlibPtr<char> pin(g_strdup_printf("%06u", passkey()));
-    displaying_ = true;
-    ask("DisplayPinCode", g_variant_new("(os)", device_.path().c_str(), pin.get()), "",
+    m_displaying = true;
+    ask("DisplayPinCode", g_variant_new("(os)", m_device.path().c_str(), pin.get()), "",
         [this](const Answer& answer) {
-            displaying_ = !answer.failed;
+            m_displaying = !answer.failed;
             if (answer.failed)
                 return askForPin(); // an agent that cannot show one is asked for one
             answered(true);
@@ -139,21 +139,21 @@ void Pairing::displayPin() {
 }
 
 void Pairing::askByCapabilities() {
-    const Capability theirs = device_.peer()->capability;
-    const Capability ours = agent_ ? agent_->capability() : Capability::NoInputNoOutput;
+    const Capability theirs = m_device.peer()->capability;
+    const Capability ours = m_agent ? m_agent->capability() : Capability::NoInputNoOutput;
     if (theirs == Capability::NoInputNoOutput || ours == Capability::NoInputNoOutput)
         return answered(true);
     if (ours == Capability::KeyboardOnly)
         return enter(passkey(), theirs == Capability::KeyboardOnly);
     if (theirs == Capability::KeyboardOnly) {
-        displaying_ = true;
+        m_displaying = true;
         return display(passkey(), 0);
     }
     confirm(passkey());
 }
 
 void Pairing::confirm(guint32 passkey) {
-    ask("RequestConfirmation", g_variant_new("(ou)", device_.path().c_str(), passkey), "",
+    ask("RequestConfirmation", g_variant_new("(ou)", m_device.path().c_str(), passkey), "",
         [this](const Answer& answer) {
             if (answer.failed)
                 return fail(authentication("Failed"));
@@ -162,7 +162,7 @@ void Pairing::confirm(guint32 passkey) {
 }
 
 void Pairing::enter(guint32 passkey, bool typedOnBothSides) {
-    ask("RequestPasskey", tuple(pathValue(device_.path())), "u",
+    ask("RequestPasskey", tuple(pathValue(m_device.path())), "u",
         [this, passkey, typedOnBothSides](const Answer& answer) {
             if (answer.failed)
                 return fail(authentication("Failed"));
@@ -174,33 +174,33 @@ void Pairing::enter(guint32 passkey, bool typedOnBothSides) {
 
 void Pairing::display(guint32 passkey, guint8 entered) {
     constexpr guint8 digits = 6;
-    const Times& times = device_.adapter().daemon().times();
-    agent_->show("DisplayPasskey",
-                 g_variant_new("(ouy)", device_.path().c_str(), passkey, entered));
+    const Times& times = m_device.adapter().daemon().times();
+    m_agent->show("DisplayPasskey",
+                  g_variant_new("(ouy)", m_device.path().c_str(), passkey, entered));
     if (entered == digits)
         return answered(true);
-    timer_.start(times.scaled(times.keyPress),
-                 [this, passkey, entered] { display(passkey, static_cast<guint8>(entered + 1)); });
+    m_timer.start(times.scaled(times.keyPress),
+                  [this, passkey, entered] { display(passkey, static_cast<guint8>(entered + 1)); });
 }
 
 void Pairing::answered(bool right) {
-    const auto peer = device_.peer();
+    const auto peer = m_device.peer();
     const PairingEnd how = peer ? peer->pairingEnd : PairingEnd::LinkLost;
     switch (how) {
     case PairingEnd::LinkLost:
         return; // nothing more is heard until the loss is noticed
     case PairingEnd::NeverAnswers: {
-        const Times& times = device_.adapter().daemon().times();
-        return timer_.start(times.pairingTimeout, [this] { fail(authentication("Timeout")); });
+        const Times& times = m_device.adapter().daemon().times();
+        return m_timer.start(times.pairingTimeout, [this] { fail(authentication("Timeout")); });
     }
     case PairingEnd::Refused:
-        return timer_.start(duration(), [this] { fail(authentication("Failed")); });
+        return m_timer.start(duration(), [this] { fail(authentication("Failed")); });
     case PairingEnd::CancelledByPeer:
-        return timer_.start(duration(), [this] { fail(authentication("Canceled")); });
+        return m_timer.start(duration(), [this] { fail(authentication("Canceled")); });
     default:
         break;
     }
-    timer_.start(duration(), [this, right] {
+    m_timer.start(duration(), [this, right] {
         if (right)
             finish();
         else
@@ -209,54 +209,54 @@ void Pairing::answered(bool right) {
 }
 
 void Pairing::finish() {
-    if (cancelled_)
+    if (m_cancelled)
         return;
-    const Times& times = device_.adapter().daemon().times();
-    done_ = true;
-    loss_.stop();
-    if (displaying_)
-        agent_->cancel();
-    device_.setTemporary(false);
-    device_.stored().known = true;
-    device_.setPaired(true);
-    if (outgoing_)
-        agent_->release();
-    timer_.start(times.scaled(outgoing_ ? times.serviceSearch : times.reverseSearch),
-                 [this] { succeed(); });
+    const Times& times = m_device.adapter().daemon().times();
+    m_done = true;
+    m_loss.stop();
+    if (m_displaying)
+        m_agent->cancel();
+    m_device.setTemporary(false);
+    m_device.stored().known = true;
+    m_device.setPaired(true);
+    if (m_outgoing)
+        m_agent->release();
+    m_timer.start(times.scaled(m_outgoing ? times.serviceSearch : times.reverseSearch),
+                  [this] { succeed(); });
 }
 
 void Pairing::succeed() {
-    Adapter& adapter = device_.adapter();
-    const bool outgoing = outgoing_;
-    device_.learnServices();
-    if (call_)
-        call_->reply(tuple(pathValue(device_.path())));
-    device_.link().release();
+    Adapter& adapter = m_device.adapter();
+    const bool outgoing = m_outgoing;
+    m_device.learnServices();
+    if (m_call)
+        m_call->reply(tuple(pathValue(m_device.path())));
+    m_device.link().release();
     end();
     if (outgoing)
         adapter.discovery().resume();
 }
 
 void Pairing::stopTimers() {
-    timer_.stop();
-    timeout_.stop();
-    loss_.stop();
+    m_timer.stop();
+    m_timeout.stop();
+    m_loss.stop();
 }
 
 void Pairing::end() {
     stopTimers();
-    device_.pairingEnded();
+    m_device.pairingEnded();
 }
 
 void Pairing::fail(const BusError& error) {
-    const auto device = device_.shared_from_this();
-    const bool outgoing = outgoing_;
-    if (agent_ && (agent_->busy() || displaying_))
-        agent_->cancel();
-    if (call_)
-        call_->fail(error);
-    if (outgoing && agent_)
-        agent_->release();
+    const auto device = m_device.shared_from_this();
+    const bool outgoing = m_outgoing;
+    if (m_agent && (m_agent->busy() || m_displaying))
+        m_agent->cancel();
+    if (m_call)
+        m_call->fail(error);
+    if (outgoing && m_agent)
+        m_agent->release();
     end();
     removeFailed(device, outgoing);
 }
@@ -271,25 +271,25 @@ void Pairing::removeFailed(const std::shared_ptr<Device>& device, bool outgoing)
 }
 
 void Pairing::cancel(const CallPtr& call) {
-    device_.setTemporary(true);
-    cancelled_ = true;
+    m_device.setTemporary(true);
+    m_cancelled = true;
     stopTimers();
-    if (device_.link().up())
-        return device_.link().requestDisconnect(call);
+    if (m_device.link().up())
+        return m_device.link().requestDisconnect(call);
     linkLost();
     call->reply();
 }
 
 void Pairing::linkLost() {
-    if (done_ && !cancelled_)
+    if (m_done && !m_cancelled)
         return succeed(); // paired already: only the services were still being read
-    if (!cancelled_)
+    if (!m_cancelled)
         return fail(pageTimeout());
-    const auto device = device_.shared_from_this();
-    const auto agent = agent_;
-    const CallPtr creating = call_;
-    const bool outgoing = outgoing_;
-    if (agent && (agent->busy() || displaying_))
+    const auto device = m_device.shared_from_this();
+    const auto agent = m_agent;
+    const CallPtr creating = m_call;
+    const bool outgoing = m_outgoing;
+    if (agent && (agent->busy() || m_displaying))
         agent->cancel();
     end();
     removeFailed(device, outgoing);
@@ -304,23 +304,23 @@ void Pairing::powerLost() {
 }
 
 void Pairing::ownerGone() {
-    if (done_)
+    if (m_done)
         return;
-    device_.setTemporary(!device_.stored().known);
-    cancelled_ = true;
+    m_device.setTemporary(!m_device.stored().known);
+    m_cancelled = true;
     stopTimers();
     // Nobody is left to be told.
-    agent_.reset();
-    call_.reset();
-    if (device_.link().up())
-        device_.link().requestDisconnect(nullptr);
+    m_agent.reset();
+    m_call.reset();
+    if (m_device.link().up())
+        m_device.link().requestDisconnect(nullptr);
     else
         linkLost();
 }
 
 void Pairing::releaseAgent() {
-    if (outgoing_ && agent_)
-        agent_->release();
+    if (m_outgoing && m_agent)
+        m_agent->release();
 }
 
 } // namespace Bluetooth::Sim

@@ -1,4 +1,5 @@
-#pragma once
+#ifndef KESBLUETOOTH_SIM_DAEMON_PAIRING_H
+#define KESBLUETOOTH_SIM_DAEMON_PAIRING_H
 
 #include "bus/bus_link.h"
 #include "daemon/agent.h"
@@ -28,7 +29,7 @@ public:
     /// The unique name of the client that wants it; "" when the device began it.
     std::string owner() const;
     /// Who is asked, or null.
-    const Agent* agent() const { return agent_.get(); }
+    const Agent* agent() const { return m_agent.get(); }
     void begin();
     /// CancelDeviceCreation of the owner.
     void cancel(const CallPtr& call);
@@ -58,16 +59,18 @@ private:
     guint32 passkey() const;
     guint duration() const;
 
-    Device& device_;
-    CallPtr call_; ///< null when the device began the pairing
-    std::shared_ptr<Agent> agent_;
-    bool outgoing_;
-    bool displaying_ = false;
-    bool cancelled_ = false;
-    bool done_ = false;
-    Timer timer_;
-    Timer timeout_;
-    Timer loss_;
+    Device& m_device;
+    CallPtr m_call; ///< null when the device began the pairing
+    std::shared_ptr<Agent> m_agent;
+    bool m_outgoing;
+    bool m_displaying = false;
+    bool m_cancelled = false;
+    bool m_done = false;
+    Timer m_timer;
+    Timer m_timeout;
+    Timer m_loss;
 };
 
 } // namespace Bluetooth::Sim
+
+#endif

@@ -18,7 +18,7 @@ struct ServiceClass {
     const char* protocol;
 };
 
-constexpr ServiceClass kClasses[] = {
+constexpr ServiceClass classes[] = {
     {"1101", "spp", "Serial Port", 1, "", ""},
     {"1103", "dun", "Dial-Up Networking", 2, "", ""},
     {"1105", "opush", "OBEX Object Push", 3, "", ""},
@@ -39,9 +39,9 @@ constexpr ServiceClass kClasses[] = {
 };
 
 const ServiceClass* classOf(const std::string& uuid) {
-    const auto* found = std::find_if(std::begin(kClasses), std::end(kClasses),
+    const auto* found = std::find_if(std::begin(classes), std::end(classes),
                                      [&](const auto& c) { return fullUuid(c.uuid) == uuid; });
-    return found == std::end(kClasses) ? nullptr : found;
+    return found == std::end(classes) ? nullptr : found;
 }
 
 std::string attribute(const char* id, const std::string& content) {
@@ -88,7 +88,7 @@ std::string record(guint32 handle, const std::string& uuid) {
 } // namespace
 
 std::string uuidOfPattern(const std::string& pattern) {
-    for (const ServiceClass& known : kClasses)
+    for (const ServiceClass& known : classes)
         if (g_ascii_strcasecmp(pattern.c_str(), known.shortName) == 0)
             return fullUuid(known.uuid);
     return fullUuid(pattern);

@@ -1,4 +1,5 @@
-#pragma once
+#ifndef KESBLUETOOTH_SIM_DAEMON_SERVICE_RECORDS_H
+#define KESBLUETOOTH_SIM_DAEMON_SERVICE_RECORDS_H
 
 #include "bus/glib_ptr.h"
 
@@ -16,3 +17,5 @@ std::string uuidOfPattern(const std::string& pattern);
 Value serviceRecords(const std::vector<std::string>& uuids, const std::string& wanted);
 
 } // namespace Bluetooth::Sim
+
+#endif

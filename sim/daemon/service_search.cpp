@@ -25,31 +25,31 @@ std::shared_ptr<ServiceSearch> ServiceSearch::begin(Device& device, const CallPt
 }
 
 void ServiceSearch::run() {
-    device_.link().hold();
+    m_device.link().hold();
     const auto search = [this](bool reached) {
         if (!reached) {
-            call_->fail(Errors::bluez("ConnectionAttemptFailed", "Host is down"));
+            m_call->fail(Errors::bluez("ConnectionAttemptFailed", "Host is down"));
             return end();
         }
-        const Times& times = device_.adapter().daemon().times();
-        timer_.start(times.scaled(times.serviceSearch), [this] { finish(); });
+        const Times& times = m_device.adapter().daemon().times();
+        m_timer.start(times.scaled(times.serviceSearch), [this] { finish(); });
     };
-    device_.link().connect(search);
+    m_device.link().connect(search);
 }
 
 void ServiceSearch::finish() {
-    device_.learnServices();
-    call_->reply(g_variant_new("(@a{us})", serviceRecords(device_.stored().uuids, uuid_).get()));
+    m_device.learnServices();
+    m_call->reply(g_variant_new("(@a{us})", serviceRecords(m_device.stored().uuids, m_uuid).get()));
     end();
 }
 
 void ServiceSearch::cancel() {
-    call_->fail(Errors::failed("Operation canceled"));
+    m_call->fail(Errors::failed("Operation canceled"));
     end();
 }
 
 void ServiceSearch::linkLost() {
-    call_->fail(Errors::bluez("ConnectionAttemptFailed", "Host is down"));
+    m_call->fail(Errors::bluez("ConnectionAttemptFailed", "Host is down"));
     end();
 }
 
@@ -58,9 +58,9 @@ void ServiceSearch::abandon() {
 }
 
 void ServiceSearch::end() {
-    timer_.stop();
-    device_.link().release();
-    device_.searchEnded();
+    m_timer.stop();
+    m_device.link().release();
+    m_device.searchEnded();
 }
 
 } // namespace Bluetooth::Sim

@@ -1,4 +1,5 @@
-#pragma once
+#ifndef KESBLUETOOTH_SIM_DAEMON_SERVICE_SEARCH_H
+#define KESBLUETOOTH_SIM_DAEMON_SERVICE_SEARCH_H
 
 #include "bus/call.h"
 #include "world/timer.h"
@@ -17,9 +18,9 @@ public:
     static std::shared_ptr<ServiceSearch> begin(Device& device, const CallPtr& call);
 
     ServiceSearch(Device& device, const CallPtr& call, std::string uuid)
-        : device_(device), call_(call), uuid_(std::move(uuid)) {}
+        : m_device(device), m_call(call), m_uuid(std::move(uuid)) {}
 
-    std::string owner() const { return call_->sender(); }
+    std::string owner() const { return m_call->sender(); }
     /// The caller is told "Operation canceled".
     void cancel();
     void linkLost();
@@ -31,10 +32,12 @@ private:
     void finish();
     void end();
 
-    Device& device_;
-    CallPtr call_;
-    std::string uuid_; ///< what is looked for; "" for everything
-    Timer timer_;
+    Device& m_device;
+    CallPtr m_call;
+    std::string m_uuid; ///< what is looked for; "" for everything
+    Timer m_timer;
 };
 
 } // namespace Bluetooth::Sim
+
+#endif

@@ -1,4 +1,5 @@
-#pragma once
+#ifndef KESBLUETOOTH_SIM_RUN_FOREGROUND_H
+#define KESBLUETOOTH_SIM_RUN_FOREGROUND_H
 
 #include "options.h"
 
@@ -10,3 +11,5 @@ namespace Bluetooth::Sim {
 int serveInForeground(const Options& options);
 
 } // namespace Bluetooth::Sim
+
+#endif

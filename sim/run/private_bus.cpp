@@ -9,7 +9,7 @@ namespace Bluetooth::Sim {
 
 namespace {
 
-constexpr int kAddressFd = 3;
+constexpr int addressFd = 3;
 
 std::string configuration(const std::string& folder, const std::string& type,
                           const std::vector<std::string>& serviceFolders) {
@@ -41,20 +41,20 @@ PrivateBus::PrivateBus(const std::string& folder, const std::string& type,
     Helper helper;
     helper.arguments = {"dbus-daemon",           "--nofork",
                         "--nopidfile",           "--syslog-only",
-                        "--config-file=" + file, "--print-address=" + std::to_string(kAddressFd)};
+                        "--config-file=" + file, "--print-address=" + std::to_string(addressFd)};
     helper.environment = environment;
-    helper.pipeTarget = kAddressFd;
+    helper.pipeTarget = addressFd;
     int output = -1;
-    pid_ = startHelper(helper, output);
-    address_ = readLine(output);
-    if (address_.empty()) {
-        endProcess(pid_);
+    m_pid = startHelper(helper, output);
+    m_address = readLine(output);
+    if (m_address.empty()) {
+        endProcess(m_pid);
         throw std::runtime_error("dbus-daemon has not started a " + type + " bus");
     }
 }
 
 PrivateBus::~PrivateBus() {
-    endProcess(pid_);
+    endProcess(m_pid);
 }
 
 } // namespace Bluetooth::Sim

@@ -1,4 +1,5 @@
-#pragma once
+#ifndef KESBLUETOOTH_SIM_RUN_PRIVATE_BUS_H
+#define KESBLUETOOTH_SIM_RUN_PRIVATE_BUS_H
 
 #include <string>
 #include <vector>
@@ -24,11 +25,13 @@ public:
     /// Stops it and waits for its end.
     ~PrivateBus();
 
-    const std::string& address() const { return address_; }
+    const std::string& address() const { return m_address; }
 
 private:
-    std::string address_;
-    pid_t pid_ = 0;
+    std::string m_address;
+    pid_t m_pid = 0;
 };
 
 } // namespace Bluetooth::Sim
+
+#endif

@@ -1,4 +1,5 @@
-#pragma once
+#ifndef KESBLUETOOTH_SIM_RUN_PROCESS_H
+#define KESBLUETOOTH_SIM_RUN_PROCESS_H
 
 #include "bus/glib_ptr.h"
 
@@ -36,3 +37,5 @@ std::string readLine(int fd);
 void endProcess(pid_t pid);
 
 } // namespace Bluetooth::Sim
+
+#endif

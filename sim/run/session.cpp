@@ -19,8 +19,8 @@ namespace Bluetooth::Sim {
 
 namespace {
 
-constexpr int kNotFound = 127;
-constexpr int kNotExecutable = 126;
+constexpr int notFound = 127;
+constexpr int notExecutable = 126;
 
 /// A folder that goes with all that is in it.
 class TemporaryFolder {
@@ -30,22 +30,22 @@ public:
         const GlibPtr<char> made(g_dir_make_tmp("bluez4-sim-XXXXXX", error.out()));
         if (!made)
             throw std::runtime_error(error->message);
-        path_ = made.get();
+        m_path = made.get();
     }
     TemporaryFolder(const TemporaryFolder&) = delete;
     TemporaryFolder& operator=(const TemporaryFolder&) = delete;
     ~TemporaryFolder() {
-        if (GDir* dir = g_dir_open(path_.c_str(), 0, nullptr)) {
+        if (GDir* dir = g_dir_open(m_path.c_str(), 0, nullptr)) {
             while (const char* name = g_dir_read_name(dir))
-                g_unlink((path_ + "/" + name).c_str());
+                g_unlink((m_path + "/" + name).c_str());
             g_dir_close(dir);
         }
-        g_rmdir(path_.c_str());
+        g_rmdir(m_path.c_str());
     }
-    const std::string& path() const { return path_; }
+    const std::string& path() const { return m_path; }
 
 private:
-    std::string path_;
+    std::string m_path;
 };
 
 std::string ownProgram() {
@@ -84,18 +84,18 @@ public:
         helper.environment = environment;
         helper.pipeTarget = readyFd;
         int output = -1;
-        pid_ = startHelper(helper, output);
+        m_pid = startHelper(helper, output);
         if (readLine(output).empty()) {
-            endProcess(pid_);
+            endProcess(m_pid);
             throw std::runtime_error("the simulated daemon has not started");
         }
     }
     DaemonProcess(const DaemonProcess&) = delete;
     DaemonProcess& operator=(const DaemonProcess&) = delete;
-    ~DaemonProcess() { endProcess(pid_); }
+    ~DaemonProcess() { endProcess(m_pid); }
 
 private:
-    pid_t pid_ = 0;
+    pid_t m_pid = 0;
 };
 
 /// What the command and the services that it has started left running.
@@ -117,16 +117,16 @@ public:
     SignalRelay(const SignalRelay&) = delete;
     SignalRelay& operator=(const SignalRelay&) = delete;
     ~SignalRelay() {
-        for (const guint source : sources_)
+        for (const guint source : m_sources)
             g_source_remove(source);
     }
 
-    void setTarget(pid_t pid) { target_ = pid; }
+    void setTarget(pid_t pid) { m_target = pid; }
     /// The signal that came before there was a command, or 0.
     int early() const {
         while (g_main_context_iteration(nullptr, FALSE)) {
         }
-        return early_;
+        return m_early;
     }
 
 private:
@@ -136,21 +136,21 @@ private:
             static_cast<SignalRelay*>(data)->came(Signal);
             return G_SOURCE_CONTINUE;
         };
-        sources_.push_back(g_unix_signal_add(Signal, came, this));
+        m_sources.push_back(g_unix_signal_add(Signal, came, this));
     }
 
     void came(int signal) {
         // Ctrl-C on a terminal has reached the command already.
         const bool fromTerminal = signal == SIGINT && tcgetpgrp(STDIN_FILENO) == getpgrp();
-        if (!target_)
-            early_ = signal;
+        if (!m_target)
+            m_early = signal;
         else if (!fromTerminal)
-            kill(target_, signal);
+            kill(m_target, signal);
     }
 
-    std::vector<guint> sources_;
-    pid_t target_ = 0;
-    int early_ = 0;
+    std::vector<guint> m_sources;
+    pid_t m_target = 0;
+    int m_early = 0;
 };
 
 struct Running {
@@ -178,8 +178,8 @@ int runCommand(const std::vector<std::string>& command, const std::vector<std::s
                        &running.pid, error.out())) {
         g_printerr("bluez4-sim: %s\n", error->message);
         g_main_loop_unref(running.loop);
-        return g_error_matches(error.get(), G_SPAWN_ERROR, G_SPAWN_ERROR_NOENT) ? kNotFound
-                                                                                : kNotExecutable;
+        return g_error_matches(error.get(), G_SPAWN_ERROR, G_SPAWN_ERROR_NOENT) ? notFound
+                                                                                : notExecutable;
     }
     relay.setTarget(running.pid);
     g_child_watch_add(

@@ -1,4 +1,5 @@
-#pragma once
+#ifndef KESBLUETOOTH_SIM_WORLD_ADDRESS_H
+#define KESBLUETOOTH_SIM_WORLD_ADDRESS_H
 
 #include <glib.h>
 
@@ -30,3 +31,5 @@ inline std::string withSeparator(std::string address, char separator) {
 }
 
 } // namespace Bluetooth::Sim
+
+#endif

@@ -1,4 +1,5 @@
-#pragma once
+#ifndef KESBLUETOOTH_SIM_WORLD_BEHAVIOUR_H
+#define KESBLUETOOTH_SIM_WORLD_BEHAVIOUR_H
 
 #include "world/peer.h"
 
@@ -19,3 +20,5 @@ const std::vector<Behaviour>& behaviours();
 const Behaviour* findBehaviour(const std::string& name);
 
 } // namespace Bluetooth::Sim
+
+#endif

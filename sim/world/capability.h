@@ -1,4 +1,5 @@
-#pragma once
+#ifndef KESBLUETOOTH_SIM_WORLD_CAPABILITY_H
+#define KESBLUETOOTH_SIM_WORLD_CAPABILITY_H
 
 #include <optional>
 #include <string>
@@ -24,3 +25,5 @@ inline std::optional<Capability> parseCapability(const std::string& text) {
 }
 
 } // namespace Bluetooth::Sim
+
+#endif

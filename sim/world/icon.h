@@ -1,4 +1,5 @@
-#pragma once
+#ifndef KESBLUETOOTH_SIM_WORLD_ICON_H
+#define KESBLUETOOTH_SIM_WORLD_ICON_H
 
 #include <glib.h>
 
@@ -38,3 +39,5 @@ inline const char* iconOf(guint32 deviceClass) {
 }
 
 } // namespace Bluetooth::Sim
+
+#endif

@@ -1,4 +1,5 @@
-#pragma once
+#ifndef KESBLUETOOTH_SIM_WORLD_PEER_H
+#define KESBLUETOOTH_SIM_WORLD_PEER_H
 
 #include "world/capability.h"
 
@@ -59,3 +60,5 @@ struct Peer {
 };
 
 } // namespace Bluetooth::Sim
+
+#endif

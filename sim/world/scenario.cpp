@@ -13,36 +13,36 @@ namespace {
 /// Reads one key file into a world; errors name where they were found.
 class ScenarioReader {
 public:
-    ScenarioReader(std::string file, GKeyFile* keys) : file_(std::move(file)), keys_(keys) {}
+    ScenarioReader(std::string file, GKeyFile* keys) : m_file(std::move(file)), m_keys(keys) {}
 
     World read() {
-        const GlibPtr<char*> groups(g_key_file_get_groups(keys_, nullptr));
+        const GlibPtr<char*> groups(g_key_file_get_groups(m_keys, nullptr));
         for (char** group = groups.get(); *group; ++group)
             readGroup(*group);
-        for (const auto& peer : world_.peers) {
-            if (!peer->adapter.empty() && !world_.adapter(peer->adapter))
+        for (const auto& peer : m_world.peers) {
+            if (!peer->adapter.empty() && !m_world.adapter(peer->adapter))
                 fail("Device " + peer->address, "Adapter",
                      "there is no adapter \"" + peer->adapter + "\"");
-            for (const auto& adapter : world_.adapters)
+            for (const auto& adapter : m_world.adapters)
                 World::store(*adapter, *peer);
         }
-        return std::move(world_);
+        return std::move(m_world);
     }
 
 private:
     [[noreturn]] void fail(const std::string& group, const std::string& key,
                            const std::string& what) const {
-        throw std::runtime_error(file_ + ": [" + group + "]" +
+        throw std::runtime_error(m_file + ": [" + group + "]" +
                                  (key.empty() ? std::string() : " " + key) + ": " + what);
     }
 
     Settings settingsOf(const std::string& group) const {
         Settings settings;
-        const GlibPtr<char*> names(g_key_file_get_keys(keys_, group.c_str(), nullptr, nullptr));
+        const GlibPtr<char*> names(g_key_file_get_keys(m_keys, group.c_str(), nullptr, nullptr));
         for (char** name = names.get(); *name; ++name) {
             ErrorOut error;
             const GlibPtr<char> value(
-                g_key_file_get_string(keys_, group.c_str(), *name, error.out()));
+                g_key_file_get_string(m_keys, group.c_str(), *name, error.out()));
             if (error)
                 fail(group, *name, error->message);
             settings.emplace_back(*name, value.get());
@@ -61,7 +61,7 @@ private:
 
     void readGroup(const std::string& group) {
         if (group == "Times")
-            apply(world_.times, group);
+            apply(m_world.times, group);
         else if (group.compare(0, 8, "Adapter ") == 0)
             readAdapter(group, group.substr(8));
         else if (group.compare(0, 7, "Device ") == 0)
@@ -81,7 +81,7 @@ private:
         apply(*adapter, group);
         if (adapter->address.empty())
             fail(group, "Address", "is missing");
-        world_.adapters.push_back(adapter);
+        m_world.adapters.push_back(adapter);
     }
 
     void readDevice(const std::string& group, const std::string& address) {
@@ -90,12 +90,12 @@ private:
         auto peer = std::make_shared<Peer>();
         peer->address = address;
         apply(*peer, group);
-        world_.peers.push_back(peer);
+        m_world.peers.push_back(peer);
     }
 
-    std::string file_;
-    GKeyFile* keys_;
-    World world_;
+    std::string m_file;
+    GKeyFile* m_keys;
+    World m_world;
 };
 
 World readLoaded(const std::string& name, GKeyFile* keys, bool loaded, const ErrorOut& error) {

@@ -1,4 +1,5 @@
-#pragma once
+#ifndef KESBLUETOOTH_SIM_WORLD_SCENARIO_H
+#define KESBLUETOOTH_SIM_WORLD_SCENARIO_H
 
 #include "world/world.h"
 
@@ -15,3 +16,5 @@ World loadScenario(const std::string& file);
 World loadDefaultScenario();
 
 } // namespace Bluetooth::Sim
+
+#endif

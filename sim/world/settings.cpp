@@ -83,7 +83,7 @@ void apply(T& target, const Key<T>* keys, std::size_t count, const std::string& 
     }
 }
 
-const Key<Peer> kPeerKeys[] = {
+const Key<Peer> peerKeys[] = {
     {"Name", [](Peer& p, const std::string& v) { p.name = v; }},
     {"Adapter", [](Peer& p, const std::string& v) { p.adapter = v; }},
     {"Class", [](Peer& p, const std::string& v) { p.deviceClass = u32(v); }},
@@ -124,7 +124,7 @@ const Key<Peer> kPeerKeys[] = {
     {"Alias", [](Peer& p, const std::string& v) { p.alias = v; }},
 };
 
-const Key<AdapterHardware> kAdapterKeys[] = {
+const Key<AdapterHardware> adapterKeys[] = {
     {"Address",
      [](AdapterHardware& a, const std::string& v) {
          if (!isAddress(v))
@@ -158,12 +158,12 @@ void applySettings(Peer& peer, const Settings& settings) {
     }
     for (const auto& [key, value] : settings)
         if (key != "Behaviour")
-            apply(peer, kPeerKeys, std::size(kPeerKeys), key, value);
+            apply(peer, peerKeys, std::size(peerKeys), key, value);
 }
 
 void applySettings(AdapterHardware& adapter, const Settings& settings) {
     for (const auto& [key, value] : settings)
-        apply(adapter, kAdapterKeys, std::size(kAdapterKeys), key, value);
+        apply(adapter, adapterKeys, std::size(adapterKeys), key, value);
 }
 
 void applySettings(Times& times, const Settings& settings) {

@@ -1,4 +1,5 @@
-#pragma once
+#ifndef KESBLUETOOTH_SIM_WORLD_SETTINGS_H
+#define KESBLUETOOTH_SIM_WORLD_SETTINGS_H
 
 #include "world/world.h"
 
@@ -14,11 +15,11 @@ namespace Bluetooth::Sim {
 class SettingError : public std::runtime_error {
 public:
     SettingError(std::string key, const std::string& what)
-        : std::runtime_error(what), key_(std::move(key)) {}
-    const std::string& key() const { return key_; }
+        : std::runtime_error(what), m_key(std::move(key)) {}
+    const std::string& key() const { return m_key; }
 
 private:
-    std::string key_;
+    std::string m_key;
 };
 
 /// Keys and values in the order in which they were written.
@@ -35,3 +36,5 @@ void applySettings(Times& times, const Settings& settings);
 std::string fullUuid(const std::string& text);
 
 } // namespace Bluetooth::Sim
+
+#endif

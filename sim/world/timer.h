@@ -1,4 +1,5 @@
-#pragma once
+#ifndef KESBLUETOOTH_SIM_WORLD_TIMER_H
+#define KESBLUETOOTH_SIM_WORLD_TIMER_H
 
 #include <glib.h>
 
@@ -17,32 +18,34 @@ public:
     /// Replaces what was set before.
     void start(guint milliseconds, std::function<void()> action) {
         stop();
-        action_ = std::move(action);
-        source_ = g_timeout_add(milliseconds, fire, this);
+        m_action = std::move(action);
+        m_source = g_timeout_add(milliseconds, fire, this);
     }
 
     void stop() {
-        if (source_)
-            g_source_remove(source_);
-        source_ = 0;
-        action_ = nullptr;
+        if (m_source)
+            g_source_remove(m_source);
+        m_source = 0;
+        m_action = nullptr;
     }
 
-    bool running() const { return source_ != 0; }
+    bool running() const { return m_source != 0; }
 
 private:
     static gboolean fire(gpointer data) {
         auto* timer = static_cast<Timer*>(data);
-        timer->source_ = 0;
+        timer->m_source = 0;
         // The action may start this timer again, or destroy it.
-        const std::function<void()> action = std::move(timer->action_);
-        timer->action_ = nullptr;
+        const std::function<void()> action = std::move(timer->m_action);
+        timer->m_action = nullptr;
         action();
         return G_SOURCE_REMOVE;
     }
 
-    guint source_ = 0;
-    std::function<void()> action_;
+    guint m_source = 0;
+    std::function<void()> m_action;
 };
 
 } // namespace Bluetooth::Sim
+
+#endif

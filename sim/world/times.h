@@ -1,4 +1,5 @@
-#pragma once
+#ifndef KESBLUETOOTH_SIM_WORLD_TIMES_H
+#define KESBLUETOOTH_SIM_WORLD_TIMES_H
 
 #include <glib.h>
 
@@ -48,3 +49,5 @@ struct Times {
 };
 
 } // namespace Bluetooth::Sim
+
+#endif

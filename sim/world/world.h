@@ -1,4 +1,5 @@
-#pragma once
+#ifndef KESBLUETOOTH_SIM_WORLD_WORLD_H
+#define KESBLUETOOTH_SIM_WORLD_WORLD_H
 
 #include "world/peer.h"
 #include "world/times.h"
@@ -59,3 +60,5 @@ struct World {
 };
 
 } // namespace Bluetooth::Sim
+
+#endif
