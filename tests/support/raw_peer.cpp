@@ -115,27 +115,31 @@ std::future<MessagePtr> RawPeer::call(const std::string& destination, const std:
                                       const Build& arguments, Milliseconds timeout) {
     auto message = std::make_shared<MessagePtr>(methodCall(destination, path, interface, member));
     build(*message, arguments);
-    auto* promise = new std::promise<MessagePtr>;
-    std::future<MessagePtr> result = promise->get_future();
-    post([message, promise, timeout](DBusConnection* connection) {
+    auto own = std::make_shared<OwnCall>();
+    own->deadline = Clock::now() + timeout;
+    std::future<MessagePtr> result = own->reply.get_future();
+    post([this, message, own](DBusConnection* connection) {
         DBusPendingCall* pending = nullptr;
         dbus_connection_send_with_reply(connection, message->get(), &pending,
-                                        static_cast<int>(timeout.count()));
-        if (!pending) {
-            promise->set_value(nullptr);
-            delete promise;
-            return;
-        }
-        dbus_pending_call_set_notify(
-            pending,
-            [](DBusPendingCall* done, void* data) {
-                static_cast<std::promise<MessagePtr>*>(data)->set_value(
-                    MessagePtr(dbus_pending_call_steal_reply(done)));
-            },
-            promise, [](void* data) { delete static_cast<std::promise<MessagePtr>*>(data); });
-        dbus_pending_call_unref(pending);
+                                        DBUS_TIMEOUT_INFINITE);
+        own->pending.reset(pending);
+        m_ownCalls.push_back(std::move(*own));
     });
     return result;
+}
+
+/// libdbus looks after time-outs only inside its own waits and main loops.
+void RawPeer::finishOwnCalls() {
+    m_ownCalls.remove_if([](OwnCall& call) {
+        const bool answered = call.pending && dbus_pending_call_get_completed(call.pending.get());
+        if (!answered && call.pending && Clock::now() < call.deadline)
+            return false;
+        if (!answered && call.pending)
+            dbus_pending_call_cancel(call.pending.get());
+        call.reply.set_value(
+            MessagePtr(answered ? dbus_pending_call_steal_reply(call.pending.get()) : nullptr));
+        return true;
+    });
 }
 
 bool RawPeer::own(const std::string& name) {
@@ -237,6 +241,7 @@ void RawPeer::loop() {
         for (const Task& task : tasks)
             task(m_connection);
         sendDueReplies();
+        finishOwnCalls();
         wait();
         dbus_connection_read_write(m_connection, 0);
         while (dbus_connection_dispatch(m_connection) == DBUS_DISPATCH_DATA_REMAINS) {
@@ -253,7 +258,7 @@ void RawPeer::wait() {
         dbus_connection_get_unix_fd(m_connection, &fds[1].fd);
     if (dbus_connection_has_messages_to_send(m_connection))
         fds[1].events |= POLLOUT;
-    auto limit = Milliseconds(100); // time-outs of calls are looked after by reading
+    auto limit = Milliseconds(m_ownCalls.empty() ? 1000 : 20);
     if (!m_dueReplies.empty())
         limit =
             std::clamp(std::chrono::ceil<Milliseconds>(m_dueReplies.begin()->first - Clock::now()),

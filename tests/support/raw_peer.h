@@ -9,6 +9,7 @@
 #include <deque>
 #include <functional>
 #include <future>
+#include <list>
 #include <map>
 #include <mutex>
 #include <string>
@@ -95,11 +96,17 @@ private:
         Handler handler;
         Milliseconds delay{0};
     };
+    struct OwnCall {
+        PendingPtr pending;
+        std::promise<MessagePtr> reply;
+        Clock::time_point deadline;
+    };
 
     void post(Task task);
     void loop();
     void wait();
     void sendDueReplies();
+    void finishOwnCalls();
     DBusHandlerResult take(DBusMessage* message);
     void answerCall(DBusMessage* message);
     static DBusHandlerResult filter(DBusConnection*, DBusMessage* message, void* peer);
@@ -112,6 +119,7 @@ private:
     std::deque<Task> m_tasks;
     std::map<std::string, Answer> m_answers;
     std::multimap<Clock::time_point, MessagePtr> m_dueReplies; // of the peer's thread
+    std::list<OwnCall> m_ownCalls;                             // of the peer's thread
     bool m_isMonitor = false;                                  // of the peer's thread
     Recorder<SeenCall> m_calls;
     Recorder<std::string> m_signals;

@@ -1,0 +1,132 @@
+// The bus goes away, and comes back.
+
+#include "support/core_test.h"
+#include "support/receive_loop.h"
+
+#include <bluetooth/connection.h>
+
+#include <ctime>
+#include <memory>
+#include <thread>
+
+namespace Bluetooth::Test {
+
+namespace {
+
+/// @return the CPU time that the whole process takes during 300 ms
+Milliseconds cpuTimeOfIdling() {
+    const auto used = [] {
+        timespec time{};
+        clock_gettime(CLOCK_PROCESS_CPUTIME_ID, &time);
+        return std::chrono::seconds(time.tv_sec) + std::chrono::nanoseconds(time.tv_nsec);
+    };
+    const auto before = used();
+    Latch never;
+    never.wait(Milliseconds(300));
+    return std::chrono::duration_cast<Milliseconds>(used() - before);
+}
+
+Recorder<std::string>& seen() {
+    static Recorder<std::string> recorder;
+    return recorder;
+}
+
+void onString(RemoteObject*, const char* text) {
+    seen().add(text);
+}
+
+} // namespace
+
+class BusLossTest : public CoreTest {
+protected:
+    void SetUp() override { KES_NEEDS_RECEIVE_LOOP(); }
+
+    /// The bus is there again, with a peer that answers Ask.
+    void restartBus() {
+        bus.start();
+        again = std::make_unique<RawPeer>(bus.address(), peerName);
+        again->reply("Ask", [](Writer& w) { w("again"); });
+    }
+
+    std::unique_ptr<RawPeer> again;
+};
+
+TEST_F(BusLossTest, CallsInFlightAndLaterOnesFailWithAText) {
+    peer.neverReply("Slow");
+    std::thread killer([&] {
+        EXPECT_TRUE(peer.waitForCalls("Slow", 1));
+        bus.kill();
+    });
+    EXPECT_EQ(call("Slow"), -1);
+    killer.join();
+    EXPECT_EQ(proxy.getErrorNumber(), 11);
+    EXPECT_NE(proxy.getErrorMessage(), "");
+    proxy.resetError();
+    EXPECT_EQ(call("Slow"), -1);
+    EXPECT_NE(proxy.getErrorMessage(), "");
+    ASSERT_EQ(proxy.newMessage("Take"), 0);
+    EXPECT_EQ(proxy.sendMessage(false, -1), -1);
+    EXPECT_EQ(proxy.getErrorMessage(), "Failed to send message");
+    EXPECT_EQ(proxy.setSignalHandlerString("Changed", onString), -1);
+    EXPECT_EQ(log.take().size(), 1u);
+}
+
+TEST_F(BusLossTest, ANewBusIsConnectedToAfterwards) {
+    const std::string oldName = proxy.getConnectionName();
+    bus.kill();
+    EXPECT_EQ(Connection::get(busType), nullptr);
+    EXPECT_EQ(log.take(), std::vector<std::string>{"connection.cpp Failed to get bus connection"});
+    for (int round = 0; round < 3; ++round) {
+        restartBus();
+        RemoteObject renewed(peerName, peerPath, peerInterface, busType);
+        ASSERT_NE(renewed.getConnection(), nullptr);
+        ASSERT_EQ(call(renewed, "Ask"), 0);
+        std::string text;
+        EXPECT_EQ(renewed.getReplyValue(text), 0);
+        EXPECT_EQ(text, "again");
+        EXPECT_EQ(call("Ask"), -1); // the old proxy stays with the old bus
+        bus.kill();                 // not noticed by anybody before the next proxy
+    }
+}
+
+TEST_F(BusLossTest, TheLoopNeitherSpinsNorHangsAndSubscriptionsCanBeMadeAnew) {
+    auto loop = std::make_unique<RemoteObject>(peerName, "/loop", "com.example.Loop", busType);
+    auto subscribed = std::make_unique<RemoteObject>(peerName, peerPath, peerInterface, busType);
+    ASSERT_EQ(subscribed->setSignalHandlerString("Changed", onString), 0);
+    ASSERT_EQ(loop->startLoop(), 0);
+    peer.emit(peerPath, peerInterface, "Changed", [](Writer& w) { w("before"); });
+    ASSERT_TRUE(seen().waitFor(1));
+    bus.kill();
+    EXPECT_EQ(call("Ask"), -1);
+    EXPECT_LT(cpuTimeOfIdling(), Milliseconds(60));
+
+    log.take();
+    subscribed.reset();
+    const std::vector<std::string> lines = log.take();
+    ASSERT_EQ(lines.size(), 1u);
+    EXPECT_EQ(lines[0].find("remote_object.cpp Remove match error ("), 0u) << lines[0];
+
+    restartBus();
+    RemoteObject renewed(peerName, peerPath, peerInterface, busType);
+    ASSERT_EQ(renewed.setSignalHandlerString("Changed", onString), 0);
+    {
+        const ReceiveLoop running(renewed); // a thread for the new connection, beside the old one
+        again->emit(peerPath, peerInterface, "Changed", [](Writer& w) { w("after"); });
+        ASSERT_TRUE(seen().waitFor(2));
+    }
+    EXPECT_EQ(seen().events(), (std::vector<std::string>{"before", "after"}));
+    EXPECT_EQ(loop->waitLoop(), 0);
+}
+
+TEST_F(BusLossTest, NothingSpinsWithoutALoopEither) {
+    ASSERT_EQ(proxy.setSignalHandlerString("Changed", onString), 0);
+    bus.kill();
+    std::thread caller([&] {
+        RemoteObject object(peerName, peerPath, peerInterface, busType);
+        EXPECT_EQ(call(object, "Ask"), -1);
+    });
+    caller.join();
+    EXPECT_LT(cpuTimeOfIdling(), Milliseconds(60));
+}
+
+} // namespace Bluetooth::Test

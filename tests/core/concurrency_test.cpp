@@ -1,0 +1,165 @@
+// Many threads, one connection: no reply and no signal is lost, and no call waits for another's.
+
+#include "support/core_test.h"
+#include "support/receive_loop.h"
+#include "support/scale.h"
+
+#include <algorithm>
+#include <atomic>
+#include <string>
+#include <thread>
+
+namespace Bluetooth::Test {
+
+namespace {
+
+using Clock = std::chrono::steady_clock;
+
+/// Answers with the argument.
+MessagePtr echo(DBusMessage* call) {
+    MessagePtr reply(dbus_message_new_method_return(call));
+    const char* text = "";
+    dbus_message_get_args(call, nullptr, DBUS_TYPE_STRING, &text, DBUS_TYPE_INVALID);
+    Writer(reply.get())(text);
+    return reply;
+}
+
+struct Echoes {
+    int failures = 0; ///< failed, or another call's reply
+    std::vector<Clock::duration> times;
+
+    Clock::duration median() {
+        std::nth_element(times.begin(), times.begin() + static_cast<long>(times.size() / 2),
+                         times.end());
+        return times[times.size() / 2];
+    }
+    Clock::duration longest() const { return *std::max_element(times.begin(), times.end()); }
+};
+
+bool callEcho(RemoteObject& proxy, const std::string& text) {
+    std::string answer;
+    return proxy.newMessage("Echo") == 0 && proxy.append(text.c_str()) == 0 &&
+           proxy.sendMessage(true, -1) == 0 && proxy.getReplyValue(answer) == 0 && answer == text;
+}
+
+Echoes callEchoes(int count, const std::string& name) {
+    RemoteObject proxy(peerName, peerPath, peerInterface, DBUS_BUS_SESSION);
+    Echoes result;
+    for (int i = 0; i < count; ++i) {
+        const auto begin = Clock::now();
+        if (!callEcho(proxy, name + std::to_string(i)))
+            ++result.failures;
+        result.times.push_back(Clock::now() - begin);
+    }
+    return result;
+}
+
+/// What the callback of the numbered signals finds.
+struct Numbers {
+    RemoteObject* caller = nullptr;
+    std::atomic<int> next{0};
+    std::atomic<int> outOfOrder{0};
+    std::atomic<int> failedCalls{0};
+};
+
+Numbers& numbers() {
+    static Numbers state;
+    return state;
+}
+
+void onNumber(RemoteObject*, const char* text) {
+    if (std::stoi(text) != numbers().next)
+        ++numbers().outOfOrder;
+    if (!callEcho(*numbers().caller, text))
+        ++numbers().failedCalls;
+    ++numbers().next;
+}
+
+} // namespace
+
+class ConcurrencyTest : public CoreTest {
+protected:
+    void SetUp() override {
+        KES_NEEDS_RECEIVE_LOOP();
+        peer.handle("Echo", echo);
+        peer.stopRecording();
+    }
+
+    RemoteObject loop{peerName, "/loop", "com.example.Loop", busType};
+};
+
+TEST_F(ConcurrencyTest, NoReplyAndNoSignalIsLostWhenFourThreadsCallAndCallbacksCallBack) {
+    constexpr int callsPerThread = isSanitized ? 1500 : 25000;
+    constexpr int signalsPerBurst = 10; // every 5 ms: 2,000 a second
+    RemoteObject caller(peerName, peerPath, peerInterface, busType);
+    numbers().caller = &caller;
+    ASSERT_EQ(proxy.setSignalHandlerString("Number", onNumber), 0);
+    RawPeer source(bus.address());
+    const ReceiveLoop running(loop);
+
+    Latch callsDone;
+    int emitted = 0;
+    std::thread emitter([&] {
+        do {
+            for (int i = 0; i < signalsPerBurst; ++i, ++emitted)
+                source.emit(peerPath, peerInterface, "Number",
+                            [&](Writer& w) { w(std::to_string(emitted)); });
+        } while (!callsDone.wait(Milliseconds(5)));
+    });
+    std::vector<Echoes> echoes(4);
+    std::vector<std::thread> callers;
+    for (Echoes& result : echoes)
+        callers.emplace_back([&] {
+            result = callEchoes(callsPerThread, std::to_string(&result - echoes.data()) + "-");
+        });
+    for (std::thread& thread : callers)
+        thread.join();
+    callsDone.open();
+    emitter.join();
+
+    for (const Echoes& result : echoes) {
+        EXPECT_EQ(result.failures, 0);
+        EXPECT_LT(result.longest(), std::chrono::seconds(1));
+    }
+    const auto deadline = Clock::now() + patience;
+    while (numbers().next < emitted && Clock::now() < deadline)
+        callEchoes(1, "wait"); // passes the time usefully
+    EXPECT_EQ(numbers().next, emitted);
+    EXPECT_EQ(numbers().outOfOrder, 0);
+    EXPECT_EQ(numbers().failedCalls, 0);
+}
+
+TEST_F(ConcurrencyTest, ASlowCallDelaysNeitherOtherCallsNorTheirTimeOuts) {
+    for (const bool withLoop : {false, true}) {
+        peer.reply("Slow", {}, std::chrono::seconds(3));
+        peer.neverReply("Never");
+        const auto receiving = withLoop ? std::make_unique<ReceiveLoop>(loop) : nullptr;
+        const int count = isSanitized ? 200 : 500;
+        Clock::duration alone = callEchoes(count, "alone").median();
+
+        Latch started;
+        std::atomic<bool> slowDone{false};
+        std::thread slow([&] {
+            started.open();
+            EXPECT_EQ(call("Slow"), 0);
+            slowDone = true;
+        });
+        ASSERT_TRUE(started.wait());
+        Echoes meanwhile = callEchoes(count, "meanwhile");
+        EXPECT_EQ(meanwhile.failures, 0);
+        EXPECT_LT(meanwhile.median(), std::max<Clock::duration>(5 * alone, Milliseconds(3)));
+
+        RemoteObject other(peerName, peerPath, peerInterface, busType);
+        const auto begin = Clock::now();
+        EXPECT_EQ(call(other, "Never", 200), -1);
+        const auto took = Clock::now() - begin;
+        EXPECT_GE(took, Milliseconds(200));
+        EXPECT_LT(took, Milliseconds(1200));
+        if (!isSanitized) {
+            EXPECT_FALSE(slowDone); // all of that was during the slow call
+        }
+        slow.join();
+    }
+}
+
+} // namespace Bluetooth::Test

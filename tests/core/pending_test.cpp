@@ -1,0 +1,233 @@
+// Calls without a time limit: what ends the wait, and who is served during it.
+
+#include "support/core_test.h"
+#include "support/receive_loop.h"
+
+#include <csignal>
+#include <memory>
+#include <thread>
+#include <unistd.h>
+
+namespace Bluetooth::Test {
+
+namespace {
+
+constexpr const char* agentPath = "/agent";
+
+/// Who answered requests to the object at agentPath.
+Recorder<std::thread::id>& served() {
+    static Recorder<std::thread::id> recorder;
+    return recorder;
+}
+
+DBusHandlerResult serve(DBusConnection* connection, DBusMessage* request, void*) {
+    served().add(std::this_thread::get_id());
+    const MessagePtr reply(dbus_message_new_method_return(request));
+    Writer(reply.get())("5820");
+    dbus_connection_send(connection, reply.get(), nullptr);
+    return DBUS_HANDLER_RESULT_HANDLED;
+}
+
+} // namespace
+
+class PendingTest : public CoreTest {
+protected:
+    void SetUp() override {
+        KES_NEEDS_RECEIVE_LOOP();
+        // The first call installs the handlers: no interruption of the tests ends the process.
+        peer.reply("Quick", [](Writer& w) { w("now"); });
+        ASSERT_EQ(callPending("Quick"), 0);
+        peer.forgetCalls();
+    }
+
+    int callPending(const char* method) {
+        proxy.resetError();
+        EXPECT_EQ(proxy.newMessage(method), 0);
+        return proxy.sendMessagePending();
+    }
+
+    void expectNoReply() {
+        std::string text;
+        EXPECT_EQ(proxy.getReplyValue(text), -1);
+        EXPECT_EQ(proxy.getErrorNumber(), 2);
+    }
+
+    void serveAgent() {
+        served().clear();
+        static const DBusObjectPathVTable handlers = [] {
+            DBusObjectPathVTable table{};
+            table.message_function = serve;
+            return table;
+        }();
+        ASSERT_TRUE(dbus_connection_register_object_path(proxy.getConnection(), agentPath,
+                                                         &handlers, nullptr));
+    }
+
+    std::future<MessagePtr> askAgent(Milliseconds timeout = patience) {
+        return peer.call(proxy.getConnectionName(), agentPath, "com.example.Agent", "Ask", {},
+                         timeout);
+    }
+
+    RemoteObject loop{peerName, "/loop", "com.example.Loop", busType};
+};
+
+TEST_F(PendingTest, TheReplyIsHeldWhateverItIs) {
+    peer.reply(
+        "Pair", [](Writer& w) { w(Path{"/dev"}); }, Milliseconds(150));
+    ObjectPath path;
+    EXPECT_EQ(callPending("Pair"), 0);
+    EXPECT_EQ(proxy.getReplyValue(path), 0);
+    EXPECT_STREQ(path, "/dev");
+    peer.replyError("Pair", "org.bluez.Error.Failed", "Authentication Failed");
+    EXPECT_EQ(callPending("Pair"), 0); // an error reply is a reply
+    EXPECT_FALSE(proxy.hasError());
+    EXPECT_EQ(proxy.getReplyValue(path), -2);
+    EXPECT_EQ(proxy.getErrorMessage(), "Authentication Failed");
+}
+
+TEST_F(PendingTest, RepliesThatComeBeforeTheNotificationIsSetAreSeen) {
+    const ReceiveLoop running(loop); // also reads the connection
+    for (int i = 0; i < 500; ++i) {
+        std::string text;
+        ASSERT_EQ(callPending("Quick"), 0);
+        ASSERT_EQ(proxy.getReplyValue(text), 0);
+        ASSERT_EQ(text, "now");
+    }
+}
+
+TEST_F(PendingTest, ALateReplyAfterAnInterruptionChangesNothing) {
+    for (const int number : {SIGINT, SIGTERM}) {
+        peer.forgetCalls();
+        MessagePtr late;
+        peer.handle("Slow", [&](DBusMessage* request) {
+            late.reset(dbus_message_new_method_return(request));
+            Writer(late.get())("late");
+            return MessagePtr();
+        });
+        std::thread interrupter([&] {
+            EXPECT_TRUE(peer.waitForCalls("Slow", 1));
+            kill(getpid(), number);
+        });
+        EXPECT_EQ(callPending("Slow"), 0);
+        interrupter.join();
+        expectNoReply();
+
+        // The next call gets its own reply, and is not taken for interrupted.
+        peer.handle(
+            "Next",
+            [&](DBusMessage* request) {
+                peer.send(std::move(late));
+                MessagePtr reply(dbus_message_new_method_return(request));
+                Writer(reply.get())("mine");
+                return reply;
+            },
+            Milliseconds(50));
+        std::string text;
+        EXPECT_EQ(callPending("Next"), 0);
+        EXPECT_EQ(proxy.getReplyValue(text), 0);
+        EXPECT_EQ(text, "mine");
+    }
+}
+
+TEST_F(PendingTest, ALateReplyForADestroyedProxyIsDropped) {
+    peer.reply("Slow", {}, Milliseconds(200));
+    std::thread interrupter([&] {
+        EXPECT_TRUE(peer.waitForCalls("Slow", 1));
+        kill(getpid(), SIGINT);
+    });
+    auto doomed = std::make_unique<RemoteObject>(peerName, peerPath, peerInterface, busType);
+    ASSERT_EQ(doomed->newMessage("Slow"), 0);
+    EXPECT_EQ(doomed->sendMessagePending(), 0);
+    doomed.reset();
+    interrupter.join();
+    EXPECT_EQ(call("Slow"), 0); // its reply comes after the late one
+}
+
+TEST_F(PendingTest, TheInterruptHandlersStayAndAnInterruptionInBetweenEndsTheNextWait) {
+    peer.neverReply("Slow");
+    for (const int number : {SIGINT, SIGTERM}) {
+        struct sigaction installed = {};
+        sigaction(number, nullptr, &installed);
+        EXPECT_NE(installed.sa_handler, SIG_DFL);
+        EXPECT_TRUE(installed.sa_flags & SA_NOCLDSTOP);
+        raise(number);
+        EXPECT_EQ(callPending("Slow"), 0);
+        expectNoReply();
+    }
+    EXPECT_EQ(callPending("Quick"), 0); // and only the next
+    std::string text;
+    EXPECT_EQ(proxy.getReplyValue(text), 0);
+    EXPECT_EQ(text, "now");
+}
+
+TEST_F(PendingTest, TheWaitEndsWhenTheConnectionCloses) {
+    peer.neverReply("Slow");
+    std::thread killer([&] {
+        EXPECT_TRUE(peer.waitForCalls("Slow", 1));
+        bus.kill();
+    });
+    EXPECT_EQ(callPending("Slow"), 0); // it had been sent
+    killer.join();
+    // libdbus itself answers what is pending on a connection that closes.
+    std::string text;
+    EXPECT_EQ(proxy.getReplyValue(text), -1);
+    EXPECT_TRUE(proxy.hasError());
+    EXPECT_EQ(callPending("Slow"), 0); // libdbus takes it, and forgets it
+    expectNoReply();
+}
+
+TEST_F(PendingTest, RequestsAreServedOnTheWaitingThreadWhileTheReceiveThreadDeliversSignals) {
+    serveAgent();
+    static Recorder<std::thread::id> delivered;
+    delivered.clear();
+    const auto self = std::this_thread::get_id();
+    ASSERT_EQ(proxy.setSignalHandlerNoArgument(
+                  "Changed", [](RemoteObject*) { delivered.add(std::this_thread::get_id()); }),
+              0);
+    const ReceiveLoop running(loop);
+    MessagePtr request;
+    peer.handle("Pair", [&](DBusMessage* pair) {
+        request.reset(dbus_message_ref(pair));
+        return MessagePtr();
+    });
+    std::thread daemon([&] {
+        EXPECT_TRUE(peer.waitForCalls("Pair", 1));
+        for (int i = 0; i < 20; ++i) {
+            peer.emit(peerPath, peerInterface, "Changed");
+            const MessagePtr answer = askAgent().get();
+            ASSERT_TRUE(answer);
+            EXPECT_EQ(argumentsOf(answer.get()), "s:5820");
+        }
+        EXPECT_TRUE(delivered.waitFor(20)); // before the wait ends
+        peer.send(MessagePtr(dbus_message_new_method_return(request.get())));
+    });
+    EXPECT_EQ(callPending("Pair"), 0);
+    daemon.join();
+    EXPECT_EQ(served().events(), std::vector<std::thread::id>(20, self));
+    for (const std::thread::id& thread : delivered.events())
+        EXPECT_NE(thread, self);
+}
+
+TEST_F(PendingTest, RequestsThatTheReceiveThreadReadsStayUnanswered) {
+    serveAgent();
+    const ReceiveLoop running(loop);
+    EXPECT_EQ(askAgent(Milliseconds(300)).get(), nullptr);
+    EXPECT_EQ(served().count(), 0u);
+}
+
+TEST_F(PendingTest, OtherThreadsCallWhileOneWaits) {
+    peer.neverReply("Slow");
+    std::thread other([&] {
+        EXPECT_TRUE(peer.waitForCalls("Slow", 1));
+        RemoteObject object(peerName, peerPath, peerInterface, busType);
+        for (int i = 0; i < 100; ++i)
+            EXPECT_EQ(call(object, "Quick"), 0);
+        EXPECT_EQ(call(object, "Slow", 50), -1);
+        kill(getpid(), SIGINT);
+    });
+    EXPECT_EQ(callPending("Slow"), 0);
+    other.join();
+    expectNoReply();
+}
+
+} // namespace Bluetooth::Test
