@@ -1,0 +1,119 @@
+#include "base/bluez.h"
+
+#include "base/text.h"
+
+#include <bluetooth/commandlib.h>
+
+#include <cstdlib>
+
+namespace Kesbt {
+
+using Bluetooth::Adapter;
+using Bluetooth::Device;
+using Bluetooth::Manager;
+
+namespace {
+
+std::string addressOf(const Device& device) {
+    const std::unique_ptr<char, decltype(&std::free)> address(
+        Bluetooth::getAddressFromPath(device.getPath()), std::free);
+    return address ? address.get() : "";
+}
+
+} // namespace
+
+std::unique_ptr<Manager> openManager() {
+    std::unique_ptr<Manager> manager(Manager::getManager());
+    if (!manager)
+        throw daemonAbsent();
+    return manager;
+}
+
+std::unique_ptr<Adapter> openAdapter(Manager& manager, const Options& options) {
+    const bool chosen = !options.adapter.empty();
+    std::unique_ptr<Adapter> adapter(chosen ? manager.findAdapter(options.adapter.c_str())
+                                            : manager.defaultAdapter());
+    if (adapter)
+        return adapter;
+    const std::string reason = manager.getErrorMessage();
+    if (reason == "No such adapter")
+        throw Failure(chosen
+                          ? "there is no adapter " + options.adapter +
+                                "; see which there are: kesbt adapters"
+                          : "there is no Bluetooth adapter; plug one in and see: kesbt adapters");
+    throw refusal("cannot find the adapter", manager);
+}
+
+std::unique_ptr<Adapter> openAdapter(const Options& options) {
+    return openAdapter(*openManager(), options);
+}
+
+std::string defaultAdapterPath(Manager& manager) {
+    const std::unique_ptr<Adapter> adapter(manager.defaultAdapter());
+    return adapter ? adapter->getPath() : "";
+}
+
+std::unique_ptr<Device> openDevice(Adapter& adapter, const std::string& address) {
+    std::unique_ptr<Device> device(adapter.findDevice(address.c_str(), false));
+    if (device)
+        return device;
+    if (adapter.getErrorMessage() == "Does Not Exist")
+        throw Failure(adapterName(adapter) + " does not know " + address +
+                      "; make it known first: kesbt create " + address);
+    throw refusal("cannot find " + address, adapter);
+}
+
+std::unique_ptr<Device> openDevice(const Options& options, const std::string& address) {
+    return openDevice(*openAdapter(options), address);
+}
+
+std::string adapterName(const Bluetooth::RemoteObject& object) {
+    const std::string path = object.getPath();
+    const std::size_t device = path.find("/dev_");
+    return lastComponent(path.substr(0, device));
+}
+
+Json readProperties(Bluetooth::BluezObject& object) {
+    const std::unique_ptr<Bluetooth::Dict> properties(
+        object.Bluetooth::BluezObject::getProperties());
+    if (!properties)
+        throw refusal("cannot read the properties of " + lastComponent(object.getPath()), object);
+    return toJson(*properties);
+}
+
+Json readOptional(Bluetooth::BluezObject& object) {
+    const std::unique_ptr<Bluetooth::Dict> properties(object.getProperties());
+    if (properties)
+        return toJson(*properties);
+    const std::string reason = object.getErrorMessage();
+    if (reason.find("doesn't exist") == std::string::npos)
+        throw refusal("cannot read the properties of " + lastComponent(object.getPath()), object);
+    return nullptr;
+}
+
+Json describe(const Adapter& adapter, bool isDefault, Json properties) {
+    return {{"adapter", adapterName(adapter)},
+            {"path", adapter.getPath()},
+            {"default", isDefault},
+            {"properties", std::move(properties)}};
+}
+
+Json describe(const Device& device, Json properties) {
+    return {{"address", addressOf(device)},
+            {"adapter", adapterName(device)},
+            {"path", device.getPath()},
+            {"properties", std::move(properties)}};
+}
+
+void printDevice(const Options& options, Device& device) {
+    const Json document = describe(device, readProperties(device));
+    if (options.json) {
+        printDocument(document);
+        return;
+    }
+    Json lines = {{"Path", document["path"]}};
+    lines.update(document["properties"]);
+    printProperties(lines);
+}
+
+} // namespace Kesbt

@@ -1,0 +1,23 @@
+#ifndef KESBT_BASE_TEXT_H
+#define KESBT_BASE_TEXT_H
+
+#include <string>
+
+namespace Kesbt {
+
+std::string upperCase(std::string text);
+/// In double quotes, printable.
+std::string quoted(const std::string& text);
+/// Control characters as escapes such as \n or \x1b: names come from strangers' devices.
+std::string printable(const std::string& text);
+/// How many columns a text takes on a terminal, with one for each character.
+std::size_t columns(const std::string& text);
+
+/// Six two-digit hexadecimal groups joined by colons.
+bool isAddress(const std::string& text);
+/// The last component of an object path: "hci0" of "/org/bluez/1234/hci0".
+std::string lastComponent(const std::string& path);
+
+} // namespace Kesbt
+
+#endif

@@ -1,0 +1,115 @@
+// kesbt: works with Bluetooth from the command line, through BlueZ 4's bluetoothd.
+
+#include "base/failure.h"
+#include "base/output.h"
+#include "base/text.h"
+#include "base/verb.h"
+
+#include <dbus/dbus.h>
+
+#include <iostream>
+#include <sstream>
+
+namespace Kesbt {
+
+namespace {
+
+std::string indented(const std::string& lines) {
+    std::istringstream stream(lines);
+    std::string result;
+    for (std::string line; std::getline(stream, line);)
+        result += "  " + line + "\n";
+    return result;
+}
+
+std::string checkAdapter(const std::string& text) {
+    const bool isName = text.size() > 3 && text.compare(0, 3, "hci") == 0 &&
+                        text.find_first_not_of("0123456789", 3) == std::string::npos;
+    return isName || isAddress(text) ? "" : quoted(text) + " is no adapter such as hci0";
+}
+
+void addOptions(CLI::App& program, Options& options) {
+    program.add_option("--adapter", options.adapter, "The adapter: hci0, or its address")
+        ->type_name("ADAPTER")
+        ->transform([](std::string text) { return isAddress(text) ? upperCase(text) : text; })
+        ->check(checkAdapter);
+    program.add_flag("--json", options.json,
+                     "Results for programs: one document, or one line for each event");
+    program
+        .add_option_function<double>(
+            "--timeout",
+            [&options](double seconds) {
+                options.timeout = seconds;
+                options.limited = true;
+            },
+            "How long the daemon may take, in seconds (default: 25)")
+        ->type_name("SECONDS")
+        ->check(checkSeconds);
+    program.set_version_flag("--version", "kesbt " KESBT_VERSION);
+}
+
+void addVerbs(CLI::App& program, const Options& options) {
+    for (const Verb* verb : allVerbs()) {
+        CLI::App* command = program.add_subcommand(verb->name, verb->summary);
+        command->group(verb->group);
+        command->footer("Examples:\n" + indented(verb->examples) +
+                        "\nOptions of every verb: --adapter, --json, --timeout; see: kesbt --help");
+        verb->build(*command, options);
+    }
+}
+
+/// One line that tells what is wrong and where to read on.
+Failure usageFailure(const CLI::App& program, const CLI::ParseError& error) {
+    std::string command = "kesbt";
+    const CLI::App* chosen = &program;
+    while (!chosen->get_subcommands().empty()) {
+        chosen = chosen->get_subcommands().front();
+        command += " " + chosen->get_name();
+    }
+    std::string what = error.what();
+    if (dynamic_cast<const CLI::RequiredError*>(&error) && chosen->get_subcommands({}).size() > 0) {
+        const std::vector<std::string> rest = chosen->remaining();
+        what = rest.empty() ? "a verb is missing" : "there is no verb " + quoted(rest.front());
+    }
+    return wrongUsage(printable(what) + "; see: " + command + " --help");
+}
+
+int run(int argc, char** argv) {
+    Options options;
+    CLI::App program("Works with Bluetooth through bluetoothd (BlueZ 4).", "kesbt");
+    program.fallthrough(); // global options may stand behind the verb too
+    program.require_subcommand(1);
+    program.get_formatter()->label("SUBCOMMAND", "VERB ...");
+    program.footer("kesbt VERB --help tells more about a verb and gives examples.\n"
+                   "Exit status: 0 success, 1 failure, 2 wrong usage.\n");
+    addOptions(program, options);
+    addVerbs(program, options);
+    try {
+        program.parse(argc, argv);
+    } catch (const CLI::ParseError& error) {
+        if (error.get_exit_code() != 0)
+            throw usageFailure(program, error);
+        program.exit(error);
+    }
+    flushOutput();
+    return 0;
+}
+
+} // namespace
+
+} // namespace Kesbt
+
+int main(int argc, char** argv) {
+    // Without this libdbus ignores SIGPIPE, and "kesbt monitor | head" would not end.
+    dbus_connection_set_change_sigpipe(false);
+    try {
+        return Kesbt::run(argc, argv);
+    } catch (const Kesbt::Failure& failure) {
+        std::cout.flush();
+        std::cerr << failure.what() << '\n';
+        return failure.status();
+    } catch (const std::exception& error) {
+        std::cerr << "kesbt: " << Kesbt::printable(error.what()) << "; please report this\n";
+        return 1;
+    }
+}

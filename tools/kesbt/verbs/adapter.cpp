@@ -1,0 +1,164 @@
+#include "base/bluez.h"
+#include "base/text.h"
+#include "base/verb.h"
+#include "base/waiting.h"
+
+#include <charconv>
+#include <iostream>
+#include <limits>
+
+namespace Kesbt {
+
+namespace {
+
+using Bluetooth::Variant;
+
+constexpr std::size_t longestName = 248; // bytes; the controller cuts what is longer
+
+void showAdapter(const Options& options) {
+    const auto manager = openManager();
+    const auto adapter = openAdapter(*manager, options);
+    // The proxy's own properties: they have the HCI version too.
+    const std::unique_ptr<Bluetooth::Dict> properties(adapter->getProperties());
+    if (!properties)
+        throw refusal("cannot read the properties of " + adapterName(*adapter), *adapter);
+    const bool isDefault = adapter->getPath() == defaultAdapterPath(*manager);
+    const Json document = describe(*adapter, isDefault, toJson(*properties));
+    if (options.json) {
+        printDocument(document);
+        return;
+    }
+    Json lines = {{"Adapter", document["adapter"]},
+                  {"Path", document["path"]},
+                  {"Default", document["default"]}};
+    lines.update(document["properties"]);
+    printProperties(lines);
+}
+
+const Bluetooth::DictEntry& findProperty(const Bluetooth::Dict& properties, const std::string& name,
+                                         const std::string& adapter) {
+    std::string names;
+    for (const auto& entry : properties) {
+        if (upperCase(entry.first) == upperCase(name))
+            return entry;
+        names += (names.empty() ? "" : ", ") + entry.first;
+    }
+    throw Failure(adapter + " has no property " + quoted(name) + "; it has: " + names);
+}
+
+bool parseBoolean(const std::string& text) {
+    const std::string upper = upperCase(text);
+    for (const char* yes : {"TRUE", "ON", "YES", "1"}) {
+        if (upper == yes)
+            return true;
+    }
+    for (const char* no : {"FALSE", "OFF", "NO", "0"}) {
+        if (upper == no)
+            return false;
+    }
+    throw wrongUsage(quoted(text) + " is neither true nor false; write one of them");
+}
+
+template <class Number>
+Number parseNumber(const std::string& text) {
+    Number number{};
+    const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), number);
+    if (error != std::errc() || end != text.data() + text.size())
+        throw wrongUsage(quoted(text) + " is no number from 0 to " +
+                         std::to_string(std::numeric_limits<Number>::max()) + "; write one");
+    return number;
+}
+
+/// The text as a value of the type that the property has now.
+struct ParseAs : boost::static_visitor<Variant> {
+    const std::string& text;
+    const std::string& name;
+
+    ParseAs(const std::string& value, const std::string& property) : text(value), name(property) {}
+
+    Variant operator()(std::uint32_t) const { return parseNumber<std::uint32_t>(text); }
+    Variant operator()(std::uint16_t) const { return parseNumber<std::uint16_t>(text); }
+    Variant operator()(bool) const { return parseBoolean(text); }
+    Variant operator()(const std::string&) const {
+        if (text.size() > longestName)
+            throw wrongUsage(name + " may have at most " + std::to_string(longestName) +
+                             " bytes; write a shorter one");
+        return text;
+    }
+    template <class Other>
+    Variant operator()(const Other&) const {
+        throw Failure(name + " cannot be set; see what can: kesbt adapter set --help");
+    }
+};
+
+void setProperty(const Options& options, const std::string& givenName,
+                 const std::string& givenValue) {
+    const auto adapter = openAdapter(options);
+    const std::string adapterText = adapterName(*adapter);
+    const std::unique_ptr<Bluetooth::Dict> properties(
+        adapter->Bluetooth::BluezObject::getProperties());
+    if (!properties)
+        throw refusal("cannot read the properties of " + adapterText, *adapter);
+
+    const auto& [name, old] = findProperty(*properties, givenName, adapterText);
+    const Variant wanted = boost::apply_visitor(ParseAs(givenValue, name), old);
+    adapter->resetError();
+    try {
+        ask(options, "cannot set " + name + " of " + adapterText, *adapter, "SetProperty",
+            name.c_str(), wanted);
+    } catch (const Failure&) {
+        if (adapter->getErrorMessage().rfind("Invalid arguments", 0) != 0)
+            throw;
+        throw Failure("the daemon does not let " + name + " of " + adapterText + " be set to " +
+                      quoted(givenValue) + "; see what can be set: kesbt adapter set --help");
+    }
+
+    Json now;
+    const Json expected = toJson(wanted);
+    const auto isSet = [&, &property = name] {
+        now = readProperties(*adapter).value(property, Json());
+        return now == expected;
+    };
+    if (!waitUntil(isSet, options.timeLimit()))
+        throw notConfirmed(name + " of " + adapterText + " is still " + quoted(display(now)));
+    if (options.json)
+        printDocument(
+            {{"adapter", adapterText}, {"property", name}, {"old", toJson(old)}, {"new", now}});
+    else
+        std::cout << name << ": " << printable(display(toJson(old))) << " -> "
+                  << printable(display(now)) << '\n';
+}
+
+void build(CLI::App& command, const Options& options) {
+    command.require_subcommand(0, 1);
+    CLI::App* info = command.add_subcommand("info", "Show all properties (what is done without a "
+                                                    "further word)");
+    CLI::App* set = command.add_subcommand("set", "Set a property and show its old and new value");
+    set->footer("Can be set: Name, Powered, Discoverable, Pairable, DiscoverableTimeout,\n"
+                "PairableTimeout. Booleans are true or false, time-outs are seconds.\n\n"
+                "Examples:\n  kesbt adapter set Powered true\n"
+                "  kesbt --adapter hci1 adapter set Name \"Living room\"");
+
+    auto name = std::make_shared<std::string>();
+    auto value = std::make_shared<std::string>();
+    set->add_option("NAME", *name, "The property, e.g. Powered")->required()->type_name("");
+    set->add_option("VALUE", *value, "Its new value")->required()->type_name("");
+
+    const auto show = [&options] { showAdapter(options); };
+    info->callback(show);
+    set->callback([&options, name, value] { setProperty(options, *name, *value); });
+    command.callback([&command, show] {
+        if (command.get_subcommands().empty())
+            show();
+    });
+}
+
+} // namespace
+
+extern const Verb adapterVerb;
+const Verb adapterVerb = {"adapter", "Adapters", "Show an adapter's properties, or set one",
+                          "kesbt adapter\nkesbt --adapter hci1 adapter info --json\n"
+                          "kesbt adapter set Discoverable true",
+                          build};
+
+} // namespace Kesbt

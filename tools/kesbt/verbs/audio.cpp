@@ -1,0 +1,97 @@
+#include "base/bluez.h"
+#include "base/verb.h"
+#include "base/waiting.h"
+
+#include <bluetooth/audio.h>
+#include <bluetooth/audio_sink.h>
+#include <bluetooth/control.h>
+
+namespace Kesbt {
+
+namespace {
+
+/// A device's audio: all its profiles together.
+struct AudioDevice {
+    std::unique_ptr<Bluetooth::Device> device;
+    std::unique_ptr<Bluetooth::Audio> audio;
+};
+
+AudioDevice openAudio(const Options& options, const std::string& address) {
+    AudioDevice opened;
+    opened.device = openDevice(options, address);
+    opened.audio.reset(Bluetooth::Audio::getAudio(opened.device->getPath()));
+    if (!opened.audio)
+        throw daemonLost();
+    if (readOptional(*opened.audio).is_null())
+        throw Failure(address + " has no audio; see what it has: kesbt services " + address);
+    return opened;
+}
+
+template <class Proxy>
+Json readOptional(Proxy* created) {
+    const std::unique_ptr<Proxy> proxy(created);
+    if (!proxy)
+        throw daemonLost();
+    return Kesbt::readOptional(*proxy);
+}
+
+void printStatus(const Options& options, AudioDevice& device, const std::string& address) {
+    const char* path = device.device->getPath();
+    const Json document = {{"address", address},
+                           {"adapter", adapterName(*device.device)},
+                           {"audio", readProperties(*device.audio)},
+                           {"sink", readOptional(Bluetooth::AudioSink::getAudioSink(path))},
+                           {"control", readOptional(Bluetooth::Control::getControl(path))}};
+    if (options.json) {
+        printDocument(document);
+        return;
+    }
+    const auto part = [&](const char* name) {
+        return document[name].is_null() ? Json("none") : document[name];
+    };
+    printProperties(
+        {{"Audio", part("audio")}, {"Sink", part("sink")}, {"Remote control", part("control")}});
+}
+
+void change(const Options& options, const std::string& address, bool connect) {
+    AudioDevice device = openAudio(options, address);
+    const auto isThere = [&] {
+        const std::string state = readProperties(*device.audio).value("State", "");
+        return connect ? state == "connected" || state == "playing" : state == "disconnected";
+    };
+    // The daemon refuses what is so already.
+    if (!isThere())
+        ask(options, std::string("cannot ") + (connect ? "connect " : "disconnect ") + address,
+            *device.audio, connect ? "Connect" : "Disconnect");
+    if (!waitUntil(isThere, options.timeLimit()))
+        throw notConfirmed(address + " is not " + (connect ? "connected" : "disconnected"));
+    printStatus(options, device, address);
+}
+
+void build(CLI::App& command, const Options& options) {
+    command.require_subcommand(1);
+    const auto add = [&command](const char* name, const char* description, auto action) {
+        CLI::App* verb = command.add_subcommand(name, description);
+        const auto address = addAddress(*verb);
+        verb->callback([address, action] { action(*address); });
+    };
+    add("connect", "Connect all audio profiles of a known device",
+        [&options](const std::string& address) { change(options, address, true); });
+    add("disconnect", "Disconnect them",
+        [&options](const std::string& address) { change(options, address, false); });
+    add("status", "Show what is connected", [&options](const std::string& address) {
+        AudioDevice device = openAudio(options, address);
+        printStatus(options, device, address);
+    });
+}
+
+} // namespace
+
+extern const Verb audioVerb;
+const Verb audioVerb = {"audio", "Audio", "Connect or disconnect a headset, or show its state",
+                        "kesbt audio connect 00:11:22:33:44:55\n"
+                        "kesbt audio status 00:11:22:33:44:55 --json\n"
+                        "kesbt audio disconnect 00:11:22:33:44:55",
+                        build};
+
+} // namespace Kesbt

@@ -1,0 +1,170 @@
+#include "base/bluez.h"
+#include "base/bus_feed.h"
+#include "base/receive_loop.h"
+#include "base/table.h"
+#include "base/text.h"
+#include "base/verb.h"
+#include "base/waiting.h"
+
+#include <iomanip>
+#include <iostream>
+#include <map>
+
+namespace Kesbt {
+
+namespace {
+
+/// What a callback was told.
+struct Event {
+    enum class Kind { Found, Disappeared, Powered, Removed };
+    Kind kind;
+    std::string subject; // a device's address, or an adapter's path
+    Json value;
+};
+
+EventQueue<Event>& events() {
+    static EventQueue<Event> queue;
+    return queue;
+}
+
+void subscribe(Bluetooth::Manager& manager, Bluetooth::Adapter& adapter) {
+    using Bluetooth::RemoteObject;
+    const bool subscribed =
+        adapter.setDeviceFoundHandler(
+            [](RemoteObject*, const char* address, const Bluetooth::Dict* properties) {
+                events().push({Event::Kind::Found, address, toJson(*properties)});
+            }) == 0 &&
+        adapter.setDeviceDisappearedHandler([](RemoteObject*, const char* address) {
+            events().push({Event::Kind::Disappeared, address, {}});
+        }) == 0 &&
+        adapter.setPropertyChangedHandler(
+            [](RemoteObject*, const char* name, const Bluetooth::Variant* value) {
+                if (std::string(name) == "Powered")
+                    events().push({Event::Kind::Powered, "", toJson(*value)});
+            }) == 0 &&
+        manager.setAdapterRemovedHandler([](RemoteObject*, const Bluetooth::ObjectPath* path) {
+            events().push({Event::Kind::Removed, path->str(), {}});
+        }) == 0;
+    if (!subscribed)
+        throw refusal("cannot watch " + adapterName(adapter), "");
+}
+
+/// Prints what the events change in the set of devices that are there.
+class Watcher {
+public:
+    explicit Watcher(bool json) : m_json(json) {}
+
+    void found(const std::string& address, const Json& properties) {
+        const auto [known, isNew] = m_devices.try_emplace(address, properties);
+        if (isNew) {
+            print("found", Colour::Green, address, properties, Json());
+            return;
+        }
+        Json changed = Json::array();
+        for (const auto& [name, value] : properties.items()) {
+            if (known->second.value(name, Json()) != value)
+                changed.push_back(name);
+        }
+        if (changed.empty())
+            return;
+        known->second = properties;
+        print("changed", Colour::Yellow, address, properties, changed);
+    }
+
+    void disappeared(const std::string& address) {
+        const auto known = m_devices.find(address);
+        const Json last = known == m_devices.end() ? Json::object() : known->second;
+        if (known != m_devices.end())
+            m_devices.erase(known);
+        print("vanished", Colour::Red, address, last, Json());
+    }
+
+private:
+    void print(const char* event, Colour colour, const std::string& address, const Json& properties,
+               const Json& changed) const {
+        if (m_json) {
+            Json line = {{"event", event},
+                         {"time", timeForPrograms()},
+                         {"address", address},
+                         {"properties", properties}};
+            if (!changed.is_null())
+                line["changed"] = changed;
+            printEvent(line);
+            return;
+        }
+        constexpr int rssiWidth = 10;
+        constexpr int iconWidth = 18;
+        std::cout << coloured(event, colour) << std::string(10 - std::string(event).size(), ' ')
+                  << printable(address) << std::right << std::setw(rssiWidth)
+                  << field(properties, "RSSI") << "  " << std::left << std::setw(iconWidth)
+                  << printable(field(properties, "Icon")) << printable(field(properties, "Alias"))
+                  << '\n';
+        flushOutput();
+    }
+
+    bool m_json;
+    std::map<std::string, Json> m_devices;
+};
+
+/// Prints until the user interrupts or the deadline comes. A Failure when the discovery ends.
+void watch(const Options& options, const Bluetooth::Adapter& adapter, BusFeed& daemon,
+           Interrupt& interrupt, Clock::time_point deadline) {
+    Watcher watcher(options.json);
+    while (!interrupt.came() && Clock::now() < deadline) {
+        while (const auto event = events().pop()) {
+            if (event->kind == Event::Kind::Found)
+                watcher.found(event->subject, event->value);
+            else if (event->kind == Event::Kind::Disappeared)
+                watcher.disappeared(event->subject);
+            else if (event->kind == Event::Kind::Removed && event->subject == adapter.getPath())
+                throw Failure(adapterName(adapter) +
+                              " was removed; plug it in and repeat the command");
+            else if (event->kind == Event::Kind::Powered && event->value == false)
+                throw Failure(adapterName(adapter) +
+                              " was switched off; switch it on: kesbt adapter set Powered true");
+        }
+        for (Signal signal; daemon.next(signal);) {
+            if (BusFeed::isDaemonGone(signal))
+                throw daemonLost();
+        }
+        waitForInput({events().fd(), daemon.fd(), interrupt.fd()}, deadline);
+    }
+}
+
+void discover(const Options& options, double seconds) {
+    Interrupt interrupt; // before the receive thread starts
+    const auto manager = openManager();
+    const auto adapter = openAdapter(*manager, options);
+    const std::string name = adapterName(*adapter);
+    BusFeed daemon({BusFeed::daemonRule});
+    subscribe(*manager, *adapter);
+    const ReceiveLoop loop(*adapter);
+
+    ask(options, "cannot start a discovery on " + name, *adapter, "StartDiscovery");
+    const auto isDiscovering = [&] {
+        return interrupt.came() || readProperties(*adapter).value("Discovering", false);
+    };
+    if (!waitUntil(isDiscovering, options.timeLimit()))
+        throw notConfirmed(name + " does not discover");
+
+    const auto deadline =
+        seconds > 0 ? Clock::now() + std::chrono::milliseconds(static_cast<long>(seconds * 1000))
+                    : Clock::time_point::max();
+    watch(options, *adapter, daemon, interrupt, deadline);
+    ask(options, "cannot stop the discovery on " + name, *adapter, "StopDiscovery");
+}
+
+void build(CLI::App& command, const Options& options) {
+    const auto seconds =
+        addSeconds(command, "--seconds", "End after this time (default: on Ctrl-C)");
+    command.callback([&options, seconds] { discover(options, *seconds); });
+}
+
+} // namespace
+
+extern const Verb discoverVerb;
+const Verb discoverVerb = {
+    "discover", "Devices", "Show devices within reach as they appear, change and vanish",
+    "kesbt discover\nkesbt discover --seconds 10 --json\nkesbt --adapter hci1 discover", build};
+
+} // namespace Kesbt

@@ -1,0 +1,91 @@
+#include "base/bluez.h"
+#include "base/bus_feed.h"
+#include "base/style.h"
+#include "base/text.h"
+#include "base/verb.h"
+#include "base/waiting.h"
+
+#include <iostream>
+
+namespace Kesbt {
+
+namespace {
+
+/// "hci0", "hci0/00:11:22:33:44:55" or, for the manager, "/".
+std::string shortPath(const std::string& path) {
+    constexpr char deviceMark[] = "/dev_";
+    const std::size_t device = path.find(deviceMark);
+    const std::string adapter = lastComponent(path.substr(0, device));
+    if (device == std::string::npos)
+        return adapter.empty() ? path : adapter;
+    std::string address = path.substr(device + sizeof deviceMark - 1);
+    for (char& c : address) {
+        if (c == '_')
+            c = ':';
+    }
+    return adapter + "/" + address;
+}
+
+std::string argumentText(const Signal& signal) {
+    if (signal.member == "PropertyChanged" && signal.arguments.size() == 2)
+        return display(signal.arguments[0]) + " = " + display(signal.arguments[1]);
+    return display(signal.arguments);
+}
+
+void printLine(const std::string& subject, const std::string& what, const std::string& arguments) {
+    constexpr std::size_t subjectWidth = 22;
+    std::string padded = printable(subject);
+    padded.resize(std::max(padded.size(), subjectWidth), ' ');
+    std::cout << coloured(timeForPeople(), Colour::Dim) << "  " << padded << "  "
+              << coloured(printable(what), Colour::Bold) << (arguments.empty() ? "" : "  ")
+              << printable(arguments) << '\n';
+    flushOutput();
+}
+
+void printSignal(const Options& options, const Signal& signal) {
+    if (BusFeed::isDaemonChange(signal)) {
+        const bool gone = BusFeed::isDaemonGone(signal);
+        if (options.json)
+            printEvent(
+                {{"event", gone ? "daemon-gone" : "daemon-came"}, {"time", timeForPrograms()}});
+        else
+            printLine("bluetoothd", gone ? "has left the bus" : "is on the bus", "");
+        return;
+    }
+    if (options.json)
+        printEvent({{"event", "signal"},
+                    {"time", timeForPrograms()},
+                    {"path", signal.path},
+                    {"interface", signal.interface},
+                    {"member", signal.member},
+                    {"arguments", signal.arguments}});
+    else
+        printLine(shortPath(signal.path),
+                  lastComponent(signal.interface.substr(signal.interface.rfind('.') + 1)) + "." +
+                      signal.member,
+                  argumentText(signal));
+}
+
+void monitor(const Options& options) {
+    Interrupt interrupt;
+    BusFeed feed({"type='signal',sender='org.bluez'", BusFeed::daemonRule});
+    openManager(); // without a daemon to watch the user has most likely mistaken something
+    while (!interrupt.came()) {
+        for (Signal signal; feed.next(signal);)
+            printSignal(options, signal);
+        waitForInput({feed.fd(), interrupt.fd()});
+    }
+}
+
+void build(CLI::App& command, const Options& options) {
+    command.callback([&options] { monitor(options); });
+}
+
+} // namespace
+
+extern const Verb monitorVerb;
+const Verb monitorVerb = {"monitor", "General",
+                          "Show every signal of bluetoothd as it comes, until Ctrl-C",
+                          "kesbt monitor\nkesbt monitor --json", build};
+
+} // namespace Kesbt

@@ -1,0 +1,39 @@
+#include "base/failure.h"
+#include "base/output.h"
+#include "base/text.h"
+#include "base/verb.h"
+
+#include <bluetooth/dbus_object.h>
+
+#include <iostream>
+
+namespace Kesbt {
+
+namespace {
+
+void listNames(const Options& options) {
+    Bluetooth::DBusObject bus;
+    const std::unique_ptr<std::vector<std::string>> names(bus.listNames());
+    if (!bus.getConnection())
+        throw daemonAbsent();
+    if (bus.hasError())
+        throw refusal("cannot list the names on the system bus", bus.getErrorMessage());
+    if (options.json) {
+        printDocument(*names);
+        return;
+    }
+    for (const std::string& name : *names)
+        std::cout << printable(name) << '\n';
+}
+
+void build(CLI::App& command, const Options& options) {
+    command.callback([&options] { listNames(options); });
+}
+
+} // namespace
+
+extern const Verb namesVerb;
+const Verb namesVerb = {"names", "General", "List the names on the system bus",
+                        "kesbt names\nkesbt names --json", build};
+
+} // namespace Kesbt

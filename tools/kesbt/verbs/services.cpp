@@ -1,0 +1,78 @@
+#include "base/bluez.h"
+#include "base/creation.h"
+#include "base/service_record.h"
+#include "base/table.h"
+#include "base/uuid.h"
+#include "base/verb.h"
+
+#include <cstdlib>
+
+namespace Kesbt {
+
+namespace {
+
+Bluetooth::Dict discover(const Options& options, Bluetooth::Device& device,
+                         const std::string& address, const std::string& pattern) {
+    Watchdog::Task task;
+    task.name = "reading the services of " + address;
+    task.limit = watchedLimit(options);
+    task.cancel = [path = std::string(device.getPath())] {
+        Bluetooth::Device(path.c_str()).cancelDiscovery();
+    };
+    std::unique_ptr<Bluetooth::Dict> records;
+    {
+        const Watchdog watchdog(std::move(task));
+        records.reset(device.discoverServices(pattern.c_str()));
+        if (!records)
+            watchdog.throwIfCancelled();
+    }
+    if (!records)
+        throw refusal("cannot read the services of " + address, device);
+    return *records;
+}
+
+Json toJson(const Bluetooth::DictEntry& entry) {
+    const std::string xml = display(Kesbt::toJson(entry.second));
+    const ServiceRecord record = parseServiceRecord(xml);
+    return {{"handle", std::strtoul(entry.first.c_str(), nullptr, 10)},
+            {"name", record.name},
+            {"uuids", record.uuids},
+            {"xml", xml}};
+}
+
+void listServices(const Options& options, const std::string& address, const std::string& pattern) {
+    const auto device = openDevice(options, address);
+    Json list = Json::array();
+    for (const auto& entry : discover(options, *device, address, pattern))
+        list.push_back(toJson(entry));
+    if (options.json) {
+        printDocument(list);
+        return;
+    }
+    Table table({"HANDLE", "CLASS", "MEANING", "NAME"});
+    for (const Json& record : list) {
+        const std::string uuid = record["uuids"].empty() ? "" : display(record["uuids"][0]);
+        table.add({display(record["handle"]), uuid, uuidName(uuid), display(record["name"])});
+    }
+    table.print();
+}
+
+void build(CLI::App& command, const Options& options) {
+    const auto address = addAddress(command);
+    auto pattern = std::make_shared<std::string>();
+    command
+        .add_option("PATTERN", *pattern,
+                    "Which services: a UUID, a short one such as 0x110b, or a name such as spp")
+        ->type_name("");
+    command.callback([&options, address, pattern] { listServices(options, *address, *pattern); });
+}
+
+} // namespace
+
+extern const Verb servicesVerb;
+const Verb servicesVerb = {"services", "Devices", "Read a known device's service records",
+                           "kesbt services 00:11:22:33:44:55\n"
+                           "kesbt services 00:11:22:33:44:55 0x110b --json",
+                           build};
+
+} // namespace Kesbt

@@ -1,0 +1,54 @@
+#include "base/bluez.h"
+#include "base/verb.h"
+
+#include <bluetooth/control.h>
+
+#include <iostream>
+
+namespace Kesbt {
+
+namespace {
+
+void changeVolume(const Options& options, const std::string& address, bool up) {
+    const auto device = openDevice(options, address);
+    const std::unique_ptr<Bluetooth::Control> control(
+        Bluetooth::Control::getControl(device->getPath()));
+    if (!control)
+        throw daemonLost();
+    const Json properties = readOptional(*control);
+    if (properties.is_null())
+        throw Failure(address + " has no remote control; see what it has: kesbt services " +
+                      address);
+    if (!properties.value("Connected", false))
+        throw Failure("the remote control of " + address +
+                      " is not connected; connect it first: kesbt audio connect " + address);
+
+    // The volume itself is not told by the daemon: its answer is all that there is to check.
+    const char* direction = up ? "up" : "down";
+    ask(options, "cannot change the volume of " + address, *control,
+        up ? "VolumeUp" : "VolumeDown");
+    if (options.json)
+        printDocument({{"address", address}, {"volume", direction}});
+    else
+        std::cout << "Volume " << direction << " sent to " << address << '\n';
+}
+
+void build(CLI::App& command, const Options& options) {
+    command.require_subcommand(1);
+    for (const bool up : {true, false}) {
+        CLI::App* verb =
+            command.add_subcommand(up ? "up" : "down", up ? "Make it louder" : "Make it quieter");
+        const auto address = addAddress(*verb);
+        verb->callback([&options, address, up] { changeVolume(options, *address, up); });
+    }
+}
+
+} // namespace
+
+extern const Verb volumeVerb;
+const Verb volumeVerb = {"volume", "Audio", "Press a connected headset's volume key",
+                         "kesbt volume up 00:11:22:33:44:55\n"
+                         "kesbt volume down 00:11:22:33:44:55",
+                         build};
+
+} // namespace Kesbt
