@@ -1,0 +1,130 @@
+#include "service_name.h"
+
+#include <bluetooth/connection.h>
+#include <bluetooth/scanner_server.h>
+
+#include <CLI/CLI.hpp>
+#include <glib-unix.h>
+#include <syslog.h>
+
+#include <atomic>
+#include <csignal>
+#include <cstdio>
+#include <cstdlib>
+#include <string>
+
+namespace {
+
+using Bluetooth::ScannerServer;
+using scannerd::ServiceName;
+
+constexpr const char* PROGRAM = "kesbt-scannerd";
+constexpr int WRONG_USAGE = 2;
+
+int fail(const std::string& problem) {
+    fprintf(stderr, "%s: %s\n", PROGRAM, problem.c_str());
+    syslog(LOG_ERR, "%s", problem.c_str());
+    return EXIT_FAILURE;
+}
+
+/// @return -1 to go on, otherwise the exit status
+int parse(int argc, char** argv) {
+    CLI::App app("Lets the programs of a session share the discovery of Bluetooth devices "
+                 "(com.kestrine.bluetooth on the session bus). The bus starts it when a program "
+                 "asks for devices; it ends by itself 30 seconds after the last discovery began.",
+                 PROGRAM);
+    app.set_version_flag("--version", std::string(PROGRAM) + ' ' + KESBLUETOOTH_VERSION);
+    try {
+        app.parse(argc, argv);
+    } catch (const CLI::ParseError& problem) {
+        return app.exit(problem) == 0 ? EXIT_SUCCESS : WRONG_USAGE;
+    }
+    return -1;
+}
+
+gboolean quit(void* server) {
+    static_cast<ScannerServer*>(server)->quitLoop();
+    return G_SOURCE_CONTINUE;
+}
+
+/// Ends the loop when the connection to a bus is lost. The connection does not come back.
+class BusWatch {
+public:
+    BusWatch(DBusConnection* connection, ScannerServer& server)
+        : m_connection(connection), m_server(server) {
+        dbus_connection_add_filter(m_connection, filter, this, nullptr);
+    }
+    ~BusWatch() { dbus_connection_remove_filter(m_connection, filter, this); }
+    BusWatch(const BusWatch&) = delete;
+    BusWatch& operator=(const BusWatch&) = delete;
+
+    bool isLost() const { return m_lost || !dbus_connection_get_is_connected(m_connection); }
+
+private:
+    /// Runs on whichever thread reads the connection.
+    static DBusHandlerResult filter(DBusConnection*, DBusMessage* message, void* data) {
+        auto* watch = static_cast<BusWatch*>(data);
+        if (dbus_message_is_signal(message, DBUS_INTERFACE_LOCAL, "Disconnected")) {
+            watch->m_lost = true;
+            // In the loop: it need not run yet, and quitting then would be lost.
+            g_idle_add(quitOnce, &watch->m_server);
+        }
+        return DBUS_HANDLER_RESULT_NOT_YET_HANDLED;
+    }
+    static gboolean quitOnce(void* server) {
+        quit(server);
+        return G_SOURCE_REMOVE;
+    }
+
+    DBusConnection* m_connection;
+    ScannerServer& m_server;
+    std::atomic<bool> m_lost{false};
+};
+
+int serve(ServiceName& name, DBusConnection* systemBus) {
+    ScannerServer server;
+    if (name.owner() != server.getConnectionName())
+        return fail("the session bus gave its name to another one; only one can run in a session");
+    const BusWatch session(name.getConnection(), server);
+    const BusWatch system(systemBus, server);
+    g_unix_signal_add(SIGTERM, quit, &server);
+    g_unix_signal_add(SIGINT, quit, &server);
+
+    server.startLoop();
+
+    // Calls that came before the name was given up are answered, the others go to the next daemon.
+    name.release();
+    while (g_main_context_iteration(nullptr, false)) {
+    }
+    server.stopDiscovery();
+    if (session.isLost())
+        return fail("the session bus has gone; start again when it is back");
+    if (system.isLost())
+        return fail("the system bus has gone; start again when it is back");
+    return EXIT_SUCCESS;
+}
+
+int start() {
+    ServiceName name;
+    if (!name.getConnection())
+        return fail("cannot reach the session bus; run it in a session that has one, or through "
+                    "dbus-run-session");
+    DBusConnection* systemBus = Bluetooth::Connection::get(DBUS_BUS_SYSTEM);
+    if (!systemBus)
+        return fail("cannot reach the system bus; start dbus-daemon, or set "
+                    "DBUS_SYSTEM_BUS_ADDRESS");
+    const std::string owner = name.owner();
+    if (!owner.empty())
+        return fail("already running in this session, as " + owner + "; one serves all programs");
+    return serve(name, systemBus);
+}
+
+} // namespace
+
+int main(int argc, char** argv) {
+    const int status = parse(argc, argv);
+    if (status >= 0)
+        return status;
+    openlog(PROGRAM, LOG_PID, LOG_DAEMON);
+    return start();
+}

@@ -1,0 +1,26 @@
+#include "service_name.h"
+
+namespace scannerd {
+
+namespace {
+constexpr const char* NAME = "com.kestrine.bluetooth";
+}
+
+ServiceName::ServiceName()
+    : RemoteObject(DBUS_SERVICE_DBUS, DBUS_PATH_DBUS, DBUS_INTERFACE_DBUS, DBUS_BUS_SESSION) {}
+
+std::string ServiceName::owner() {
+    std::string owner;
+    resetError();
+    if (newMessage("GetNameOwner") == 0 && append(NAME) == 0 && sendMessage(true, -1) == 0)
+        getReplyValue(owner);
+    return owner;
+}
+
+void ServiceName::release() {
+    resetError();
+    if (newMessage("ReleaseName") == 0 && append(NAME) == 0)
+        sendMessage(true, -1);
+}
+
+} // namespace scannerd
