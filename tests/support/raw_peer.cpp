@@ -89,6 +89,8 @@ void RawPeer::post(Task task) {
 }
 
 void RawPeer::run(const std::function<void(DBusConnection*)>& task) {
+    if (std::this_thread::get_id() == m_thread.get_id())
+        return task(m_connection); // a handler's
     std::promise<void> done;
     post([&](DBusConnection* connection) {
         task(connection);

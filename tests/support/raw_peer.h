@@ -64,7 +64,7 @@ public:
     /// Sends any message; its serial is set by this.
     void send(MessagePtr message);
 
-    /// Runs something on the peer's thread and waits for it.
+    /// Runs something on the peer's thread and waits for it. Handlers may do so too.
     void run(const std::function<void(DBusConnection*)>& task);
     bool own(const std::string& name);
     void disown(const std::string& name);

@@ -1,0 +1,132 @@
+// The text form of values and dictionaries.
+
+#include <bluetooth/dict_codec.h>
+
+#include <gtest/gtest.h>
+
+#include <limits>
+#include <memory>
+
+namespace Bluetooth::Test {
+
+namespace {
+
+using Texts = std::vector<std::string>;
+
+Variant text(const char* value) {
+    return Variant(std::string(value));
+}
+
+/// "name=value;" for each entry, only if all are texts; "null" for none.
+std::string parsed(const std::string& input, const std::string& separators) {
+    const std::unique_ptr<Dict> dict(stringDivideToDict(input, separators));
+    if (!dict)
+        return "null";
+    std::string result;
+    for (const DictEntry& entry : *dict)
+        result += entry.first + "=" + boost::get<std::string>(entry.second) + ";";
+    return result;
+}
+
+const Dict& example() {
+    static const Dict dict{{"Address", text("00:11:22:33:44:55")},
+                           {"Class", Variant(360u)},
+                           {"Paired", Variant(false)},
+                           {"UUIDs", Variant(Texts{"a1", "b2"})}};
+    return dict;
+}
+
+} // namespace
+
+TEST(CodecTest, EveryAlternativeHasItsText) {
+    EXPECT_EQ(variantToString(Variant()), "0");
+    EXPECT_EQ(variantToString(Variant(std::numeric_limits<std::uint32_t>::max())), "4294967295");
+    EXPECT_EQ(variantToString(Variant(std::uint16_t{65535})), "65535");
+    EXPECT_EQ(variantToString(Variant(true)), "1");
+    EXPECT_EQ(variantToString(Variant(false)), "0");
+    EXPECT_EQ(variantToString(text("a \"b\"\n;")), "a \"b\"\n;");
+    EXPECT_EQ(variantToString(Variant(Texts{})), "[]");
+    EXPECT_EQ(variantToString(Variant(Texts{"one"})), "[one]");
+    EXPECT_EQ(variantToString(Variant(Texts{"", "a, b"})), "[, a, b]");
+    EXPECT_EQ(variantToString(Variant(std::int32_t{-60})), "-60");
+    EXPECT_EQ(variantToString(Variant(std::numeric_limits<std::int32_t>::min())), "-2147483648");
+}
+
+TEST(CodecTest, OnlyABooleanIsABoolean) {
+    EXPECT_TRUE(variantToBool(Variant(true)));
+    for (const Variant& other : {Variant(false), Variant(1u), text("1"), text("true"),
+                                 Variant(std::int32_t{1}), Variant(Texts{"1"})})
+        EXPECT_FALSE(variantToBool(other));
+}
+
+TEST(CodecTest, DictionariesAreFormattedWithATerminatorAfterEachEntry) {
+    const std::string line = "Address: 00:11:22:33:44:55;Class: 360;Paired: 0;UUIDs: [a1, b2];";
+    EXPECT_EQ(dictConquerToString(example(), ";"), line);
+    EXPECT_EQ(dictToString(example()),
+              "Address: 00:11:22:33:44:55\nClass: 360\nPaired: 0\nUUIDs: [a1, b2]\n");
+    EXPECT_EQ(dictConquerToString({{"a", text("")}, {"", text("b")}}, "<>"), "a: <>: b<>");
+    EXPECT_EQ(dictToString({}), "");
+    EXPECT_EQ(dictConquerToString({}, ";"), "");
+
+    // The types do not come back, the text does.
+    EXPECT_EQ(parsed(line, ";"), "Address=00:11:22:33:44:55;Class=360;Paired=0;UUIDs=[a1, b2];");
+    const std::unique_ptr<Dict> again(stringDivideToDict(line, ";"));
+    EXPECT_EQ(dictConquerToString(*again, ";"), line);
+    EXPECT_FALSE(variantToBool((*again)[2].second));
+}
+
+TEST(CodecTest, ValuesAreFoundByExactNameTheFirstFirst) {
+    EXPECT_EQ(find(&example(), "Class"), "360");
+    EXPECT_EQ(find(&example(), "class"), "");
+    EXPECT_EQ(find(&example(), "Clas"), "");
+    EXPECT_EQ(find(nullptr, "x"), "");
+    EXPECT_EQ(find(&example(), nullptr), "");
+    const Dict twice{{"a", Variant(1u)}, {"a", Variant(2u)}};
+    EXPECT_EQ(find(&twice, "a"), "1");
+}
+
+TEST(CodecTest, EntriesAreSplitAtTheFirstColonAndTrimmed) {
+    const struct {
+        const char* item;
+        const char* name;
+        const char* value;
+    } cases[] = {{"k: v: w", "k", "v: w"},
+                 {":v", "", "v"},
+                 {"z:", "z", ""},
+                 {" \t\n\v\f\r a b \t: \v 1 2 \r\n", "a b", "1 2"},
+                 {":", "", ""},
+                 {"n: -60", "n", "-60"}};
+    for (const auto& given : cases) {
+        const std::unique_ptr<DictEntry> entry(stringToEntry(given.item));
+        ASSERT_TRUE(entry) << given.item;
+        EXPECT_EQ(entry->first, given.name);
+        ASSERT_EQ(entry->second.which(), 3);
+        EXPECT_EQ(boost::get<std::string>(entry->second), given.value);
+    }
+    EXPECT_EQ(stringToEntry("nocolon"), nullptr);
+    EXPECT_EQ(stringToEntry(""), nullptr);
+}
+
+TEST(CodecTest, OnlyTerminatedItemsWithAColonAreParsed) {
+    const struct {
+        const char* input;
+        const char* separators;
+        const char* result;
+    } cases[] = {
+        {"a: 1;b: 2", ";", "a=1;"},
+        {"a: 1", ";", "null"},
+        {";;", ";", "null"},
+        {"", ";", "null"},
+        {"junk;", ";", "null"},
+        {"a: 1;", "", "null"},
+        {"  x : y ;junk;z:;", ";", "x=y;z=;"},
+        {"a: 1\nb: 2;c: 3|", ";\n", "a=1;b=2;"},
+        {";a:1;;a:2;", ";", "a=1;a=2;"},
+    };
+    for (const auto& given : cases)
+        EXPECT_EQ(parsed(given.input, given.separators), given.result) << given.input;
+    const std::string withNul("a: \0x;", 6);
+    EXPECT_EQ(parsed(withNul, ";"), std::string("a=\0x;", 5));
+}
+
+} // namespace Bluetooth::Test

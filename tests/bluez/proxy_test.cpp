@@ -1,0 +1,402 @@
+// What each operation of the proxies asks the daemon, and what becomes of the answer.
+
+#include "bluez/daemon_test.h"
+
+#include <bluetooth/adapter.h>
+#include <bluetooth/adapter_list.h>
+#include <bluetooth/agent.h>
+#include <bluetooth/audio.h>
+#include <bluetooth/audio_sink.h>
+#include <bluetooth/control.h>
+#include <bluetooth/device.h>
+#include <bluetooth/device_list.h>
+#include <bluetooth/dict_codec.h>
+#include <bluetooth/manager.h>
+
+#include <functional>
+#include <limits>
+#include <memory>
+
+namespace Bluetooth::Test {
+
+namespace {
+
+using Found = std::unique_ptr<RemoteObject>;
+
+const Writer::Build badReplies[] = {{}, [](Writer& w) { w(7u); }, [](Writer& w) { w.array("u"); }};
+
+void twoPaths(Writer& w) {
+    w.array("o", [](Writer& a) { a(Path{"/a"})(Path{"/b"}); });
+}
+
+} // namespace
+
+class ProxyTest : public DaemonTest {
+protected:
+    Manager manager;
+    Adapter adapter{adapterPath};
+    Device device{devicePath};
+};
+
+TEST_F(ProxyTest, OperationsWithoutResultAreSentAndNotWaitedFor) {
+    Agent agent;
+    ASSERT_EQ(agent.registerPath(), 0);
+    const std::string agentPath = agent.getPath();
+    const struct {
+        const char* file;
+        std::string call;
+        std::function<int(const char* path)> operation;
+    } cases[] = {
+        {"adapter", "Adapter.RequestSession!", [](auto p) { return Adapter(p).requestSession(); }},
+        {"adapter", "Adapter.ReleaseSession!", [](auto p) { return Adapter(p).releaseSession(); }},
+        {"adapter", "Adapter.StartDiscovery!", [](auto p) { return Adapter(p).startDiscovery(); }},
+        {"adapter", "Adapter.StopDiscovery!", [](auto p) { return Adapter(p).stopDiscovery(); }},
+        {"adapter", "Adapter.CancelDeviceCreation! s:any text",
+         [](auto p) { return Adapter(p).cancelDeviceCreation("any text"); }},
+        {"adapter", "Adapter.RemoveDevice! o:/dev",
+         [](auto p) { return Adapter(p).removeDevice("/dev"); }},
+        {"adapter", "Adapter.RegisterAgent! o:" + agentPath + " s:DisplayYesNo",
+         [&](auto p) { return Adapter(p).registerAgent(agent); }},
+        {"adapter", "Adapter.UnregisterAgent! o:" + agentPath,
+         [&](auto p) { return Adapter(p).unregisterAgent(agent); }},
+        {"device", "Device.CancelDiscovery!", [](auto p) { return Device(p).cancelDiscovery(); }},
+        {"audio", "Audio.Connect!", [](auto p) { return Audio(p).connect(); }},
+        {"audio", "Audio.Disconnect!", [](auto p) { return Audio(p).disconnect(); }},
+        {"audio_sink", "AudioSink.Connect!", [](auto p) { return AudioSink(p).connect(); }},
+        {"audio_sink", "AudioSink.Disconnect!", [](auto p) { return AudioSink(p).disconnect(); }},
+        {"control", "Control.VolumeUp!", [](auto p) { return Control(p).volumeUp(); }},
+        {"control", "Control.VolumeDown!", [](auto p) { return Control(p).volumeDown(); }},
+        {"bluez_object", "Device.SetProperty! s:Alias v(s:x)",
+         [](auto p) { return Device(p).setProperty("Alias", Variant(std::string("x"))); }},
+        {"bluez_object", "Control.SetProperty! s:N v(u:5)",
+         [](auto p) { return Control(p).setProperty("N", Variant(5u)); }},
+    };
+    for (const auto& given : cases) {
+        EXPECT_EQ(given.operation("/some/path"), 0) << given.call;
+        ASSERT_TRUE(
+            daemon.waitForCalls(given.call.substr(given.call.find('.') + 1,
+                                                  given.call.find('!') - given.call.find('.') - 1),
+                                1));
+        const SeenCall seen = daemon.calls()[0];
+        EXPECT_EQ(seen.interface + "." + seen.text(), "org.bluez." + given.call);
+        EXPECT_EQ(seen.path, "/some/path");
+        daemon.forgetCalls();
+        EXPECT_EQ(log.take(), Texts{});
+        EXPECT_EQ(given.operation("no path"), -1);
+        EXPECT_EQ(log.take(), Texts{std::string(given.file) + ".cpp Failed to create message"});
+    }
+    EXPECT_EQ(daemon.calls().size(), 0u);
+    agent.unregisterPath();
+}
+
+TEST_F(ProxyTest, OperationsThatGiveAnObjectReadItsPath) {
+    Agent agent;
+    ASSERT_EQ(agent.registerPath(), 0);
+    agent.setCapability(Agent::PSZ_KEYBOARD_ONLY);
+    const struct {
+        const char* file;
+        std::string call;
+        std::function<Found()> operation;
+        const char* interface;
+    } cases[] = {
+        {"manager", "DefaultAdapter", [&] { return Found(manager.defaultAdapter()); },
+         "org.bluez.Adapter"},
+        {"manager", "FindAdapter s:hci1", [&] { return Found(manager.findAdapter("hci1")); },
+         "org.bluez.Adapter"},
+        {"adapter", "FindDevice s:a", [&] { return Found(adapter.findDevice("a", true)); },
+         "org.bluez.Device"},
+        {"adapter", "CreateDevice s:a", [&] { return Found(adapter.createDevice("a")); },
+         "org.bluez.Device"},
+        {"adapter", std::string("CreatePairedDevice s:a o:") + agent.getPath() + " s:KeyboardOnly",
+         [&] { return Found(adapter.createPairedDevice("a", agent)); }, "org.bluez.Device"},
+    };
+    for (const auto& given : cases) {
+        const std::string method = given.call.substr(0, given.call.find(' '));
+        const std::string place = std::string(given.file) + ".cpp ";
+        daemon.reply(method, [](Writer& w) { w(Path{"/new"}); });
+        const Found found = given.operation();
+        ASSERT_TRUE(found) << method;
+        EXPECT_STREQ(found->getPath(), "/new");
+        EXPECT_STREQ(found->getInterface(), given.interface);
+        EXPECT_STREQ(found->getDestination(), "org.bluez");
+        EXPECT_EQ(takeCalls(), Texts{given.call});
+        EXPECT_EQ(log.take(), Texts{});
+
+        daemon.replyError(method, "org.bluez.Error.Failed", "Nothing there");
+        EXPECT_FALSE(given.operation());
+        EXPECT_EQ(log.take(), Texts{place + "Nothing there"});
+        daemon.reply(method, [](Writer& w) { w("said in a text"); });
+        EXPECT_FALSE(given.operation());
+        EXPECT_EQ(log.take(), Texts{place + "said in a text"});
+        for (const auto& bad : badReplies) {
+            daemon.reply(method, bad);
+            EXPECT_FALSE(given.operation());
+            EXPECT_EQ(log.take(), Texts{place});
+        }
+        // The daemon may be gone by the time its answer is used.
+        daemon.handle(method, [&](DBusMessage* request) {
+            daemon.disown("org.bluez");
+            MessagePtr reply(dbus_message_new_method_return(request));
+            Writer(reply.get())(Path{"/new"});
+            return reply;
+        });
+        EXPECT_FALSE(given.operation());
+        EXPECT_EQ(log.take(), Texts{});
+        ASSERT_TRUE(daemon.own("org.bluez"));
+        daemon.forgetCalls();
+    }
+    agent.unregisterPath();
+}
+
+TEST_F(ProxyTest, UnusableArgumentsAreLoggedAndNothingIsSent) {
+    const Agent unregistered;
+    const std::function<bool()> refused[] = {
+        [&] { return !manager.findAdapter(nullptr); },
+        [&] { return !adapter.createDevice(nullptr); },
+        [&] { return !adapter.findDevice("\xff", true); },
+        [&] { return adapter.cancelDeviceCreation(nullptr) == -1; },
+        [&] { return adapter.removeDevice(address) == -1; },
+        [&] { return adapter.removeDevice(nullptr) == -1; },
+        [&] { return adapter.registerAgent(unregistered) == -1; },
+        [&] { return !adapter.createPairedDevice(address, unregistered); },
+        [&] { return !device.discoverServices(nullptr); },
+        [&] { return device.setProperty(nullptr, Variant(true)) == -1; },
+        [&] { return device.setProperty("Alias", Variant(std::string("\xff"))) == -1; },
+    };
+    for (const auto& isRefused : refused)
+        EXPECT_TRUE(isRefused());
+    EXPECT_EQ(log.take(), (Texts{"manager.cpp Parameter is null", "adapter.cpp Parameter is null",
+                                 "adapter.cpp Failed to append args to message",
+                                 "adapter.cpp Parameter is null", "adapter.cpp Invalid path",
+                                 "adapter.cpp Invalid path", "adapter.cpp Invalid path",
+                                 "adapter.cpp Invalid path", "device.cpp Parameter is null",
+                                 "bluez_object.cpp Parameter is null",
+                                 "bluez_object.cpp Failed to append args = iterator"}));
+    EXPECT_EQ(daemon.calls().size(), 0u);
+    // A list cannot be sent: the call goes out without it, and only the log tells.
+    EXPECT_EQ(device.setProperty("UUIDs", Variant(Texts{"a"})), 0);
+    ASSERT_TRUE(daemon.waitForCalls("SetProperty", 1));
+    EXPECT_EQ(takeCalls(), Texts{"SetProperty! s:UUIDs"});
+    EXPECT_EQ(log.take(), Texts{"bluez_object.cpp Failed to append args = iterator"});
+}
+
+TEST_F(ProxyTest, DictionariesAreGivenWholeOrNotAtAll) {
+    using Ask = std::function<Dict*()>;
+    const struct {
+        const char* file;
+        const char* call;
+        Ask ask;
+    } cases[] = {
+        {"bluez_object", "GetProperties", [&] { return device.getProperties(); }},
+        {"bluez_object", "GetProperties", [&] { return manager.getProperties(); }},
+        {"device", "DiscoverServices s:0x110b", [&] { return device.discoverServices("0x110b"); }},
+    };
+    for (const auto& given : cases) {
+        const std::string method =
+            std::string(given.call).substr(0, std::string(given.call).find(' '));
+        const std::string place = std::string(given.file) + ".cpp ";
+        daemon.reply(method, [](Writer& w) {
+            w.dict("us", [](Writer& d) { d.entry(65536u, "<a/>").entry(65537u, "<b/>"); });
+        });
+        const std::unique_ptr<Dict> dict(given.ask());
+        ASSERT_TRUE(dict);
+        EXPECT_EQ(dictConquerToString(*dict, ";"), "65536: <a/>;65537: <b/>;");
+        EXPECT_EQ(takeCalls(), Texts{given.call});
+        daemon.reply(method, [](Writer& w) { w.dict("us"); });
+        const std::unique_ptr<Dict> empty(given.ask());
+        ASSERT_TRUE(empty);
+        EXPECT_TRUE(empty->empty());
+        EXPECT_EQ(log.take(), Texts{});
+
+        daemon.reply(method, [](Writer& w) {
+            w.dict("sv", [](Writer& d) { d.entry("good", Var{1u}).entry("bad", Var{1.5}); });
+        });
+        EXPECT_EQ(given.ask(), nullptr);
+        daemon.reply(method, [](Writer& w) { w("text"); });
+        EXPECT_EQ(given.ask(), nullptr);
+        daemon.replyError(method, "org.bluez.Error.NotReady", "Resource Not Ready");
+        EXPECT_EQ(given.ask(), nullptr);
+        EXPECT_EQ(log.take(), (Texts{place + "Invalid reply value", place + "Invalid reply format",
+                                     place + "Resource Not Ready"}));
+        daemon.forgetCalls();
+    }
+    EXPECT_EQ(device.getErrorMessage(), "Resource Not Ready"); // left for the caller to read
+}
+
+TEST_F(ProxyTest, ConnectionStatesAreReadOrLeftAsTheyWere) {
+    AudioSink sink(devicePath);
+    Control control(devicePath);
+    const struct {
+        const char* file;
+        std::function<int(bool&)> ask;
+    } cases[] = {{"audio_sink", [&](bool& connected) { return sink.isConnected(connected); }},
+                 {"control", [&](bool& connected) { return control.isConnected(connected); }}};
+    for (const auto& given : cases) {
+        for (const bool state : {true, false}) {
+            bool connected = !state;
+            daemon.reply("IsConnected", [state](Writer& w) { w(state); });
+            EXPECT_EQ(given.ask(connected), 0);
+            EXPECT_EQ(connected, state);
+
+            daemon.replyError("IsConnected", "org.bluez.Error.Failed", "No sink");
+            EXPECT_EQ(given.ask(connected), -1);
+            daemon.reply("IsConnected", [](Writer& w) { w("yes"); });
+            EXPECT_EQ(given.ask(connected), -1);
+            EXPECT_EQ(connected, state);
+            EXPECT_EQ(log.take(), (Texts{std::string(given.file) + ".cpp No sink",
+                                         std::string(given.file) + ".cpp Invalid reply value"}));
+        }
+    }
+    EXPECT_EQ(takeCalls(), Texts(12, "IsConnected"));
+}
+
+TEST_F(ProxyTest, AnIndexPastTheEndMeansTheDefaultAdapterButNoDevice) {
+    daemon.reply("ListAdapters", twoPaths);
+    daemon.reply("DefaultAdapter", [](Writer& w) { w(Path{"/default"}); });
+    const std::pair<unsigned int, const char*> places[] = {
+        {0, "/a"}, {1, "/b"}, {2, "/default"}, {std::numeric_limits<unsigned>::max(), "/default"}};
+    for (const auto& [index, path] : places) {
+        const Found found(manager.getAdapterByIndex(index));
+        ASSERT_TRUE(found);
+        EXPECT_STREQ(found->getPath(), path);
+    }
+    EXPECT_EQ(takeCalls(), (Texts{"ListAdapters", "ListAdapters", "ListAdapters", "DefaultAdapter",
+                                  "ListAdapters", "DefaultAdapter"}));
+    EXPECT_EQ(log.take(), Texts{});
+    // A fallback that fails is logged by both.
+    daemon.replyError("DefaultAdapter", "org.bluez.Error.NoSuchAdapter", "No such adapter");
+    EXPECT_EQ(manager.getAdapterByIndex(2), nullptr);
+    EXPECT_EQ(log.take(), (Texts{"manager.cpp No such adapter", "manager.cpp No such adapter"}));
+    daemon.reply("ListAdapters", [](Writer& w) { w("text"); });
+    EXPECT_EQ(manager.getAdapterByIndex(0), nullptr);
+    EXPECT_EQ(log.take(), Texts{"manager.cpp Invalid reply value"});
+
+    daemon.reply("ListDevices", twoPaths);
+    const Found second(adapter.getDeviceByIndex(1));
+    ASSERT_TRUE(second);
+    EXPECT_STREQ(second->getPath(), "/b");
+    EXPECT_EQ(adapter.getDeviceByIndex(2), nullptr);
+    EXPECT_EQ(log.take(), Texts{});
+    daemon.replyError("ListDevices", "org.bluez.Error.Failed", "Broken");
+    EXPECT_EQ(adapter.getDeviceByIndex(0), nullptr);
+    EXPECT_EQ(log.take(), Texts{"adapter.cpp Broken"});
+}
+
+TEST_F(ProxyTest, ListingAdaptersNeitherLogsNorForgetsAnEarlierError) {
+    daemon.replyError("FindAdapter", "org.bluez.Error.NoSuchAdapter", "No such adapter");
+    daemon.reply("ListAdapters", twoPaths);
+    EXPECT_EQ(manager.findAdapter("hci9"), nullptr);
+    log.take();
+    const std::unique_ptr<AdapterList> list(manager.listAdapters());
+    ASSERT_TRUE(list);
+    ASSERT_EQ(list->size(), 2u);
+    EXPECT_STREQ((*list)[0]->getPath(), "/a");
+    EXPECT_STREQ((*list)[1]->getPath(), "/b");
+    EXPECT_EQ(manager.getErrorMessage(), "No such adapter");
+    for (const auto& bad : badReplies) {
+        daemon.reply("ListAdapters", bad);
+        const std::unique_ptr<AdapterList> none(manager.listAdapters());
+        EXPECT_EQ(none == nullptr, &bad != &badReplies[2]); // an empty array of any type is a list
+    }
+    daemon.replyError("ListAdapters", "org.bluez.Error.Failed", "Broken");
+    EXPECT_EQ(manager.listAdapters(), nullptr);
+    EXPECT_EQ(manager.getErrorMessage(), "Broken");
+    EXPECT_EQ(log.take(), Texts{});
+
+    daemon.reply("ListDevices", [](Writer& w) { w.array("o"); });
+    const std::unique_ptr<DeviceList> devices(adapter.listDevices());
+    ASSERT_TRUE(devices);
+    EXPECT_TRUE(devices->empty());
+    daemon.replyError("ListDevices", "org.bluez.Error.Failed", "Broken");
+    EXPECT_EQ(adapter.listDevices(), nullptr); // unlike adapters, this is logged
+    EXPECT_EQ(log.take(), Texts{"adapter.cpp Broken"});
+}
+
+TEST_F(ProxyTest, ListsHoldNullsForADaemonThatLeftAndSkipThemWhenDeleted) {
+    const auto leaving = [&](DBusMessage* request) {
+        daemon.disown("org.bluez");
+        MessagePtr reply(dbus_message_new_method_return(request));
+        Writer writer(reply.get());
+        twoPaths(writer);
+        return reply;
+    };
+    daemon.handle("ListAdapters", leaving);
+    daemon.handle("ListDevices", leaving);
+    std::unique_ptr<AdapterList> adapters(manager.listAdapters());
+    ASSERT_TRUE(adapters);
+    EXPECT_EQ(static_cast<std::vector<Adapter*>&>(*adapters),
+              (std::vector<Adapter*>{nullptr, nullptr}));
+    ASSERT_TRUE(daemon.own("org.bluez"));
+    std::unique_ptr<DeviceList> devices(adapter.listDevices());
+    ASSERT_TRUE(devices);
+    EXPECT_EQ(static_cast<std::vector<Device*>&>(*devices),
+              (std::vector<Device*>{nullptr, nullptr}));
+    EXPECT_EQ(log.take(), Texts{});
+    // Elements taken out are the caller's.
+    adapters->push_back(new Adapter("/kept"));
+    const std::unique_ptr<Adapter> kept(adapters->back());
+    adapters->back() = nullptr;
+    adapters.reset();
+    EXPECT_STREQ(kept->getPath(), "/kept");
+}
+
+TEST_F(ProxyTest, AListCostsOneCallAndOneLookAtTheBusForEachElement) {
+    daemon.reply("ListAdapters", twoPaths);
+    RawPeer monitor(bus.address());
+    monitor.becomeMonitor();
+    const std::unique_ptr<AdapterList> list(manager.listAdapters());
+    const std::unique_ptr<Manager> another(Manager::getManager());
+    ASSERT_TRUE(list && another);
+    EXPECT_NE(another.get(), &manager);
+    manager.setProperty("End", Variant(true));
+    ASSERT_TRUE(monitor.waitForCalls("SetProperty", 1));
+    Texts members;
+    for (const SeenCall& call : monitor.calls())
+        members.push_back(call.member);
+    EXPECT_EQ(members,
+              (Texts{"ListAdapters", "ListNames", "ListNames", "ListNames", "SetProperty"}));
+}
+
+TEST_F(ProxyTest, FindDeviceLogsOnlyWhenAsked) {
+    daemon.replyError("FindDevice", "org.bluez.Error.DoesNotExist", "Does Not Exist");
+    EXPECT_EQ(adapter.findDevice(address, false), nullptr);
+    EXPECT_EQ(log.take(), Texts{});
+    EXPECT_EQ(adapter.getErrorMessage(), "Does Not Exist");
+    EXPECT_EQ(adapter.findDevice(address, true), nullptr);
+    EXPECT_EQ(log.take(), Texts{"adapter.cpp Does Not Exist"});
+    EXPECT_EQ(takeCalls(), Texts(2, std::string("FindDevice s:") + address));
+}
+
+TEST_F(ProxyTest, FactoriesAskWhetherTheDaemonIsThereByItsExactName) {
+    const std::function<Found()> factories[] = {
+        [] { return Found(Manager::getManager()); },
+        [] { return Found(Adapter::getAdapter(adapterPath)); },
+        [] { return Found(Device::getDevice(devicePath)); },
+        [] { return Found(Audio::getAudio(devicePath)); },
+        [] { return Found(AudioSink::getAudioSink(devicePath)); },
+        [] { return Found(Control::getControl(devicePath)); },
+    };
+    const char* expected[] = {
+        "/ org.bluez.Manager", adapterPath, devicePath, devicePath, devicePath, devicePath};
+    EXPECT_TRUE(BluezObject::hasBluetoothd());
+    for (std::size_t i = 0; i < std::size(factories); ++i) {
+        const Found made = factories[i]();
+        ASSERT_TRUE(made);
+        EXPECT_EQ(std::string(expected[i]).find(made->getPath()), 0u);
+    }
+    daemon.disown("org.bluez");
+    for (const char* other : {"org.bluez.obex", "org.Bluez", "org.blue"})
+        ASSERT_TRUE(daemon.own(other));
+    EXPECT_FALSE(BluezObject::hasBluetoothd());
+    for (const auto& factory : factories)
+        EXPECT_FALSE(factory());
+    EXPECT_EQ(log.take(), Texts{});
+    ASSERT_TRUE(daemon.own("org.bluez"));
+    EXPECT_TRUE(BluezObject::hasBluetoothd()); // nothing is remembered
+
+    bus.kill();
+    EXPECT_FALSE(BluezObject::hasBluetoothd());
+    EXPECT_FALSE(factories[0]());
+}
+
+} // namespace Bluetooth::Test
