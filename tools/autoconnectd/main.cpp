@@ -65,7 +65,10 @@ int parse(int argc, char** argv, Options& options) {
     try {
         app.parse(argc, argv);
     } catch (const CLI::ParseError& problem) {
-        return app.exit(problem) == 0 ? EXIT_SUCCESS : WRONG_USAGE;
+        if (problem.get_exit_code() == 0) // --help, --version
+            return app.exit(problem);
+        fprintf(stderr, "%s: %s; see %s --help\n", PROGRAM, problem.what(), PROGRAM);
+        return WRONG_USAGE;
     }
     options.maxInterval = std::max(options.maxInterval, options.interval);
     return -1;
