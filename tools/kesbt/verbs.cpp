@@ -13,6 +13,9 @@
     VERB(create)                                                                                   \
     VERB(remove)                                                                                   \
     VERB(services)                                                                                 \
+    VERB(pair)                                                                                     \
+    VERB(cancel)                                                                                   \
+    VERB(agent)                                                                                    \
     VERB(audio)                                                                                    \
     VERB(volume)
 

@@ -1,0 +1,96 @@
+#include "base/bluez.h"
+#include "base/bus_feed.h"
+#include "base/shown_agent.h"
+#include "base/style.h"
+#include "base/text.h"
+#include "base/verb.h"
+#include "base/waiting.h"
+
+#include <iostream>
+
+namespace Kesbt {
+
+namespace {
+
+void printLine(const std::string& text) {
+    std::cout << coloured(timeForPeople(), Colour::Dim) << "  " << printable(text) << '\n';
+    flushOutput();
+}
+
+void printRequest(const Options& options, const AgentRequest& request) {
+    if (!options.json) {
+        printLine(request.text());
+        return;
+    }
+    Json line = {{"event", "request"}, {"time", timeForPrograms()}, {"request", request.method}};
+    if (!request.address.empty())
+        line["address"] = request.address;
+    if (!request.detail.empty())
+        line["detail"] = request.detail;
+    line["answer"] = request.answer;
+    printEvent(line);
+}
+
+void registerAgent(const Options& options, Bluetooth::Adapter& adapter, const ShownAgent& agent) {
+    const std::string name = adapterName(adapter);
+    try {
+        ask(options, "cannot register an agent on " + name, adapter, "RegisterAgent",
+            Bluetooth::ObjectPath(agent.getPath()), agent.getCapability());
+    } catch (const Failure&) {
+        if (adapter.getErrorMessage() == "Already Exists")
+            throw Failure(name + " has an agent of another program; end that program first");
+        throw;
+    }
+    if (options.json)
+        printEvent({{"event", "registered"}, {"time", timeForPrograms()}, {"adapter", name}});
+    else
+        printLine("Agent registered on " + name + ", waiting for requests (Ctrl-C ends it)");
+}
+
+/// Answers requests until the user interrupts. The library's receive thread does not run here: it
+/// would drop them.
+void serve(DBusConnection* connection, const ShownAgent& agent, BusFeed& daemon,
+           Interrupt& interrupt) {
+    while (!interrupt.came()) {
+        int fd = -1;
+        dbus_connection_get_unix_fd(connection, &fd);
+        waitForInput({fd, daemon.fd(), interrupt.fd()});
+        dbus_connection_read_write(connection, 0);
+        while (dbus_connection_dispatch(connection) == DBUS_DISPATCH_DATA_REMAINS) {
+        }
+        for (Signal signal; daemon.next(signal);) {
+            if (BusFeed::isDaemonGone(signal))
+                throw daemonLost();
+        }
+        if (agent.isReleased())
+            throw Failure("bluetoothd has released the agent; register it again: kesbt agent");
+    }
+}
+
+void runAgent(const Options& options, const AgentSettings& settings) {
+    Interrupt interrupt;
+    const auto adapter = openAdapter(options);
+    BusFeed daemon({BusFeed::daemonRule});
+    const ShownAgent agent(
+        settings, [&options](const AgentRequest& request) { printRequest(options, request); });
+    registerAgent(options, *adapter, agent);
+    serve(adapter->getConnection(), agent, daemon, interrupt);
+    ask(options, "cannot unregister the agent", *adapter, "UnregisterAgent",
+        Bluetooth::ObjectPath(agent.getPath()));
+}
+
+void build(CLI::App& command, const Options& options) {
+    const auto settings = addAgentOptions(command);
+    command.callback([&options, settings] { runAgent(options, *settings); });
+}
+
+} // namespace
+
+extern const Verb agentVerb;
+const Verb agentVerb = {"agent", "Pairing",
+                        "Answer devices that want to pair with an adapter, until Ctrl-C",
+                        "kesbt agent --pin 1234\n"
+                        "kesbt --adapter hci1 agent --reject\nkesbt agent --json",
+                        build};
+
+} // namespace Kesbt

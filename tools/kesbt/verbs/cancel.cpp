@@ -1,0 +1,41 @@
+#include "base/bluez.h"
+#include "base/verb.h"
+
+#include <iostream>
+
+namespace Kesbt {
+
+namespace {
+
+void cancel(const Options& options, const std::string& address) {
+    const auto adapter = openAdapter(options);
+    const std::string name = adapterName(*adapter);
+    try {
+        ask(options, "cannot cancel the creation of " + address, *adapter, "CancelDeviceCreation",
+            address.c_str());
+    } catch (const Failure&) {
+        if (adapter->getErrorMessage() == "Does Not Exist")
+            throw Failure("no creation of " + address + " is under way on " + name +
+                          "; see what happens with: kesbt monitor");
+        throw;
+    }
+    if (options.json)
+        printDocument({{"address", address}, {"adapter", name}, {"cancelled", true}});
+    else
+        std::cout << "Cancelled the creation of " << address << " on " << name << '\n';
+}
+
+void build(CLI::App& command, const Options& options) {
+    const auto address = addAddress(command);
+    command.callback([&options, address] { cancel(options, *address); });
+}
+
+} // namespace
+
+extern const Verb cancelVerb;
+const Verb cancelVerb = {"cancel", "Pairing",
+                         "Stop the creation of a device (the daemon lets only the program that "
+                         "began it)",
+                         "kesbt cancel 00:11:22:33:44:55", build};
+
+} // namespace Kesbt

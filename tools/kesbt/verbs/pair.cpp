@@ -1,0 +1,62 @@
+#include "base/bluez.h"
+#include "base/creation.h"
+#include "base/shown_agent.h"
+#include "base/text.h"
+#include "base/verb.h"
+
+#include <iostream>
+
+namespace Kesbt {
+
+namespace {
+
+std::unique_ptr<Bluetooth::Device> createPaired(const Options& options, Bluetooth::Adapter& adapter,
+                                                const std::string& address,
+                                                const AgentSettings& settings) {
+    std::string shown; // a passkey to type is told again with each key
+    const ShownAgent agent(settings, [&shown](const AgentRequest& request) {
+        const bool isEnd = request.method == "Release";
+        if (!isEnd && request.text() != shown)
+            std::cerr << printable(request.text()) << '\n';
+        shown = request.text();
+    });
+    Watchdog::Task task = creationTask(adapter, address, "pairing with");
+    if (options.limited) // otherwise as long as the other side's user takes
+        task.limit = options.timeLimit();
+    task.showsProgress = true;
+    const Watchdog watchdog(std::move(task));
+    std::unique_ptr<Bluetooth::Device> device(adapter.createPairedDevice(address.c_str(), agent));
+    if (!device)
+        watchdog.throwIfCancelled();
+    return device;
+}
+
+void pair(const Options& options, const std::string& address, const AgentSettings& settings) {
+    const auto adapter = openAdapter(options);
+    std::cerr << "Pairing with " << address << " on " << adapterName(*adapter)
+              << " (Ctrl-C stops it)\n";
+    const auto device = createPaired(options, *adapter, address, settings);
+    if (!device)
+        throw refusal("cannot pair with " + address, *adapter);
+    const auto isPaired = [&] { return readProperties(*device).value("Paired", false); };
+    if (!waitUntil(isPaired, options.timeLimit()))
+        throw notConfirmed(address + " is not paired");
+    printDevice(options, *device);
+}
+
+void build(CLI::App& command, const Options& options) {
+    const auto address = addAddress(command);
+    const auto settings = addAgentOptions(command);
+    command.callback([&options, address, settings] { pair(options, *address, *settings); });
+}
+
+} // namespace
+
+extern const Verb pairVerb;
+const Verb pairVerb = {"pair", "Pairing", "Pair with a device and make it known",
+                       "kesbt pair 00:11:22:33:44:55\n"
+                       "kesbt pair 00:11:22:33:44:55 --pin 1234\n"
+                       "kesbt pair 00:11:22:33:44:55 --capability NoInputNoOutput",
+                       build};
+
+} // namespace Kesbt
