@@ -5,7 +5,6 @@
 #include <algorithm>
 #include <cstdarg>
 #include <cstdio>
-#include <regex>
 
 namespace Bluetooth::Test {
 
@@ -30,8 +29,11 @@ void record(int priority, const char* format, va_list args) {
 } // namespace
 
 std::string LogLine::withoutNumber() const {
-    static const std::regex place("^([a-z0-9_]+\\.cpp):[1-9][0-9]* ");
-    std::string result = std::regex_replace(text, place, "$1 ");
+    std::string result = text;
+    const std::size_t colon = text.find(".cpp:") + 4;
+    const std::size_t end = text.find_first_not_of("0123456789", colon + 1);
+    if (colon < text.find(' ') && end != std::string::npos && text[end] == ' ')
+        result.erase(colon, end - colon);
     if (priority != LOG_ERR)
         result += " (priority " + std::to_string(priority) + ")";
     return result;
