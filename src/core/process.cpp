@@ -98,7 +98,7 @@ std::unique_ptr<ProcessReader> ProcessReader::open(const char* program,
         return std::unique_ptr<ProcessReader>(new ProcessReader(stream, pid));
 
     if (stream)
-        fclose(stream);
+        static_cast<void>(fclose(stream));
     else
         close(ends[0]);
     errno = error;
@@ -106,7 +106,7 @@ std::unique_ptr<ProcessReader> ProcessReader::open(const char* program,
 }
 
 ProcessReader::~ProcessReader() {
-    fclose(m_stream);
+    static_cast<void>(fclose(m_stream)); // only read from
     waitFor(m_pid);
 }
 

@@ -6,7 +6,7 @@ namespace Bluetooth {
 
 namespace {
 
-constexpr std::streamoff MAX_SIZE = 1024 * 1024;
+constexpr std::streamoff MAX_SIZE = 1 << 20;
 constexpr std::streamoff FIRST_ENTRY = 2; // after the flag and one comma, whatever they are
 constexpr char SEPARATOR = ',';
 

@@ -12,7 +12,7 @@
 #include <unistd.h>
 
 #include <algorithm>
-#include <cstdio>
+#include <charconv>
 #include <cstdlib>
 #include <cstring>
 
@@ -20,6 +20,7 @@ namespace Bluetooth {
 
 namespace {
 
+constexpr const char* PROCESSES = "/proc/";
 constexpr const char* DAEMON_NAME = "bluetoothd";
 constexpr const char* DAEMON_PROGRAM = "/usr/sbin/bluetoothd";
 constexpr const char* ADAPTER_MARKERS = "/tmp/bluetooth.info_*";
@@ -49,6 +50,14 @@ bool linkContains(const char* link, const char* name) {
     return readlink(link, target, sizeof(target) - 1) >= 0 && strstr(target, name);
 }
 
+/// The number in "/proc/PID/exe"; -1 for "/proc/self/exe".
+int pidOf(const char* link) {
+    const char* const digits = link + strlen(PROCESSES);
+    int pid = -1;
+    std::from_chars(digits, digits + strlen(digits), pid);
+    return pid;
+}
+
 void sleepFully(unsigned int seconds) {
     while (seconds > 0)
         seconds = sleep(seconds); // what is left, when a signal came
@@ -63,9 +72,8 @@ int getPidFromName(const char* name) {
         return -1;
     }
     for (const char* link : links) {
-        int pid = -1;
-        // /proc/self matches the pattern and is no number.
-        if (linkContains(link, name) && sscanf(link, "/proc/%d/exe", &pid) == 1)
+        const int pid = pidOf(link);
+        if (pid >= 0 && linkContains(link, name))
             return pid;
     }
     return -1;

@@ -11,9 +11,9 @@
 
 #include <algorithm>
 #include <cerrno>
-#include <cstdio>
 #include <cstdlib>
 #include <cstring>
+#include <iostream>
 #include <memory>
 #include <string>
 
@@ -40,7 +40,7 @@ struct Options {
 };
 
 int fail(const std::string& problem) {
-    fprintf(stderr, "%s: %s\n", PROGRAM, problem.c_str());
+    std::cerr << PROGRAM << ": " << problem << std::endl;
     syslog(LOG_ERR, "%s", problem.c_str());
     return EXIT_FAILURE;
 }
@@ -67,7 +67,7 @@ int parse(int argc, char** argv, Options& options) {
     } catch (const CLI::ParseError& problem) {
         if (problem.get_exit_code() == 0) // --help, --version
             return app.exit(problem);
-        fprintf(stderr, "%s: %s; see %s --help\n", PROGRAM, problem.what(), PROGRAM);
+        std::cerr << PROGRAM << ": " << problem.what() << "; see " << PROGRAM << " --help\n";
         return WRONG_USAGE;
     }
     options.maxInterval = std::max(options.maxInterval, options.interval);
