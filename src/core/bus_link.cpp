@@ -40,10 +40,6 @@ private:
     const BusLink* m_before;
 };
 
-void setNoMemory(DBusError& error) {
-    dbus_set_error_const(&error, DBUS_ERROR_NO_MEMORY, "Not enough memory");
-}
-
 /// @return the reply; null, and none will come any more, when the call is not answered
 MessagePtr takeReply(DBusPendingCall* pending) {
     if (dbus_pending_call_get_completed(pending)) // libdbus ends the process otherwise
@@ -59,11 +55,13 @@ static_assert(std::atomic<bool>::is_always_lock_free, "set in signal handlers");
 
 /// A thread that waits for something that dispatching brings about.
 struct BusLink::Waiter {
-    enum class Goal { Reply, Output, Disconnect };
+    enum class Goal { Reply, Completion, Output, Disconnect };
 
     Goal goal;
     DBusConnection* connection;
-    DBusPendingCall* pending = nullptr;
+    dbus_uint32_t serial = 0;           // Reply: of the call
+    MessagePtr reply;                   // Reply: what the filter found for it
+    DBusPendingCall* pending = nullptr; // Completion
     Clock::time_point deadline = Clock::time_point::max();
     const std::atomic<bool>* interrupted = nullptr;
     bool leadsAlways = false;
@@ -75,6 +73,8 @@ struct BusLink::Waiter {
     bool isFinished() const {
         switch (goal) {
         case Goal::Reply:
+            return reply != nullptr;
+        case Goal::Completion:
             return dbus_pending_call_get_completed(pending) || (interrupted && *interrupted);
         case Goal::Output:
             return !dbus_connection_has_messages_to_send(connection);
@@ -128,40 +128,35 @@ MessagePtr BusLink::call(DBusMessage* message, int timeoutMs, DBusError& error) 
         return MessagePtr(
             dbus_connection_send_with_reply_and_block(m_connection, message, timeoutMs, &error));
 
-    DBusPendingCall* begun = nullptr;
-    if (!dbus_connection_send_with_reply(m_connection, message, &begun, timeoutMs)) {
-        setNoMemory(error);
-        return nullptr;
-    }
-    if (!begun) {
+    if (!dbus_connection_get_is_connected(m_connection)) {
         dbus_set_error_const(&error, DBUS_ERROR_DISCONNECTED, "Connection is closed");
         return nullptr;
     }
-    const PendingPtr pending(begun);
     Waiter waiter(Waiter::Goal::Reply, m_connection);
-    waiter.pending = begun;
     if (timeoutMs != std::numeric_limits<int>::max()) {
         constexpr int defaultTimeoutMs = 25000;
         waiter.deadline = Clock::now() + Milliseconds(timeoutMs < 0 ? defaultTimeoutMs : timeoutMs);
     }
-    wait(waiter);
-
-    MessagePtr reply = takeReply(begun);
-    if (!reply) {
-        if (dbus_connection_get_is_connected(m_connection))
-            dbus_set_error_const(
-                &error, DBUS_ERROR_NO_REPLY,
-                "Did not receive a reply. Possible causes include: the remote application did not "
-                "send a reply, the message bus security policy blocked the reply, the reply "
-                "timeout expired, or the network connection was broken.");
-        else
-            dbus_set_error_const(&error, DBUS_ERROR_DISCONNECTED,
-                                 "Connection was disconnected before a reply was received");
-        return nullptr;
+    {
+        // Sent without a pending call, which costs a third of the whole exchange: libdbus makes an
+        // error message for each beforehand. Locked from here on, so that the filter finds the
+        // waiter however soon the reply comes; sending neither dispatches nor waits.
+        Lock lock(m_mutex);
+        if (!dbus_connection_send(m_connection, message, &waiter.serial)) {
+            dbus_set_error_const(&error, DBUS_ERROR_NO_MEMORY, "Not enough memory");
+            return nullptr;
+        }
+        wait(waiter, lock);
     }
-    if (dbus_set_error_from_message(&error, reply.get()))
+    if (!waiter.reply)
+        dbus_set_error_const(
+            &error, DBUS_ERROR_NO_REPLY,
+            "Did not receive a reply. Possible causes include: the remote application did not "
+            "send a reply, the message bus security policy blocked the reply, the reply "
+            "timeout expired, or the network connection was broken.");
+    else if (dbus_set_error_from_message(&error, waiter.reply.get()))
         return nullptr;
-    return reply;
+    return std::move(waiter.reply);
 }
 
 bool BusLink::send(DBusMessage* message) {
@@ -188,11 +183,13 @@ MessagePtr BusLink::finish(PendingPtr pending, const std::atomic<bool>& interrup
         dbus_pending_call_block(pending.get());
     } else {
         const ScopedRole answersRequests(receiving, nullptr);
-        Waiter waiter(Waiter::Goal::Reply, m_connection);
+        Waiter waiter(Waiter::Goal::Completion, m_connection);
         waiter.pending = pending.get();
         waiter.interrupted = &interrupted;
         waiter.leadsAlways = true;
-        wait(waiter);
+        dbus_pending_call_set_notify(waiter.pending, pendingCompleted, this, nullptr);
+        Lock lock(m_mutex);
+        wait(waiter, lock);
     }
     return takeReply(pending.get());
 }
@@ -205,7 +202,8 @@ void BusLink::flush() {
         return;
     }
     Waiter waiter(Waiter::Goal::Output, m_connection);
-    wait(waiter);
+    Lock lock(m_mutex);
+    wait(waiter, lock);
 }
 
 bool BusLink::checkOpen() {
@@ -216,17 +214,14 @@ bool BusLink::checkOpen() {
         // libdbus hands out a dead connection until its end has been dispatched.
         Waiter waiter(Waiter::Goal::Disconnect, m_connection);
         waiter.deadline = Clock::now() + longestWait;
-        wait(waiter);
+        Lock lock(m_mutex);
+        wait(waiter, lock);
     }
     return dbus_connection_get_is_connected(m_connection);
 }
 
 /// Returns when the waiter's goal is reached, its time is over or the connection is closed.
-void BusLink::wait(Waiter& waiter) {
-    if (waiter.goal == Waiter::Goal::Reply)
-        dbus_pending_call_set_notify(waiter.pending, replyArrived, this, nullptr);
-
-    Lock lock(m_mutex);
+void BusLink::wait(Waiter& waiter, Lock& lock) {
     m_waiters.push_back(&waiter);
     if (m_reading && (waiter.leadsAlways || dbus_connection_has_messages_to_send(m_connection)))
         wakeLeader();
@@ -244,7 +239,7 @@ void BusLink::wait(Waiter& waiter) {
         }
     }
     m_waiters.erase(std::find(m_waiters.begin(), m_waiters.end(), &waiter));
-    if (waiter.goal == Waiter::Goal::Reply)
+    if (waiter.goal == Waiter::Goal::Reply || waiter.goal == Waiter::Goal::Completion)
         m_lastCall = Clock::now();
     passLead();
 }
@@ -386,8 +381,24 @@ DBusHandlerResult BusLink::filter(DBusConnection*, DBusMessage* message, void* d
     case DBUS_MESSAGE_TYPE_SIGNAL:
         return link->keepSignal(message);
     default:
-        return DBUS_HANDLER_RESULT_NOT_YET_HANDLED;
+        return link->giveReply(message);
     }
+}
+
+/// Hands a reply to the call that waits for it; others are for libdbus's pending calls.
+DBusHandlerResult BusLink::giveReply(DBusMessage* message) {
+    const dbus_uint32_t serial = dbus_message_get_reply_serial(message);
+    const Lock lock(m_mutex);
+    const auto waiter =
+        std::find_if(m_waiters.begin(), m_waiters.end(), [serial](const Waiter* candidate) {
+            return candidate->goal == Waiter::Goal::Reply && candidate->serial == serial;
+        });
+    if (waiter == m_waiters.end())
+        return DBUS_HANDLER_RESULT_NOT_YET_HANDLED;
+    (*waiter)->reply.reset(dbus_message_ref(message));
+    if (leading != this)
+        wakeLeader();
+    return DBUS_HANDLER_RESULT_HANDLED;
 }
 
 DBusHandlerResult BusLink::keepSignal(DBusMessage* message) {
@@ -411,7 +422,7 @@ DBusHandlerResult BusLink::keepSignal(DBusMessage* message) {
 }
 
 /// Only the link is touched: whoever waits for the reply may have left already.
-void BusLink::replyArrived(DBusPendingCall*, void* data) {
+void BusLink::pendingCompleted(DBusPendingCall*, void* data) {
     auto* link = static_cast<BusLink*>(data);
     if (leading != link)
         link->wakeLeader();

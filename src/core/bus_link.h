@@ -19,7 +19,7 @@ namespace Bluetooth {
 /// One thread at a time leads: it waits for the socket outside libdbus, reads and dispatches.
 /// Every other thread that waits for a reply sleeps until the leader has dispatched it, or takes
 /// the lead. A filter sorts what is dispatched: signals go to an inbox that the receive thread
-/// empties in order, replies complete their pending calls. So no thread can take another's reply,
+/// empties in order, replies go to the calls that wait for them. So no thread can take another's reply,
 /// and no thread waits inside libdbus while others need the connection.
 ///
 /// The receive thread leads when nobody calls. While calls are made, and shortly after, it leaves
@@ -80,7 +80,7 @@ private:
     ~BusLink();
     bool attach();
 
-    void wait(Waiter& waiter);
+    void wait(Waiter& waiter, Lock& lock);
     bool mayLead(const Waiter& waiter) const;
     bool lead(Lock& lock, Milliseconds limit);
     bool step(Milliseconds limit);
@@ -93,7 +93,8 @@ private:
 
     static DBusHandlerResult filter(DBusConnection*, DBusMessage* message, void* link);
     DBusHandlerResult keepSignal(DBusMessage* message);
-    static void replyArrived(DBusPendingCall*, void* link);
+    DBusHandlerResult giveReply(DBusMessage* message);
+    static void pendingCompleted(DBusPendingCall*, void* link);
 
     static std::atomic<bool> stopRequested;
 

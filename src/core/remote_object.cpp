@@ -4,6 +4,7 @@
 
 #include "core/bus_link.h"
 #include "core/dbus_ptr.h"
+#include "core/method_call_message.h"
 
 #include <signal.h>
 
@@ -79,10 +80,8 @@ int RemoteObject::newMessage(const char* method) {
         return recordError(errorNullParameter);
     if (m_message)
         dbus_message_unref(m_message);
-    const bool usable = m_usable && dbus_validate_member(method, nullptr);
-    m_message = usable ? dbus_message_new_method_call(m_destination.c_str(), m_path.c_str(),
-                                                      m_interface.c_str(), method)
-                       : nullptr;
+    m_message =
+        m_usable ? newMethodCall(m_destination, m_path, m_interface, method).release() : nullptr;
     return m_message ? 0 : recordError(errorCreateMessage);
 }
 
