@@ -8,6 +8,7 @@
     VERB(adapters)                                                                                 \
     VERB(adapter)                                                                                  \
     VERB(discover)                                                                                 \
+    VERB(scan)                                                                                     \
     VERB(devices)                                                                                  \
     VERB(device)                                                                                   \
     VERB(create)                                                                                   \
@@ -17,7 +18,10 @@
     VERB(cancel)                                                                                   \
     VERB(agent)                                                                                    \
     VERB(audio)                                                                                    \
-    VERB(volume)
+    VERB(volume)                                                                                   \
+    VERB(autoconnect)                                                                              \
+    VERB(name)                                                                                     \
+    VERB(restartDaemon)
 
 namespace Kesbt {
 

@@ -1,5 +1,6 @@
 #include "base/bluez.h"
 
+#include "base/table.h"
 #include "base/text.h"
 
 #include <bluetooth/commandlib.h>
@@ -103,6 +104,30 @@ Json describe(const Device& device, Json properties) {
             {"adapter", adapterName(device)},
             {"path", device.getPath()},
             {"properties", std::move(properties)}};
+}
+
+void printDevices(const Options& options, const Bluetooth::DeviceList& devices) {
+    Json list = Json::array();
+    for (Device* device : devices) {
+        if (!device)
+            throw daemonLost();
+        list.push_back(describe(*device, readProperties(*device)));
+    }
+    if (options.json) {
+        printDocument(list);
+        return;
+    }
+    Table table({"ADDRESS", "PAIRED", "TRUSTED", "CONNECTED", "KIND", "NAME"});
+    for (const Json& device : list) {
+        const Json& properties = device["properties"];
+        table.add({{display(device["address"]), Colour::Bold},
+                   yesNo(field(properties, "Paired")),
+                   yesNo(field(properties, "Trusted")),
+                   yesNo(field(properties, "Connected")),
+                   field(properties, "Icon"),
+                   field(properties, "Alias")});
+    }
+    table.print();
 }
 
 void printDevice(const Options& options, Device& device) {

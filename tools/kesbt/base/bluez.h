@@ -7,6 +7,7 @@
 
 #include <bluetooth/adapter.h>
 #include <bluetooth/device.h>
+#include <bluetooth/device_list.h>
 #include <bluetooth/manager.h>
 
 #include <memory>
@@ -46,7 +47,8 @@ Json readOptional(Bluetooth::BluezObject& object);
 Json describe(const Bluetooth::Adapter& adapter, bool isDefault, Json properties);
 Json describe(const Bluetooth::Device& device, Json properties);
 
-/// Shows a device to the user.
+/// Shows devices to the user.
+void printDevices(const Options& options, const Bluetooth::DeviceList& devices);
 void printDevice(const Options& options, Bluetooth::Device& device);
 
 /// Calls a method and waits for the daemon's verdict. The proxies' own operations do not wait for

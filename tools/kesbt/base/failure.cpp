@@ -25,7 +25,7 @@ constexpr Advice advices[] = {
     {"Page Timeout", "make sure that the device is on and within reach"},
     {"Connection Timeout", "make sure that the device is on and within reach"},
     {"No route to host", "make sure that the adapter and the device are on"},
-    {"Already Exists", "it is there already"},
+    {"Already Exists", "it is known already, see: kesbt devices"},
     {"Does Not Exist", "see what there is: kesbt devices"},
     {"In Progress", "wait until it is done, or stop it where it was begun"},
     {"Device creation in progress", "wait until it is done, or stop it where it was begun"},

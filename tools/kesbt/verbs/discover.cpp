@@ -1,14 +1,9 @@
 #include "base/bluez.h"
 #include "base/bus_feed.h"
+#include "base/device_watch.h"
 #include "base/receive_loop.h"
-#include "base/table.h"
-#include "base/text.h"
 #include "base/verb.h"
 #include "base/waiting.h"
-
-#include <iomanip>
-#include <iostream>
-#include <map>
 
 namespace Kesbt {
 
@@ -49,73 +44,16 @@ void subscribe(Bluetooth::Manager& manager, Bluetooth::Adapter& adapter) {
         throw refusal("cannot watch " + adapterName(adapter), "");
 }
 
-/// Prints what the events change in the set of devices that are there.
-class Watcher {
-public:
-    explicit Watcher(bool json) : m_json(json) {}
-
-    void found(const std::string& address, const Json& properties) {
-        const auto [known, isNew] = m_devices.try_emplace(address, properties);
-        if (isNew) {
-            print("found", Colour::Green, address, properties, Json());
-            return;
-        }
-        Json changed = Json::array();
-        for (const auto& [name, value] : properties.items()) {
-            if (known->second.value(name, Json()) != value)
-                changed.push_back(name);
-        }
-        if (changed.empty())
-            return;
-        known->second = properties;
-        print("changed", Colour::Yellow, address, properties, changed);
-    }
-
-    void disappeared(const std::string& address) {
-        const auto known = m_devices.find(address);
-        const Json last = known == m_devices.end() ? Json::object() : known->second;
-        if (known != m_devices.end())
-            m_devices.erase(known);
-        print("vanished", Colour::Red, address, last, Json());
-    }
-
-private:
-    void print(const char* event, Colour colour, const std::string& address, const Json& properties,
-               const Json& changed) const {
-        if (m_json) {
-            Json line = {{"event", event},
-                         {"time", timeForPrograms()},
-                         {"address", address},
-                         {"properties", properties}};
-            if (!changed.is_null())
-                line["changed"] = changed;
-            printEvent(line);
-            return;
-        }
-        constexpr int rssiWidth = 10;
-        constexpr int iconWidth = 18;
-        std::cout << coloured(event, colour) << std::string(10 - std::string(event).size(), ' ')
-                  << printable(address) << std::right << std::setw(rssiWidth)
-                  << field(properties, "RSSI") << "  " << std::left << std::setw(iconWidth)
-                  << printable(field(properties, "Icon")) << printable(field(properties, "Alias"))
-                  << '\n';
-        flushOutput();
-    }
-
-    bool m_json;
-    std::map<std::string, Json> m_devices;
-};
-
 /// Prints until the user interrupts or the deadline comes. A Failure when the discovery ends.
 void watch(const Options& options, const Bluetooth::Adapter& adapter, BusFeed& daemon,
            Interrupt& interrupt, Clock::time_point deadline) {
-    Watcher watcher(options.json);
+    DeviceWatch devices(options.json);
     while (!interrupt.came() && Clock::now() < deadline) {
         while (const auto event = events().pop()) {
             if (event->kind == Event::Kind::Found)
-                watcher.found(event->subject, event->value);
+                devices.found(event->subject, event->value);
             else if (event->kind == Event::Kind::Disappeared)
-                watcher.disappeared(event->subject);
+                devices.vanished(event->subject);
             else if (event->kind == Event::Kind::Removed && event->subject == adapter.getPath())
                 throw Failure(adapterName(adapter) +
                               " was removed; plug it in and repeat the command");

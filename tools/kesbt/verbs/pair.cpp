@@ -15,7 +15,7 @@ std::unique_ptr<Bluetooth::Device> createPaired(const Options& options, Bluetoot
                                                 const AgentSettings& settings) {
     std::string shown; // a passkey to type is told again with each key
     const ShownAgent agent(settings, [&shown](const AgentRequest& request) {
-        const bool isEnd = request.method == "Release";
+        const bool isEnd = request.method == "Release" || request.method == "Cancel";
         if (!isEnd && request.text() != shown)
             std::cerr << printable(request.text()) << '\n';
         shown = request.text();

@@ -1,0 +1,48 @@
+#include "base/failure.h"
+#include "base/output.h"
+#include "base/verb.h"
+
+#include <bluetooth/commandlib.h>
+
+#include <glob.h>
+#include <unistd.h>
+
+#include <iostream>
+
+namespace Kesbt {
+
+namespace {
+
+bool isAdapterMarked() {
+    glob_t found{};
+    const bool isMarked = glob("/tmp/bluetooth.info_*", 0, nullptr, &found) == 0;
+    globfree(&found);
+    return isMarked;
+}
+
+void restartDaemon(const Options& options) {
+    if (geteuid() != 0)
+        throw Failure("only root may restart bluetoothd; run it as root");
+    if (Bluetooth::restartBluetoothd() != 0)
+        throw Failure(isAdapterMarked()
+                          ? "bluetoothd does not run after its restart; start /usr/sbin/bluetoothd "
+                            "by hand and read what it says"
+                          : "bluetoothd was not restarted: no adapter is plugged in (there is no "
+                            "/tmp/bluetooth.info_* file); plug one in");
+    if (options.json)
+        printDocument({{"restarted", true}});
+    else
+        std::cout << "Restarted bluetoothd\n";
+}
+
+void build(CLI::App& command, const Options& options) {
+    command.callback([&options] { restartDaemon(options); });
+}
+
+} // namespace
+
+extern const Verb restartDaemonVerb;
+const Verb restartDaemonVerb = {"restart-daemon", "Host", "Kill bluetoothd and start it again",
+                                "kesbt restart-daemon", build};
+
+} // namespace Kesbt
