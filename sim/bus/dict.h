@@ -40,6 +40,17 @@ inline Value pathValue(const std::string& path) {
     return g_variant_new_object_path(path.c_str());
 }
 
+/// The members of a tuple, or of nothing, as an av.
+inline Value variantList(const Value& tuple) {
+    GVariantBuilder list;
+    g_variant_builder_init(&list, G_VARIANT_TYPE("av"));
+    for (gsize i = 0; tuple && i < g_variant_n_children(tuple.get()); ++i) {
+        const GlibPtr<GVariant> member(g_variant_get_child_value(tuple.get(), i));
+        g_variant_builder_add(&list, "v", member.get());
+    }
+    return g_variant_builder_end(&list);
+}
+
 /// One value as the only result or argument.
 inline Value tuple(const Value& only) {
     GVariant* child = only.get();

@@ -2,6 +2,7 @@
 #define KESBLUETOOTH_SIM_CONTROL_CALL_LOG_H
 
 #include "bus/call.h"
+#include "bus/dict.h"
 
 #include <deque>
 
@@ -17,14 +18,14 @@ public:
     }
     void clear() { m_calls.clear(); }
 
-    /// As a(ossv): path, interface, member, and the arguments as one tuple.
+    /// As a(ossav): path, interface, member and arguments.
     Value list() const {
         GVariantBuilder builder;
-        g_variant_builder_init(&builder, G_VARIANT_TYPE("a(ossv)"));
+        g_variant_builder_init(&builder, G_VARIANT_TYPE("a(ossav)"));
         for (const CallPtr& call : m_calls)
-            g_variant_builder_add(&builder, "(ossv)", call->path().c_str(),
+            g_variant_builder_add(&builder, "(oss@av)", call->path().c_str(),
                                   call->interface().c_str(), call->member().c_str(),
-                                  call->arguments().get());
+                                  variantList(call->arguments()).get());
         return g_variant_builder_end(&builder);
     }
 

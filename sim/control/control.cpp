@@ -46,10 +46,25 @@ Settings settingsOf(const CallPtr& call, gsize index) {
     return settings;
 }
 
-/// A variant argument as a message body: a tuple stands for itself, anything else for one argument.
+/// A variant argument as a message body: a tuple or an av (which may be empty, as a tuple on D-Bus
+/// may not) holds all arguments, anything else is the only one.
 Value bodyOf(const CallPtr& call, gsize index) {
     const Value content = call->content(index);
-    return g_variant_is_of_type(content.get(), G_VARIANT_TYPE_TUPLE) ? content : tuple(content);
+    if (g_variant_is_of_type(content.get(), G_VARIANT_TYPE_TUPLE))
+        return content;
+    if (!content.is("av"))
+        return tuple(content);
+    const gsize count = g_variant_n_children(content.get());
+    if (count == 0)
+        return {};
+    GVariantBuilder body;
+    g_variant_builder_init(&body, G_VARIANT_TYPE_TUPLE);
+    for (gsize i = 0; i < count; ++i) {
+        const GlibPtr<GVariant> boxed(g_variant_get_child_value(content.get(), i));
+        const GlibPtr<GVariant> argument(g_variant_get_variant(boxed.get()));
+        g_variant_builder_add_value(&body, argument.get());
+    }
+    return g_variant_builder_end(&body);
 }
 
 } // namespace
@@ -80,7 +95,7 @@ const Interface& Control::table() {
           handle<&Control::emitSignal>},
          {"CallAgent",
           {{"adapter", "s"}, {"interface", "s"}, {"member", "s"}, {"arguments", "v"}},
-          {{"errorName", "s"}, {"errorText", "s"}, {"results", "v"}},
+          {{"errorName", "s"}, {"errorText", "s"}, {"results", "av"}},
           handle<&Control::callAgent>},
          {"FailNext",
           {{"interface", "s"}, {"method", "s"}, {"errorName", "s"}, {"errorText", "s"}},
@@ -91,7 +106,7 @@ const Interface& Control::table() {
           {},
           handle<&Control::delayNext>},
          {"ClearFaults", {}, {}, handle<&Control::clearFaults>},
-         {"GetCalls", {}, {{"calls", "a(ossv)"}}, handle<&Control::getCalls>},
+         {"GetCalls", {}, {{"calls", "a(ossav)"}}, handle<&Control::getCalls>},
          {"ClearCalls", {}, {}, handle<&Control::clearCalls>},
          {"SetTimeScale", {{"scale", "d"}}, {}, handle<&Control::setTimeScale>},
          {"SetTimes", {{"milliseconds", "a{sv}"}}, {}, handle<&Control::setTimes>},
@@ -141,6 +156,8 @@ void Control::received(const CallPtr& call) {
 void Control::carryOut(const CallPtr& call, const std::function<void()>& what) {
     try {
         what();
+    } catch (const SettingError& wrong) {
+        call->fail({std::string(controlName) + ".Error.Failed", wrong.key() + ": " + wrong.what()});
     } catch (const std::exception& wrong) {
         call->fail({std::string(controlName) + ".Error.Failed", wrong.what()});
     }
@@ -174,8 +191,12 @@ std::shared_ptr<Device> Control::device(const CallPtr& call) {
 }
 
 void Control::peerChanged(const std::shared_ptr<Peer>& peer) {
-    for (const auto& adapter : m_daemon.adapters())
+    for (const auto& adapter : m_daemon.adapters()) {
         adapter->discovery().peerChanged(peer);
+        const auto known = adapter->find(peer->address);
+        if (known && !(peer->present && peer->connectable))
+            known->link().drop();
+    }
 }
 
 void Control::addAdapter(const CallPtr& call) {
@@ -231,6 +252,8 @@ void Control::removeDevice(const CallPtr& call) {
     const auto gone = peer(call->text(0));
     auto& all = m_world.peers;
     all.erase(std::find(all.begin(), all.end(), gone));
+    gone->present = false;
+    peerChanged(gone);
     done(call);
 }
 
@@ -295,13 +318,13 @@ void Control::callAgent(const CallPtr& call) {
     const std::string member = call->text(2);
     if (!g_dbus_is_interface_name(interface.c_str()) || !g_dbus_is_member_name(member.c_str()))
         throw std::runtime_error("\"" + interface + "." + member + "\" cannot name a method");
-    m_daemon.bus().call(
-        agent->owner(), agent->path(), interface, member, bodyOf(call, 3),
-        static_cast<int>(m_world.times.agentTimeout), nullptr, [call](const Answer& answer) {
-            const Value none = g_variant_new_tuple(nullptr, 0);
-            call->reply(g_variant_new("(ssv)", answer.error.name.c_str(), answer.error.text.c_str(),
-                                      answer.failed ? none.get() : answer.results.get()));
-        });
+    m_daemon.bus().call(agent->owner(), agent->path(), interface, member, bodyOf(call, 3),
+                        static_cast<int>(m_world.times.agentTimeout), nullptr,
+                        [call](const Answer& answer) {
+                            call->reply(g_variant_new("(ss@av)", answer.error.name.c_str(),
+                                                      answer.error.text.c_str(),
+                                                      variantList(answer.results).get()));
+                        });
 }
 
 void Control::failNext(const CallPtr& call) {

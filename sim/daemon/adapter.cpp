@@ -120,7 +120,7 @@ void Adapter::clientGone(const std::string& client) {
         device->clientGone(client);
     if (m_agent && m_agent->owner() == client) {
         const auto agent = std::move(m_agent);
-        agent->ownerGone();
+        agent->failRequest();
     }
 }
 
@@ -357,6 +357,7 @@ void Adapter::unregisterAgent(const CallPtr& call) {
     const auto agent = std::move(m_agent);
     agent->release();
     call->reply();
+    agent->failRequest();
 }
 
 } // namespace Bluetooth::Sim

@@ -41,19 +41,14 @@ void Agent::cancel() {
 }
 
 void Agent::release() {
-    if (busy()) {
-        failRequest();
+    if (busy())
         m_bus.send(m_owner, m_path, agentInterface, "Cancel");
-    }
     m_bus.send(m_owner, m_path, agentInterface, "Release");
 }
 
-void Agent::ownerGone() {
-    if (busy())
-        failRequest();
-}
-
 void Agent::failRequest() {
+    if (!busy())
+        return;
     const OnAnswer handler = std::move(m_onAnswer);
     forgetRequest();
     handler({{}, Errors::failed("Canceled"), true});

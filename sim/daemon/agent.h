@@ -31,14 +31,13 @@ public:
     void show(const char* member, const Value& arguments);
     /// Tells the agent that what it is asked or shows is over; an open request is forgotten.
     void cancel();
-    /// The daemon drops the agent: an open request fails, then Release.
+    /// Tells the agent that it is used no longer.
     void release();
-    /// The agent's owner has left the bus: an open request fails, nothing is sent.
-    void ownerGone();
+    /// An open request fails, though the agent has not answered.
+    void failRequest();
 
 private:
     void forgetRequest();
-    void failRequest();
 
     BusLink& m_bus;
     std::string m_owner;

@@ -159,8 +159,7 @@ void AudioDevice::connectSink(const CallPtr& call) {
 void AudioDevice::beginConnecting() {
     setSink(State::Connecting);
     setAudio(State::Connecting);
-    m_holdsLink = true;
-    m_device.link().hold();
+    m_hold = m_device.link().hold();
     if (!m_device.adapter().mode().powered())
         return failed();
     m_device.link().connect([this](bool reached) {
@@ -184,8 +183,7 @@ void AudioDevice::serviceConnects(const std::string& uuid) {
         return;
     if (!m_device.link().up())
         m_device.comeIn(false);
-    m_holdsLink = true;
-    m_device.link().hold();
+    m_hold = m_device.link().hold();
     setSink(State::Connecting);
     setAudio(State::Connecting);
     authorize(uuid);
@@ -241,9 +239,7 @@ void AudioDevice::failed() {
     m_sinkCall.reset();
     setSink(State::Disconnected);
     setAudio(State::Disconnected);
-    if (m_holdsLink)
-        m_device.link().release();
-    m_holdsLink = false;
+    m_hold.release();
 }
 
 void AudioDevice::disconnected() {
@@ -281,7 +277,6 @@ void AudioDevice::setPlaying(bool playing) {
 }
 
 void AudioDevice::linkLost() {
-    m_holdsLink = false;
     if (m_audio != State::Disconnected || m_sink != State::Disconnected)
         disconnected();
 }
@@ -291,6 +286,7 @@ void AudioDevice::abandon() {
     m_controlSetUp.stop();
     m_audioCall.reset();
     m_sinkCall.reset();
+    m_hold.release();
 }
 
 void AudioDevice::audioProperties(const CallPtr& call) {

@@ -2,6 +2,7 @@
 #define KESBLUETOOTH_SIM_DAEMON_AUDIO_DEVICE_H
 
 #include "bus/interface.h"
+#include "daemon/link.h"
 #include "world/timer.h"
 
 #include <string>
@@ -65,7 +66,7 @@ private:
     State m_audio = State::Disconnected;
     State m_sink = State::Disconnected;
     bool m_control = false;
-    bool m_holdsLink = false;
+    Link::Hold m_hold;
     CallPtr m_audioCall; ///< Audio.Connect that waits
     CallPtr m_sinkCall;  ///< AudioSink.Connect that waits
     Timer m_setUp;

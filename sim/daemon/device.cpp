@@ -32,7 +32,7 @@ const Interface& Device::table() {
 Device::Device(Adapter& adapter, std::string address)
     : m_adapter(adapter),
       m_address(std::move(address)),
-      m_path(adapter.path() + "/m_dev" + withSeparator(m_address, '_')),
+      m_path(adapter.path() + "/dev_" + withSeparator(m_address, '_')),
       m_stored(adapter.hardware().storage[m_address]),
       m_classKnown(m_stored.deviceClass.has_value()),
       m_name(m_stored.name),
@@ -54,12 +54,15 @@ void Device::retire() {
     m_reverseSearch.stop();
     Daemon& daemon = m_adapter.daemon();
     m_audio->abandon();
-    if (m_creation)
-        daemon.bury(std::move(m_creation));
-    if (m_pairing)
-        daemon.bury(std::move(m_pairing));
-    if (m_search)
-        daemon.bury(std::move(m_search));
+    const auto end = [&](auto& work) {
+        if (!work)
+            return;
+        work->abandon();
+        daemon.bury(std::move(work));
+    };
+    end(m_creation);
+    end(m_pairing);
+    end(m_search);
     daemon.objects().remove(m_path);
 }
 
@@ -191,13 +194,12 @@ void Device::pair(const CallPtr& call) {
 
 void Device::comeIn(bool pairing) {
     const Times& times = m_adapter.daemon().times();
-    m_link.accept();
+    m_link.accept(!pairing);
     if (pairing) {
         m_pairing = Pairing::incoming(*this);
         m_pairing->begin();
         return;
     }
-    m_link.hold();
     m_reverseSearch.start(times.scaled(times.reverseSearch), [this] { learnServices(); });
 }
 
@@ -278,7 +280,7 @@ void Device::linkLost() {
 void Device::clientGone(const std::string& client) {
     const auto alive = shared_from_this();
     if (m_search && m_search->owner() == client)
-        m_search->abandon();
+        m_search->ownerGone();
     if (m_creation && m_creation->owner() == client)
         m_creation->ownerGone();
     if (m_pairing && m_pairing->owner() == client)

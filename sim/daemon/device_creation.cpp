@@ -9,7 +9,7 @@ namespace Bluetooth::Sim {
 
 void DeviceCreation::begin() {
     m_device.adapter().discovery().suspend();
-    m_device.link().hold();
+    m_hold = m_device.link().hold();
     m_device.link().connect([this](bool reached) {
         if (reached)
             search();
@@ -29,7 +29,7 @@ void DeviceCreation::succeed() {
     m_device.setTemporary(false);
     m_device.stored().known = true;
     m_call->reply(tuple(pathValue(m_device.path())));
-    m_device.link().release();
+    m_hold.release();
     m_device.creationEnded();
     adapter.discovery().resume();
 }
@@ -41,9 +41,13 @@ void DeviceCreation::fail(const char* text) {
 
 void DeviceCreation::removeDevice() {
     Adapter& adapter = m_device.adapter();
-    m_timer.stop();
     adapter.removeDevice(m_device.shared_from_this());
     adapter.discovery().resume();
+}
+
+void DeviceCreation::abandon() {
+    m_timer.stop();
+    m_hold.release();
 }
 
 void DeviceCreation::cancel(const CallPtr& call) {

@@ -2,6 +2,7 @@
 #define KESBLUETOOTH_SIM_DAEMON_DEVICE_CREATION_H
 
 #include "bus/call.h"
+#include "daemon/link.h"
 #include "world/timer.h"
 
 #include <string>
@@ -23,16 +24,18 @@ public:
     void linkLost();
     void ownerGone();
     void powerLost() { linkLost(); }
+    /// Stops without a word; the device has gone.
+    void abandon();
 
 private:
     void search();
     void succeed();
     void fail(const char* text);
-    void end();
     void removeDevice();
 
     Device& m_device;
     CallPtr m_call;
+    Link::Hold m_hold;
     Timer m_timer;
 };
 

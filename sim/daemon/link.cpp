@@ -36,8 +36,9 @@ void Link::paged(bool reached) {
         onPaged(reached);
 }
 
-void Link::accept() {
+void Link::accept(bool stays) {
     m_pager.stop();
+    m_heldByPeer = stays;
     paged(true);
 }
 
@@ -49,16 +50,16 @@ void Link::comeUp() {
     m_device.learnName();
 }
 
-void Link::hold() {
-    ++m_holds;
+Link::Hold Link::hold() {
     m_idle.stop();
+    return Hold(*this);
 }
 
-void Link::release() {
-    if (m_holds && --m_holds == 0 && m_up) {
-        const Times& times = m_device.adapter().daemon().times();
-        m_idle.start(times.scaled(times.idleDisconnect), [this] { drop(); });
-    }
+void Link::released() {
+    if (--m_holds != 0 || m_heldByPeer || !m_up)
+        return;
+    const Times& times = m_device.adapter().daemon().times();
+    m_idle.start(times.scaled(times.idleDisconnect), [this] { drop(); });
 }
 
 void Link::drop() {
@@ -67,6 +68,7 @@ void Link::drop() {
     m_idle.stop();
     m_disconnect.stop();
     m_up = false;
+    m_heldByPeer = false;
     const auto calls = std::move(m_disconnects);
     m_disconnects.clear();
     for (const CallPtr& call : calls)

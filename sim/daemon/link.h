@@ -5,6 +5,7 @@
 #include "world/timer.h"
 
 #include <functional>
+#include <utility>
 #include <vector>
 
 namespace Bluetooth::Sim {
@@ -16,6 +17,27 @@ class Link {
 public:
     using OnPaged = std::function<void(bool reached)>;
 
+    /// While one of these is held, the link does not drop for want of use.
+    class Hold {
+    public:
+        Hold() = default;
+        explicit Hold(Link& link) : m_link(&link) { ++link.m_holds; }
+        Hold(Hold&& other) noexcept : m_link(std::exchange(other.m_link, nullptr)) {}
+        Hold& operator=(Hold&& other) noexcept {
+            release();
+            m_link = std::exchange(other.m_link, nullptr);
+            return *this;
+        }
+        ~Hold() { release(); }
+        void release() {
+            if (Link* link = std::exchange(m_link, nullptr))
+                link->released();
+        }
+
+    private:
+        Link* m_link = nullptr;
+    };
+
     explicit Link(Device& device) : m_device(device) {}
 
     bool up() const { return m_up; }
@@ -23,10 +45,9 @@ public:
     /// Reaches the device, at once when it is connected already.
     void connect(OnPaged onPaged);
     /// The device has connected to us.
-    void accept();
-    /// While it is held, the link does not drop for want of use.
-    void hold();
-    void release();
+    /// @param stays  whether it keeps the link for itself
+    void accept(bool stays);
+    Hold hold();
     /// Disconnects now, and says so.
     void drop();
     /// Announces the end of the link, waits, answers the call if there is one, and disconnects.
@@ -38,9 +59,11 @@ private:
     void page();
     void paged(bool reached);
     void comeUp();
+    void released();
 
     Device& m_device;
     bool m_up = false;
+    bool m_heldByPeer = false;
     unsigned m_holds = 0;
     std::vector<OnPaged> m_waiting;
     std::vector<CallPtr> m_disconnects;

@@ -49,7 +49,7 @@ std::string Pairing::owner() const {
 void Pairing::begin() {
     if (m_outgoing)
         m_device.adapter().discovery().suspend();
-    m_device.link().hold();
+    m_hold = m_device.link().hold();
     m_device.link().connect([this](bool reached) {
         if (reached)
             negotiate();
@@ -74,6 +74,8 @@ guint32 Pairing::passkey() const {
 void Pairing::negotiate() {
     const Times& times = m_device.adapter().daemon().times();
     const auto peer = m_device.peer();
+    if (!peer)
+        return fail(pageTimeout());
     if (!m_outgoing && !m_device.adapter().mode().pairable())
         return fail(authentication("Rejected"));
     switch (peer->pairingEnd) {
@@ -132,9 +134,12 @@ void Pairing::displayPin() {
     ask("DisplayPinCode", g_variant_new("(os)", m_device.path().c_str(), pin.get()), "",
         [this](const Answer& answer) {
             m_displaying = !answer.failed;
-            if (answer.failed)
-                return askForPin(); // an agent that cannot show one is asked for one
-            answered(true);
+            if (!answer.failed)
+                return answered(true);
+            // An agent that cannot show a PIN is asked for one.
+            if (answer.error.name == "org.freedesktop.DBus.Error.UnknownMethod")
+                return askForPin();
+            fail(authentication("Rejected"));
         });
 }
 
@@ -209,18 +214,18 @@ void Pairing::answered(bool right) {
 }
 
 void Pairing::finish() {
-    if (m_cancelled)
-        return;
     const Times& times = m_device.adapter().daemon().times();
     m_done = true;
     m_loss.stop();
     if (m_displaying)
         m_agent->cancel();
+    m_displaying = false;
     m_device.setTemporary(false);
     m_device.stored().known = true;
     m_device.setPaired(true);
     if (m_outgoing)
         m_agent->release();
+    m_agent.reset();
     m_timer.start(times.scaled(m_outgoing ? times.serviceSearch : times.reverseSearch),
                   [this] { succeed(); });
 }
@@ -231,7 +236,6 @@ void Pairing::succeed() {
     m_device.learnServices();
     if (m_call)
         m_call->reply(tuple(pathValue(m_device.path())));
-    m_device.link().release();
     end();
     if (outgoing)
         adapter.discovery().resume();
@@ -243,8 +247,13 @@ void Pairing::stopTimers() {
     m_loss.stop();
 }
 
-void Pairing::end() {
+void Pairing::abandon() {
     stopTimers();
+    m_hold.release();
+}
+
+void Pairing::end() {
+    abandon();
     m_device.pairingEnded();
 }
 

@@ -3,6 +3,7 @@
 
 #include "bus/bus_link.h"
 #include "daemon/agent.h"
+#include "daemon/link.h"
 #include "world/peer.h"
 #include "world/timer.h"
 
@@ -36,6 +37,8 @@ public:
     void linkLost();
     void powerLost();
     void ownerGone();
+    /// Stops without a word; the device has gone.
+    void abandon();
     /// The daemon stops.
     void releaseAgent();
 
@@ -66,6 +69,7 @@ private:
     bool m_displaying = false;
     bool m_cancelled = false;
     bool m_done = false;
+    Link::Hold m_hold;
     Timer m_timer;
     Timer m_timeout;
     Timer m_loss;

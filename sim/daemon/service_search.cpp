@@ -25,7 +25,7 @@ std::shared_ptr<ServiceSearch> ServiceSearch::begin(Device& device, const CallPt
 }
 
 void ServiceSearch::run() {
-    m_device.link().hold();
+    m_hold = m_device.link().hold();
     const auto search = [this](bool reached) {
         if (!reached) {
             m_call->fail(Errors::bluez("ConnectionAttemptFailed", "Host is down"));
@@ -54,12 +54,12 @@ void ServiceSearch::linkLost() {
 }
 
 void ServiceSearch::abandon() {
-    end();
+    m_timer.stop();
+    m_hold.release();
 }
 
 void ServiceSearch::end() {
-    m_timer.stop();
-    m_device.link().release();
+    abandon();
     m_device.searchEnded();
 }
 

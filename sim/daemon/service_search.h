@@ -2,6 +2,7 @@
 #define KESBLUETOOTH_SIM_DAEMON_SERVICE_SEARCH_H
 
 #include "bus/call.h"
+#include "daemon/link.h"
 #include "world/timer.h"
 
 #include <memory>
@@ -24,7 +25,8 @@ public:
     /// The caller is told "Operation canceled".
     void cancel();
     void linkLost();
-    /// Ends without an answer.
+    void ownerGone() { end(); }
+    /// Stops without a word; the device has gone.
     void abandon();
 
 private:
@@ -35,6 +37,7 @@ private:
     Device& m_device;
     CallPtr m_call;
     std::string m_uuid; ///< what is looked for; "" for everything
+    Link::Hold m_hold;
     Timer m_timer;
 };
 

@@ -6,6 +6,7 @@
 
 #include <glib-unix.h>
 
+#include <cerrno>
 #include <stdexcept>
 #include <unistd.h>
 
@@ -26,7 +27,7 @@ void tellReady(const Options& options) {
     constexpr char line[] = "ready\n";
     const auto tell = [&](int fd) {
         if (write(fd, line, sizeof line - 1) < 0)
-            throw std::runtime_error("nobody reads that the daemon is ready");
+            g_printerr("bluez4-sim: cannot tell that the daemon is ready: %s\n", g_strerror(errno));
     };
     if (options.readyFd >= 0) {
         tell(options.readyFd);
@@ -59,7 +60,7 @@ int serveInForeground(const Options& options) {
             g_main_loop_quit(loop);
         });
         control.daemon().start(static_cast<int>(getpid()));
-        tellReady(options);
+        control.daemon().bus().afterRoundTrip([&] { tellReady(options); });
         g_main_loop_run(loop);
         if (control.daemon().running() && !busLost)
             control.daemon().stop();

@@ -2,6 +2,7 @@
 
 #include "run/private_bus.h"
 #include "run/process.h"
+#include "world/scenario.h"
 
 #include <glib-unix.h>
 #include <glib/gstdio.h>
@@ -163,6 +164,16 @@ int exitStatus(int status) {
     return WIFSIGNALED(status) ? 128 + WTERMSIG(status) : WEXITSTATUS(status);
 }
 
+/// @return the status that a shell gives for it
+int cannotRun(const std::string& program) {
+    const bool isPath = program.find('/') != std::string::npos;
+    const bool found = isPath ? g_file_test(program.c_str(), G_FILE_TEST_EXISTS) != FALSE
+                              : GlibPtr<char>(g_find_program_in_path(program.c_str())) != nullptr;
+    g_printerr("bluez4-sim: %s: %s\n", program.c_str(),
+               found ? "cannot be run" : "command not found");
+    return found ? notExecutable : notFound;
+}
+
 int runCommand(const std::vector<std::string>& command, const std::vector<std::string>& environment,
                SignalRelay& relay) {
     if (const int signal = relay.early())
@@ -176,10 +187,8 @@ int runCommand(const std::vector<std::string>& command, const std::vector<std::s
                                  G_SPAWN_CHILD_INHERITS_STDIN | G_SPAWN_LEAVE_DESCRIPTORS_OPEN);
     if (!g_spawn_async(nullptr, arguments.data(), variables.data(), flags, nullptr, nullptr,
                        &running.pid, error.out())) {
-        g_printerr("bluez4-sim: %s\n", error->message);
         g_main_loop_unref(running.loop);
-        return g_error_matches(error.get(), G_SPAWN_ERROR, G_SPAWN_ERROR_NOENT) ? notFound
-                                                                                : notExecutable;
+        return cannotRun(command.front());
     }
     relay.setTarget(running.pid);
     g_child_watch_add(
@@ -199,6 +208,8 @@ int runCommand(const std::vector<std::string>& command, const std::vector<std::s
 } // namespace
 
 int runSession(const Options& options) {
+    if (!options.noDaemon && !options.scenario.empty())
+        loadScenario(options.scenario); // a wrong one is told before anything is started
     // Whoever loses its parent in here becomes our child, so that nothing outlives the session.
     prctl(PR_SET_CHILD_SUBREAPER, 1);
     SignalRelay relay;
