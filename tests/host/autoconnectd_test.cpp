@@ -140,6 +140,7 @@ TEST_F(AutoConnectDaemonTest, EveryCommandOfManySendersArrives) {
     constexpr int senders = 4;
     constexpr int each = 50;
     std::vector<std::thread> threads;
+    threads.reserve(senders);
     for (int sender = 0; sender < senders; ++sender)
         threads.emplace_back([] {
             for (int count = 0; count < each; ++count)

@@ -125,7 +125,7 @@ TEST(ProcessTest, TheProgramInheritsOutputsOnlyAndNoSignalSettings) {
     EXPECT_EQ(signals(status, "SigIgn:"), 0u);
     EXPECT_EQ(outputOf("/bin/cat", {}), "");
 
-    signal(SIGPIPE, pipeHandler);
+    EXPECT_EQ(signal(SIGPIPE, pipeHandler), SIG_IGN);
     pthread_sigmask(SIG_SETMASK, &before, nullptr);
     close(leaky);
 }

@@ -5,7 +5,6 @@
 #include <bluetooth/hci_lib.h>
 #include <gtest/gtest.h>
 
-#include <cstring>
 #include <string>
 #include <vector>
 
@@ -34,26 +33,26 @@ std::string textOf(const bdaddr_t* address) {
 // In the place of libbluetooth's.
 extern "C" {
 
-int hci_get_route(bdaddr_t* remote) {
-    controller.calls.push_back("route " + textOf(remote));
+int hci_get_route(bdaddr_t* bdaddr) {
+    controller.calls.push_back("route " + textOf(bdaddr));
     return controller.route;
 }
 
-int hci_open_dev(int adapter) {
-    controller.calls.push_back("open " + std::to_string(adapter));
+int hci_open_dev(int dev_id) {
+    controller.calls.push_back("open " + std::to_string(dev_id));
     return controller.device;
 }
 
-int hci_close_dev(int device) {
-    controller.calls.push_back("close " + std::to_string(device));
+int hci_close_dev(int dd) {
+    controller.calls.push_back("close " + std::to_string(dd));
     return 0;
 }
 
-int hci_read_remote_name(int device, const bdaddr_t* remote, int length, char* name, int timeout) {
-    controller.calls.push_back("name " + std::to_string(device) + " " + textOf(remote) + " " +
-                               std::to_string(length) + " " + std::to_string(timeout));
+int hci_read_remote_name(int sock, const bdaddr_t* ba, int len, char* name, int timeout) {
+    controller.calls.push_back("name " + std::to_string(sock) + " " + textOf(ba) + " " +
+                               std::to_string(len) + " " + std::to_string(timeout));
     // As a controller may: all the bytes there is room for, and no terminator.
-    memcpy(name, controller.name.data(), std::min<std::size_t>(controller.name.size(), 248));
+    controller.name.copy(name, 248);
     return controller.result;
 }
 }
