@@ -48,9 +48,9 @@ int hci_close_dev(int dd) {
     return 0;
 }
 
-int hci_read_remote_name(int sock, const bdaddr_t* ba, int len, char* name, int timeout) {
-    controller.calls.push_back("name " + std::to_string(sock) + " " + textOf(ba) + " " +
-                               std::to_string(len) + " " + std::to_string(timeout));
+int hci_read_remote_name(int dd, const bdaddr_t* bdaddr, int len, char* name, int to) {
+    controller.calls.push_back("name " + std::to_string(dd) + " " + textOf(bdaddr) + " " +
+                               std::to_string(len) + " " + std::to_string(to));
     // As a controller may: all the bytes there is room for, and no terminator.
     controller.name.copy(name, 248);
     return controller.result;
