@@ -99,7 +99,7 @@ TEST_F(CommandTest, SessionServicesAreActivatedWithBothBuses) {
     const std::string services = testFolder() + "/services";
     fs::create_directories(services);
     const std::string seen = services + "/seen";
-    std::ofstream(services + "/run.sh") << "env > " << seen << "\n";
+    std::ofstream(services + "/run.sh") << "env > " << seen << "; exit 1\n";
     std::ofstream(services + "/com.example.Service.service")
         << "[D-BUS Service]\nName=com.example.Service\nExec=/bin/sh " << services << "/run.sh\n";
     runShell("gdbus call --session -d com.example.Service -o / -m a.b.C >/dev/null 2>&1; "

@@ -7,6 +7,7 @@
 
 #include <gtest/gtest.h>
 
+#include <csignal>
 #include <fstream>
 #include <memory>
 #include <string>
@@ -25,6 +26,17 @@ protected:
         client = std::make_unique<SimClient>();
         base = client->base();
         adapter = base + "hci0";
+    }
+
+    /// Whatever happened, the daemon ends when asked, quietly: a sanitizer's findings show here.
+    void TearDown() override {
+        client.reset();
+        if (daemon->hasEnded())
+            return;
+        daemon->signal(SIGTERM);
+        EXPECT_EQ(daemon->wait(), 0);
+        daemon->readAll();
+        EXPECT_EQ(daemon->readErrors(), "");
     }
 
     std::unique_ptr<ChildProcess> start(const std::string& scale = "0.01") const {
