@@ -333,6 +333,8 @@ TEST_F(CallTest, ATextWhereAPathWasAskedForIsTheServicesError) {
     hold([](Writer& w) { w(true); });
     EXPECT_EQ(proxy.getReplyValue(path), -1);
     EXPECT_EQ(proxy.getErrorMessage(), "older text");
+    hold({}); // the proxy's destructor releases what is left
+    EXPECT_EQ(proxy.newMessage("Unsent"), 0);
 }
 
 TEST_F(CallTest, ListsAreReadFromArraysOfTexts) {
