@@ -84,7 +84,7 @@ private:
 int serve(ServiceName& name, DBusConnection* systemBus) {
     ScannerServer server;
     if (name.owner() != server.getConnectionName())
-        return fail("the session bus gave its name to another one; only one can run in a session");
+        return fail("the session bus did not give it its name; only one can run in a session");
     const BusWatch session(name.getConnection(), server);
     const BusWatch system(systemBus, server);
     g_unix_signal_add(SIGTERM, quit, &server);

@@ -1,0 +1,283 @@
+// The server inside the test's process, where its parts can be reached.
+
+#include "scanner/scanner_test.h"
+#include "support/receive_loop.h"
+#include "support/stdout_capture.h"
+
+#include "scanner/scanner_object_info.h"
+
+#include <bluetooth/scanner_server.h>
+
+#include <thread>
+
+namespace Bluetooth::Test {
+
+namespace {
+
+using Texts = std::vector<std::string>;
+
+/// The fields up to an empty one.
+Texts fieldsAt(const char* data) {
+    Texts fields;
+    for (; *data; data += fields.back().size() + 1)
+        fields.emplace_back(data);
+    return fields;
+}
+
+struct Unref {
+    void operator()(ScannerObject* object) const { g_object_unref(object); }
+};
+using ObjectPtr = std::unique_ptr<ScannerObject, Unref>;
+
+ObjectPtr makeObject() {
+    return ObjectPtr(static_cast<ScannerObject*>(g_object_new(scanner_object_get_type(), nullptr)));
+}
+
+/// @return the error of a handler that has failed, as DOMAIN/CODE TEXT; "" when none was set
+template <class Handler>
+std::string errorOf(Handler handler) {
+    GError* error = nullptr;
+    EXPECT_FALSE(handler(&error));
+    std::string text;
+    if (error)
+        text = std::to_string(error->domain) + "/" + std::to_string(error->code) + " " +
+               error->message;
+    g_clear_error(&error);
+    return text;
+}
+
+/// A server whose loop runs on a thread of its own.
+class RunningServer {
+public:
+    ~RunningServer() {
+        do
+            server.quitLoop(); // lost as long as the loop has not begun
+        while (!m_ended.wait(Milliseconds(10)));
+        m_thread.join();
+    }
+    bool waitForEnd() const { return m_ended.wait(); }
+
+    ScannerServer server;
+
+private:
+    Latch m_ended;
+    std::thread m_thread{[this] {
+        server.startLoop();
+        m_ended.open();
+    }};
+};
+
+} // namespace
+
+class ServerTest : public ScannerTest {
+protected:
+    void SetUp() override { KES_NEEDS_RECEIVE_LOOP(); }
+
+    std::string adapterPath(const char* name) {
+        const MessagePtr reply = system
+                                     .call("org.bluez", "/", "org.bluez.Manager", "FindAdapter",
+                                           [name](Writer& w) { w(name); })
+                                     .get();
+        return argumentsOf(reply.get()).substr(std::string("o:").size());
+    }
+    static bool ticks(ScannerServer& server, int count) {
+        bool all = true;
+        for (int tick = 0; tick < count; ++tick)
+            all = updateTimer(&server) == 1 && all;
+        return all;
+    }
+};
+
+TEST(ScannerObjectInfoTest, IsLaidOutForDBusGLib) {
+    const DBusGObjectInfo& info = scannerObjectInfo();
+    EXPECT_EQ(info.format_version, 1);
+    ASSERT_EQ(info.n_method_infos, 2);
+    EXPECT_EQ(info.method_infos[0].data_offset, 0);
+    EXPECT_EQ(info.method_infos[1].data_offset, 72);
+    EXPECT_EQ(fieldsAt(info.data), (Texts{serviceInterface, "ListDevices", "S", "arg0", "I", "s",
+                                          "arg1", "O", "F", "N", "a{ss}"}));
+    EXPECT_EQ(fieldsAt(info.data + 72),
+              (Texts{serviceInterface, "RemoveFinder", "S", "arg0", "I", "s"}));
+    EXPECT_STREQ(info.exported_signals, "");
+    EXPECT_STREQ(info.exported_properties, "");
+}
+
+TEST_F(ServerTest, FrameTellsAboutTheBus) {
+    ServerObject frame("com.example.Frame", "/frame", DBUS_BUS_SESSION);
+    EXPECT_STREQ(frame.getBusName(), "org.freedesktop.DBus");
+    EXPECT_STREQ(frame.getPath(), "/org/freedesktop/DBus");
+    EXPECT_STREQ(frame.getInterface(), "org.freedesktop.DBus");
+    EXPECT_EQ(frame.getConnectionName()[0], ':');
+    StdoutCapture output;
+    frame.printInfo();
+    EXPECT_EQ(output.take(), "ServerObject name: org.freedesktop.DBus\n"
+                             "Path: /org/freedesktop/DBus\n"
+                             "Interface: org.freedesktop.DBus\n");
+    frame.quitLoop();
+    frame.startLoop(); // returns: it is no scanner server
+    EXPECT_EQ(updateTimer(&frame), 1);
+    EXPECT_TRUE(log.take().empty());
+}
+
+TEST_F(ServerTest, OnlyReachingZeroEndsTheLoop) {
+    ScannerServer server;
+    EXPECT_TRUE(ticks(server, 29));
+    server.addAdapterFounder("hci0");
+    EXPECT_TRUE(ticks(server, 29));
+    server.addAdapterFounder("hci9"); // no finder, no more time
+    server.startLoop();               // the timer's tick is the thirtieth
+    EXPECT_TRUE(ticks(server, 40));   // below zero it goes on
+    EXPECT_EQ(countCalls("hci0", "StartDiscovery"), 1u);
+    server.stopDiscovery();
+    EXPECT_EQ(countCalls("hci0", "StopDiscovery"), 1u);
+}
+
+TEST_F(ServerTest, RunsOneLoopAtATime) {
+    RunningServer running;
+    EXPECT_EQ(ask("hci0"), emptyAnswer);
+    running.server.startLoop(); // returns
+    comeInReach(phone);
+    askUntilListed("hci0", phone);
+    running.server.quitLoop();
+    EXPECT_TRUE(running.waitForEnd());
+}
+
+TEST_F(ServerTest, SecondFinderOfAnAdapterIsNotListed) {
+    ScannerServer server;
+    const ObjectPtr object = makeObject();
+    const std::string path = adapterPath("hci0");
+    AddressSet* first = object->addFinder(path.c_str());
+    ASSERT_NE(first, nullptr);
+    AddressSet* second = object->addFinder(path.c_str());
+    ASSERT_NE(second, nullptr);
+    EXPECT_NE(first, second);
+    EXPECT_EQ(object->getListByName(path), first);
+    EXPECT_EQ(object->finders.size(), 1u);
+    EXPECT_EQ(countCalls("hci0", "StartDiscovery"), 2u);
+    EXPECT_EQ(object->addFinder("/org/bluez/1/hci9"), nullptr);
+    EXPECT_EQ(object->getListByName("/org/bluez/1/hci9"), nullptr);
+
+    GError* error = nullptr;
+    EXPECT_TRUE(scanner_object_remove_finder(object.get(), "hci0", &error));
+    EXPECT_EQ(error, nullptr);
+    EXPECT_TRUE(object->finders.empty());
+    EXPECT_EQ(countCalls("hci0", "StopDiscovery"), 1u); // of two: the other runs on
+}
+
+TEST_F(ServerTest, SignalMakesAFinder) {
+    RunningServer running;
+    running.server.addAdapterFounder("hci0");
+    running.server.addAdapterFounder("00:1A:7D:DA:71:10"); // the same adapter once more
+    comeInReach(phone);
+    askUntilListed("hci0", phone);
+    EXPECT_EQ(countCalls("hci0", "StartDiscovery"), 2u);
+
+    EXPECT_EQ(call("RemoveFinder", "hci0"), "");
+    setDevice("00:11:22:33:44:99", "Name", "New", "AddDevice");
+    ASSERT_TRUE(awaitCalls("hci0", "StartDiscovery", 3)); // nobody asked
+    askUntilListed("hci0", "00:11:22:33:44:99");
+    EXPECT_EQ(countCalls("hci0", "StartDiscovery"), 3u);
+}
+
+TEST_F(ServerTest, HandlersTellWhatIsMissing) {
+    GHashTable* devices = nullptr;
+    const auto listDevices = [&](ScannerObject* object) {
+        return errorOf([&](GError** error) {
+            return scanner_object_list_devices(object, "hci0", &devices, error);
+        });
+    };
+    const auto removeFinder = [](ScannerObject* object, const char* adapter) {
+        return errorOf(
+            [&](GError** error) { return scanner_object_remove_finder(object, adapter, error); });
+    };
+    const ObjectPtr object = makeObject();
+    EXPECT_EQ(listDevices(nullptr), "3/0 Object hci0 not found");
+    EXPECT_EQ(listDevices(object.get()), "3/0 Server hci0 not found");
+    EXPECT_EQ(object->addFinder("hci0"), nullptr);
+    EXPECT_EQ(removeFinder(nullptr, "hci0"), "3/0 Scanner or AdapterId is null");
+    EXPECT_EQ(removeFinder(object.get(), nullptr), "3/0 Scanner or AdapterId is null");
+    EXPECT_EQ(removeFinder(object.get(), "hci0"), "");
+    {
+        const ScannerServer server;
+        simulation.control("DropName");
+        EXPECT_EQ(listDevices(object.get()), "3/0 Adapter hci0 not found");
+        // An adapter that goes after it was looked up.
+        std::atomic<bool> isGone{false};
+        RawPeer daemon(simulation.bus().address(), "org.bluez");
+        daemon.handle("FindAdapter", [&isGone](DBusMessage* message) {
+            if (isGone.exchange(true))
+                return MessagePtr(dbus_message_new_error(message, "org.bluez.Error", "gone"));
+            MessagePtr reply(dbus_message_new_method_return(message));
+            Writer(reply.get())(Path{"/org/bluez/1/hci0"});
+            return reply;
+        });
+        EXPECT_EQ(listDevices(object.get()), "3/0 Set hci0 not found");
+    }
+    EXPECT_EQ(listDevices(object.get()), "3/0 Server hci0 not found"); // it is gone
+    EXPECT_EQ(devices, nullptr);
+}
+
+TEST_F(ServerTest, KeepsTextsAndKnownAddresses) {
+    ScannerServer server;
+    EXPECT_TRUE(server.isInFilterSet(mouse));
+    EXPECT_FALSE(server.isInFilterSet(phone));
+    EXPECT_EQ(server.getInfoFromMap(phone), "");
+    server.putInfoToMap(phone, "a: 1;");
+    server.putInfoToMap(phone, "b: 2;");
+    EXPECT_EQ(server.getInfoFromMap(phone), "b: 2;");
+}
+
+TEST_F(ServerTest, IncompleteConstructionIsLogged) {
+    {
+        const ScannerServer first;
+        const ScannerServer second; // dbus-glib would end the process
+        EXPECT_EQ(log.take(), (Texts{"server_object.cpp Failed to serve /, another object is there",
+                                     "scanner_server.cpp Failed to initial the ScannerServer"}));
+    }
+    simulation.control("DropName");
+    const ScannerServer server;
+    EXPECT_EQ(log.take(), (Texts{"scanner_server.cpp Failed to initial the ScannerServer",
+                                 "scanner_server.cpp failed to get manager"}));
+    EXPECT_TRUE(session.hasOwner(serviceName));
+}
+
+TEST_F(ServerTest, WithoutSessionBusNothingIsServed) {
+    sessionBus.kill();
+    ScannerServer server;
+    EXPECT_STREQ(server.getBusName(), "");
+    EXPECT_STREQ(server.getConnectionName(), "");
+    EXPECT_EQ(log.take(),
+              (Texts{"server_object.cpp Failed to acquire com.kestrine.bluetooth, Not connected to "
+                     "the bus",
+                     "scanner_server.cpp Failed to initial the ScannerServer"}));
+    ticks(server, 29);
+    server.startLoop(); // ends by itself all the same
+}
+
+TEST_F(ServerTest, FindersComeAndGoWhileDevicesAreFound) {
+    for (int device = 10; device < 60; ++device)
+        setDevice(("00:11:22:33:55:" + std::to_string(device)).c_str(), "RSSIVariation",
+                  std::uint32_t{20}, "AddDevice");
+    RunningServer running;
+    std::vector<std::thread> clients;
+    for (const char* adapter : {"hci0", "hci1", "hci0", "hci1"}) {
+        clients.emplace_back([this, adapter] {
+            RawPeer client(sessionBus.address());
+            for (int round = 0; round < 30; ++round) {
+                const char* method = round % 5 == 4 ? "RemoveFinder" : "ListDevices";
+                const MessagePtr reply = client
+                                             .call(serviceName, "/", serviceInterface, method,
+                                                   [adapter](Writer& w) { w(adapter); })
+                                             .get();
+                ASSERT_TRUE(reply);
+                EXPECT_EQ(dbus_message_get_type(reply.get()), DBUS_MESSAGE_TYPE_METHOD_RETURN);
+            }
+        });
+    }
+    for (std::thread& client : clients)
+        client.join();
+    comeInReach(speaker);
+    askUntilListed("hci1", speaker);
+}
+
+} // namespace Bluetooth::Test

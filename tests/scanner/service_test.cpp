@@ -1,0 +1,354 @@
+// The service in its own process (kesbt-scannerd), asked over the bus and by its client.
+
+#include "scanner/scanner_test.h"
+#include "support/scale.h"
+
+#include <bluetooth/dict_codec.h>
+#include <bluetooth/scanner.h>
+
+#include <csignal>
+#include <fstream>
+
+namespace Bluetooth::Test {
+
+namespace {
+
+using Devices = std::vector<std::pair<std::string, Dict*>>;
+
+struct DeleteDevices {
+    void operator()(Devices* devices) const {
+        for (const auto& device : *devices)
+            delete device.second;
+        delete devices;
+    }
+};
+using DevicesPtr = std::unique_ptr<Devices, DeleteDevices>;
+
+DevicesPtr list(Scanner& scanner, const char* adapterId, bool logErrors = true) {
+    return DevicesPtr(scanner.listDevices(adapterId, logErrors));
+}
+
+} // namespace
+
+class ServiceTest : public ScannerTest {
+protected:
+    void startService() {
+        service = std::make_unique<ChildProcess>(std::vector<std::string>{KESBT_SCANNERD},
+                                                 ChildProcess::Output::Capture);
+        ASSERT_TRUE(session.waitForOwner(serviceName, true)) << service->readErrors();
+    }
+    /// Ends the service as a user would. @return its exit status
+    int stopService(int signal = SIGTERM) {
+        service->signal(signal);
+        return service->wait();
+    }
+
+    /// @return what the system bus counts for the service's connection
+    long matchRules(const std::string& caller) {
+        const MessagePtr reply =
+            system
+                .call(DBUS_SERVICE_DBUS, DBUS_PATH_DBUS, "org.freedesktop.DBus.Debug.Stats",
+                      "GetConnectionStats", [&](Writer& w) { w(caller); })
+                .get();
+        const std::string text = argumentsOf(reply.get());
+        const std::string key = "e(s:MatchRules v(u:";
+        const std::size_t place = text.find(key);
+        EXPECT_NE(place, std::string::npos) << text;
+        return place == std::string::npos ? -1 : std::stol(text.substr(place + key.size()));
+    }
+    long residentKiB() const {
+        std::ifstream status("/proc/" + std::to_string(service->pid()) + "/status");
+        std::string word;
+        while (status >> word && word != "VmRSS:") {
+        }
+        long amount = 0;
+        status >> amount;
+        return amount;
+    }
+
+    std::unique_ptr<ChildProcess> service;
+};
+
+TEST_F(ServiceTest, FirstAnswerIsEmptyAndStartsDiscoveryOnce) {
+    startService();
+    EXPECT_EQ(ask("hci0"), emptyAnswer);
+    EXPECT_EQ(countCalls("hci0", "StartDiscovery"), 1u);
+    EXPECT_EQ(countCalls("hci1", "StartDiscovery"), 0u);
+
+    Scanner scanner;
+    const DevicesPtr first = list(scanner, "hci1");
+    ASSERT_TRUE(first);
+    EXPECT_TRUE(first->empty());
+    EXPECT_EQ(countCalls("hci1", "StartDiscovery"), 1u);
+
+    comeInReach(phone);
+    askUntilListed("hci0", phone);
+    EXPECT_EQ(countCalls("hci0", "StartDiscovery"), 1u);
+    EXPECT_EQ(stopService(), 0);
+}
+
+TEST_F(ServiceTest, ClientGetsTheProperties) {
+    startService();
+    comeInReach(phone);
+    const std::string answer = askUntilListed("hci0", phone);
+    EXPECT_NE(answer.find(
+                  "s:Address: 00:11:22:33:44:02;Class: 360;Icon: computer;RSSI: -60;Name: Phone;"),
+              std::string::npos)
+        << answer;
+    EXPECT_NE(answer.find("Trusted: 0;)"), std::string::npos) << answer;
+
+    Scanner scanner;
+    const DevicesPtr devices = list(scanner, "00:1A:7D:DA:71:10"); // by the adapter's address
+    ASSERT_TRUE(devices);
+    ASSERT_EQ(devices->size(), 1u);
+    EXPECT_EQ(devices->front().first, phone);
+    const Dict& properties = *devices->front().second;
+    ASSERT_GE(properties.size(), 2u);
+    EXPECT_TRUE(properties[0] == DictEntry("Address", std::string(phone)));
+    EXPECT_TRUE(properties[1] == DictEntry("Class", std::string("360")));
+    EXPECT_EQ(find(&properties, "Paired"), "0");
+    EXPECT_TRUE(log.take().empty());
+}
+
+TEST_F(ServiceTest, DevicesDisappearAndComeBackWithNewProperties) {
+    startService();
+    comeInReach(phone);
+    askUntilListed("hci0", phone);
+    setDevice(phone, "Present", false);
+    askUntilGone("hci0", phone);
+    setDevice(phone, "RSSI", std::int16_t{-40});
+    comeInReach(phone);
+    EXPECT_NE(askUntilListed("hci0", phone).find("RSSI: -40;"), std::string::npos);
+}
+
+TEST_F(ServiceTest, DevicesThatTheDaemonKnowsAreLeftOut) {
+    startService();
+    comeInReach(mouse); // is found before the phone in each round, and is known
+    comeInReach(phone);
+    EXPECT_FALSE(lists(askUntilListed("hci0", phone), mouse));
+
+    const MessagePtr adapter = system
+                                   .call("org.bluez", "/", "org.bluez.Manager", "FindAdapter",
+                                         [](Writer& w) { w("hci0"); })
+                                   .get();
+    const std::string adapterPath = argumentsOf(adapter.get()).substr(2);
+    const auto onAdapter = [&](const char* method, const RawPeer::Build& arguments) {
+        return system.call("org.bluez", adapterPath, "org.bluez.Adapter", method, arguments).get();
+    };
+    const MessagePtr created = onAdapter("CreateDevice", [](Writer& w) { w(phone); });
+    const std::string devicePath = argumentsOf(created.get()).substr(2);
+    EXPECT_FALSE(lists(ask("hci0"), phone));
+    onAdapter("RemoveDevice", [&](Writer& w) { w(Path{devicePath}); });
+    askUntilListed("hci0", phone);
+}
+
+TEST_F(ServiceTest, AdaptersHaveFindersOfTheirOwn) {
+    startService();
+    ask("hci0");
+    comeInReach(speaker);
+    askUntilListed("hci1", speaker);
+    EXPECT_EQ(countCalls("hci0", "StartDiscovery"), 1u);
+    EXPECT_EQ(countCalls("hci1", "StartDiscovery"), 1u);
+    // Signals reach the proxies of all adapters: what one finds is told by the others too.
+    askUntilListed("hci0", speaker);
+
+    EXPECT_EQ(call("RemoveFinder", "hci0"), "");
+    EXPECT_EQ(countCalls("hci0", "StopDiscovery"), 1u);
+    EXPECT_EQ(countCalls("hci1", "StopDiscovery"), 0u);
+    // The removed finder does not come back with what the other adapter finds.
+    setDevice("00:11:22:33:44:99", "Adapter", "hci1", "AddDevice");
+    askUntilListed("hci1", "00:11:22:33:44:99");
+    EXPECT_EQ(countCalls("hci0", "StartDiscovery"), 1u);
+
+    // The next question begins anew.
+    EXPECT_EQ(ask("hci0"), emptyAnswer);
+    EXPECT_EQ(countCalls("hci0", "StartDiscovery"), 2u);
+    comeInReach(phone);
+    askUntilListed("hci0", phone);
+}
+
+TEST_F(ServiceTest, AnswersToWrongAndNeedlessCalls) {
+    startService();
+    EXPECT_EQ(ask("hci9"), "ERROR Adapter hci9 not found");
+    EXPECT_EQ(ask("/org/bluez/1/hci0"), "ERROR Adapter /org/bluez/1/hci0 not found");
+    EXPECT_EQ(ask(""), "ERROR Adapter  not found");
+    EXPECT_EQ(call("RemoveFinder", "hci0"), ""); // without a finder
+    EXPECT_EQ(call("RemoveFinder", "hci9"),
+              "ERROR Method invoked for RemoveFinder returned FALSE but did not set error");
+    EXPECT_EQ(countCalls("hci0", "StopDiscovery"), 0u);
+
+    const MessagePtr data =
+        session.call(serviceName, "/", "org.freedesktop.DBus.Introspectable", "Introspect").get();
+    const std::string xml = argumentsOf(data.get());
+    EXPECT_NE(xml.find("<method name=\"ListDevices\">"), std::string::npos);
+    EXPECT_NE(xml.find("<method name=\"RemoveFinder\">"), std::string::npos);
+    EXPECT_NE(xml.find("<arg name=\"arg1\" type=\"a{ss}\" direction=\"out\"/>"), std::string::npos)
+        << xml;
+}
+
+TEST_F(ServiceTest, RoundsOfFindersLeaveRulesAndMemoryFlat) {
+    startService();
+    const auto rounds = [this](int count) {
+        for (int round = 0; round < count; ++round) {
+            ASSERT_EQ(ask("hci0"), emptyAnswer);
+            ASSERT_EQ(call("RemoveFinder", "hci0"), "");
+        }
+    };
+    rounds(100);
+    const std::string caller = lastCaller();
+    const long rules = matchRules(caller);
+    const long memory = residentKiB();
+    rounds(isSanitized ? 200 : 1000);
+    EXPECT_EQ(matchRules(caller), rules);
+    // A sanitizer keeps what was freed for a while.
+    if (!isSanitized) {
+        EXPECT_LT(residentKiB(), memory + 256);
+    }
+    EXPECT_EQ(stopService(), 0); // and LeakSanitizer finds nothing then
+}
+
+TEST_F(ServiceTest, DaemonMayComeLateGoAndComeBack) {
+    simulation.control("DropName");
+    startService();
+    EXPECT_EQ(ask("hci0"), "ERROR Adapter hci0 not found");
+    EXPECT_EQ(call("RemoveFinder", "hci0"),
+              "ERROR Method invoked for RemoveFinder returned FALSE but did not set error");
+    simulation.control("RegainName");
+    EXPECT_EQ(ask("hci0"), emptyAnswer);
+    comeInReach(phone);
+    askUntilListed("hci0", phone); // its signals are received too
+
+    simulation.control("Restart"); // all paths change
+    askUntilListed("hci0", phone);
+
+    simulation.control("DropName");
+    EXPECT_EQ(ask("hci0"), "ERROR Adapter hci0 not found");
+    simulation.control("RegainName");
+    askUntilListed("hci0", phone);
+    EXPECT_EQ(stopService(), 0);
+}
+
+TEST_F(ServiceTest, EndsWithDiscoveryStoppedEverywhere) {
+    for (const int signal : {SIGTERM, SIGINT}) {
+        startService();
+        ask("hci0");
+        ask("hci1");
+        EXPECT_EQ(stopService(signal), 0);
+        EXPECT_EQ(service->readAll() + service->readErrors(), "");
+    }
+    EXPECT_EQ(countCalls("hci0", "StopDiscovery"), 2u);
+    EXPECT_EQ(countCalls("hci1", "StopDiscovery"), 2u);
+}
+
+TEST_F(ServiceTest, RunsOnceInASession) {
+    startService();
+    ChildProcess second({KESBT_SCANNERD}, ChildProcess::Output::Capture);
+    EXPECT_EQ(second.wait(), 1);
+    EXPECT_EQ(second.readAll(), "");
+    const std::string said = second.readErrors();
+    EXPECT_EQ(said.find("kesbt-scannerd: already running in this session, as :1."), 0u) << said;
+    EXPECT_EQ(said.find('\n'), said.size() - 1);
+    EXPECT_EQ(ask("hci0"), emptyAnswer); // the first goes on
+}
+
+TEST_F(ServiceTest, EndsWithItsBuses) {
+    startService();
+    ask("hci0");
+    simulation.bus().kill();
+    EXPECT_EQ(service->wait(), 1);
+    service->readAll();
+    EXPECT_EQ(service->readErrors(),
+              "kesbt-scannerd: the system bus has gone; start again when it is back\n");
+
+    simulation.bus().start();
+    startService();
+    ask("hci0"); // now it is past its start
+    sessionBus.kill();
+    EXPECT_EQ(service->wait(), 1);
+    service->readAll();
+    EXPECT_EQ(service->readErrors(),
+              "kesbt-scannerd: the session bus has gone; start again when it is back\n");
+
+    ChildProcess without({KESBT_SCANNERD}, ChildProcess::Output::Capture);
+    EXPECT_EQ(without.wait(), 1);
+    without.readAll();
+    EXPECT_EQ(without.readErrors().find("kesbt-scannerd: cannot reach the session bus; "), 0u);
+}
+
+TEST_F(ServiceTest, TellsItsUsage) {
+    const auto run = [](const char* argument) {
+        ChildProcess program({KESBT_SCANNERD, argument}, ChildProcess::Output::Capture);
+        const int status = program.wait();
+        return std::make_pair(status, program.readAll());
+    };
+    EXPECT_EQ(run("--version"), std::make_pair(0, std::string("kesbt-scannerd 1.0.0\n")));
+    EXPECT_EQ(run("--help").first, 0);
+    EXPECT_EQ(run("--nonsense").first, 2);
+}
+
+TEST_F(ServiceTest, ClientsWithoutServiceStartIt) {
+    ASSERT_FALSE(session.hasOwner(serviceName));
+    Scanner scanner;
+    const DevicesPtr devices = list(scanner, "hci0");
+    ASSERT_TRUE(devices) << scanner.getErrorMessage();
+    EXPECT_TRUE(devices->empty());
+    EXPECT_TRUE(session.hasOwner(serviceName));
+    comeInReach(phone);
+    askUntilListed("hci0", phone);
+}
+
+TEST_F(ServiceTest, ClientIsSilentAboutAdaptersThatAreNot) {
+    Scanner scanner;
+    EXPECT_FALSE(list(scanner, "hci9"));
+    EXPECT_FALSE(list(scanner, nullptr));
+    EXPECT_FALSE(scanner.removeFinder("hci9"));
+    EXPECT_FALSE(scanner.hasError());
+    simulation.control("DropName");
+    EXPECT_FALSE(list(scanner, "hci0"));
+    EXPECT_FALSE(scanner.removeFinder("hci0"));
+    EXPECT_FALSE(scanner.hasError());
+    EXPECT_FALSE(session.hasOwner(serviceName)); // it was not asked, and so not started
+    EXPECT_EQ(log.take(), (std::vector<std::string>{"manager.cpp No such adapter",
+                                                    "manager.cpp Parameter is null",
+                                                    "manager.cpp No such adapter"}));
+}
+
+TEST_F(ServiceTest, ClientTellsWhatTheServiceRefuses) {
+    RawPeer standIn(sessionBus.address(), serviceName);
+    standIn.replyError("ListDevices", "com.example.Error", "Adapter hci0 not found");
+    Scanner scanner;
+    EXPECT_FALSE(list(scanner, "hci0", false));
+    EXPECT_EQ(scanner.getErrorMessage(), "Adapter hci0 not found");
+    EXPECT_TRUE(log.take().empty());
+    EXPECT_FALSE(list(scanner, "hci0", true));
+    EXPECT_EQ(log.take(), std::vector<std::string>{"scanner.cpp Adapter hci0 not found"});
+
+    EXPECT_TRUE(scanner.removeFinder("hci0")); // queued: the answer is not waited for
+    EXPECT_FALSE(scanner.hasError());
+    ASSERT_TRUE(standIn.waitForCalls("RemoveFinder", 1));
+    EXPECT_EQ(standIn.callTexts().back(), "RemoveFinder! s:hci0");
+}
+
+TEST_F(ServiceTest, ClientReadsAnyAnswer) {
+    RawPeer standIn(sessionBus.address(), serviceName);
+    Scanner scanner;
+    standIn.reply("ListDevices", [](Writer& w) { w(std::int32_t{1}); });
+    EXPECT_FALSE(list(scanner, "hci0", false));
+    EXPECT_EQ(scanner.getErrorMessage(), "Invalid reply format");
+
+    standIn.reply("ListDevices", [](Writer& w) {
+        w.dict("ss", [](Writer& e) {
+            e.entry("B", "Name: x;tail").entry("no entry", "Name: x").entry("A", "k: 1;l: 2;");
+        });
+    });
+    const DevicesPtr devices = list(scanner, "hci0");
+    ASSERT_TRUE(devices);
+    EXPECT_FALSE(scanner.hasError());
+    ASSERT_EQ(devices->size(), 2u);
+    EXPECT_EQ((*devices)[0].first, "B");
+    EXPECT_EQ(dictToString(*(*devices)[0].second), "Name: x\n");
+    EXPECT_EQ((*devices)[1].first, "A");
+    EXPECT_EQ(dictToString(*(*devices)[1].second), "k: 1\nl: 2\n");
+}
+
+} // namespace Bluetooth::Test
