@@ -45,12 +45,12 @@ Value Call::arguments() const {
 }
 
 std::string Call::text(gsize index) const {
-    const Value child(g_variant_get_child_value(arguments().get(), index));
+    const GlibPtr<GVariant> child(g_variant_get_child_value(arguments().get(), index));
     return g_variant_get_string(child.get(), nullptr);
 }
 
 guint32 Call::number(gsize index) const {
-    const Value child(g_variant_get_child_value(arguments().get(), index));
+    const GlibPtr<GVariant> child(g_variant_get_child_value(arguments().get(), index));
     return g_variant_get_uint32(child.get());
 }
 

@@ -293,7 +293,7 @@ void Control::dropLink(const CallPtr& call) {
 }
 
 void Control::setPlaying(const CallPtr& call) {
-    const Value playing(g_variant_get_child_value(call->arguments().get(), 2));
+    const GlibPtr<GVariant> playing(g_variant_get_child_value(call->arguments().get(), 2));
     device(call)->audio().setPlaying(g_variant_get_boolean(playing.get()) != FALSE);
     done(call);
 }
