@@ -1,0 +1,96 @@
+// Listing devices with all that it takes: ListDevices, and for each device the factory's question
+// to the bus whether the daemon is there. Raw libdbus sends the very same messages.
+
+#include "bus.h"
+#include "client.h"
+#include "names.h"
+
+#include "core/dbus_ptr.h"
+
+#include <bluetooth/adapter.h>
+#include <bluetooth/device.h>
+#include <bluetooth/device_list.h>
+
+#include <benchmark/benchmark.h>
+
+#include <algorithm>
+#include <cstring>
+
+namespace {
+
+using namespace Bench;
+using Bluetooth::MessagePtr;
+
+/// The array of texts or paths in a reply, freed with this object.
+class Texts {
+public:
+    Texts(DBusConnection* connection, int elementType, const char* destination, const char* path,
+          const char* interface, const char* method) {
+        const MessagePtr call(dbus_message_new_method_call(destination, path, interface, method));
+        const MessagePtr reply(
+            dbus_connection_send_with_reply_and_block(connection, call.get(), -1, nullptr));
+        require(reply && dbus_message_get_args(reply.get(), nullptr, DBUS_TYPE_ARRAY, elementType,
+                                               &m_texts, &m_count, DBUS_TYPE_INVALID),
+                "libdbus: list");
+    }
+    ~Texts() { dbus_free_string_array(m_texts); }
+    Texts(const Texts&) = delete;
+    Texts& operator=(const Texts&) = delete;
+    char** begin() const { return m_texts; }
+    char** end() const { return m_texts + m_count; }
+
+private:
+    char** m_texts = nullptr;
+    int m_count = 0;
+};
+
+bool hasDaemon(DBusConnection* connection) {
+    const Texts names(connection, DBUS_TYPE_STRING, DBUS_SERVICE_DBUS, DBUS_PATH_DBUS,
+                      DBUS_INTERFACE_DBUS, "ListNames");
+    return std::any_of(names.begin(), names.end(),
+                       [](const char* name) { return std::strcmp(name, peerName) == 0; });
+}
+
+void listThroughLibdbus(benchmark::State& state, std::size_t count) {
+    const std::string adapter = adapterWith(count);
+    DBusConnection* connection = dbus_bus_get_private(DBUS_BUS_SYSTEM, nullptr);
+    for (auto _ : state) {
+        const Texts paths(connection, DBUS_TYPE_OBJECT_PATH, peerName, adapter.c_str(),
+                          peerInterface, "ListDevices");
+        std::vector<std::string> devices;
+        for (const char* path : paths) {
+            require(hasDaemon(connection), "libdbus: the daemon is not there");
+            devices.emplace_back(path);
+        }
+        require(devices.size() == count, "libdbus: not all devices");
+    }
+    dbus_connection_close(connection);
+    dbus_connection_unref(connection);
+}
+
+void listThroughKesbluetooth(benchmark::State& state, std::size_t count) {
+    Bluetooth::Adapter adapter(adapterWith(count).c_str());
+    for (auto _ : state) {
+        const std::unique_ptr<Bluetooth::DeviceList> devices(adapter.listDevices());
+        require(devices && devices->size() == count && devices->back(),
+                "kesbluetooth: not all devices");
+    }
+}
+
+} // namespace
+
+int main(int argc, char** argv) {
+    benchmark::Initialize(&argc, argv);
+    const Bus bus;
+    for (const std::size_t count : {1, 10, 100, 1000}) {
+        const std::string name = "list/" + std::to_string(count) + "/";
+        // The same number of devices in each, and thus of messages.
+        const auto iterations = static_cast<benchmark::IterationCount>(1000 / count);
+        for (const auto& [library, list] : {std::pair(libdbus.name, listThroughLibdbus),
+                                            std::pair(kesbluetooth.name, listThroughKesbluetooth)})
+            benchmark::RegisterBenchmark((name + library).c_str(), list, count)
+                ->Iterations(std::min<benchmark::IterationCount>(iterations, 100))
+                ->UseRealTime();
+    }
+    benchmark::RunSpecifiedBenchmarks();
+}
