@@ -31,10 +31,12 @@ bool isEmptyArray(DBusMessageIter& array) {
 template <class Text>
 void readTextArray(DBusMessageIter& array, std::vector<Text>& texts) {
     DBusMessageIter element;
-    for (dbus_message_iter_recurse(&array, &element);
-         dbus_message_iter_get_arg_type(&element) != DBUS_TYPE_INVALID;
-         dbus_message_iter_next(&element))
+    dbus_message_iter_recurse(&array, &element);
+    if (dbus_message_iter_get_arg_type(&element) == DBUS_TYPE_INVALID)
+        return;
+    do
         texts.emplace_back(basicAt<const char*>(element));
+    while (dbus_message_iter_next(&element));
 }
 
 bool isDictionary(DBusMessageIter& iter) {
@@ -149,9 +151,11 @@ RemoteObject::DictResult RemoteObject::parseDictionary(DBusMessageIter& iter, Di
         return DictResult::NoDict;
     dict.clear();
     DBusMessageIter item;
-    for (dbus_message_iter_recurse(&iter, &item);
-         dbus_message_iter_get_arg_type(&item) != DBUS_TYPE_INVALID;
-         dbus_message_iter_next(&item)) {
+    dbus_message_iter_recurse(&iter, &item);
+    if (dbus_message_iter_get_arg_type(&item) == DBUS_TYPE_INVALID)
+        return DictResult::Read;
+    dict.reserve(16); // what the objects of the Bluetooth daemon have at most
+    do {
         DBusMessageIter half;
         dbus_message_iter_recurse(&item, &half);
         DictEntry entry;
@@ -163,7 +167,7 @@ RemoteObject::DictResult RemoteObject::parseDictionary(DBusMessageIter& iter, Di
         if (parseEntryValue(half, entry) != 0)
             return DictResult::BadValue;
         dict.push_back(std::move(entry));
-    }
+    } while (dbus_message_iter_next(&item));
     return DictResult::Read;
 }
 
