@@ -67,8 +67,11 @@ Failure usageFailure(const CLI::App& program, const CLI::ParseError& error) {
         command += " " + chosen->get_name();
     }
     std::string what = error.what();
-    if (dynamic_cast<const CLI::RequiredError*>(&error) && chosen->get_subcommands({}).size() > 0) {
-        const std::vector<std::string> rest = chosen->remaining();
+    const std::string option = what.substr(0, what.find(':'));
+    if (program.get_option_no_throw(option) && !chosen->get_option_no_throw(option))
+        command = "kesbt"; // an option of every verb
+    if (dynamic_cast<const CLI::RequiredError*>(&error) && !chosen->get_subcommands({}).empty()) {
+        const std::vector<std::string> rest = program.remaining(true);
         what = rest.empty() ? "a verb is missing" : "there is no verb " + quoted(rest.front());
     }
     return wrongUsage(printable(what) + "; see: " + command + " --help");

@@ -6,15 +6,6 @@
 
 namespace Kesbt {
 
-namespace {
-
-std::string padded(const std::string& text, std::size_t width) {
-    const std::size_t length = columns(text);
-    return text + std::string(length < width ? width - length : 0, ' ');
-}
-
-} // namespace
-
 void DeviceWatch::found(const std::string& address, const Json& properties) {
     const auto [known, isNew] = m_devices.try_emplace(address, properties);
     if (isNew) {

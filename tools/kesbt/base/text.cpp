@@ -43,6 +43,11 @@ std::size_t columns(const std::string& text) {
     }));
 }
 
+std::string padded(const std::string& text, std::size_t width) {
+    const std::size_t length = columns(text);
+    return text + std::string(length < width ? width - length : 0, ' ');
+}
+
 bool isAddress(const std::string& text) {
     constexpr std::size_t length = 17;
     if (text.size() != length)

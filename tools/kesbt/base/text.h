@@ -13,6 +13,9 @@ std::string printable(const std::string& text);
 /// How many columns a text takes on a terminal, with one for each character.
 std::size_t columns(const std::string& text);
 
+/// The text with blanks after it, at least so many columns wide.
+std::string padded(const std::string& text, std::size_t width);
+
 /// Six two-digit hexadecimal groups joined by colons.
 bool isAddress(const std::string& text);
 /// The last component of an object path: "hci0" of "/org/bluez/1234/hci0".

@@ -34,22 +34,24 @@ std::string argumentText(const Signal& signal) {
 
 void printLine(const std::string& subject, const std::string& what, const std::string& arguments) {
     constexpr std::size_t subjectWidth = 22;
-    std::string padded = printable(subject);
-    padded.resize(std::max(padded.size(), subjectWidth), ' ');
-    std::cout << coloured(timeForPeople(), Colour::Dim) << "  " << padded << "  "
+    std::cout << coloured(timeForPeople(), Colour::Dim) << "  "
+              << padded(printable(subject), subjectWidth) << "  "
               << coloured(printable(what), Colour::Bold) << (arguments.empty() ? "" : "  ")
               << printable(arguments) << '\n';
     flushOutput();
 }
 
+void printDaemon(const Options& options, bool isThere) {
+    if (options.json)
+        printEvent(
+            {{"event", isThere ? "daemon-came" : "daemon-gone"}, {"time", timeForPrograms()}});
+    else
+        printLine("bluetoothd", isThere ? "is on the bus" : "has left the bus", "");
+}
+
 void printSignal(const Options& options, const Signal& signal) {
     if (BusFeed::isDaemonChange(signal)) {
-        const bool gone = BusFeed::isDaemonGone(signal);
-        if (options.json)
-            printEvent(
-                {{"event", gone ? "daemon-gone" : "daemon-came"}, {"time", timeForPrograms()}});
-        else
-            printLine("bluetoothd", gone ? "has left the bus" : "is on the bus", "");
+        printDaemon(options, !BusFeed::isDaemonGone(signal));
         return;
     }
     if (options.json)
@@ -61,8 +63,7 @@ void printSignal(const Options& options, const Signal& signal) {
                     {"arguments", signal.arguments}});
     else
         printLine(shortPath(signal.path),
-                  lastComponent(signal.interface.substr(signal.interface.rfind('.') + 1)) + "." +
-                      signal.member,
+                  signal.interface.substr(signal.interface.rfind('.') + 1) + "." + signal.member,
                   argumentText(signal));
 }
 
@@ -70,6 +71,7 @@ void monitor(const Options& options) {
     Interrupt interrupt;
     BusFeed feed({"type='signal',sender='org.bluez'", BusFeed::daemonRule});
     openManager(); // without a daemon to watch the user has most likely mistaken something
+    printDaemon(options, true);
     while (!interrupt.came()) {
         for (Signal signal; feed.next(signal);)
             printSignal(options, signal);

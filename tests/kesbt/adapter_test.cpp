@@ -1,0 +1,95 @@
+#include "kesbt/kesbt_test.h"
+
+namespace Bluetooth::Test {
+
+namespace {
+
+class AdapterVerbs : public KesbtTest {};
+
+TEST_F(AdapterVerbs, ListAndInfoHaveStableJson) {
+    const Json adapters = run({"adapters", "--json"}).json();
+    ASSERT_EQ(adapters.size(), 2U);
+    EXPECT_EQ(keys(adapters[0]), (Arguments{"adapter", "path", "default", "properties"}));
+    EXPECT_EQ(adapters[0]["adapter"], "hci0");
+    EXPECT_EQ(adapters[0]["default"], true);
+    EXPECT_EQ(adapters[1]["default"], false);
+
+    const Json info = run({"--json", "adapter", "info"}).json();
+    EXPECT_EQ(info["path"], adapters[0]["path"]);
+    EXPECT_EQ(info["properties"]["Address"], "00:1A:7D:DA:71:10");
+    EXPECT_EQ(info["properties"]["Class"], 0x6e0100);
+    EXPECT_EQ(info["properties"]["Powered"], true);
+    EXPECT_TRUE(info["properties"]["UUIDs"].is_array());
+}
+
+TEST_F(AdapterVerbs, AnAdapterIsChosenByNameOrAddress) {
+    for (const char* choice : {"hci1", "00:1A:7D:DA:71:11", "00:1a:7d:da:71:11"})
+        EXPECT_EQ(run({"--adapter", choice, "adapter", "--json"}).json()["adapter"], "hci1");
+    EXPECT_EQ(failure({"adapter", "--adapter", "hci9"}),
+              "there is no adapter hci9; see which there are: kesbt adapters\n");
+}
+
+TEST_F(AdapterVerbs, SetTellsOldAndNewValueInThePropertysOwnType) {
+    EXPECT_EQ(run({"adapter", "set", "powered", "off"}), (Result{0, "Powered: yes -> no\n", ""}));
+    EXPECT_EQ(run({"adapter", "set", "Powered", "true"}), (Result{0, "Powered: no -> yes\n", ""}));
+    EXPECT_EQ(run({"adapter", "set", "DiscoverableTimeout", "60"}).out,
+              "DiscoverableTimeout: 180 -> 60\n");
+    EXPECT_EQ(
+        run({"adapter", "set", "Name", "42", "--json"}).json(),
+        (Json{{"adapter", "hci0"}, {"property", "Name"}, {"old", "kestrine-0"}, {"new", "42"}}));
+    EXPECT_EQ(adapterProperties()["Name"], "42");
+}
+
+TEST_F(AdapterVerbs, SetRefusesWhatCannotBeSet) {
+    EXPECT_EQ(failure({"adapter", "set", "Address", "x"}),
+              "the daemon does not let Address of hci0 be set to \"x\"; see what can be set: kesbt "
+              "adapter set --help\n");
+    EXPECT_EQ(failure({"adapter", "set", "UUIDs", "x"}),
+              "UUIDs cannot be set; see what can: kesbt adapter set --help\n");
+    EXPECT_EQ(failure({"adapter", "set", "Colour", "red"}).substr(0, 40),
+              "hci0 has no property \"Colour\"; it has: A");
+    failure({"adapter", "set", "Powered", "perhaps"}, 2);
+    failure({"adapter", "set", "PairableTimeout", "-1"}, 2);
+    failure({"adapter", "set", "PairableTimeout", "4294967296"}, 2);
+    failure({"adapter", "set", "Name", std::string(249, 'n')}, 2);
+    EXPECT_EQ(adapterProperties()["PairableTimeout"], 0);
+}
+
+TEST_F(AdapterVerbs, ACallThatIsAcceptedButDoesNothingIsAFailure) {
+    // The daemon answers and changes nothing: only reading back shows it.
+    peer = std::make_unique<RawPeer>(bus.address());
+    control("DropName");
+    RawPeer liar(bus.address(), "org.bluez");
+    liar.reply("DefaultAdapter", [](Writer& w) { w(Path{"/org/bluez/1/hci0"}); });
+    liar.reply("SetProperty");
+    liar.reply("GetProperties",
+               [](Writer& w) { w.dict("sv", [](Writer& d) { d.entry("Powered", Var{true}); }); });
+    EXPECT_EQ(failure({"--timeout", "0.3", "adapter", "set", "Powered", "off"}),
+              "Powered of hci0 is still \"yes\" within the time-out; try again or give a longer "
+              "--timeout\n");
+    liar.neverReply("SetProperty");
+    EXPECT_NE(failure({"--timeout", "0.3", "adapter", "set", "Powered", "off"})
+                  .find("Did not receive a reply"),
+              std::string::npos);
+}
+
+TEST_F(AdapterVerbs, NamesFromOutsideCannotControlTheTerminal) {
+    run({"adapter", "set", "Name", "a\x1b[2J\nb\xc3\xa9"});
+    EXPECT_NE(run({"adapters"}).out.find("a\\x1b[2J\\nb\xc3\xa9\n"), std::string::npos);
+    EXPECT_EQ(adapterProperties()["Name"], "a\x1b[2J\nb\xc3\xa9");
+}
+
+TEST_F(AdapterVerbs, ColoursAreForTerminalsOnlyAndNoColorEndsThem) {
+    const auto onTerminal = [](const std::string& environment) {
+        return runCommand({"env", "TERM=xterm", environment, "script", "-qec",
+                           std::string(KESBT) + " adapters", "/dev/null"})
+            .out;
+    };
+    EXPECT_NE(onTerminal("X=").find("\033["), std::string::npos);
+    EXPECT_EQ(onTerminal("NO_COLOR=1").find("\033["), std::string::npos);
+    EXPECT_EQ(run({"adapters"}).out.find("\033["), std::string::npos);
+}
+
+} // namespace
+
+} // namespace Bluetooth::Test

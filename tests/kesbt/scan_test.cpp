@@ -1,0 +1,61 @@
+// The verbs on the scanner service, with the real service on a session bus of the test's own.
+
+#include "kesbt/kesbt_test.h"
+
+#include <csignal>
+
+namespace Bluetooth::Test {
+
+namespace {
+
+class ScanVerbs : public KesbtTest {
+protected:
+    PrivateBus session{PrivateBus::Kind::Session, SESSION_BUS_CONFIGURATION};
+};
+
+TEST_F(ScanVerbs, TwoProgramsShareOneScan) {
+    EXPECT_EQ(run({"scan", "stop"}), (Result{0, "No scan is running on hci0\n", ""}));
+    const auto watch = start({"scan", "watch", "--json"}); // the bus starts the service
+    const Json found = awaitEvent(*watch, "address", gps);
+    EXPECT_EQ(found["event"], "found");
+    EXPECT_EQ(found["properties"]["RSSI"], -70);
+
+    const Json list = run({"scan", "list", "--json"}).json();
+    ASSERT_FALSE(list.empty());
+    EXPECT_EQ(keys(list[0]), (Arguments{"address", "adapter", "properties"}));
+    EXPECT_EQ(list[0]["address"], headset);
+    EXPECT_EQ(list[0]["properties"]["Paired"], false);
+    EXPECT_TRUE(list[0]["properties"]["UUIDs"].is_array());
+    EXPECT_NE(run({"scan", "list"}).out.find("00:11:22:33:44:04  -70 dBm  0x001f00  GPS Receiver"),
+              std::string::npos);
+    EXPECT_EQ(calls("StartDiscovery"), 1U);
+
+    control("SetDevice", [](Writer& w) {
+        w(gps).dict("sv", [](Writer& d) { d.entry("RSSI", Var{std::int32_t{-20}}); });
+    });
+    while (awaitEvent(*watch, "event", "changed")["address"] != gps && !HasFailure()) {
+    }
+    watch->signal(SIGINT);
+    EXPECT_EQ(finish(*watch).status, 0);
+    EXPECT_EQ(run({"scan", "stop", "--json"}).json(),
+              (Json{{"adapter", "hci0"}, {"stopped", true}}));
+    awaitCall("StopDiscovery");
+}
+
+class ScanVerbsAlone : public KesbtTest {
+protected:
+    PrivateBus session{PrivateBus::Kind::Session};
+};
+
+TEST_F(ScanVerbsAlone, WithoutTheServiceTheLineSaysSo) {
+    for (const char* verb : {"list", "watch"})
+        EXPECT_EQ(failure({"scan", verb}),
+                  "the scanner service is not running; start it: kesbt-scannerd\n");
+    session.kill();
+    EXPECT_EQ(failure({"scan", "list"}), "the session bus cannot be reached; log in, or try: "
+                                         "dbus-run-session -- kesbt scan list\n");
+}
+
+} // namespace
+
+} // namespace Bluetooth::Test

@@ -1,0 +1,129 @@
+// The verbs that print until they are interrupted: discover and monitor.
+
+#include "kesbt/kesbt_test.h"
+
+#include <csignal>
+#include <set>
+
+namespace Bluetooth::Test {
+
+namespace {
+
+class Streams : public KesbtTest {
+protected:
+    static void expectEnd(ChildProcess& program, int status, const std::string& line) {
+        const Result result = finish(program);
+        EXPECT_EQ(result.status, status) << result;
+        EXPECT_EQ(result.err, line);
+    }
+};
+
+TEST_F(Streams, DiscoverTellsWhatAppearsChangesAndVanishes) {
+    const auto discover = start({"discover", "--json"});
+    std::set<std::string> found;
+    while (found.size() < 8)
+        found.insert(awaitEvent(*discover, "event", "found")["address"].get<std::string>());
+    EXPECT_EQ(adapterProperties()["Discovering"], true);
+
+    const Json vanished = awaitEvent(*discover, "event", "vanished");
+    EXPECT_EQ(vanished["address"], speaker);
+    EXPECT_EQ(vanished["properties"]["Name"], "Passing Speaker");
+
+    control("SetDevice", [](Writer& w) {
+        w(gps).dict("sv", [](Writer& d) { d.entry("RSSI", Var{std::int32_t{-20}}); });
+    });
+    const Json changed = awaitEvent(*discover, "address", gps);
+    EXPECT_EQ(keys(changed), (Arguments{"event", "time", "address", "properties", "changed"}));
+    EXPECT_EQ(changed["event"], "changed");
+    EXPECT_EQ(changed["changed"], Json::array({"RSSI"}));
+    EXPECT_EQ(changed["properties"]["RSSI"], -20);
+
+    discover->signal(SIGINT);
+    expectEnd(*discover, 0, "");
+    EXPECT_EQ(calls("StopDiscovery"), 1U);
+    EXPECT_EQ(adapterProperties()["Discovering"], false);
+}
+
+TEST_F(Streams, DiscoverEndsAfterItsTimeOnTheChosenAdapter) {
+    const Result result = run({"--adapter", "hci1", "discover", "--seconds", "1"});
+    EXPECT_EQ(result.status, 0);
+    EXPECT_EQ(result.err, "");
+    EXPECT_NE(
+        result.out.find("found     00:11:22:33:44:04  -70 dBm   0x001f00                  GPS "
+                        "Receiver\n"),
+        std::string::npos)
+        << result;
+    EXPECT_EQ(calls("StopDiscovery"), 1U);
+}
+
+TEST_F(Streams, DiscoverFailsWhenItCannotGoOn) {
+    run({"adapter", "set", "Powered", "off"});
+    EXPECT_EQ(failure({"discover"}),
+              "cannot start a discovery on hci0: Resource Not Ready; the adapter is off, switch it "
+              "on: kesbt adapter set Powered true\n");
+    run({"adapter", "set", "Powered", "on"});
+
+    auto discover = start({"discover"});
+    EXPECT_NE(discover->readLine(), "");
+    run({"adapter", "set", "Powered", "off"});
+    expectEnd(*discover, 1,
+              "hci0 was switched off; switch it on: kesbt adapter set Powered true\n");
+
+    discover = start({"--adapter", "hci1", "discover"});
+    EXPECT_NE(discover->readLine(), "");
+    control("RemoveAdapter", [](Writer& w) { w("hci1"); });
+    const Result removed = finish(*discover);
+    EXPECT_EQ(removed.status, 1); // switched off first, then removed
+    EXPECT_EQ(removed.err.substr(0, 9), "hci1 was ");
+
+    run({"adapter", "set", "Powered", "on"});
+    discover = start({"discover"});
+    EXPECT_NE(discover->readLine(), "");
+    daemon->kill();
+    expectEnd(*discover, 1,
+              "bluetoothd has left the system bus; start it again and repeat the command\n");
+}
+
+TEST_F(Streams, MonitorShowsEverySignalAlsoOfWhatComesLater) {
+    const auto monitor = start({"monitor", "--json"});
+    awaitEvent(*monitor, "event", "daemon-came"); // from now on nothing is missed
+
+    run({"adapter", "set", "Discoverable", "on"});
+    const Json changed = awaitEvent(*monitor, "arguments", {"Discoverable", true});
+    EXPECT_EQ(keys(changed),
+              (Arguments{"event", "time", "path", "interface", "member", "arguments"}));
+    EXPECT_EQ(changed["interface"], "org.bluez.Adapter");
+    EXPECT_EQ(changed["member"], "PropertyChanged");
+
+    control("AddAdapter", [](Writer& w) {
+        w.dict("sv", [](Writer& d) { d.entry("Address", Var{"00:1A:7D:DA:71:12"}); });
+    });
+    const Json added = awaitEvent(*monitor, "member", "AdapterAdded");
+    run({"--adapter", "hci2", "adapter", "set", "Name", "new"});
+    EXPECT_EQ(awaitEvent(*monitor, "arguments", {"Name", "new"})["path"], added["arguments"][0]);
+
+    control("Restart");
+    awaitEvent(*monitor, "event", "daemon-gone");
+    awaitEvent(*monitor, "event", "daemon-came");
+    run({"create", gps});
+    const Json created = awaitEvent(*monitor, "member", "DeviceCreated");
+    EXPECT_NE(created["path"], changed["path"]);
+    awaitEvent(*monitor, "path", created["arguments"][0]); // a device's own signal
+
+    monitor->signal(SIGTERM);
+    expectEnd(*monitor, 0, "");
+}
+
+TEST_F(Streams, MonitorIsReadableByPeople) {
+    const auto monitor = start({"monitor"});
+    EXPECT_EQ(monitor->readLine().substr(12), "  bluetoothd              is on the bus");
+    run({"adapter", "set", "Discoverable", "on"});
+    EXPECT_EQ(monitor->readLine().substr(12),
+              "  hci0                    Adapter.PropertyChanged  Discoverable = yes");
+    monitor->signal(SIGINT);
+    expectEnd(*monitor, 0, "");
+}
+
+} // namespace
+
+} // namespace Bluetooth::Test

@@ -1,0 +1,98 @@
+// What the program says before there is anything to do, and when nothing can be done.
+
+#include "kesbt/kesbt_test.h"
+
+namespace Bluetooth::Test {
+
+namespace {
+
+const Arguments verbs = {"names",    "monitor",     "adapters", "adapter",       "discover",
+                         "scan",     "devices",     "device",   "create",        "remove",
+                         "services", "pair",        "cancel",   "agent",         "audio",
+                         "volume",   "autoconnect", "name",     "restart-daemon"};
+
+TEST(Usage, WrongUsageIsOneLineThatSaysWhereToReadOnAndStatus2) {
+    const std::vector<std::pair<Arguments, std::string>> wrong = {
+        {{}, "a verb is missing; see: kesbt --help\n"},
+        {{"adaptres"}, "there is no verb \"adaptres\"; see: kesbt --help\n"},
+        {{"audio"}, "a verb is missing; see: kesbt audio --help\n"},
+        {{"audio", "play", headset}, "there is no verb \"play\"; see: kesbt audio --help\n"},
+        {{"device"}, "ADDRESS is required; see: kesbt device --help\n"},
+        {{"device", "00:11:22"},
+         "ADDRESS: \"00:11:22\" is no address such as 00:11:22:33:44:55; see: kesbt device "
+         "--help\n"},
+        {{"--adapter", "/org/bluez/1/hci0", "devices"},
+         "--adapter: \"/org/bluez/1/hci0\" is no adapter such as hci0; see: kesbt --help\n"},
+        {{"discover", "--seconds", "0"},
+         "--seconds: \"0\" is no time such as 10 or 0.5; see: kesbt discover --help\n"},
+        {{"pair", headset, "--pin", "12345678901234567"},
+         "--pin: a PIN has 1 to 16 characters; see: kesbt pair --help\n"},
+        {{"pair", headset, "--capability", "Telepathy"},
+         "--capability: \"Telepathy\" is no capability; see: kesbt pair --help\n"},
+        {{"agent", "--delay", "-1"},
+         "--delay: \"-1\" is no number from 0 to 9999; see: kesbt agent --help\n"},
+        {{"name", headset, "--timeout", "soon"},
+         "--timeout: \"soon\" is no time such as 5000; see: kesbt name --help\n"},
+    };
+    for (const auto& [arguments, line] : wrong)
+        EXPECT_EQ(failure(arguments, 2), line);
+    failure({"devices", "too", "much"}, 2);
+    failure({"devices", "--colour"}, 2);
+}
+
+TEST(Usage, EveryVerbHasHelpWithExamples) {
+    const Result help = run({"--help"});
+    EXPECT_EQ(help.status, 0);
+    EXPECT_EQ(help.err, "");
+    for (const std::string& verb : verbs) {
+        EXPECT_NE(help.out.find("\n  " + verb + " "), std::string::npos) << verb;
+        const Result own = run({verb, "--help"});
+        EXPECT_EQ(own.status, 0);
+        EXPECT_NE(own.out.find("Examples:\n  kesbt "), std::string::npos) << own;
+    }
+    EXPECT_EQ(run({"--version"}), (Result{0, "kesbt " KESBT_VERSION "\n", ""}));
+}
+
+TEST(Usage, ResultsThatCannotBeWrittenAreAFailure) {
+    EXPECT_EQ(runCommand({"sh", "-c", std::string(KESBT) + " --help >/dev/full"}),
+              (Result{1, "",
+                      "cannot write the results: No space left on device; check where "
+                      "standard output goes\n"}));
+}
+
+TEST(Usage, WithoutASystemBusTheLineSaysSo) {
+    PrivateBus::address(PrivateBus::Kind::System); // where none runs
+    for (const Arguments& arguments :
+         {Arguments{"names"}, Arguments{"adapters"}, Arguments{"monitor"}, Arguments{"agent"}})
+        EXPECT_EQ(failure(arguments), "the system bus cannot be reached; start dbus-daemon, or "
+                                      "try: bluez4-sim -- kesbt adapters\n");
+}
+
+TEST(Usage, WithoutADaemonTheLineSaysSo) {
+    const PrivateBus bus(PrivateBus::Kind::System);
+    for (const Arguments& arguments :
+         {Arguments{"adapters"}, Arguments{"adapter", "set", "Powered", "on"}, Arguments{"devices"},
+          Arguments{"device", mouse}, Arguments{"create", headset}, Arguments{"remove", mouse},
+          Arguments{"services", mouse}, Arguments{"discover"}, Arguments{"monitor"},
+          Arguments{"cancel", headset}, Arguments{"agent"}, Arguments{"audio", "connect", headset},
+          Arguments{"volume", "up", headset}, Arguments{"scan", "list"},
+          Arguments{"autoconnect", "targets"}})
+        EXPECT_EQ(failure(arguments), absentDaemon);
+    EXPECT_EQ(run({"names"}).out.substr(0, 21), "org.freedesktop.DBus\n");
+}
+
+TEST(Usage, TheSimulatedDaemonRunsItAndPassesItsStatusOn) {
+    const Result result = runCommand({BLUEZ4_SIM, "--", KESBT, "adapters"});
+    EXPECT_EQ(result, (Result{0,
+                              "ADAPTER  ADDRESS            POWERED  DISCOVERABLE  DEFAULT  NAME\n"
+                              "hci0     00:1A:7D:DA:71:10  yes      no            yes      "
+                              "kestrine-0\n"
+                              "hci1     00:1A:7D:DA:71:11  yes      no            no       "
+                              "kestrine-1\n",
+                              ""}));
+    EXPECT_EQ(runCommand({BLUEZ4_SIM, "--", KESBT, "--adapter", "hci7", "devices"}).status, 1);
+}
+
+} // namespace
+
+} // namespace Bluetooth::Test
