@@ -284,12 +284,14 @@ DBusHandlerResult RawPeer::filter(DBusConnection*, DBusMessage* message, void* p
 DBusHandlerResult RawPeer::take(DBusMessage* message) {
     switch (dbus_message_get_type(message)) {
     case DBUS_MESSAGE_TYPE_METHOD_CALL:
-        m_calls.add(
-            {textOf(dbus_message_get_destination(message)), textOf(dbus_message_get_path(message)),
-             textOf(dbus_message_get_interface(message)), textOf(dbus_message_get_member(message)),
-             argumentsOf(message), !dbus_message_get_no_reply(message)});
         if (!m_isMonitor)
-            answerCall(message);
+            answerCall(message); // first: who waits for the call finds its handler done
+        if (m_recording)
+            m_calls.add({textOf(dbus_message_get_destination(message)),
+                         textOf(dbus_message_get_path(message)),
+                         textOf(dbus_message_get_interface(message)),
+                         textOf(dbus_message_get_member(message)), argumentsOf(message),
+                         !dbus_message_get_no_reply(message)});
         return DBUS_HANDLER_RESULT_HANDLED;
     case DBUS_MESSAGE_TYPE_SIGNAL:
         m_signals.add(textOf(dbus_message_get_member(message)) + " " + argumentsOf(message));
