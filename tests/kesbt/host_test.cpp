@@ -55,6 +55,9 @@ TEST_F(HostVerbs, TheListIsChangedEntryByEntryAndTheFlagStays) {
     EXPECT_EQ(content(), std::string("0,") + gps);
     failure({"autoconnect", "remove", mouse});
 
+    setContent(std::string("1,") + gps + "\n"); // written with an editor
+    run({"autoconnect", "add", headset});
+    EXPECT_EQ(content(), std::string("1,") + gps + "," + headset);
     setContent(std::string("1,") + gps + ",");
     run({"autoconnect", "add", mouse});
     EXPECT_EQ(content(), std::string("1,") + gps + "," + mouse);

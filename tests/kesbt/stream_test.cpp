@@ -124,6 +124,28 @@ TEST_F(Streams, MonitorIsReadableByPeople) {
     expectEnd(*monitor, 0, "");
 }
 
+TEST_F(Streams, WaitEndsWhenItIsSoAndFailsWhenTimeIsOver) {
+    EXPECT_EQ(run({"wait", "found", gps}), (Result{0, "00:11:22:33:44:04 is found\n", ""}));
+    EXPECT_EQ(run({"wait", "powered", "--json"}).json(),
+              (Json{{"subject", "hci0"}, {"reached", "powered"}}));
+    EXPECT_EQ(failure({"--timeout", "0.2", "wait", "connected", mouse}),
+              "00:11:22:33:44:06 was not connected within the time-out; try again or give a longer "
+              "--timeout\n");
+
+    const auto waiting = start({"wait", "paired", gps}); // not even known yet
+    awaitCall("FindDevice");
+    EXPECT_EQ(run({"pair", gps, "--pin", "1234"}).status, 0);
+    expectEnd(*waiting, 0, "");
+
+    const std::size_t asked = calls("FindDevice");
+    const auto interrupted = start({"wait", "paired", laptop});
+    awaitCall("FindDevice", asked + 1);
+    interrupted->signal(SIGINT);
+    expectEnd(*interrupted, 1,
+              "interrupted before 00:11:22:33:44:07 was paired; repeat the command to go on "
+              "waiting\n");
+}
+
 } // namespace
 
 } // namespace Bluetooth::Test

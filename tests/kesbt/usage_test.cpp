@@ -6,10 +6,10 @@ namespace Bluetooth::Test {
 
 namespace {
 
-const Arguments verbs = {"names",    "monitor",     "adapters", "adapter",       "discover",
-                         "scan",     "devices",     "device",   "create",        "remove",
-                         "services", "pair",        "cancel",   "agent",         "audio",
-                         "volume",   "autoconnect", "name",     "restart-daemon"};
+const Arguments verbs = {"names",    "monitor",     "adapters", "adapter",        "discover",
+                         "scan",     "devices",     "device",   "create",         "remove",
+                         "services", "pair",        "cancel",   "agent",          "audio",
+                         "volume",   "autoconnect", "name",     "restart-daemon", "wait"};
 
 TEST(Usage, WrongUsageIsOneLineThatSaysWhereToReadOnAndStatus2) {
     const std::vector<std::pair<Arguments, std::string>> wrong = {

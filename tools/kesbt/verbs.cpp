@@ -5,6 +5,7 @@
 #define KESBT_VERBS(VERB)                                                                          \
     VERB(names)                                                                                    \
     VERB(monitor)                                                                                  \
+    VERB(wait)                                                                                     \
     VERB(adapters)                                                                                 \
     VERB(adapter)                                                                                  \
     VERB(discover)                                                                                 \

@@ -68,6 +68,8 @@ void AutoConnectFile::read() {
     if (!file)
         throw unusable(m_path, errno);
     m_content.assign(std::istreambuf_iterator<char>(file), {});
+    // Editors end files with a line break, which would be part of the last address.
+    m_content.erase(m_content.find_last_not_of("\r\n") + 1);
 }
 
 bool AutoConnectFile::isEnabled() const {
