@@ -18,6 +18,8 @@ class ObjectTree {
 public:
     /// @param object  what the table's handlers cast back to; not owned
     void add(const std::string& path, const Interface& interface, void* object);
+    /// An object that serves nothing: it exists, but has no methods.
+    void add(const std::string& path) { m_objects[path]; }
     void remove(const std::string& path);
     void remove(const std::string& path, const Interface& interface);
 

@@ -65,6 +65,7 @@ void AdapterMode::powerOn() {
 }
 
 void AdapterMode::powerOff() {
+    m_powered = false;
     m_adapter.loseDevices();
     m_restoreDiscoverable = m_discoverable;
     m_discoverableTimer.stop();
@@ -76,7 +77,6 @@ void AdapterMode::powerOff() {
     // Only the signal says so: GetProperties keeps the value that the next power-on brings back.
     m_adapter.changed("Pairable", boolValue(false));
     m_adapter.discovery().stop();
-    m_powered = false;
     m_adapter.changed("Powered", boolValue(false));
     m_powerFromSession = false;
 }

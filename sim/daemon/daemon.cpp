@@ -37,6 +37,7 @@ void Daemon::start(int pid) {
         throw;
     }
     m_bus = std::move(bus);
+    m_objects.add(basePath() + "/any");
     for (const auto& hardware : m_world.adapters)
         plugIn(hardware);
 }
@@ -55,6 +56,7 @@ void Daemon::clear() {
     // Adapters use the bus until they are gone; nothing of theirs is said on the way out.
     m_adapters.clear();
     m_manager.reset();
+    m_objects.remove(basePath() + "/any");
     if (m_burial)
         g_source_remove(m_burial);
     m_burial = 0;

@@ -51,7 +51,7 @@ void Discovery::resume() {
 }
 
 void Discovery::begin() {
-    if (m_suspensions)
+    if (m_suspensions || !m_adapter.mode().powered())
         return;
     m_found.clear();
     m_began = g_get_monotonic_time();

@@ -41,6 +41,8 @@ TEST_F(DaemonTest, FindAdapterKnowsNamesAndAddressesButNoPaths) {
     EXPECT_EQ(find("hci1"), "reply 'hci1'");
     EXPECT_EQ(find("00:1a:7d:da:71:11"), "reply 'hci1'");
     EXPECT_EQ(find("any"), "reply 'any'");
+    EXPECT_EQ(client->call(base + "any", "Adapter.GetProperties").substr(0, unknown.size()),
+              unknown);
     for (const std::string& pattern :
          {adapter, std::string("hci9"), std::string("junk"), std::string("")})
         EXPECT_EQ(find(pattern), no) << pattern;
