@@ -1,0 +1,33 @@
+// Any content of an auto-connect file, read in each way.
+
+#include "host/auto_connect_file.h"
+
+#include <sys/mman.h>
+#include <unistd.h>
+
+#include <cstdint>
+#include <cstdlib>
+
+using namespace Bluetooth;
+
+extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
+    static const int descriptor = memfd_create("auto-connect", MFD_CLOEXEC);
+    static const std::string path = "/proc/self/fd/" + std::to_string(descriptor);
+    if (ftruncate(descriptor, 0) != 0 ||
+        pwrite(descriptor, data, size, 0) != static_cast<ssize_t>(size))
+        abort();
+    AutoConnectFile file(path, std::ios::in);
+    if (!file.isOpen() || file.isTooLarge())
+        abort();
+    if (file.readsEnabled() && !file.readsNonZero())
+        abort(); // "1" is not 0
+    std::size_t read = 2;
+    for (const std::string& entry : file.readEntries()) {
+        if (entry.find(',') != std::string::npos)
+            abort();
+        read += entry.size() + 1;
+    }
+    if (size > 2 && read != size + (data[size - 1] == ',' ? 0 : 1))
+        abort(); // a byte is lost, or made up
+    return 0;
+}
