@@ -47,8 +47,10 @@ private:
 /// Looks at every value, whatever it is nested in, and keeps none.
 std::size_t readThrough(DBusMessageIter& iter) {
     std::size_t entries = 0;
-    for (int type; (type = dbus_message_iter_get_arg_type(&iter)) != DBUS_TYPE_INVALID;
-         dbus_message_iter_next(&iter)) {
+    if (dbus_message_iter_get_arg_type(&iter) == DBUS_TYPE_INVALID)
+        return 0;
+    do {
+        const int type = dbus_message_iter_get_arg_type(&iter);
         if (type == DBUS_TYPE_ARRAY || type == DBUS_TYPE_VARIANT || type == DBUS_TYPE_DICT_ENTRY) {
             DBusMessageIter inner;
             dbus_message_iter_recurse(&iter, &inner);
@@ -57,7 +59,7 @@ std::size_t readThrough(DBusMessageIter& iter) {
             DBusBasicValue value;
             dbus_message_iter_get_basic(&iter, &value);
         }
-    }
+    } while (dbus_message_iter_next(&iter));
     return entries;
 }
 

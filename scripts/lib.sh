@@ -11,6 +11,7 @@ build_packages=(g++ cmake ninja-build pkg-config dbus libdbus-1-dev libglib2.0-d
     libdbus-glib-1-dev libbluetooth-dev libboost-dev libcli11-dev nlohmann-json3-dev)
 test_packages=(libgtest-dev bubblewrap)
 lint_packages=(clang-format-14 clang-tidy-14)
+bench_packages=(libbenchmark-dev libsdbus-c++-dev python3 util-linux)
 
 # Installs the named Debian packages that are missing; quiet when none is.
 need_packages() {
@@ -32,6 +33,8 @@ need_packages() {
         apt-get install -y -qq --no-install-recommends "${missing[@]}" >/dev/null
 }
 
+build_target=all
+
 # build FOLDER [cmake option...]: configures and builds, showing output only when that fails.
 build() {
     local folder=$1 log
@@ -39,7 +42,7 @@ build() {
     log=$(mktemp)
     local launcher=()
     command -v ccache >/dev/null && launcher=(-DCMAKE_CXX_COMPILER_LAUNCHER=ccache)
-    if ! { cmake -S "$root" -B "$folder" -G Ninja "${launcher[@]}" "$@" && cmake --build "$folder"; } >"$log" 2>&1; then
+    if ! { cmake -S "$root" -B "$folder" -G Ninja "${launcher[@]}" "$@" && cmake --build "$folder" --target "$build_target"; } >"$log" 2>&1; then
         cat "$log" >&2
         rm -f "$log"
         die "the build in $folder failed; its output is above"
