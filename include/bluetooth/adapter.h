@@ -76,8 +76,7 @@ public:
     /// Pairs with a device and makes it known to the daemon (CreatePairedDevice).
     /// @param address see findDevice()
     /// @param agent   answers the daemon's questions; its registerPath() must have succeeded
-    /// @return a new Device, deleted by the caller; null on failure, with the daemon's text as
-    /// error
+    /// @return a new Device, deleted by the caller; null on failure, the daemon's text as the error
     ///
     /// Blocks until the daemon answers. No time-out of the library ends it: a pairing takes as long
     /// as the other side's user takes, and the daemon reports a device that is out of reach or does
@@ -100,8 +99,7 @@ public:
     /// Makes the daemon forget a device and its pairing (RemoveDevice).
     /// @param devicePath the device's object path, not its address
     /// @return 0 when the call was handed to the bus; -1 with error 3, "Invalid path", for null or
-    /// a
-    ///         text that is no path, -1 for any other failure
+    ///         a text without a leading "/", -1 for any other failure
     int removeDevice(const char* devicePath);
 
     /// Makes an agent the one that the daemon asks when a device wants to pair with this adapter

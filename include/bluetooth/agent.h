@@ -43,8 +43,8 @@ public:
     /// all agents of a process: one of them at a time can be registered.
     /// @return 0; -1 when another agent is registered or the bus cannot be reached (logged)
     int registerPath();
-    /// Ceases to serve requests.
-    /// @return 0; -1 when this agent is not registered or the bus cannot be reached (logged)
+    /// Ceases to serve requests at this agent's path, whichever agent of the process does.
+    /// @return 0; -1 when none is registered there or the bus cannot be reached (logged)
     int unregisterPath();
 
     /// The object path, valid until the next registerPath(); "" before the first.

@@ -12,8 +12,13 @@ namespace Bluetooth {
 /// The process does not end when the bus goes away (libdbus's exit-on-disconnect is turned off);
 /// calls then fail, and a later get() connects anew.
 ///
-/// Programs that call dbus_connection_send_with_reply_and_block() on this connection themselves
-/// lose nothing, but a slow call of theirs holds up every call of the library meanwhile.
+/// Programs may use this connection themselves. What they should know:
+/// - dbus_connection_send_with_reply_and_block() loses nothing, but a slow call of theirs holds up
+///   every call of the library meanwhile;
+/// - where they dispatch the connection (a GLib main loop, dbus_connection_read_write_dispatch()),
+///   their handlers may call methods; calls of other threads on that bus may wait until a handler
+///   returns, so a handler must not wait for such a thread;
+/// - a dispatch status function of theirs must not call the library.
 class KESBLUETOOTH_API Connection {
 public:
     Connection() = delete;

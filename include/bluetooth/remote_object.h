@@ -53,7 +53,8 @@ public:
 
     /// Ends the proxy's subscriptions and drops its messages. The reference to the shared
     /// connection is kept on purpose: Connection::unref() is for programs that want to drop it.
-    /// Waits while another thread runs one of this proxy's callbacks.
+    /// Waits while another thread runs one of this proxy's callbacks; so not to be destroyed in a
+    /// handler of requests while its callbacks make calls on the same bus.
     virtual ~RemoteObject();
 
     /// The shared connection of the bus; null when it could not be reached. Not to be released.
@@ -146,7 +147,8 @@ public:
     /// @param member   the signal's name, e.g. "PropertyChanged"
     /// @param callback must not be null; called on the receive thread with this proxy, except that
     ///                 a NoArgumentCallback gets the proxy that runs the loop
-    /// @return 0, or -1 when the bus refuses (logged; nothing is subscribed)
+    /// @return 0; -1 when the bus refuses or cannot be reached, or an argument is null or no
+    ///         signal name (logged; nothing is subscribed)
     /// Blocks until the bus has answered.
     int setSignalHandlerNoArgument(const char* member, NoArgumentCallback callback);
     int setSignalHandlerString(const char* member, StringCallback callback);

@@ -13,9 +13,9 @@ class RemoteObject;
 
 /// What a program gives to be called when a signal arrives.
 ///
-/// Callbacks run on the receive thread (RemoteObject::startLoop), one at a time, in the order in
-/// which the signals arrived. No lock of the library is held meanwhile: a callback may call
-/// methods, subscribe and destroy proxies. While it runs no other signal is delivered; signals
+/// Callbacks run on the receive thread (RemoteObject::startLoop) of their bus, one at a time, in
+/// the order in which the signals arrived. No lock of the library is held meanwhile: a callback may
+/// call methods, subscribe and destroy proxies. While it runs no other signal is delivered; signals
 /// that come in are kept in memory until it returns. What the pointers point at is valid only
 /// during the call.
 using NoArgumentCallback = void (*)(RemoteObject* receiver);

@@ -97,12 +97,12 @@ DBusHandlerResult answer(DBusConnection* connection, DBusMessage* message, const
     if (!rejected && !appendValue(reply, request.value, agent->getPasskeyValue()))
         logError(KES_HERE, "Failed to append the passkey value when handling %s message.",
                  request.name);
+    if (reply && connection)
+        dbus_connection_send(connection, reply, nullptr);
+    if (connection)
+        dbus_connection_flush(connection);
     if (!reply)
         return DBUS_HANDLER_RESULT_NEED_MEMORY;
-    if (connection) {
-        dbus_connection_send(connection, reply, nullptr);
-        dbus_connection_flush(connection);
-    }
     dbus_message_unref(reply);
     return handled;
 }
@@ -136,10 +136,11 @@ int Agent::registerPath() {
 
 int Agent::unregisterPath() {
     DBusConnection* connection = m_path.empty() ? nullptr : Connection::get(DBUS_BUS_SYSTEM);
-    // The path may be another agent's, or nobody's: libdbus would abort on the latter.
+    // libdbus would abort on a path that nobody has registered. All agents of a process share one:
+    // whichever is registered there goes.
     void* owner = nullptr;
     if (connection && dbus_connection_get_object_path_data(connection, m_path.c_str(), &owner) &&
-        owner == this && dbus_connection_unregister_object_path(connection, m_path.c_str()))
+        owner && dbus_connection_unregister_object_path(connection, m_path.c_str()))
         return 0;
     logError(KES_HERE, "Failed to unregister agent path from dbus.");
     return -1;

@@ -22,31 +22,45 @@ constexpr std::chrono::milliseconds callBurst{1};
 /// What libdbus may hold unread of a flood of signals, in bytes, before it stops reading replies.
 constexpr long receiveLimit = 1L << 30;
 
-thread_local const BusLink* leading = nullptr;     // its step() runs on this thread
-thread_local const BusLink* receiving = nullptr;   // its receive() runs on this thread
-thread_local const BusLink* dispatching = nullptr; // dispatched on this thread by the program
+thread_local const BusLink* receiving = nullptr; // its receive() runs on this thread
 
-class ScopedRole {
+/// While it lives, no link's receive() counts as running on this thread, or `link`'s does.
+class ReceivingScope {
 public:
-    ScopedRole(const BusLink*& role, const BusLink* link) : m_role(role), m_before(role) {
-        role = link;
-    }
-    ~ScopedRole() { m_role = m_before; }
-    ScopedRole(const ScopedRole&) = delete;
-    ScopedRole& operator=(const ScopedRole&) = delete;
+    explicit ReceivingScope(const BusLink* link) : m_outer(receiving) { receiving = link; }
+    ~ReceivingScope() { receiving = m_outer; }
+    ReceivingScope(const ReceivingScope&) = delete;
+    ReceivingScope& operator=(const ReceivingScope&) = delete;
 
 private:
-    const BusLink*& m_role;
-    const BusLink* m_before;
+    const BusLink* m_outer;
 };
 
-/// @return the reply; null, and none will come any more, when the call is not answered
-MessagePtr takeReply(DBusPendingCall* pending) {
-    if (dbus_pending_call_get_completed(pending)) // libdbus ends the process otherwise
-        return MessagePtr(dbus_pending_call_steal_reply(pending));
-    dbus_pending_call_cancel(pending);
-    return nullptr;
-}
+/// While it lives, `link`'s step() runs on this thread. Steps of several links nest when a handler
+/// on one bus calls on another.
+class LeadingScope {
+public:
+    explicit LeadingScope(const BusLink* link) : m_link(link), m_outer(innermost) {
+        innermost = this;
+    }
+    ~LeadingScope() { innermost = m_outer; }
+    LeadingScope(const LeadingScope&) = delete;
+    LeadingScope& operator=(const LeadingScope&) = delete;
+
+    static bool has(const BusLink* link) {
+        const LeadingScope* scope = innermost;
+        while (scope && scope->m_link != link)
+            scope = scope->m_outer;
+        return scope;
+    }
+
+private:
+    static thread_local const LeadingScope* innermost;
+    const BusLink* m_link;
+    const LeadingScope* m_outer;
+};
+
+thread_local const LeadingScope* LeadingScope::innermost = nullptr;
 
 } // namespace
 
@@ -55,13 +69,12 @@ static_assert(std::atomic<bool>::is_always_lock_free, "set in signal handlers");
 
 /// A thread that waits for something that dispatching brings about.
 struct BusLink::Waiter {
-    enum class Goal { Reply, Completion, Output, Disconnect };
+    enum class Goal { Reply, Output, Disconnect };
 
     Goal goal;
     DBusConnection* connection;
-    dbus_uint32_t serial = 0;           // Reply: of the call
-    MessagePtr reply;                   // Reply: what the filter found for it
-    DBusPendingCall* pending = nullptr; // Completion
+    dbus_uint32_t serial = 0; // Reply: of the call
+    MessagePtr reply;         // Reply: what the filter found for it
     Clock::time_point deadline = Clock::time_point::max();
     const std::atomic<bool>* interrupted = nullptr;
     bool leadsAlways = false;
@@ -71,17 +84,13 @@ struct BusLink::Waiter {
     Waiter(Goal what, DBusConnection* where) : goal(what), connection(where) {}
 
     bool isFinished() const {
-        switch (goal) {
-        case Goal::Reply:
-            return reply != nullptr;
-        case Goal::Completion:
-            return dbus_pending_call_get_completed(pending) || (interrupted && *interrupted);
-        case Goal::Output:
-            return !dbus_connection_has_messages_to_send(connection);
-        case Goal::Disconnect:
-            break;
-        }
-        return false;
+        return (goal == Goal::Reply && reply) ||
+               (goal == Goal::Output && !dbus_connection_has_messages_to_send(connection));
+    }
+    /// Whether to leave without having reached the goal. Needs no lock.
+    bool isOver() const {
+        return (interrupted && *interrupted) ||
+               (deadline != Clock::time_point::max() && Clock::now() >= deadline);
     }
 };
 
@@ -123,11 +132,9 @@ bool BusLink::attach() {
 }
 
 MessagePtr BusLink::call(DBusMessage* message, int timeoutMs, DBusError& error) {
-    // libdbus's dispatch cannot be entered twice: inside it only libdbus's own wait works.
     if (dispatchesHere())
         return MessagePtr(
             dbus_connection_send_with_reply_and_block(m_connection, message, timeoutMs, &error));
-
     if (!dbus_connection_get_is_connected(m_connection)) {
         dbus_set_error_const(&error, DBUS_ERROR_DISCONNECTED, "Connection is closed");
         return nullptr;
@@ -146,17 +153,26 @@ MessagePtr BusLink::call(DBusMessage* message, int timeoutMs, DBusError& error) 
             dbus_set_error_const(&error, DBUS_ERROR_NO_MEMORY, "Not enough memory");
             return nullptr;
         }
+        join(waiter);
         wait(waiter, lock);
     }
     if (!waiter.reply)
+        setNoReply(error);
+    else if (dbus_set_error_from_message(&error, waiter.reply.get()))
+        return nullptr;
+    return std::move(waiter.reply);
+}
+
+void BusLink::setNoReply(DBusError& error) const {
+    if (dbus_connection_get_is_connected(m_connection))
         dbus_set_error_const(
             &error, DBUS_ERROR_NO_REPLY,
             "Did not receive a reply. Possible causes include: the remote application did not "
             "send a reply, the message bus security policy blocked the reply, the reply "
             "timeout expired, or the network connection was broken.");
-    else if (dbus_set_error_from_message(&error, waiter.reply.get()))
-        return nullptr;
-    return std::move(waiter.reply);
+    else
+        dbus_set_error_const(&error, DBUS_ERROR_DISCONNECTED,
+                             "Connection was disconnected before a reply was received");
 }
 
 bool BusLink::send(DBusMessage* message) {
@@ -168,32 +184,50 @@ bool BusLink::send(DBusMessage* message) {
     return true;
 }
 
-bool BusLink::begin(DBusMessage* message, PendingPtr& pending) {
-    DBusPendingCall* begun = nullptr;
-    if (!dbus_connection_send_with_reply(m_connection, message, &begun, -1))
-        return false;
-    pending.reset(begun);
-    return true;
-}
-
-MessagePtr BusLink::finish(PendingPtr pending, const std::atomic<bool>& interrupted) {
-    if (!pending)
-        return nullptr;
+bool BusLink::converse(DBusMessage* message, const std::atomic<bool>& interrupted, void (*sent)(),
+                       MessagePtr& reply) {
     if (dispatchesHere()) {
-        dbus_pending_call_block(pending.get());
-    } else {
-        const ScopedRole answersRequests(receiving, nullptr);
-        Waiter waiter(Waiter::Goal::Completion, m_connection);
-        waiter.pending = pending.get();
-        waiter.interrupted = &interrupted;
-        waiter.leadsAlways = true;
-        dbus_pending_call_set_notify(waiter.pending, pendingCompleted, this, nullptr);
-        Lock lock(m_mutex);
-        wait(waiter, lock);
+        sent();
+        reply = callInsideDispatch(message);
+        return true;
     }
-    return takeReply(pending.get());
+    const ReceivingScope answersRequests(nullptr);
+    Waiter waiter(Waiter::Goal::Reply, m_connection);
+    waiter.interrupted = &interrupted;
+    waiter.leadsAlways = true;
+
+    Lock lock(m_mutex);
+    // The lead is taken before the call is sent: the receive thread would drop a request that
+    // comes at once.
+    join(waiter);
+    while (m_reading)
+        waiter.wake.wait_for(lock, longestWait);
+    const bool queued = dbus_connection_send(m_connection, message, &waiter.serial);
+    while (queued && dbus_connection_has_messages_to_send(m_connection) &&
+           lead(lock, longestWait, &waiter)) {
+    }
+    if (queued)
+        sent();
+    else
+        waiter.deadline = Clock::now();
+    wait(waiter, lock);
+    reply = std::move(waiter.reply);
+    return queued;
 }
 
+/// libdbus's dispatch cannot be entered twice: inside it only libdbus's own wait works, in which
+/// no requests are answered.
+MessagePtr BusLink::callInsideDispatch(DBusMessage* message) {
+    DBusPendingCall* begun = nullptr;
+    if (!dbus_connection_send_with_reply(m_connection, message, &begun, DBUS_TIMEOUT_INFINITE) ||
+        !begun)
+        return nullptr;
+    const PendingPtr pending(begun);
+    dbus_pending_call_block(begun);
+    return MessagePtr(dbus_pending_call_steal_reply(begun));
+}
+
+/// Waits until everything sent is written or the connection closes.
 void BusLink::flush() {
     if (!dbus_connection_has_messages_to_send(m_connection))
         return;
@@ -203,6 +237,7 @@ void BusLink::flush() {
     }
     Waiter waiter(Waiter::Goal::Output, m_connection);
     Lock lock(m_mutex);
+    join(waiter);
     wait(waiter, lock);
 }
 
@@ -215,31 +250,36 @@ bool BusLink::checkOpen() {
         Waiter waiter(Waiter::Goal::Disconnect, m_connection);
         waiter.deadline = Clock::now() + longestWait;
         Lock lock(m_mutex);
+        join(waiter);
         wait(waiter, lock);
     }
     return dbus_connection_get_is_connected(m_connection);
 }
 
-/// Returns when the waiter's goal is reached, its time is over or the connection is closed.
-void BusLink::wait(Waiter& waiter, Lock& lock) {
+void BusLink::join(Waiter& waiter) {
     m_waiters.push_back(&waiter);
     if (m_reading && (waiter.leadsAlways || dbus_connection_has_messages_to_send(m_connection)))
         wakeLeader();
-    while (!waiter.isFinished()) {
-        const auto now = Clock::now();
-        if (now >= waiter.deadline)
-            break;
-        const auto limit = std::min<Clock::duration>(longestWait, waiter.deadline - now);
-        if (!mayLead(waiter)) {
+}
+
+/// Returns when the waiter's goal is reached, its time is over or the connection is closed. The
+/// waiter has joined; afterwards it has left.
+void BusLink::wait(Waiter& waiter, Lock& lock) {
+    while (!waiter.isFinished() && !waiter.isOver()) {
+        const auto left = waiter.deadline - Clock::now();
+        const auto limit =
+            std::chrono::ceil<Milliseconds>(std::min<Clock::duration>(longestWait, left));
+        if (mayLead(waiter)) {
+            if (!lead(lock, limit, &waiter))
+                break;
+        } else {
             passLead();
-            waiter.wake.wait_for(lock, limit);
             waiter.woken = false;
-        } else if (!lead(lock, std::chrono::ceil<Milliseconds>(limit))) {
-            break;
+            waiter.wake.wait_for(lock, limit);
         }
     }
     m_waiters.erase(std::find(m_waiters.begin(), m_waiters.end(), &waiter));
-    if (waiter.goal == Waiter::Goal::Reply || waiter.goal == Waiter::Goal::Completion)
+    if (waiter.goal == Waiter::Goal::Reply)
         m_lastCall = Clock::now();
     passLead();
 }
@@ -252,24 +292,27 @@ bool BusLink::mayLead(const Waiter& waiter) const {
                         [](const Waiter* other) { return other->leadsAlways; });
 }
 
-/// One round as the leader. @return whether the connection is open
-bool BusLink::lead(Lock& lock, Milliseconds limit) {
+/// One round as the leader, for `waiter` or, with null, the receive thread.
+/// @return whether the connection is open
+bool BusLink::lead(Lock& lock, Milliseconds limit, const Waiter* waiter) {
     m_reading = true;
     lock.unlock();
-    const bool open = step(limit);
+    const bool open = step(limit, waiter);
     lock.lock();
     m_reading = false;
     wakeFinished();
     return open;
 }
 
-/// Waits for input, reads it and dispatches all of it. The mutex is not held.
-bool BusLink::step(Milliseconds limit) {
-    const ScopedRole role(leading, this);
+/// Waits for input, reads it and dispatches it. The mutex is not held.
+bool BusLink::step(Milliseconds limit, const Waiter* waiter) {
+    const LeadingScope scope(this);
     if (dbus_connection_get_dispatch_status(m_connection) != DBUS_DISPATCH_DATA_REMAINS)
         awaitInput(limit);
     const bool open = dbus_connection_read_write(m_connection, 0);
-    while (dbus_connection_dispatch(m_connection) == DBUS_DISPATCH_DATA_REMAINS) {
+    // What a handler's delay has left is for the next leader when this one has to go.
+    while (dbus_connection_dispatch(m_connection) == DBUS_DISPATCH_DATA_REMAINS &&
+           !(waiter ? waiter->isOver() : stopRequested.load())) {
     }
     return open;
 }
@@ -292,14 +335,15 @@ void BusLink::awaitInput(Milliseconds limit) {
 void BusLink::passLead() {
     if (m_reading)
         return;
-    Waiter* next = nullptr;
-    for (Waiter* waiter : m_waiters) {
-        if (!waiter->woken && (!next || waiter->leadsAlways))
-            next = waiter;
-    }
-    if (next) {
-        next->woken = true;
-        next->wake.notify_one();
+    const auto always = std::find_if(m_waiters.begin(), m_waiters.end(),
+                                     [](const Waiter* waiter) { return waiter->leadsAlways; });
+    const auto next = always != m_waiters.end()
+                          ? always
+                          : std::find_if(m_waiters.begin(), m_waiters.end(),
+                                         [](const Waiter* waiter) { return !waiter->woken; });
+    if (next != m_waiters.end()) {
+        (*next)->woken = true;
+        (*next)->wake.notify_one();
     } else if (m_waiters.empty() && m_receiverParked) {
         m_receiverWake.notify_one();
     }
@@ -319,7 +363,7 @@ void BusLink::wakeLeader() {
 }
 
 bool BusLink::dispatchesHere() const {
-    return leading == this || dispatching == this;
+    return LeadingScope::has(this) || m_ownDispatch.isHere();
 }
 
 void BusLink::addSubscription() {
@@ -335,7 +379,7 @@ void BusLink::removeSubscription() {
 }
 
 void BusLink::receive(Deliver deliver, void* context) {
-    const ScopedRole role(receiving, this);
+    const ReceivingScope scope(this);
     Lock lock(m_mutex);
     ++m_receivers;
     while (!stopRequested) {
@@ -360,7 +404,7 @@ void BusLink::receiveMore(Lock& lock) {
         m_receiverParked = sinceCall >= 2 * callBurst;
         m_receiverWake.wait_for(lock, m_receiverParked ? longestWait : callBurst);
         m_receiverParked = false;
-    } else if (!lead(lock, longestWait)) {
+    } else if (!lead(lock, longestWait, nullptr)) {
         passLead();
         m_receiverWake.wait_for(lock, longestWait); // closed: nothing will come
     } else {
@@ -371,17 +415,22 @@ void BusLink::receiveMore(Lock& lock) {
 /// Runs on the thread that dispatches; never calls the program's callbacks.
 DBusHandlerResult BusLink::filter(DBusConnection*, DBusMessage* message, void* data) {
     auto* link = static_cast<BusLink*>(data);
-    if (leading != link)
-        dispatching = link; // by the program's own main loop, in which this thread's calls may be
+    const DBusHandlerResult result = link->sort(message);
+    if (result == DBUS_HANDLER_RESULT_NOT_YET_HANDLED && !LeadingScope::has(link))
+        link->m_ownDispatch.mark(message); // the program's handlers come next
+    return result;
+}
+
+DBusHandlerResult BusLink::sort(DBusMessage* message) {
     switch (dbus_message_get_type(message)) {
     case DBUS_MESSAGE_TYPE_METHOD_CALL:
         // The receive thread serves no objects: a request that it takes is not answered.
-        return receiving == link ? DBUS_HANDLER_RESULT_HANDLED
+        return receiving == this ? DBUS_HANDLER_RESULT_HANDLED
                                  : DBUS_HANDLER_RESULT_NOT_YET_HANDLED;
     case DBUS_MESSAGE_TYPE_SIGNAL:
-        return link->keepSignal(message);
+        return keepSignal(message);
     default:
-        return link->giveReply(message);
+        return giveReply(message);
     }
 }
 
@@ -393,10 +442,10 @@ DBusHandlerResult BusLink::giveReply(DBusMessage* message) {
         std::find_if(m_waiters.begin(), m_waiters.end(), [serial](const Waiter* candidate) {
             return candidate->goal == Waiter::Goal::Reply && candidate->serial == serial;
         });
-    if (waiter == m_waiters.end())
+    if (waiter == m_waiters.end() || serial == 0)
         return DBUS_HANDLER_RESULT_NOT_YET_HANDLED;
     (*waiter)->reply.reset(dbus_message_ref(message));
-    if (leading != this)
+    if (!LeadingScope::has(this))
         wakeLeader();
     return DBUS_HANDLER_RESULT_HANDLED;
 }
@@ -405,27 +454,22 @@ DBusHandlerResult BusLink::keepSignal(DBusMessage* message) {
     const Lock lock(m_mutex);
     if ((m_receivers == 0 && m_subscriptions == 0) || stopRequested)
         return DBUS_HANDLER_RESULT_NOT_YET_HANDLED;
-    try {
-        m_inbox.emplace_back(dbus_message_ref(message));
-    } catch (const std::bad_alloc&) {
-        dbus_message_unref(message);
-        return DBUS_HANDLER_RESULT_NEED_MEMORY;
-    }
-    m_receiverWake.notify_one();
-    if (leading != this)
-        wakeLeader(); // the receive thread may be waiting for the socket
     // Without a receive thread the signal may be meant for handlers of the program as well, and
     // libdbus itself has to see the end of the connection.
     const bool keptFromOthers =
         m_receivers > 0 && !dbus_message_is_signal(message, DBUS_INTERFACE_LOCAL, "Disconnected");
+    MessagePtr kept(keptFromOthers ? dbus_message_ref(message) : dbus_message_copy(message));
+    if (!kept)
+        return DBUS_HANDLER_RESULT_NEED_MEMORY;
+    try {
+        m_inbox.push_back(std::move(kept));
+    } catch (const std::bad_alloc&) {
+        return DBUS_HANDLER_RESULT_NEED_MEMORY;
+    }
+    m_receiverWake.notify_one();
+    if (!LeadingScope::has(this))
+        wakeLeader(); // the receive thread may be waiting for the socket
     return keptFromOthers ? DBUS_HANDLER_RESULT_HANDLED : DBUS_HANDLER_RESULT_NOT_YET_HANDLED;
-}
-
-/// Only the link is touched: whoever waits for the reply may have left already.
-void BusLink::pendingCompleted(DBusPendingCall*, void* data) {
-    auto* link = static_cast<BusLink*>(data);
-    if (leading != link)
-        link->wakeLeader();
 }
 
 } // namespace Bluetooth

@@ -2,6 +2,7 @@
 #define KESBLUETOOTH_CORE_BUS_LINK_H
 
 #include "core/dbus_ptr.h"
+#include "core/own_dispatch.h"
 
 #include <dbus/dbus.h>
 
@@ -19,8 +20,8 @@ namespace Bluetooth {
 /// One thread at a time leads: it waits for the socket outside libdbus, reads and dispatches.
 /// Every other thread that waits for a reply sleeps until the leader has dispatched it, or takes
 /// the lead. A filter sorts what is dispatched: signals go to an inbox that the receive thread
-/// empties in order, replies go to the calls that wait for them. So no thread can take another's reply,
-/// and no thread waits inside libdbus while others need the connection.
+/// empties in order, replies go to the calls that wait for them. So no thread can take another's
+/// reply, and no thread waits inside libdbus while others need the connection.
 ///
 /// The receive thread leads when nobody calls. While calls are made, and shortly after, it leaves
 /// the lead to the callers, which saves a change of threads in every call.
@@ -40,21 +41,19 @@ public:
     /// @return the reply; null with `error` set, also when the reply is a D-Bus error
     MessagePtr call(DBusMessage* message, int timeoutMs, DBusError& error);
 
-    /// Sends a message that gets no reply and waits until it is written.
+    /// Sends a message that gets no reply and waits until it is written, without a time limit.
     /// @return false when the connection is closed or refuses it
     bool send(DBusMessage* message);
 
-    /// Begins a method call that has no time limit. @return false without memory; `pending` stays
-    /// null when the connection is closed
-    bool begin(DBusMessage* message, PendingPtr& pending);
-
-    /// Leads until the call is answered, `interrupted` is set or the connection closes. Requests
-    /// to objects of this process are answered meanwhile, on this thread.
-    /// @return the reply, a D-Bus error among them; null when none came, and none will any more
-    MessagePtr finish(PendingPtr pending, const std::atomic<bool>& interrupted);
-
-    /// Waits until everything sent is written or the connection closes.
-    void flush();
+    /// Sends a method call and waits for its reply without a time limit, as the leader all the
+    /// while: requests to objects of this process are answered on this thread.
+    /// @param interrupted ends the wait when it is set
+    /// @param sent        called when the call has been written, before the wait
+    /// @param reply       receives the reply, a D-Bus error among them; null when none came, and
+    ///                    none will any more
+    /// @return false when the call could not be sent for want of memory
+    bool converse(DBusMessage* message, const std::atomic<bool>& interrupted, void (*sent)(),
+                  MessagePtr& reply);
 
     /// Signals are kept for the receive thread while there are subscriptions, even before it runs.
     void addSubscription();
@@ -80,29 +79,34 @@ private:
     ~BusLink();
     bool attach();
 
+    void join(Waiter& waiter);
     void wait(Waiter& waiter, Lock& lock);
     bool mayLead(const Waiter& waiter) const;
-    bool lead(Lock& lock, Milliseconds limit);
-    bool step(Milliseconds limit);
+    bool lead(Lock& lock, Milliseconds limit, const Waiter* waiter);
+    bool step(Milliseconds limit, const Waiter* waiter);
     void awaitInput(Milliseconds limit);
+    void flush();
     void passLead();
     void wakeFinished();
     void wakeLeader();
     void receiveMore(Lock& lock);
     bool dispatchesHere() const;
+    void setNoReply(DBusError& error) const;
+    MessagePtr callInsideDispatch(DBusMessage* message);
 
     static DBusHandlerResult filter(DBusConnection*, DBusMessage* message, void* link);
+    DBusHandlerResult sort(DBusMessage* message);
     DBusHandlerResult keepSignal(DBusMessage* message);
     DBusHandlerResult giveReply(DBusMessage* message);
-    static void pendingCompleted(DBusPendingCall*, void* link);
 
     static std::atomic<bool> stopRequested;
 
     DBusConnection* const m_connection; // not referenced: the link is the connection's data
     int m_wakeFd = -1;                  // interrupts the leader's wait for the socket
+    OwnDispatch m_ownDispatch;
 
-    // Guards what follows. Not held while waiting for the socket, in libdbus's I/O and dispatch, or
-    // in callbacks; libdbus's own locks may be taken under it.
+    // Guards what follows. Not held while waiting for the socket, in reading and dispatching, or in
+    // callbacks. libdbus's own locks may be taken under it, and a call is sent under it.
     std::mutex m_mutex;
     bool m_reading = false; // some thread leads
     std::vector<Waiter*> m_waiters;

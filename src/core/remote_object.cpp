@@ -150,14 +150,11 @@ int RemoteObject::sendMessagePending() {
     MessagePtr(std::exchange(m_reply, nullptr)).reset();
     BusLink* link = BusLink::of(m_connection);
 
-    PendingPtr pending;
-    const bool sent = message && link && link->begin(message.get(), pending);
-    if (sent) {
-        link->flush();
-        installInterruptHandlers();
-        if (MessagePtr reply = link->finish(std::move(pending), interrupted))
-            setReplyMessage(reply.release());
-    }
+    MessagePtr reply;
+    const bool sent = message && link &&
+                      link->converse(message.get(), interrupted, installInterruptHandlers, reply);
+    if (reply)
+        setReplyMessage(reply.release());
     interrupted = false;
     return sent ? 0 : recordError(errorDBus, "");
 }

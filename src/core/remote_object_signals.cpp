@@ -301,7 +301,11 @@ void RemoteObject::dispatch(void* proxy, DBusMessage* message) {
 }
 
 int RemoteObject::startLoop() {
-    return pthread_create(&m_loopThread, nullptr, receiveSignal, this);
+    pthread_t thread = 0;
+    const int error = pthread_create(&thread, nullptr, receiveSignal, this);
+    if (error == 0)
+        m_loopThread = thread;
+    return error;
 }
 
 void RemoteObject::stopLoop() {

@@ -75,7 +75,21 @@ TEST_F(OwnDispatchTest, HandlersOfTheProgramMayCall) {
     ASSERT_TRUE(answer);
     EXPECT_EQ(argumentsOf(answer.get()), "s:answer");
     EXPECT_TRUE(peer.waitForCalls("Take", 1));
-    EXPECT_EQ(call("Ask"), 0); // on the same thread, outside its dispatch
+    // On the same thread, outside its dispatch, requests are answered while a call waits.
+    peer.handle("Pair", [this](DBusMessage* pair) {
+        MessagePtr request(dbus_message_new_method_call(proxy.getConnectionName(), "/object",
+                                                        "com.example.Object", "Do"));
+        peer.send(std::move(request));
+        return MessagePtr(dbus_message_new_method_return(pair));
+    });
+    bool asked = false;
+    onRequest() = [&asked] {
+        asked = true;
+        return std::string();
+    };
+    ASSERT_EQ(proxy.newMessage("Pair"), 0);
+    EXPECT_EQ(proxy.sendMessagePending(), 0);
+    EXPECT_TRUE(asked);
 }
 
 TEST_F(OwnDispatchTest, CallsAndSignalsOfOtherThreadsAreNotLostToIt) {

@@ -68,6 +68,19 @@ protected:
                          timeout);
     }
 
+    /// Pair asks the agent at once, `count` times, and is answered right after that.
+    void pairAsks(int count) {
+        peer.handle("Pair", [this, count](DBusMessage* pair) {
+            for (int i = 0; i < count; ++i) {
+                MessagePtr request(dbus_message_new_method_call(
+                    proxy.getConnectionName(), agentPath, "com.example.Agent", "Ask"));
+                dbus_message_set_no_reply(request.get(), true);
+                peer.send(std::move(request));
+            }
+            return MessagePtr(dbus_message_new_method_return(pair));
+        });
+    }
+
     RemoteObject loop{peerName, "/loop", "com.example.Loop", busType};
 };
 
@@ -206,6 +219,34 @@ TEST_F(PendingTest, RequestsAreServedOnTheWaitingThreadWhileTheReceiveThreadDeli
     EXPECT_EQ(served().events(), std::vector<std::thread::id>(20, self));
     for (const std::thread::id& thread : delivered.events())
         EXPECT_NE(thread, self);
+}
+
+TEST_F(PendingTest, ARequestThatComesAtOnceIsNotLeftToTheReceiveThread) {
+    serveAgent();
+    const ReceiveLoop running(loop);
+    pairAsks(1);
+    constexpr int rounds = 300;
+    for (int i = 0; i < rounds; ++i)
+        ASSERT_EQ(callPending("Pair"), 0);
+    EXPECT_EQ(served().count(), static_cast<std::size_t>(rounds));
+}
+
+TEST_F(PendingTest, AnInterruptionLeavesTheRequestsThatAreStillQueued) {
+    static const DBusObjectPathVTable interrupting = [] {
+        DBusObjectPathVTable table{};
+        table.message_function = [](DBusConnection* connection, DBusMessage* request, void* data) {
+            raise(SIGINT);
+            return serve(connection, request, data);
+        };
+        return table;
+    }();
+    served().clear();
+    ASSERT_TRUE(dbus_connection_register_object_path(proxy.getConnection(), agentPath,
+                                                     &interrupting, nullptr));
+    pairAsks(3);
+    ASSERT_EQ(callPending("Pair"), 0);
+    expectNoReply();
+    EXPECT_EQ(served().count(), 1u);
 }
 
 TEST_F(PendingTest, RequestsThatTheReceiveThreadReadsStayUnanswered) {
