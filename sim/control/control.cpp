@@ -49,7 +49,7 @@ Settings settingsOf(const CallPtr& call, gsize index) {
 /// A variant argument as a message body: a tuple or an av (which may be empty, as a tuple on D-Bus
 /// may not) holds all arguments, anything else is the only one.
 Value bodyOf(const CallPtr& call, gsize index) {
-    const Value content = call->content(index);
+    Value content = call->content(index);
     if (g_variant_is_of_type(content.get(), G_VARIANT_TYPE_TUPLE))
         return content;
     if (!content.is("av"))

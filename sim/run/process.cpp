@@ -12,8 +12,6 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
-extern char** environ;
-
 namespace Bluetooth::Sim {
 
 std::vector<char*> cStrings(const std::vector<std::string>& texts) {

@@ -128,7 +128,7 @@ std::string SimClient::call(const std::string& path, const std::string& method,
 }
 
 std::string SimClient::control(const std::string& method, const std::string& arguments) {
-    const std::string answer = call("", std::string(controlName) + "." + method, arguments);
+    std::string answer = call("", std::string(controlName) + "." + method, arguments);
     EXPECT_TRUE(begins(answer, "reply")) << method << arguments << ": " << answer;
     return answer;
 }
@@ -214,7 +214,7 @@ std::string SimClient::describe(GDBusMessage* message) {
         const char* name = nullptr;
         GVariant* value = nullptr;
         g_variant_get(body, "(&sv)", &name, &value);
-        const std::string line = path + " " + name + "=" + print(value);
+        std::string line = path + " " + name + "=" + print(value);
         g_variant_unref(value);
         return line;
     }
