@@ -205,7 +205,7 @@ one run, their repetitions mixed in random order. Times are medians in microseco
 that kesbluetooth takes 0.90 times as long as the library of that column. Raw libdbus is the limit:
 it looks at each value and keeps none. Unless a heading says otherwise, all processes share one
 processor, so that a time is the work done for it; with more, it depends as well on where the
-scheduler puts whom.
+scheduler puts whom and on what else the machine does.
 
 ![Times relative to raw libdbus](performance.svg)
 

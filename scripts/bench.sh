@@ -6,7 +6,7 @@
 # BENCH_FOLDER names another build folder than build-bench.
 source "$(dirname "$0")/lib.sh"
 
-rounds=5 repetitions=30 lists=5 signals=5 idle=20 shortest=0.1 scanner=15
+rounds=3 repetitions=30 lists=20 signals=3 idle=20 shortest=0.1 scanner=15
 folder=${BENCH_FOLDER:-$root/build-bench} results=$root/docs
 case "${1:-}" in
 --quick) rounds=1 repetitions=3 lists=1 signals=1 idle=1 shortest=0.005 scanner=1 results=$folder ;;
@@ -23,18 +23,21 @@ raw=$folder/results
 rm -rf "$raw"
 mkdir -p "$raw"
 
-# What else the machine does should count as little as can be had.
-lift=()
-[ "$(id -u)" -eq 0 ] && lift=(nice -n -10)
 # On one processor a figure is the work that all take part in; on all of them it holds as well what
-# the scheduler makes of it, which varies far more.
+# the scheduler makes of it, which varies far more. What else the machine does should count as
+# little as can be had.
 one=(taskset -c "$(taskset -cp $$ | sed 's/.*[^0-9]//')")
+all=(env)
+if chrt -f 1 true 2>/dev/null; then
+    one+=(chrt -f 1)
+    all=(nice -n -10)
+fi
 
 # measure NAME RESULT [option...]: runs a benchmark, its repetitions in random order.
 measure() {
     local name=$1 result=$raw/$2.json
     shift 2
-    "${lift[@]}" "$@" --benchmark_enable_random_interleaving \
+    "$@" --benchmark_enable_random_interleaving \
         --benchmark_out="$result" >"$raw/output" 2>&1 ||
         { cat "$raw/output" >&2; die "$name failed; its output is above"; }
     ! grep -q '"error_occurred": true' "$result" || die "$name reports an error; see $result"
@@ -44,13 +47,13 @@ bench=$folder/bench/kesbluetooth-bench
 for ((round = 1; round <= rounds; ++round)); do
     echo "Measuring, round $round of $rounds ..."
     measure calls "one.call.$round" "${one[@]}" "$bench-call" --benchmark_repetitions=$repetitions
-    measure calls "all.call.$round" "$bench-call" --benchmark_repetitions=$repetitions
+    measure calls "all.call.$round" "${all[@]}" "$bench-call" --benchmark_repetitions=$repetitions
     measure lists "one.list.$round" "${one[@]}" "$bench-list" --benchmark_repetitions=$lists
     measure signals "one.signal.$round" "${one[@]}" "$bench-signal" \
         --benchmark_repetitions=$signals --benchmark_filter='^(signal|call)/'
-    measure signals "all.signal.$round" "$bench-signal" \
+    measure signals "all.signal.$round" "${all[@]}" "$bench-signal" \
         --benchmark_repetitions=$signals --benchmark_filter='^(signal|call)/'
-    measure data "one.data.$round" "${one[@]}" "$bench-data" --benchmark_min_time=$shortest
+    measure data "one.data.$round" "${all[@]}" "$bench-data" --benchmark_min_time=$shortest
 done
 echo "Measuring idle threads ..."
 for library in kesbluetooth sdbus-c++ GDBus; do
