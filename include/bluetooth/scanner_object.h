@@ -44,7 +44,7 @@ struct KESBLUETOOTH_API ScannerObject {
     /// Gives the finder of an adapter, made by addFinder() when there is none.
     /// @param path the adapter's object path
     /// @return the set as addFinder() describes it, or null
-    AddressSet* getListByName(std::string path);
+    AddressSet* getListByName(const std::string& path);
 };
 
 KESBLUETOOTH_API GType scanner_object_get_type();

@@ -62,7 +62,7 @@ AddressSet* ScannerObject::addFinder(const char* adapterId) {
     return server && adapterId ? Finders(*server, *this).add(adapterId).get() : nullptr;
 }
 
-AddressSet* ScannerObject::getListByName(std::string path) {
+AddressSet* ScannerObject::getListByName(const std::string& path) {
     ScannerServer* server = currentServer();
     return server ? Finders(*server, *this).of(path).get() : nullptr;
 }

@@ -36,7 +36,7 @@ Present=false
 std::string textOf(DBusMessage* reply) {
     if (!reply)
         return "NO REPLY";
-    const std::string arguments = argumentsOf(reply);
+    std::string arguments = argumentsOf(reply);
     if (dbus_message_get_type(reply) != DBUS_MESSAGE_TYPE_ERROR)
         return arguments;
     return "ERROR " + arguments.substr(std::string("s:").size());

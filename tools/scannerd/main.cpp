@@ -9,8 +9,8 @@
 
 #include <atomic>
 #include <csignal>
-#include <cstdio>
 #include <cstdlib>
+#include <iostream>
 #include <string>
 
 namespace {
@@ -22,7 +22,7 @@ constexpr const char* PROGRAM = "kesbt-scannerd";
 constexpr int WRONG_USAGE = 2;
 
 int fail(const std::string& problem) {
-    fprintf(stderr, "%s: %s\n", PROGRAM, problem.c_str());
+    std::cerr << PROGRAM << ": " << problem << std::endl;
     syslog(LOG_ERR, "%s", problem.c_str());
     return EXIT_FAILURE;
 }
