@@ -60,6 +60,12 @@ TEST(Usage, ResultsThatCannotBeWrittenAreAFailure) {
                       "standard output goes\n"}));
 }
 
+TEST(Usage, ResultsGoNowhereElseWhenStandardOutputIsClosed) {
+    const PrivateBus bus(PrivateBus::Kind::System);
+    EXPECT_EQ(runCommand({"sh", "-c", std::string(KESBT) + " names >&-"}),
+              (Result{1, "", "standard output is closed; give results somewhere to go\n"}));
+}
+
 TEST(Usage, WithoutASystemBusTheLineSaysSo) {
     PrivateBus::address(PrivateBus::Kind::System); // where none runs
     for (const Arguments& arguments :

@@ -6,6 +6,8 @@
 #include "base/verb.h"
 
 #include <dbus/dbus.h>
+#include <fcntl.h>
+#include <unistd.h>
 
 #include <iostream>
 #include <sstream>
@@ -77,6 +79,17 @@ Failure usageFailure(const CLI::App& program, const CLI::ParseError& error) {
     return wrongUsage(printable(what) + "; see: " + command + " --help");
 }
 
+/// A closed standard descriptor would be taken by the next socket, and results be written there.
+void checkDescriptors() {
+    for (const int standard : {STDIN_FILENO, STDOUT_FILENO, STDERR_FILENO}) {
+        if (fcntl(standard, F_GETFD) >= 0)
+            continue;
+        const int opened = open("/dev/null", O_RDWR); // the lowest free one
+        if (standard == STDOUT_FILENO || opened < 0)
+            throw Failure("standard output is closed; give results somewhere to go");
+    }
+}
+
 int run(int argc, char** argv) {
     Options options;
     CLI::App program("Works with Bluetooth through bluetoothd (BlueZ 4).", "kesbt");
@@ -106,6 +119,7 @@ int main(int argc, char** argv) {
     // Without this libdbus ignores SIGPIPE, and "kesbt monitor | head" would not end.
     dbus_connection_set_change_sigpipe(false);
     try {
+        Kesbt::checkDescriptors();
         return Kesbt::run(argc, argv);
     } catch (const Kesbt::Failure& failure) {
         std::cout.flush();

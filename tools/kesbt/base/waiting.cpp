@@ -15,12 +15,18 @@ namespace Kesbt {
 
 namespace {
 
-int openSignals() {
+/// @return what was blocked or unblocked
+sigset_t mask(int how) {
     sigset_t signals;
     sigemptyset(&signals);
     sigaddset(&signals, SIGINT);
     sigaddset(&signals, SIGTERM);
-    pthread_sigmask(SIG_BLOCK, &signals, nullptr);
+    pthread_sigmask(how, &signals, nullptr);
+    return signals;
+}
+
+int openSignals() {
+    const sigset_t signals = mask(SIG_BLOCK);
     return signalfd(-1, &signals, SFD_CLOEXEC | SFD_NONBLOCK);
 }
 
@@ -40,6 +46,12 @@ Descriptor::~Descriptor() {
 }
 
 Interrupt::Interrupt() : m_descriptor(openSignals()) {}
+
+Interrupt::~Interrupt() {
+    while (take()) { // what has come is dealt with: it must not end the program now
+    }
+    mask(SIG_UNBLOCK);
+}
 
 bool Interrupt::take() {
     signalfd_siginfo signal{};

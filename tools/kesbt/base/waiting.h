@@ -26,11 +26,14 @@ private:
     int m_fd;
 };
 
-/// Makes SIGINT and SIGTERM something to wait for instead of the program's end. Threads that are
-/// started later do not see the signals either.
+/// Makes SIGINT and SIGTERM something to wait for instead of the program's end, while it lives.
+/// Threads that are started meanwhile do not see the signals either.
 class Interrupt {
 public:
     Interrupt();
+    ~Interrupt();
+    Interrupt(const Interrupt&) = delete;
+    Interrupt& operator=(const Interrupt&) = delete;
     int fd() const { return m_descriptor.fd(); }
     /// Whether a signal has come since the last call.
     bool take();

@@ -1,13 +1,30 @@
 #include "base/bluez.h"
 #include "base/verb.h"
+#include "base/waiting.h"
 
+#include <bluetooth/audio.h>
 #include <bluetooth/control.h>
 
+#include <algorithm>
 #include <iostream>
 
 namespace Kesbt {
 
 namespace {
+
+/// A headset connects its remote control some seconds after its audio.
+bool awaitConnection(const Options& options, Bluetooth::Control& control) {
+    constexpr std::chrono::milliseconds longest{5000};
+    const auto isConnected = [&control] {
+        return readProperties(control).value("Connected", false);
+    };
+    if (isConnected())
+        return true;
+    const std::unique_ptr<Bluetooth::Audio> audio(Bluetooth::Audio::getAudio(control.getPath()));
+    const Json state = audio ? readOptional(*audio) : Json();
+    const bool isComing = state.is_object() && state.value("State", "") != "disconnected";
+    return isComing && waitUntil(isConnected, std::min(options.timeLimit(), longest));
+}
 
 void changeVolume(const Options& options, const std::string& address, bool up) {
     const auto device = openDevice(options, address);
@@ -15,11 +32,10 @@ void changeVolume(const Options& options, const std::string& address, bool up) {
         Bluetooth::Control::getControl(device->getPath()));
     if (!control)
         throw daemonLost();
-    const Json properties = readOptional(*control);
-    if (properties.is_null())
+    if (readOptional(*control).is_null())
         throw Failure(address + " has no remote control; see what it has: kesbt services " +
                       address);
-    if (!properties.value("Connected", false))
+    if (!awaitConnection(options, *control))
         throw Failure("the remote control of " + address +
                       " is not connected; connect it first: kesbt audio connect " + address);
 
