@@ -129,8 +129,8 @@ void appendEntries(Arguments& dict, unsigned int count) {
 void appendDevices(Arguments& array, unsigned int count) {
     char path[64];
     for (unsigned int i = 0; i < count; ++i) {
-        std::snprintf(path, sizeof path, "/org/bluez/1/hci0/dev_00_11_22_33_%02X_%02X", i / 256,
-                      i % 256);
+        (void)std::snprintf(path, sizeof path, "/org/bluez/1/hci0/dev_00_11_22_33_%02X_%02X",
+                            i / 256, i % 256);
         array.path(path);
     }
 }
@@ -232,7 +232,7 @@ private:
 
 int main(int argc, char** argv) {
     if (argc != 2) {
-        std::fputs("usage: kesbluetooth-bench-peer BUS-ADDRESS\n", stderr);
+        (void)std::fputs("usage: kesbluetooth-bench-peer BUS-ADDRESS\n", stderr);
         return 2;
     }
     prctl(PR_SET_TIMERSLACK, 1UL);
@@ -240,11 +240,11 @@ int main(int argc, char** argv) {
     DBusConnection* connection = dbus_connection_open_private(argv[1], error);
     if (!connection || !dbus_bus_register(connection, error) ||
         dbus_bus_request_name(connection, Bench::peerName, 0, error) < 0) {
-        std::fprintf(stderr, "%s: %s\n", argv[1], error.message());
+        (void)std::fprintf(stderr, "%s: %s\n", argv[1], error.message());
         return 1;
     }
-    std::puts("ready");
-    std::fflush(stdout);
+    (void)std::puts("ready");
+    (void)std::fflush(stdout);
     Peer(connection).serve();
     return 0;
 }

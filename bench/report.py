@@ -212,6 +212,10 @@ scheduler puts whom and on what else the machine does.
 ## Goals
 
 {goals(figures)}
+Where sdbus-c++ is ahead it is ahead of raw libdbus too: libdbus reads and checks a small reply with
+some 15,000 instructions, which is what sd-bus takes for the whole call. Of the 29,000 that a call
+takes with kesbluetooth (59,000 with raw libdbus), all but 2,000 are libdbus's.
+
 ## Blocking calls
 
 {compared(figures, one, CALLS, LIBRARIES, "reply")}
@@ -264,7 +268,7 @@ BARS = CALLS + SIGNALS[:1] + [("decode/15", "decoding 15 entries"), ("list/100",
 
 def chart(figures):
     """Bars of each library's time relative to raw libdbus's."""
-    left, width, bar, longest = 250, 820, 13, 4.0
+    left, width, bar, longest = 290, 860, 13, 4.0
     scale = (width - left - 70) / longest
     parts, y = [], 40
     for case, text in BARS:
