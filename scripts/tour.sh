@@ -1,22 +1,65 @@
 #!/usr/bin/env bash
-# The tour that try.sh shows. It expects the programs in PATH.
+# The tour that try.sh shows. It expects the programs in PATH, and is run in a mount namespace of
+# its own where that is possible: what it writes to /etc and /tmp is then seen by nobody else.
 set -euo pipefail
 
+# The simulated adapters' hciconfig stands in /usr/bin, and /etc and /tmp can be written.
+if [ "${1:-}" = isolated ]; then
+    layer=$(mktemp -d)
+    mount -t tmpfs tmpfs "$layer"
+    mkdir "$layer"/{etc,etc-work,tmp,tmp-work}
+    mount -t overlay overlay -o "lowerdir=$KES_TOUR_HCICONFIG:/usr/bin" /usr/bin
+    mount -t overlay overlay -o "lowerdir=/etc,upperdir=$layer/etc,workdir=$layer/etc-work" /etc
+    mount -t overlay overlay -o "lowerdir=/tmp,upperdir=$layer/tmp,workdir=$layer/tmp-work" /tmp
+    mkdir -p /etc/bluetooth
+    export KES_TOUR_ISOLATED=1
+    shift
+fi
 if [ "${1:-}" != inside ]; then
-    if [ -n "${KES_TOUR_HCICONFIG:-}" ]; then
-        mount -t overlay overlay -o "lowerdir=$KES_TOUR_HCICONFIG:/usr/bin" /usr/bin 2>/dev/null || true
-    fi
-    exec bluez4-sim -- "$0" inside
+    exec bluez4-sim ${KES_TOUR_SERVICES:+--session-services="$KES_TOUR_SERVICES"} -- "$0" inside
 fi
 
 headset=00:11:22:33:44:01
+phone=00:11:22:33:44:03
+receiver=00:11:22:33:44:04
 bold='' plain=''
 [ -t 1 ] && bold=$'\033[1m' plain=$'\033[0m'
 
 say() { printf '\n%s# %s%s\n' "$bold" "$*" "$plain"; }
+show() { printf '%s$ %s%s\n' "$bold" "$*" "$plain"; }
 run() {
-    printf '%s$ %s%s\n' "$bold" "$*" "$plain"
+    show "$@"
     "$@"
+}
+background=()
+stop_all() {
+    for pid in "${background[@]}"; do kill -INT "$pid" 2>/dev/null || true; done
+    for pid in "${background[@]}"; do wait "$pid" || true; done
+    background=()
+}
+trap stop_all EXIT
+# start PROGRAM...: runs it beside the tour, until stop_all. A shell's background jobs ignore Ctrl-C.
+start() {
+    show "$* &"
+    env --default-signal=INT "$@" &
+    background+=($!)
+}
+sink_connected() {
+    local try
+    for try in {1..50}; do
+        kesbt audio status "$headset" | grep -q 'Sink *State=connected' && return
+        sleep 0.2
+    done
+}
+scannerd_pid() {
+    gdbus call --session --dest org.freedesktop.DBus --object-path /org/freedesktop/DBus \
+        --method org.freedesktop.DBus.GetConnectionUnixProcessID com.kestrine.bluetooth |
+        sed 's/[^ ]* \([0-9]*\).*/\1/'
+}
+headset_in_range() {
+    gdbus call --address "$DBUS_SYSTEM_BUS_ADDRESS" --dest com.kestrine.bluetooth.Sim \
+        --object-path /com/kestrine/bluetooth/Sim \
+        --method com.kestrine.bluetooth.Sim.SetDevice "$headset" "{'Present': <$1>}" >/dev/null
 }
 
 say "The adapters of this host"
@@ -24,7 +67,7 @@ run kesbt adapters
 run kesbt adapter
 
 say "What is in reach"
-run kesbt discover --seconds 5
+run kesbt discover --seconds 3
 run kesbt devices
 
 say "A headset becomes known, and tells its services"
@@ -32,13 +75,39 @@ run kesbt create "$headset"
 run kesbt services "$headset"
 
 say "Its audio is connected; the signals are shown as they come"
-kesbt monitor &
-monitor=$!
-trap 'kill -INT $monitor 2>/dev/null || true' EXIT
+start kesbt monitor
 run kesbt audio connect "$headset"
 run kesbt audio status "$headset"
 run kesbt volume up "$headset"
-kill -INT "$monitor"
-wait "$monitor" || true
+run kesbt audio disconnect "$headset"
+stop_all
 
-say "That was the tour; docs/ tells more"
+say "Pairing: an old device wants a PIN, a phone shows a passkey to confirm"
+run kesbt pair "$receiver" --pin 1234
+run kesbt pair "$phone"
+run kesbt devices
+
+say "Two programs share one scan; the first question starts the scanner daemon"
+start kesbt scan watch
+run kesbt scan list
+run kesbt wait found 00:11:22:33:44:08
+run kesbt scan list
+stop_all
+run kesbt scan stop
+kill "$(scannerd_pid)" # it would end by itself half a minute after its last new scan
+
+if [ -n "${KES_TOUR_ISOLATED:-}" ]; then
+    say "The headset is to be connected by itself whenever it appears"
+    headset_in_range false
+    run kesbt autoconnect add "$headset"
+    run kesbt autoconnect enable
+    run kesbt autoconnect show
+    start kesbt-autoconnectd --foreground --pid-file /tmp/autoconnectd.pid --interval 1
+    printf '... the headset is switched on\n'
+    headset_in_range true
+    sink_connected
+    run kesbt audio status "$headset"
+    stop_all
+fi
+
+say "That was the tour; README.md and docs/ tell more"

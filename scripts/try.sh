@@ -6,12 +6,19 @@ need_packages "${build_packages[@]}"
 echo "Building in build ..."
 build "$root/build"
 
-# The tour runs where the simulated adapters' hciconfig stands in /usr/bin; only it sees that.
+for program in kesbt scannerd autoconnectd; do
+    PATH=$root/build/tools/$program:$PATH
+done
+export PATH=$root/build/sim:$PATH
+export KES_TOUR_HCICONFIG=$root/sim/bin KES_TOUR_SERVICES=$root/build/tour-services
+mkdir -p "$KES_TOUR_SERVICES"
+printf '[D-BUS Service]\nName=com.kestrine.bluetooth\nExec=%s\n' \
+    "$root/build/tools/scannerd/kesbt-scannerd" >"$KES_TOUR_SERVICES/com.kestrine.bluetooth.service"
+
 enter=(unshare --mount)
 [ "$(id -u)" -eq 0 ] || enter=(unshare --user --map-root-user --mount)
-export PATH=$root/build/tools/kesbt:$root/build/tools/scannerd:$root/build/tools/autoconnectd:$root/build/sim:$PATH
-export KES_TOUR_HCICONFIG=$root/sim/bin
 if "${enter[@]}" true 2>/dev/null; then
-    exec "${enter[@]}" "$root/scripts/tour.sh"
+    exec "${enter[@]}" "$root/scripts/tour.sh" isolated
 fi
-exec "$root/scripts/tour.sh" # without namespaces: the HCI version stays empty
+echo "Without namespaces: no HCI versions, and no auto-connect, which writes to /etc."
+exec "$root/scripts/tour.sh"
