@@ -149,6 +149,7 @@ MessagePtr BusLink::call(DBusMessage* message, int timeoutMs, DBusError& error) 
         // error message for each beforehand. Locked from here on, so that the filter finds the
         // waiter however soon the reply comes; sending neither dispatches nor waits.
         Lock lock(m_mutex);
+        m_waiters.reserve(m_waiters.size() + 1); // nothing is thrown once the call is on its way
         if (!dbus_connection_send(m_connection, message, &waiter.serial)) {
             dbus_set_error_const(&error, DBUS_ERROR_NO_MEMORY, "Not enough memory");
             return nullptr;
@@ -372,10 +373,15 @@ void BusLink::addSubscription() {
 }
 
 void BusLink::removeSubscription() {
-    std::deque<MessagePtr> unwanted;
-    const Lock lock(m_mutex);
-    if (--m_subscriptions == 0 && m_receivers == 0)
-        unwanted.swap(m_inbox);
+    Lock lock(m_mutex);
+    --m_subscriptions;
+    while (m_subscriptions == 0 && m_receivers == 0 && !m_inbox.empty()) {
+        MessagePtr unwanted = std::move(m_inbox.front()); // one by one: another deque takes memory
+        m_inbox.pop_front();
+        lock.unlock();
+        unwanted.reset();
+        lock.lock();
+    }
 }
 
 void BusLink::receive(Deliver deliver, void* context) {

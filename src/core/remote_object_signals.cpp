@@ -10,6 +10,7 @@
 #include <cerrno>
 #include <condition_variable>
 #include <mutex>
+#include <new>
 #include <thread>
 
 namespace Bluetooth {
@@ -41,6 +42,48 @@ Guard& guard() {
 template <class Callback>
 int walkers = 0;
 
+/// One thread's walk. The guard is held when it begins and ends.
+template <class Callback>
+class Walk {
+public:
+    explicit Walk(std::list<SignalHandler<Callback>>& registry) : m_registry(registry) {
+        ++walkers<Callback>;
+    }
+    ~Walk() {
+        if (--walkers<Callback> == 0)
+            m_registry.remove_if([](const auto& record) { return !record.object; });
+    }
+    Walk(const Walk&) = delete;
+    Walk& operator=(const Walk&) = delete;
+
+private:
+    std::list<SignalHandler<Callback>>& m_registry;
+};
+
+/// While it lives, an object's callback is being called and the guard is not held.
+class Calling {
+public:
+    Calling(std::unique_lock<std::mutex>& lock, const RemoteObject* object)
+        : m_lock(lock), m_object(object) {
+        guard().running.push_back({object, std::this_thread::get_id()});
+        m_lock.unlock();
+    }
+    ~Calling() {
+        m_lock.lock();
+        auto& running = guard().running;
+        running.erase(std::find_if(running.begin(), running.end(), [this](const Running& call) {
+            return call.object == m_object && call.thread == std::this_thread::get_id();
+        }));
+        guard().callbackDone.notify_all();
+    }
+    Calling(const Calling&) = delete;
+    Calling& operator=(const Calling&) = delete;
+
+private:
+    std::unique_lock<std::mutex>& m_lock;
+    const RemoteObject* m_object;
+};
+
 /// Calls visit(object, callback) for the subscriptions that a signal is for, front to back, until
 /// one returns false. The guard is not held in visit().
 template <class Callback, class Visit>
@@ -48,7 +91,7 @@ void forEachMatch(std::list<SignalHandler<Callback>>& registry, DBusMessage* mes
     if (!message)
         return; // libdbus would end the process
     std::unique_lock<std::mutex> lock(guard().mutex);
-    ++walkers<Callback>;
+    const Walk<Callback> walk(registry);
     bool more = true;
     for (auto record = registry.begin(); more && record != registry.end(); ++record) {
         // Neither path nor sender is compared: every subscribed proxy of the interface is told.
@@ -57,19 +100,9 @@ void forEachMatch(std::list<SignalHandler<Callback>>& registry, DBusMessage* mes
             continue;
         RemoteObject* object = record->object;
         const Callback callback = record->callback;
-        const std::thread::id self = std::this_thread::get_id();
-        guard().running.push_back({object, self});
-        lock.unlock();
+        const Calling calling(lock, object);
         more = visit(object, callback);
-        lock.lock();
-        auto& running = guard().running;
-        running.erase(std::find_if(running.begin(), running.end(), [&](const Running& call) {
-            return call.object == object && call.thread == self;
-        }));
-        guard().callbackDone.notify_all();
     }
-    if (--walkers<Callback> == 0)
-        registry.remove_if([](const auto& record) { return !record.object; });
 }
 
 bool isBusy(const RemoteObject* object) {
@@ -95,7 +128,12 @@ bool changeMatch(BusLink* link, const char* method, const std::string& rule, Sco
         dbus_set_error_const(error, DBUS_ERROR_NO_MEMORY, "Not enough memory");
         return false;
     }
-    return link->call(message.get(), -1, error.get()) != nullptr;
+    try {
+        return link->call(message.get(), -1, error.get()) != nullptr;
+    } catch (const std::bad_alloc&) {
+        dbus_set_error_const(error, DBUS_ERROR_NO_MEMORY, "Not enough memory");
+        return false;
+    }
 }
 
 /// Moves to the first argument. @return false, logged, when there is none or it has another type
@@ -142,9 +180,14 @@ int RemoteObject::subscribe(Registry<Callback>& registry, const char* member, Ca
     ScopedError error;
     BusLink* link = BusLink::of(m_connection);
     const bool usable = member && callback && dbus_validate_member(member, error);
+    // Before AddMatch: without memory for the record the bus must not be left with a rule.
+    Registry<Callback> record;
+    if (usable)
+        record.emplace_front(this, member, callback);
+    const std::string rule = usable ? matchRule(member) : "";
     if (link)
         link->addSubscription(); // before AddMatch: its signals may come before its reply
-    if (!usable || !changeMatch(link, "AddMatch", matchRule(member), error)) {
+    if (!usable || !changeMatch(link, "AddMatch", rule, error)) {
         if (link)
             link->removeSubscription();
         logError(KES_LOG_PLACE, "Match error (%s)",
@@ -152,7 +195,7 @@ int RemoteObject::subscribe(Registry<Callback>& registry, const char* member, Ca
         return -1;
     }
     const std::lock_guard<std::mutex> lock(guard().mutex);
-    registry.emplace_front(this, member, callback);
+    registry.splice(registry.begin(), record);
     return 0;
 }
 
@@ -184,7 +227,12 @@ void RemoteObject::takeMembers(Registry<Callback>& registry, std::vector<std::st
         const auto current = record++;
         if (current->object != this)
             continue;
-        members.push_back(current->member);
+        try {
+            members.push_back(std::move(current->member));
+        } catch (const std::bad_alloc&) { // in the destructor: the rule has to stay
+            logError(KES_LOG_PLACE, "Remove match error (Not enough memory)");
+            BusLink::of(m_connection)->removeSubscription();
+        }
         if (walkers < Callback >> 0)
             current->object = nullptr;
         else
@@ -203,12 +251,21 @@ void RemoteObject::unsubscribeAll() {
         takeMembers(signalHandlerVectorStringDict, members);
         guard().callbackDone.wait(lock, [this] { return !isBusy(this); });
     }
-    BusLink* link = BusLink::of(m_connection);
+    if (members.empty())
+        return;
+    BusLink* link = BusLink::of(m_connection); // a proxy with subscriptions has one
     for (const std::string& member : members) {
         ScopedError error;
-        if (!changeMatch(link, "RemoveMatch", matchRule(member), error))
+        bool removed = false;
+        try {
+            removed = changeMatch(link, "RemoveMatch", matchRule(member), error);
+        } catch (const std::bad_alloc&) {
+            dbus_set_error_const(error, DBUS_ERROR_NO_MEMORY, "Not enough memory");
+        }
+        // A rule that stays lets signals in that find no subscriber.
+        if (!removed)
             logError(KES_LOG_PLACE, "Remove match error (%s)", error.message());
-        link->removeSubscription(); // a proxy with subscriptions has a link
+        link->removeSubscription();
     }
 }
 
@@ -292,12 +349,19 @@ void RemoteObject::signalHandlerDispatcherStringDict(DBusMessage* message) {
 }
 
 void RemoteObject::dispatch(void* proxy, DBusMessage* message) {
-    auto* self = static_cast<RemoteObject*>(proxy);
-    self->signalHandlerDispatcherObjectPath(message);
-    self->signalHandlerDispatcherStringVariant(message);
-    self->signalHandlerDispatcherString(message);
-    self->signalHandlerDispatcherStringDict(message);
-    self->signalHandlerDispatcherNoArgument(message);
+    constexpr void (RemoteObject::*dispatchers[])(DBusMessage*) = {
+        &RemoteObject::signalHandlerDispatcherObjectPath,
+        &RemoteObject::signalHandlerDispatcherStringVariant,
+        &RemoteObject::signalHandlerDispatcherString,
+        &RemoteObject::signalHandlerDispatcherStringDict,
+        &RemoteObject::signalHandlerDispatcherNoArgument};
+    for (const auto dispatcher : dispatchers) {
+        try {
+            (static_cast<RemoteObject*>(proxy)->*dispatcher)(message);
+        } catch (const std::bad_alloc&) { // the thread goes on with the next signal
+            logError(KES_LOG_PLACE, "Not enough memory for a signal");
+        }
+    }
 }
 
 int RemoteObject::startLoop() {

@@ -48,11 +48,19 @@ std::vector<std::string> AutoConnectFile::readEntries() {
     m_file.clear();
     m_file.seekg(FIRST_ENTRY);
     std::vector<std::string> entries;
-    while (m_file.peek() != std::fstream::traits_type::eof()) {
-        std::string entry;
-        std::getline(m_file, entry, SEPARATOR);
-        entries.push_back(std::move(entry));
+    try {
+        // Without this the stream keeps a lack of memory to itself, and a list that is cut short
+        // would be written back so.
+        m_file.exceptions(std::ios::badbit);
+        while (m_file.peek() != std::fstream::traits_type::eof()) {
+            std::string entry;
+            std::getline(m_file, entry, SEPARATOR);
+            entries.push_back(std::move(entry));
+        }
+    } catch (const std::ios_base::failure&) {
+        // The disk failed: the entries before that.
     }
+    m_file.exceptions(std::ios::goodbit);
     return entries;
 }
 

@@ -1,0 +1,26 @@
+#!/usr/bin/env bash
+# Uses the library for long and checks that nothing is left behind: 100,000 calls, 1,000,000
+# signals, and a daemon that goes and comes back 1,000 times.
+#   scripts/soak.sh [--minute]    --minute: a twentieth of all that
+source "$(dirname "$0")/lib.sh"
+
+export KESBLUETOOTH_SOAK=100
+case "${1:-}" in
+'') ;;
+--minute) KESBLUETOOTH_SOAK=5 ;;
+*) echo "usage: soak.sh [--minute]" >&2; exit 2 ;;
+esac
+
+need_packages "${build_packages[@]}" "${test_packages[@]}"
+echo "Building in build ..."
+build "$root/build"
+# Not through ctest, which ends a test after two minutes. Each in a process of its own.
+tests=$root/build/tests/fault/soak-tests
+"$tests" --gtest_list_tests | while read -r name; do
+    case "$name" in
+    *.) suite=$name ;;
+    Running*) ;;
+    *) "$tests" --gtest_brief=1 --gtest_filter="$suite$name" </dev/null || exit 1
+        echo "$suite$name holds" ;;
+    esac
+done

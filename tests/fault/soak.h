@@ -1,0 +1,43 @@
+#ifndef KESBLUETOOTH_TESTS_FAULT_SOAK_H
+#define KESBLUETOOTH_TESTS_FAULT_SOAK_H
+
+#include "support/scale.h"
+
+#include <gtest/gtest.h>
+
+#include <malloc.h>
+
+#include <algorithm>
+#include <cstdlib>
+#include <filesystem>
+#include <iterator>
+
+namespace Bluetooth::Test {
+
+/// How much of a full soak is to be done: KESBLUETOOTH_SOAK percent, or so much that the tests stay
+/// quick.
+inline int soakCount(int full) {
+    const char* percent = std::getenv("KESBLUETOOTH_SOAK");
+    const int share = percent ? std::atoi(percent) : 1;
+    return std::max(full / 100 * share, 1) / (isSanitized ? 5 : 1) + 1;
+}
+
+/// What the process holds.
+struct Holdings {
+    long descriptors = std::distance(std::filesystem::directory_iterator("/proc/self/fd"),
+                                     std::filesystem::directory_iterator());
+    long bytes = static_cast<long>(mallinfo2().uordblks + mallinfo2().hblkhd);
+};
+
+/// A sanitizer keeps what was freed for a while.
+inline void expectNoGrowth(const Holdings& before) {
+    const Holdings now;
+    EXPECT_EQ(now.descriptors, before.descriptors);
+    if (!isSanitized) {
+        EXPECT_LT(now.bytes - before.bytes, 64 * 1024);
+    }
+}
+
+} // namespace Bluetooth::Test
+
+#endif

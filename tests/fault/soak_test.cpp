@@ -1,0 +1,79 @@
+// Long use leaves nothing behind. scripts/soak.sh runs these at full length.
+
+#include "fault/soak.h"
+#include "support/core_test.h"
+#include "support/receive_loop.h"
+
+namespace Bluetooth::Test {
+
+namespace {
+
+Recorder<int>& batches() {
+    static Recorder<int> recorder;
+    return recorder;
+}
+
+constexpr int batch = 1000;
+int delivered = 0; // of the receive thread
+
+void onFound(RemoteObject*, const char*, const Dict* properties) {
+    if (properties->size() == 2 && ++delivered % batch == 0)
+        batches().add(delivered);
+}
+
+} // namespace
+
+class SoakTest : public CoreTest {
+protected:
+    void SetUp() override {
+        KES_NEEDS_RECEIVE_LOOP();
+        peer.stopRecording();
+    }
+
+    void makeCalls(int count) {
+        for (int i = 0; i < count; ++i) {
+            Dict dict;
+            RemoteObject object(peerName, peerPath, peerInterface, busType);
+            ASSERT_EQ(call(object, "GetProperties"), 0);
+            ASSERT_EQ(object.getReplyValue(dict), 0);
+            ASSERT_EQ(call(object, "Fail"), -1);
+        }
+    }
+
+    void emitSignals(int count) {
+        for (; count > 0; count -= batch) {
+            batches().clear();
+            for (int i = 0; i < batch; ++i)
+                peer.emit(peerPath, peerInterface, "Found", [](Writer& w) {
+                    w("00:11:22:33:44:55").dict("sv", [](Writer& d) {
+                        d.entry("Name", Var{"a name that is longer than a short string"});
+                        d.entry("RSSI", Var{std::int16_t{-60}});
+                    });
+                });
+            ASSERT_TRUE(batches().waitFor(1)); // else the inbox grows, as it should
+        }
+    }
+
+    RemoteObject loop{peerName, "/loop", "com.example.Loop", busType};
+};
+
+TEST_F(SoakTest, CallsLeaveMemoryAndDescriptorsFlat) {
+    peer.reply("GetProperties", [](Writer& w) {
+        w.dict("sv", [](Writer& d) { d.entry("Name", Var{"x"}).entry("Class", Var{360u}); });
+    });
+    makeCalls(200);
+    const Holdings before;
+    makeCalls(soakCount(50'000)); // two calls each
+    expectNoGrowth(before);
+}
+
+TEST_F(SoakTest, SignalsLeaveMemoryAndDescriptorsFlat) {
+    ASSERT_EQ(proxy.setSignalHandlerStringDict("Found", onFound), 0);
+    const ReceiveLoop running(loop);
+    emitSignals(5 * batch);
+    const Holdings before;
+    emitSignals(soakCount(1'000'000));
+    expectNoGrowth(before);
+}
+
+} // namespace Bluetooth::Test
