@@ -12,6 +12,7 @@ if [ "${1:-}" = isolated ]; then
     mount -t overlay overlay -o "lowerdir=/etc,upperdir=$layer/etc,workdir=$layer/etc-work" /etc
     mount -t overlay overlay -o "lowerdir=/tmp,upperdir=$layer/tmp,workdir=$layer/tmp-work" /tmp
     mkdir -p /etc/bluetooth
+    mount -t tmpfs tmpfs /etc/bluetooth # one that was there belongs to somebody else
     export KES_TOUR_ISOLATED=1
     shift
 fi
