@@ -39,7 +39,7 @@ const std::string& testFolder() {
 }
 
 std::string PrivateBus::address(Kind kind) {
-    const std::string address = "unix:path=" + testFolder() + "/" + nameOf(kind) + "-bus";
+    std::string address = "unix:path=" + testFolder() + "/" + nameOf(kind) + "-bus";
     setenv(kind == Kind::System ? "DBUS_SYSTEM_BUS_ADDRESS" : "DBUS_SESSION_BUS_ADDRESS",
            address.c_str(), 1);
     return address;
