@@ -29,12 +29,13 @@ struct Holdings {
     long bytes = static_cast<long>(mallinfo2().uordblks + mallinfo2().hblkhd);
 };
 
-/// A sanitizer keeps what was freed for a while.
+/// How much the queues between threads once held stays with libdbus, and is not growth. A sanitizer
+/// keeps what was freed for a while.
 inline void expectNoGrowth(const Holdings& before) {
     const Holdings now;
     EXPECT_EQ(now.descriptors, before.descriptors);
     if (!isSanitized) {
-        EXPECT_LT(now.bytes - before.bytes, 64 * 1024);
+        EXPECT_LT(now.bytes - before.bytes, 256 * 1024);
     }
 }
 
