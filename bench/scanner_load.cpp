@@ -151,10 +151,12 @@ int run(const char* program, int seconds) {
 
     Scanner scanner;
     std::unique_ptr<std::vector<std::pair<std::string, Dict*>>> begun;
-    while (!begun) // until the service is there
+    while (!begun && !service.hasEnded()) // until the service is there
         begun.reset(scanner.listDevices(adapterNames[0], false));
-    constexpr int firstRound = 5;
-    askFromAllClients(program, firstRound);
+    if (!begun)
+        return EXIT_FAILURE;   // it has said why
+    constexpr int warmUp = 10; // all devices found twice, answers at their full length
+    askFromAllClients(program, warmUp);
     const long memoryThen = memoryOf(service.pid(), "VmRSS:");
     const long signalsThen = signalCount;
     const Result result = askFromAllClients(program, seconds);
@@ -169,8 +171,8 @@ int run(const char* program, int seconds) {
            milliseconds(result.times, 1));
     printf("signals       %.0f a second\n",
            static_cast<double>(signalsNow - signalsThen) / seconds);
-    printf("memory        %ld KiB after the first round, %ld KiB at the end, at most %ld KiB\n",
-           memoryThen, memoryOf(service.pid(), "VmRSS:"), memoryOf(service.pid(), "VmHWM:"));
+    printf("memory        %ld KiB before, %ld KiB after, at most %ld KiB\n", memoryThen,
+           memoryOf(service.pid(), "VmRSS:"), memoryOf(service.pid(), "VmHWM:"));
     service.signal(SIGTERM);
     return service.wait() == 0 && result.failures == 0 ? EXIT_SUCCESS : EXIT_FAILURE;
 }
@@ -182,8 +184,8 @@ int main(int argc, char** argv) {
         return runClient(argv[2], std::stoi(argv[3]));
     const int seconds = argc > 1 ? static_cast<int>(strtol(argv[1], nullptr, 10)) : 15;
     // The service ends 30 s after its finders were made.
-    if (argc > 2 || seconds < 1 || seconds > 20) {
-        std::cerr << "usage: " << argv[0] << " [SECONDS, 1 to 20]\n";
+    if (argc > 2 || seconds < 1 || seconds > 15) {
+        std::cerr << "usage: " << argv[0] << " [SECONDS, 1 to 15]\n";
         return 2;
     }
     return run("/proc/self/exe", seconds);

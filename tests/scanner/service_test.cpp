@@ -228,6 +228,23 @@ TEST_F(ServiceTest, DaemonMayComeLateGoAndComeBack) {
     EXPECT_EQ(stopService(), 0);
 }
 
+TEST_F(ServiceTest, GoesOnWhenAClientLeavesWithoutItsAnswer) {
+    startService();
+    simulation.control("DelayNext",
+                       [](Writer& w) { w("org.bluez.Manager")("FindAdapter")(std::uint32_t{50}); });
+    {
+        RawPeer leaving(sessionBus.address());
+        leaving.call(serviceName, "/", serviceInterface, "ListDevices",
+                     [](Writer& w) { w("hci0"); });
+        ASSERT_TRUE(system.signals().waitUntil([](const auto& signals) {
+            return !signals.empty() && signals.back().find("FindAdapter") != std::string::npos;
+        }));
+    }
+    EXPECT_EQ(ask("hci1"), emptyAnswer);
+    EXPECT_EQ(countCalls("hci0", "StartDiscovery"), 1u); // it was carried out all the same
+    EXPECT_EQ(stopService(), 0);
+}
+
 TEST_F(ServiceTest, EndsWithDiscoveryStoppedEverywhere) {
     for (const int signal : {SIGTERM, SIGINT}) {
         startService();

@@ -7,10 +7,10 @@
 #include <glib-unix.h>
 #include <syslog.h>
 
-#include <atomic>
 #include <csignal>
 #include <cstdlib>
 #include <iostream>
+#include <memory>
 #include <string>
 
 namespace {
@@ -42,15 +42,16 @@ int parse(int argc, char** argv) {
     return -1;
 }
 
+/// Runs in the loop, so there is one to quit, and a server.
 gboolean quit(void* server) {
-    static_cast<ScannerServer*>(server)->quitLoop();
+    static_cast<std::unique_ptr<ScannerServer>*>(server)->get()->quitLoop();
     return G_SOURCE_CONTINUE;
 }
 
 /// Ends the loop when the connection to a bus is lost. The connection does not come back.
 class BusWatch {
 public:
-    BusWatch(DBusConnection* connection, ScannerServer& server)
+    BusWatch(DBusConnection* connection, std::unique_ptr<ScannerServer>& server)
         : m_connection(connection), m_server(server) {
         dbus_connection_add_filter(m_connection, filter, this, nullptr);
     }
@@ -58,17 +59,13 @@ public:
     BusWatch(const BusWatch&) = delete;
     BusWatch& operator=(const BusWatch&) = delete;
 
-    bool isLost() const { return m_lost || !dbus_connection_get_is_connected(m_connection); }
+    bool isLost() const { return !dbus_connection_get_is_connected(m_connection); }
 
 private:
     /// Runs on whichever thread reads the connection.
     static DBusHandlerResult filter(DBusConnection*, DBusMessage* message, void* data) {
-        auto* watch = static_cast<BusWatch*>(data);
-        if (dbus_message_is_signal(message, DBUS_INTERFACE_LOCAL, "Disconnected")) {
-            watch->m_lost = true;
-            // In the loop: it need not run yet, and quitting then would be lost.
-            g_idle_add(quitOnce, &watch->m_server);
-        }
+        if (dbus_message_is_signal(message, DBUS_INTERFACE_LOCAL, "Disconnected"))
+            g_idle_add(quitOnce, &static_cast<BusWatch*>(data)->m_server);
         return DBUS_HANDLER_RESULT_NOT_YET_HANDLED;
     }
     static gboolean quitOnce(void* server) {
@@ -77,26 +74,28 @@ private:
     }
 
     DBusConnection* m_connection;
-    ScannerServer& m_server;
-    std::atomic<bool> m_lost{false};
+    std::unique_ptr<ScannerServer>& m_server;
 };
 
 int serve(ServiceName& name, DBusConnection* systemBus) {
-    ScannerServer server;
-    if (name.owner() != server.getConnectionName())
-        return fail("the session bus did not give it its name; only one can run in a session");
+    // Before the name is requested: from then on calls may be answered and discoveries begun.
+    std::unique_ptr<ScannerServer> server;
     const BusWatch session(name.getConnection(), server);
     const BusWatch system(systemBus, server);
     g_unix_signal_add(SIGTERM, quit, &server);
     g_unix_signal_add(SIGINT, quit, &server);
 
-    server.startLoop();
+    server = std::make_unique<ScannerServer>();
+    if (name.owner() == server->getConnectionName())
+        server->startLoop();
+    else if (!session.isLost())
+        return fail("the session bus did not give it its name; only one can run in a session");
 
     // Calls that came before the name was given up are answered, the others go to the next daemon.
     name.release();
     while (g_main_context_iteration(nullptr, false)) {
     }
-    server.stopDiscovery();
+    server->stopDiscovery();
     if (session.isLost())
         return fail("the session bus has gone; start again when it is back");
     if (system.isLost())
