@@ -1,5 +1,7 @@
 #include "core/method_call_message.h"
 
+#include <new>
+
 namespace Bluetooth {
 
 namespace {
@@ -12,10 +14,13 @@ struct LastCall {
                 const std::string& newInterface, const char* newMethod) {
         message.reset();
         method.clear(); // matches nothing until all is in place
-        destination = newDestination;
-        path = newPath;
-        interface = newInterface;
-        method = newMethod;
+        try {
+            destination = newDestination;
+            path = newPath;
+            interface = newInterface;
+            method = newMethod;
+        } catch (const std::bad_alloc&) { // the method stays empty; the call needs none of this
+        }
     }
 
     std::string destination;
