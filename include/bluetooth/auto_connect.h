@@ -15,7 +15,8 @@ namespace Bluetooth {
 ///     1,AA:BB:CC:DD:EE:FF,11:22:33:44:55:66
 /// @endcode
 /// "1" is enabled, "0" disabled. A missing file is created disabled and empty by every operation
-/// that looks at it. A file beyond 1 MiB is not read.
+/// that looks at it. A file beyond 1 MiB is not read: it counts as disabled and empty, and only
+/// set() changes it.
 ///
 /// The auto-connect daemon reads the same files and takes commands from the pipe
 /// /tmp/kes_bluetooth_autoconnect.
@@ -45,14 +46,15 @@ public:
 
     /// Drops every entry equal to `device` (case matters), rewrites the file and tells the daemon.
     /// The list of an adapter whose flag is not "1" is left as it is.
-    /// @return true when the file was processed, whether or not it could be rewritten
+    /// @return true when the file was processed, whether or not it could be rewritten; false when
+    ///         it is beyond 1 MiB or cannot be read to its end, which leaves it as it is
     bool removeDevice(const char* adapter, const char* device);
 
     /// The devices of one adapter's list, enabled or not. Entries that the adapter does not know
-    /// are removed from an enabled file (removeDevice()); none is while the adapter itself cannot
-    /// be reached any more.
-    /// @return a new list, possibly empty, deleted by the caller; null when the daemon, the adapter
-    ///         or the file is not there
+    /// are removed from an enabled file (removeDevice()), each distinct one once. Entries that the
+    /// daemon gave no answer about (it hangs or restarts, the adapter was pulled out) are kept.
+    /// @return a new list, possibly empty, deleted by the caller; null when the daemon or the
+    ///         adapter is not there, or the file cannot be opened
     /// Blocks for one call of the daemon for each entry.
     DeviceList* getDeviceList(const char* adapter);
 

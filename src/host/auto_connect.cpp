@@ -10,12 +10,14 @@
 #include <bluetooth/fifo.h>
 #include <bluetooth/manager.h>
 
+#include <dbus/dbus.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
 #include <cerrno>
 #include <cstring>
 #include <memory>
+#include <set>
 #include <string>
 #include <vector>
 
@@ -61,18 +63,28 @@ bool rewrite(const AutoConnect& config, const char* adapter, bool enable, const 
     return true;
 }
 
-/// Opens an adapter's file for reading. @return null (logged) when that cannot be done
+bool isReadable(AutoConnectFile& file, const std::string& path) {
+    if (file.isTooLarge()) {
+        logError(KES_HERE, "Config '%s' is too large.", path.c_str());
+        return false;
+    }
+    return true;
+}
+
+/// Opens an adapter's file. @return null (logged) when that cannot be done
 std::unique_ptr<AutoConnectFile> openFile(const std::string& path, std::ios::openmode mode) {
     auto file = std::make_unique<AutoConnectFile>(path, mode);
-    if (!file->isOpen()) {
-        logError(KES_HERE, "Cannot open config file '%s'", path.c_str());
-        return nullptr;
-    }
-    if (file->isTooLarge()) {
-        logError(KES_HERE, "Config '%s' is too large.", path.c_str());
-        return nullptr;
-    }
-    return file;
+    if (file->isOpen())
+        return file;
+    logError(KES_HERE, "Cannot open config file '%s'", path.c_str());
+    return nullptr;
+}
+
+std::vector<std::string> readEntries(AutoConnectFile& file, const std::string& path) {
+    std::vector<std::string> entries = file.readEntries();
+    if (!file.isComplete())
+        logError(KES_HERE, "Config '%s' can not be read to its end.", path.c_str());
+    return entries;
 }
 
 /// AutoConnect::removeDevice() for an entry that may hold any byte.
@@ -81,13 +93,16 @@ bool removeEntry(const AutoConnect& config, const char* adapter, const std::stri
     if (!config.checkConfigFile(path.c_str()))
         return false;
     const auto file = openFile(path, std::ios::in | std::ios::out);
-    if (!file)
+    if (!file || !isReadable(*file, path))
         return false;
     // The list of a disabled adapter is left alone on purpose.
     if (!file->readsEnabled())
         return true;
+    const std::vector<std::string> entries = readEntries(*file, path);
+    if (!file->isComplete())
+        return false;
     std::string kept;
-    for (const std::string& entry : file->readEntries()) {
+    for (const std::string& entry : entries) {
         if (entry != device)
             kept += ',' + entry;
     }
@@ -96,45 +111,59 @@ bool removeEntry(const AutoConnect& config, const char* adapter, const std::stri
     return true;
 }
 
-/// Whether the daemon still has this very adapter. Its path changes when the daemon restarts.
-bool isStillThere(Manager& manager, const char* address, const Adapter& adapter) {
-    const std::unique_ptr<Adapter> now(manager.findAdapter(address));
-    return now && strcmp(now->getPath(), adapter.getPath()) == 0;
+enum class Lookup { Found, Unknown, NotAnswered };
+
+/// Only what the daemon itself said of the text counts: an adapter that was pulled out, or a daemon
+/// that hangs or restarts, must not cost the user's list.
+bool isDeniedByDaemon(const std::string& error) {
+    return error == "Does Not Exist" || error == "Invalid arguments in method call";
+}
+
+/// Appends the device of an entry.
+Lookup appendDevice(Adapter& adapter, const std::string& entry, DeviceList& devices) {
+    if (entry.find('\0') != std::string::npos) {
+        logError(KES_HERE, "An entry of the config file holds a NUL byte.");
+        return Lookup::Unknown;
+    }
+    std::unique_ptr<Device> device(adapter.findDevice(entry.c_str(), true));
+    if (device) {
+        devices.push_back(device.get());
+        device.release();
+        return Lookup::Found;
+    }
+    const bool canBeSent = dbus_validate_utf8(entry.c_str(), nullptr);
+    return !canBeSent || isDeniedByDaemon(adapter.getErrorMessage()) ? Lookup::Unknown
+                                                                     : Lookup::NotAnswered;
 }
 
 /// Appends the devices that the adapter knows, in the file's order.
-/// @return the entries that it does not know
+/// @return the entries that it does not know, each once
 std::vector<std::string> appendKnown(Adapter& adapter, const std::vector<std::string>& entries,
                                      DeviceList& devices) {
     std::vector<std::string> unknown;
+    std::set<std::string> missing; // asked for once: a file may hold a million empty entries
     for (const std::string& entry : entries) {
-        const bool isText = entry.find('\0') == std::string::npos;
-        if (!isText)
-            logError(KES_HERE, "An entry of the config file holds a NUL byte.");
-        Device* const device = isText ? adapter.findDevice(entry.c_str(), true) : nullptr;
-        if (device)
-            devices.push_back(device);
-        else
+        if (missing.count(entry) != 0)
+            continue;
+        const Lookup lookup = appendDevice(adapter, entry, devices);
+        if (lookup != Lookup::Found)
+            missing.insert(entry);
+        if (lookup == Lookup::Unknown)
             unknown.push_back(entry);
     }
     return unknown;
 }
 
-void removeUnknown(const AutoConnect& config, Manager& manager, const char* address,
-                   const Adapter& adapter, const std::vector<std::string>& unknown) {
-    // An adapter that was pulled out, or a daemon that restarts, knows no device at all: the
-    // user's list must survive that.
-    if (!unknown.empty() && !isStillThere(manager, address, adapter)) {
-        logError(KES_HERE, "Adapter '%s' has gone; its device list is kept.", address);
-        return;
-    }
-    for (const std::string& entry : unknown)
+/// Appends the devices of a file's entries, and removes the entries that the adapter does not know
+/// from the file.
+void appendAndPrune(const AutoConnect& config, const char* address, Adapter& adapter,
+                    const std::vector<std::string>& entries, DeviceList& devices) {
+    for (const std::string& entry : appendKnown(adapter, entries, devices))
         removeEntry(config, address, entry);
 }
 
 /// One adapter's part of AutoConnect::getAutoConnectDeviceList().
-void appendTargets(const AutoConnect& config, Manager& manager, Adapter& adapter,
-                   DeviceList& devices) {
+void appendTargets(const AutoConnect& config, Adapter& adapter, DeviceList& devices) {
     const std::unique_ptr<Dict> properties(adapter.getProperties());
     const std::string address = find(properties.get(), "Address");
     if (find(properties.get(), "Powered") != "1")
@@ -143,12 +172,11 @@ void appendTargets(const AutoConnect& config, Manager& manager, Adapter& adapter
     if (!config.checkConfigFile(path.c_str()))
         return;
     auto file = openFile(path, std::ios::in);
-    if (!file || !file->readsEnabled())
+    if (!file || !isReadable(*file, path) || !file->readsEnabled())
         return;
-    const std::vector<std::string> entries = file->readEntries();
+    const std::vector<std::string> entries = readEntries(*file, path);
     file.reset();
-    const std::vector<std::string> unknown = appendKnown(adapter, entries, devices);
-    removeUnknown(config, manager, address.c_str(), adapter, unknown);
+    appendAndPrune(config, address.c_str(), adapter, entries, devices);
 }
 
 } // namespace
@@ -181,7 +209,7 @@ bool AutoConnect::getEnable(const char* adapter) const {
     if (!checkConfigFile(path.c_str()))
         return false;
     AutoConnectFile file(path, std::ios::in);
-    return file.isOpen() && file.readsNonZero();
+    return file.isOpen() && isReadable(file, path) && file.readsNonZero();
 }
 
 bool AutoConnect::set(const char* adapter, bool enable, const char* deviceList) {
@@ -229,11 +257,12 @@ DeviceList* AutoConnect::getDeviceList(const char* adapter) {
     auto file = openFile(path, std::ios::in);
     if (!file)
         return nullptr;
-    const std::vector<std::string> entries = file->readEntries();
-    file.reset();
     auto devices = std::make_unique<DeviceList>();
-    const std::vector<std::string> unknown = appendKnown(*proxy, entries, *devices);
-    removeUnknown(*this, *manager, adapter, *proxy, unknown);
+    if (!isReadable(*file, path))
+        return devices.release();
+    const std::vector<std::string> entries = readEntries(*file, path);
+    file.reset();
+    appendAndPrune(*this, adapter, *proxy, entries, *devices);
     return devices.release();
 }
 
@@ -251,7 +280,7 @@ DeviceList* AutoConnect::getAutoConnectDeviceList() {
     auto devices = std::make_unique<DeviceList>();
     for (Adapter* adapter : *adapters) {
         if (adapter) // null: the daemon left the bus while the list was made
-            appendTargets(*this, *manager, *adapter, *devices);
+            appendTargets(*this, *adapter, *devices);
     }
     return devices.release();
 }

@@ -46,17 +46,19 @@ bool AutoConnectFile::readsEnabled() {
 
 std::vector<std::string> AutoConnectFile::readEntries() {
     m_file.clear();
-    m_file.seekg(FIRST_ENTRY);
+    m_complete = false;
     std::vector<std::string> entries;
     try {
         // Without this the stream keeps a lack of memory to itself, and a list that is cut short
         // would be written back so.
         m_file.exceptions(std::ios::badbit);
+        m_file.seekg(FIRST_ENTRY);
         while (m_file.peek() != std::fstream::traits_type::eof()) {
             std::string entry;
             std::getline(m_file, entry, SEPARATOR);
             entries.push_back(std::move(entry));
         }
+        m_complete = true;
     } catch (const std::ios_base::failure&) {
         // The disk failed: the entries before that.
     }

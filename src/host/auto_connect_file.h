@@ -29,9 +29,13 @@ public:
     /// The texts between the commas, from the third byte to the end of the file. What follows a
     /// comma at the very end is not an entry.
     std::vector<std::string> readEntries();
+    /// Whether the last readEntries() came to the end of the file. A list that is cut short by a
+    /// read error must not be written back.
+    bool isComplete() const { return m_complete; }
 
 private:
     std::fstream m_file;
+    bool m_complete = false;
 };
 
 /// Overwrites a file with `content`.
