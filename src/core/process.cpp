@@ -52,6 +52,15 @@ private:
     posix_spawnattr_t m_attributes{};
 };
 
+struct Descriptor {
+    explicit Descriptor(int owned) : number(owned) {}
+    Descriptor(const Descriptor&) = delete;
+    Descriptor& operator=(const Descriptor&) = delete;
+    ~Descriptor() { close(number); }
+
+    const int number;
+};
+
 /// @return the process, or -1 with errno set
 pid_t start(const char* program, const std::vector<std::string>& arguments, int output) {
     if (!program) {
@@ -85,29 +94,31 @@ int waitFor(pid_t pid) {
 
 } // namespace
 
+// Each thing gets its owner before the next step, which may run out of memory.
 std::unique_ptr<ProcessReader> ProcessReader::open(const char* program,
                                                    const std::vector<std::string>& arguments) {
+    std::unique_ptr<ProcessReader> reader(new ProcessReader);
     int ends[2];
     if (pipe2(ends, O_CLOEXEC) != 0)
         return nullptr;
-    FILE* stream = fdopen(ends[0], "r");
-    const pid_t pid = stream ? start(program, arguments, ends[1]) : -1;
+    const Descriptor output(ends[1]);
+    reader->m_stream = fdopen(ends[0], "r");
+    if (reader->m_stream)
+        reader->m_pid = start(program, arguments, output.number);
     const int error = errno;
-    close(ends[1]);
-    if (pid >= 0)
-        return std::unique_ptr<ProcessReader>(new ProcessReader(stream, pid));
-
-    if (stream)
-        static_cast<void>(fclose(stream));
-    else
+    if (!reader->m_stream)
         close(ends[0]);
+    if (reader->m_pid < 0)
+        reader.reset();
     errno = error;
-    return nullptr;
+    return reader;
 }
 
 ProcessReader::~ProcessReader() {
-    static_cast<void>(fclose(m_stream)); // only read from
-    waitFor(m_pid);
+    if (m_stream)
+        static_cast<void>(fclose(m_stream)); // only read from
+    if (m_pid >= 0)
+        waitFor(m_pid);
 }
 
 int runProcess(const char* program, const std::vector<std::string>& arguments) {

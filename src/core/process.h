@@ -34,10 +34,10 @@ public:
     FILE* stream() const { return m_stream; }
 
 private:
-    ProcessReader(FILE* stream, pid_t pid) : m_stream(stream), m_pid(pid) {}
+    ProcessReader() = default;
 
-    FILE* m_stream;
-    pid_t m_pid;
+    FILE* m_stream = nullptr;
+    pid_t m_pid = -1;
 };
 
 /// Runs a program and waits for it to end; processes that it leaves in the background are not

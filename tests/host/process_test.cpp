@@ -9,8 +9,36 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <cstdlib>
 #include <cstring>
+#include <filesystem>
 #include <fstream>
+#include <iterator>
+#include <new>
+
+namespace {
+
+/// How many of this thread's next allocations succeed before one fails; -1: all.
+thread_local int allocationsLeft = -1;
+
+bool shallFail() {
+    if (allocationsLeft < 0)
+        return false;
+    return allocationsLeft-- == 0;
+}
+
+} // namespace
+
+void* operator new(std::size_t size) {
+    void* const memory = shallFail() ? nullptr : malloc(size);
+    return memory ? memory : throw std::bad_alloc();
+}
+void operator delete(void* memory) noexcept {
+    free(memory);
+}
+void operator delete(void* memory, std::size_t /*size*/) noexcept {
+    free(memory);
+}
 
 namespace Bluetooth::Test {
 
@@ -88,6 +116,27 @@ TEST(ProcessTest, AProgramThatCannotBeStartedIsSeen) {
         EXPECT_EQ(errno, testCase.error) << testCase.program;
     }
     EXPECT_TRUE(hasNoChild());
+}
+
+TEST(ProcessTest, NothingIsLeftBehindWhenMemoryRunsOut) {
+    const std::vector<std::string> arguments{"-a", "-b"};
+    const auto countOpen = [] {
+        return std::distance(std::filesystem::directory_iterator("/proc/self/fd"), {});
+    };
+    const auto before = countOpen();
+    int failures = 0;
+    for (bool failed = true; failed; failures += failed) {
+        allocationsLeft = failures;
+        try {
+            ProcessReader::open("/bin/true", arguments);
+            failed = false;
+        } catch (const std::bad_alloc&) {
+        }
+        allocationsLeft = -1;
+        EXPECT_EQ(countOpen(), before);
+        EXPECT_TRUE(hasNoChild());
+    }
+    EXPECT_GE(failures, 2) << "the reader, and its program's arguments";
 }
 
 TEST(ProcessTest, TheStatusIsTheProgramsOwnDespiteInterruptions) {
