@@ -184,7 +184,9 @@ TEST_F(AutoConnectDaemonTest, ARemovedPipeIsMadeAnew) {
 }
 
 TEST_F(AutoConnectDaemonTest, GoesIntoTheBackgroundOnceItIsReady) {
-    ChildProcess starter(commandLine(""), ChildProcess::Output::Capture);
+    // Taken from the folder it is started in, not from the one it goes to.
+    ChildProcess starter({"sh", "-c", "cd /tmp && exec " KESBT_AUTOCONNECTD " --pid-file test.pid"},
+                         ChildProcess::Output::Capture);
     EXPECT_EQ(starter.wait(), 0);
     EXPECT_EQ(starter.readAll(), "") << "the output is let go of";
     const int pid = std::stoi(readFile(pidFile));
@@ -239,8 +241,11 @@ TEST_F(AutoConnectDaemonTest, EndsWhenTheBusGoes) {
     Daemon daemon("--interval 1 --max-interval 1");
     ASSERT_TRUE(daemon.waitFor("started"));
     bus.kill();
-    EXPECT_TRUE(daemon.waitFor("the system bus has gone; start again when it is back"));
+    const char* const reason = "the system bus has gone; start again when it is back";
+    EXPECT_TRUE(daemon.waitFor(reason));
     EXPECT_EQ(daemon.stop(0), 1);
+    EXPECT_FALSE(daemon.waitFor("a line after that"));
+    EXPECT_EQ(daemon.count(reason), 1) << "one line, not one more from the log";
 }
 
 } // namespace Bluetooth::Test

@@ -13,6 +13,7 @@
 #include <cerrno>
 #include <cstdlib>
 #include <cstring>
+#include <filesystem>
 #include <iostream>
 #include <memory>
 #include <string>
@@ -70,6 +71,11 @@ int parse(int argc, char** argv, Options& options) {
         std::cerr << PROGRAM << ": " << problem.what() << "; see " << PROGRAM << " --help\n";
         return WRONG_USAGE;
     }
+    // The background's current folder is another one.
+    std::error_code error;
+    const auto absolute = std::filesystem::absolute(options.pidFile, error);
+    if (!options.pidFile.empty() && !error)
+        options.pidFile = absolute;
     options.maxInterval = std::max(options.maxInterval, options.interval);
     return -1;
 }
@@ -113,8 +119,11 @@ int run(AutoConnector& connector, std::unique_ptr<CommandPipe>& pipe) {
             connector.reload();
         if (!pipe->isCurrent())
             renewPipe(pipe);
-        if (!connector.hasBus())
-            return fail("the system bus has gone; start again when it is back");
+        if (!connector.hasBus()) {
+            // Not fail(): in the foreground the log itself goes to standard error by now.
+            syslog(LOG_ERR, "the system bus has gone; start again when it is back");
+            return EXIT_FAILURE;
+        }
     }
     syslog(LOG_NOTICE, "stopped");
     return EXIT_SUCCESS;
