@@ -4,11 +4,11 @@
 source "$(dirname "$0")/lib.sh"
 
 folder=$root/build
-options=(-DKESBLUETOOTH_SANITIZE=)
+options=(-DKESBLUETOOTH_BUILD_TESTS=ON -DKESBLUETOOTH_SANITIZE=)
 if [ "${1:-}" = --sanitize ]; then
     [ $# -ge 2 ] || { echo "usage: check.sh [--sanitize KIND] [ctest option...]" >&2; exit 2; }
     folder=$root/build-${2//,/-}
-    options=(-DKESBLUETOOTH_SANITIZE="$2")
+    options=(-DKESBLUETOOTH_BUILD_TESTS=ON -DKESBLUETOOTH_SANITIZE="$2")
     shift 2
 fi
 

@@ -12,7 +12,7 @@ fi
 clang-format-14 --dry-run --Werror "${files[@]}"
 echo "clang-format: ${#files[@]} files are clean"
 
-build "$root/build"
+build "$root/build" -DKESBLUETOOTH_BUILD_TESTS=ON
 # The benchmarks need libraries that nothing else does.
 mapfile -t sources < <(git ls-files '*.cpp' ':!bench/')
 printf '%s\n' "${sources[@]}" |

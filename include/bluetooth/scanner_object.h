@@ -44,13 +44,15 @@ struct KESBLUETOOTH_API ScannerObject {
     /// Gives the finder of an adapter, made by addFinder() when there is none.
     /// @param path the adapter's object path
     /// @return the set as addFinder() describes it, or null
-    AddressSet* getListByName(const std::string& path);
+    AddressSet* getListByName(std::string path);
 };
 
+/// The GObject type of ScannerObject, registered when first asked for.
 KESBLUETOOTH_API GType scanner_object_get_type();
 
 /// The handler of the D-Bus method ListDevices(s adapter) -> a{ss}: the devices in reach that the
 /// Bluetooth daemon does not know yet. The first call for an adapter starts discovery.
+/// @param object    the exported object; null is an error
 /// @param adapterId the adapter's name or address
 /// @param devices   receives a new table, freed with its texts by g_hash_table_unref(): address ->
 ///                  properties as dictConquerToString() writes them with ";". With nothing to
@@ -64,6 +66,8 @@ KESBLUETOOTH_API gboolean scanner_object_list_devices(ScannerObject* object, con
 
 /// The handler of the D-Bus method RemoveFinder(s adapter): ends discovery on the adapter and
 /// forgets what was found there. An adapter without finder is a success.
+/// @param object    the exported object; null is an error
+/// @param adapterId the adapter's name or address; null is an error
 /// @param error receives "Scanner or AdapterId is null". On purpose it is not set for an adapter
 ///              that the daemon does not know: the bus then tells a text of its own.
 /// @return FALSE on failure

@@ -31,7 +31,8 @@ class Manager;
 ///
 /// DAEMON. Without the Bluetooth daemon the service runs all the same: ListDevices answers that
 /// the adapter is not found, and each call looks for the daemon again. After the daemon's restart
-/// its adapters have other paths, and so other finders.
+/// its adapters have other paths, and so other finders; those of the old paths stay, without
+/// effect, until the service ends.
 ///
 /// MEMORY. The properties of each device ever found are kept, as text, until the service ends:
 /// about 0.5 KiB a device.
@@ -62,6 +63,7 @@ public:
     /// Reads from the daemon which devices it knows: they are left out of all answers. Done for
     /// each ListDevices. Without the daemon this is logged and none is left out.
     void updateFilterSet();
+    /// @return whether the daemon knew the device when updateFilterSet() was called last
     bool isInFilterSet(const std::string& address);
 
     /// Keeps the properties of a found device, in place of those before.
@@ -95,7 +97,7 @@ private:
     ScannerObject* m_scannerObject;
 
     // Guards what follows and the scanner object's finders. Nothing is called while it is held: no
-    // bus, no GLib, no callback. It is the only lock of the service.
+    // bus, no GLib, no callback. No other lock is taken under it.
     std::mutex m_mutex;
     std::unique_ptr<Manager> m_manager; // set once
     bool m_receives = false;            // startLoop() runs

@@ -48,7 +48,8 @@ public:
     /// @param type   the object's type, to which the method table is attached
     /// @param info   method table as dbus-binding-tool makes it; must live as long as the type
     /// @param object not owned; served until it is destroyed
-    /// @return false, logged, when the bus did not take the request or the path is taken. Whether
+    /// @return false, logged, when the bus did not take the request, the path is taken, or the bus
+    ///         name or the path given to the constructor is none. Whether
     ///         the name came to be owned, or this process only waits for it, is not looked at.
     /// Blocks until the bus answers.
     bool prepareObjectInfo(GType type, const DBusGObjectInfo* info, GObject* object);

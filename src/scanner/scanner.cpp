@@ -42,8 +42,11 @@ std::vector<std::pair<std::string, Dict*>>* Scanner::listDevices(const char* ada
     devices->reserve(reply.size());
     for (const auto& [address, text] : reply) {
         // Null for a text without any entry, as in the pair that an empty answer consists of.
-        if (Dict* properties = stringDivideToDict(variantToString(text), ";"))
-            devices->emplace_back(address, properties);
+        std::unique_ptr<Dict> properties(stringDivideToDict(variantToString(text), ";"));
+        if (!properties)
+            continue;
+        devices->emplace_back(address, properties.get());
+        properties.release();
     }
     return devices.release();
 }

@@ -62,13 +62,14 @@ AddressSet* ScannerObject::addFinder(const char* adapterId) {
     return server && adapterId ? Finders(*server, *this).add(adapterId).get() : nullptr;
 }
 
-AddressSet* ScannerObject::getListByName(const std::string& path) {
+// NOLINTNEXTLINE(performance-unnecessary-value-param): callers were built with it
+AddressSet* ScannerObject::getListByName(std::string path) {
     ScannerServer* server = currentServer();
     return server ? Finders(*server, *this).of(path).get() : nullptr;
 }
 
 gboolean scanner_object_list_devices(ScannerObject* object, const char* adapterId,
-                                     GHashTable** devices, GError** error) {
+                                     GHashTable** devices, GError** error) try {
     if (!object)
         return notFound(error, "Object", adapterId);
     ScannerServer* server = currentServer();
@@ -90,10 +91,12 @@ gboolean scanner_object_list_devices(ScannerObject* object, const char* adapterI
     if (g_hash_table_size(*devices) == 0) // clients know an answer by its never being empty
         g_hash_table_insert(*devices, g_strdup(""), g_strdup(""));
     return TRUE;
+} catch (const std::bad_alloc&) { // not through the frames of C that called
+    return notFound(error, "Set", adapterId);
 }
 
 gboolean scanner_object_remove_finder(ScannerObject* object, const char* adapterId,
-                                      GError** error) {
+                                      GError** error) try {
     if (!object || !adapterId) {
         g_set_error_literal(error, errorDomain, errorCode, "Scanner or AdapterId is null");
         return FALSE;
@@ -105,6 +108,8 @@ gboolean scanner_object_remove_finder(ScannerObject* object, const char* adapter
         return FALSE; // on purpose without an error: clients remove finders of adapters long gone
     Finders(*server, *object).remove(*adapter);
     return TRUE;
+} catch (const std::bad_alloc&) {
+    return notFound(error, "Set", adapterId);
 }
 
 } // namespace Bluetooth

@@ -140,21 +140,20 @@ std::vector<ScannerServer::Discovery> ScannerServer::takeDiscoveries() {
 /// The manager, looked for again while there is none. It also runs the receive thread, which begins
 /// here when the daemon comes only after the loop.
 Manager* ScannerServer::fetchManager() {
-    {
+    const auto held = [this] {
         const Lock lock(m_mutex);
-        if (m_manager)
-            return m_manager.get();
-    }
-    std::unique_ptr<Manager> manager(Manager::getManager());
-    if (!manager)
-        return nullptr;
-    {
+        return m_manager.get();
+    };
+    if (!held()) {
+        std::unique_ptr<Manager> manager(Manager::getManager());
+        if (!manager)
+            return nullptr;
         const Lock lock(m_mutex);
         if (!m_manager)
             m_manager.swap(manager);
     }
-    startReceiver();
-    return m_manager.get();
+    startReceiver(); // now, or because it failed before
+    return held();
 }
 
 /// Starts the receive thread when it is wanted, possible and not done yet.

@@ -61,6 +61,14 @@ void ServerObject::getConnection() {
 }
 
 bool ServerObject::prepareObjectInfo(GType type, const DBusGObjectInfo* info, GObject* object) {
+    // libdbus ends the process on a name or a path that is none.
+    if (!m_busName || !m_path || !dbus_validate_utf8(m_busName, nullptr) ||
+        !dbus_validate_utf8(m_path, nullptr) || !dbus_validate_bus_name(m_busName, nullptr) ||
+        !dbus_validate_path(m_path, nullptr)) {
+        logError(KES_HERE, "Failed to acquire %s, %s", m_busName ? m_busName : "(null)",
+                 "Invalid name or path");
+        return false;
+    }
     dbus_g_object_type_install_info(type, info);
 
     constexpr guint noFlags = 0;
@@ -75,10 +83,11 @@ bool ServerObject::prepareObjectInfo(GType type, const DBusGObjectInfo* info, GO
         return false;
     }
 
-    // dbus-glib ends the process when something is served at the path already.
+    // dbus-glib ends the process when something else is served at the path already.
     void* served = nullptr;
     DBusConnection* connection = dbus_g_connection_get_connection(m_connection);
-    if (dbus_connection_get_object_path_data(connection, m_path, &served) && served) {
+    if (dbus_g_connection_lookup_g_object(m_connection, m_path) != object &&
+        dbus_connection_get_object_path_data(connection, m_path, &served) && served) {
         logError(KES_HERE, "Failed to serve %s, another object is there", m_path);
         return false;
     }
