@@ -15,6 +15,7 @@ void logError(LogPlace place, const char* format, ...) {
     va_list again;
     va_copy(again, args);
     char line[512];
+    // NOLINTNEXTLINE(clang-analyzer-valist.Uninitialized): begun above
     const int length = vsnprintf(line, sizeof line, format, args);
     va_end(args);
 

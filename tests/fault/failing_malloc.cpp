@@ -62,10 +62,12 @@ void* counted(void* block) {
 
 extern "C" {
 
+// NOLINTBEGIN(bugprone-reserved-identifier,cert-dcl37-c,cert-dcl51-cpp): the C library's names
 void* __libc_malloc(std::size_t size);
 void* __libc_calloc(std::size_t count, std::size_t size);
 void* __libc_realloc(void* block, std::size_t size);
 void __libc_free(void* block);
+// NOLINTEND(bugprone-reserved-identifier,cert-dcl37-c,cert-dcl51-cpp)
 
 KES_REPLACES_LIBC void* malloc(std::size_t size) {
     return mayAllocate() ? counted(__libc_malloc(size)) : nullptr;

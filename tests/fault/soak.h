@@ -18,7 +18,7 @@ namespace Bluetooth::Test {
 /// quick.
 inline int soakCount(int full) {
     const char* percent = std::getenv("KESBLUETOOTH_SOAK");
-    const int share = percent ? std::atoi(percent) : 1;
+    const auto share = percent ? static_cast<int>(std::strtol(percent, nullptr, 10)) : 1;
     return std::max(full / 100 * share, 1) / (isSanitized ? 5 : 1) + 1;
 }
 

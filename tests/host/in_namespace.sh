@@ -22,7 +22,7 @@ fingerprint() {
 set -- --unshare-pid --die-with-parent \
     --ro-bind /usr /usr --ro-bind /usr/bin /real-bin --tmpfs /usr/bin --tmpfs /usr/sbin \
     --proc /proc --dev /dev --perms 1777 --tmpfs /tmp --dir /var/tmp --dir /run \
-    --size 65536 --tmpfs /small --ro-bind "$build" "$build" \
+    --size 65536 --tmpfs /small "${KESBLUETOOTH_BUILD_BIND:---ro-bind}" "$build" "$build" \
     --unsetenv DBUS_SYSTEM_BUS_ADDRESS --unsetenv DBUS_SESSION_BUS_ADDRESS \
     --setenv HOME /tmp --setenv KESBLUETOOTH_TEST_NAMESPACE 1 --chdir / \
     /real-bin/sh -c '
