@@ -128,7 +128,7 @@ Lookup appendDevice(Adapter& adapter, const std::string& entry, DeviceList& devi
     std::unique_ptr<Device> device(adapter.findDevice(entry.c_str(), true));
     if (device) {
         devices.push_back(device.get());
-        device.release();
+        static_cast<void>(device.release());
         return Lookup::Found;
     }
     const bool canBeSent = dbus_validate_utf8(entry.c_str(), nullptr);

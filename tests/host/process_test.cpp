@@ -1,4 +1,5 @@
 #include "core/process.h"
+#include "host/failing_new.h"
 
 #include <gtest/gtest.h>
 
@@ -9,36 +10,11 @@
 #include <unistd.h>
 
 #include <cerrno>
-#include <cstdlib>
 #include <cstring>
 #include <filesystem>
 #include <fstream>
 #include <iterator>
 #include <new>
-
-namespace {
-
-/// How many of this thread's next allocations succeed before one fails; -1: all.
-thread_local int allocationsLeft = -1;
-
-bool shallFail() {
-    if (allocationsLeft < 0)
-        return false;
-    return allocationsLeft-- == 0;
-}
-
-} // namespace
-
-void* operator new(std::size_t size) {
-    void* const memory = shallFail() ? nullptr : malloc(size);
-    return memory ? memory : throw std::bad_alloc();
-}
-void operator delete(void* memory) noexcept {
-    free(memory);
-}
-void operator delete(void* memory, std::size_t /*size*/) noexcept {
-    free(memory);
-}
 
 namespace Bluetooth::Test {
 
