@@ -56,7 +56,6 @@ Echoes callEchoes(int count, const std::string& name) {
 
 /// What the callback of the numbered signals finds.
 struct Numbers {
-    RemoteObject* caller = nullptr;
     std::atomic<int> next{0};
     std::atomic<int> outOfOrder{0};
     std::atomic<int> failedCalls{0};
@@ -68,9 +67,11 @@ Numbers& numbers() {
 }
 
 void onNumber(RemoteObject*, const char* text) {
+    static auto& caller =
+        *new RemoteObject(peerName, peerPath, peerInterface, DBUS_BUS_SESSION); // outlives the test
     if (std::stoi(text) != numbers().next)
         ++numbers().outOfOrder;
-    if (!callEcho(*numbers().caller, text))
+    if (!callEcho(caller, text))
         ++numbers().failedCalls;
     ++numbers().next;
 }
@@ -91,8 +92,6 @@ protected:
 TEST_F(ConcurrencyTest, NoReplyAndNoSignalIsLostWhenFourThreadsCallAndCallbacksCallBack) {
     constexpr int callsPerThread = isSanitized ? 1500 : 25000;
     constexpr int signalsPerBurst = 10; // every 5 ms: 2,000 a second
-    RemoteObject caller(peerName, peerPath, peerInterface, busType);
-    numbers().caller = &caller;
     ASSERT_EQ(proxy.setSignalHandlerString("Number", onNumber), 0);
     RawPeer source(bus.address());
     const ReceiveLoop running(loop);
@@ -108,6 +107,7 @@ TEST_F(ConcurrencyTest, NoReplyAndNoSignalIsLostWhenFourThreadsCallAndCallbacksC
     });
     std::vector<Echoes> echoes(4);
     std::vector<std::thread> callers;
+    callers.reserve(echoes.size());
     for (Echoes& result : echoes)
         callers.emplace_back([&] {
             result = callEchoes(callsPerThread, std::to_string(&result - echoes.data()) + "-");

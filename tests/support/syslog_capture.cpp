@@ -5,6 +5,7 @@
 #include <algorithm>
 #include <cstdarg>
 #include <cstdio>
+#include <cstdlib>
 
 namespace Bluetooth::Test {
 
@@ -16,14 +17,11 @@ Recorder<LogLine>& lines() {
 }
 
 void record(int priority, const char* format, va_list args) {
-    va_list again;
-    va_copy(again, args);
-    const int length = vsnprintf(nullptr, 0, format, again);
-    va_end(again);
-    std::string text(static_cast<std::size_t>(std::max(length, 0)) + 1, '\0');
-    vsnprintf(text.data(), text.size(), format, args);
-    text.pop_back();
+    char* text = nullptr;
+    if (vasprintf(&text, format, args) < 0)
+        return;
     lines().add({priority, text});
+    free(text);
 }
 
 } // namespace
@@ -71,6 +69,7 @@ bool SyslogCapture::waitForCount(std::size_t count, Milliseconds limit) const {
 } // namespace Bluetooth::Test
 
 // The library's calls end here, however it was compiled.
+// NOLINTBEGIN(bugprone-reserved-identifier,cert-dcl*,readability-inconsistent-declaration*)
 extern "C" {
 
 void syslog(int priority, const char* format, ...) {
@@ -95,3 +94,4 @@ void __vsyslog_chk(int priority, int /*flag*/, const char* format, va_list args)
     Bluetooth::Test::record(priority, format, args);
 }
 }
+// NOLINTEND(bugprone-reserved-identifier,cert-dcl*,readability-inconsistent-declaration*)
