@@ -19,12 +19,12 @@ off_t readableUpTo = std::numeric_limits<off_t>::max();
 } // namespace
 
 /// Replaces the C library's, also for the C++ library's streams.
-extern "C" [[gnu::visibility("default")]] ssize_t read(int descriptor, void* buffer, size_t size) {
-    if (lseek(descriptor, 0, SEEK_CUR) >= readableUpTo) {
+extern "C" [[gnu::visibility("default")]] ssize_t read(int fd, void* buf, size_t nbytes) {
+    if (lseek(fd, 0, SEEK_CUR) >= readableUpTo) {
         errno = EIO;
         return -1;
     }
-    return syscall(SYS_read, descriptor, buffer, size);
+    return syscall(SYS_read, fd, buf, nbytes);
 }
 
 namespace Bluetooth::Test {
