@@ -56,6 +56,14 @@ class Figures:
         other = self.median(processors, case, base, quantity)
         return value / other if value is not None and other else None
 
+    def overlap(self, processors, case, library, other):
+        """Whether the middle halves of two libraries' times overlap."""
+        first, second = (self.values[processors, case, name]["time"] for name in (library, other))
+        if min(len(first), len(second)) < 2:
+            return True
+        first, second = statistics.quantiles(first, n=4), statistics.quantiles(second, n=4)
+        return first[0] <= second[2] and second[0] <= first[2]
+
     def cases(self, processors, group):
         found = {case for where, case, _ in self.values if where == processors
                  and case.split("/")[0] == group}
@@ -111,29 +119,29 @@ SIGNALS = [("signal/idle", "200 a second"), ("signal/2000-per-second", "2,000 a 
            ("signal/2000-per-second-while-calling", "2,000 a second, another thread calls")]
 
 
-def goal(text, ratio, limit):
+def goal(figures, text, case, base, limit):
+    ratio = figures.ratio("one", case, OURS, base)
     verdict = "met" if ratio <= limit else "missed"
+    if limit == 1 and figures.overlap("one", case, OURS, base):
+        verdict = "level"
     return [text, f"× {ratio:.3f}", f"{'<' if limit == 1 else '≤'} {limit}", verdict]
 
 
 def goals(figures):
     rows = []
     for case, text in CALLS[:3]:
-        rows.append(goal(f"call, {text}: against raw libdbus",
-                         figures.ratio("one", case, OURS, LIMIT), 1.03))
+        rows.append(goal(figures, f"call, {text}: against raw libdbus", case, LIMIT, 1.03))
         for peer in LIBRARIES[2:]:
-            rows.append(goal(f"call, {text}: against {peer}",
-                             figures.ratio("one", case, OURS, peer), 1))
+            rows.append(goal(figures, f"call, {text}: against {peer}", case, peer, 1))
     for peer in ("sdbus-c++", "GDBus"):
-        worst = max(figures.ratio("one", case, OURS, peer)
-                    for case in figures.cases("one", "decode"))
-        rows.append(goal(f"decoding, worst size: against {peer}", worst, 1))
+        worst = max(figures.cases("one", "decode"),
+                    key=lambda case: figures.ratio("one", case, OURS, peer))
+        rows.append(goal(figures, f"decoding, worst size: against {peer}", worst, peer, 1))
     for case in figures.cases("one", "list"):
-        rows.append(goal(f"listing {case.split('/')[1]}: against raw libdbus",
-                         figures.ratio("one", case, OURS, LIMIT), 1.05))
+        rows.append(goal(figures, f"listing {case.split('/')[1]}: against raw libdbus", case, LIMIT,
+                         1.05))
     for peer in ("sdbus-c++", "GDBus"):
-        rows.append(goal(f"signal, idle: against {peer}",
-                         figures.ratio("one", "signal/idle", OURS, peer), 1))
+        rows.append(goal(figures, f"signal, idle: against {peer}", "signal/idle", peer, 1))
     return table(["goal", "time", "wanted", ""], rows)
 
 
@@ -212,9 +220,11 @@ scheduler puts whom and on what else the machine does.
 ## Goals
 
 {goals(figures)}
-Where sdbus-c++ is ahead it is ahead of raw libdbus too: libdbus reads and checks a small reply with
-some 15,000 instructions, which is what sd-bus takes for the whole call. Of the 29,000 that a call
-takes with kesbluetooth (59,000 with raw libdbus), all but 2,000 are libdbus's.
+"Level" means that the middle halves of both libraries' repetitions overlap.
+
+In small calls sdbus-c++ is ahead of raw libdbus, and so of kesbluetooth: libdbus reads and checks a
+text reply with 17,000 instructions, and sdbus-c++ makes the whole call with 13,000. It is 34,000
+with kesbluetooth and 59,000 with raw libdbus (counted by callgrind).
 
 ## Blocking calls
 
@@ -223,6 +233,9 @@ On all processors:
 
 {compared(figures, every, CALLS, LIBRARIES, "reply")}
 ## Signals, from emission to callback
+
+While another thread calls, it is that thread which reads a signal; the receive thread, on which all
+callbacks run, has to be woken for it.
 
 {compared(figures, one, SIGNALS, quick, "signals")}
 On all processors:
