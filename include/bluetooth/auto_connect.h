@@ -51,7 +51,7 @@ public:
     bool removeDevice(const char* adapter, const char* device);
 
     /// The devices of one adapter's list, enabled or not. Entries that the adapter does not know
-    /// are removed from an enabled file (removeDevice()), each distinct one once. Entries that the
+    /// are removed from an enabled file, one after the other (removeDevice()). Entries that the
     /// daemon gave no answer about (it hangs or restarts, the adapter was pulled out) are kept.
     /// @return a new list, possibly empty, deleted by the caller; null when the daemon or the
     ///         adapter is not there, or the file cannot be opened

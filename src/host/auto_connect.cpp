@@ -17,7 +17,6 @@
 #include <cerrno>
 #include <cstring>
 #include <memory>
-#include <set>
 #include <string>
 #include <vector>
 
@@ -137,18 +136,12 @@ Lookup appendDevice(Adapter& adapter, const std::string& entry, DeviceList& devi
 }
 
 /// Appends the devices that the adapter knows, in the file's order.
-/// @return the entries that it does not know, each once
+/// @return the entries that it does not know
 std::vector<std::string> appendKnown(Adapter& adapter, const std::vector<std::string>& entries,
                                      DeviceList& devices) {
     std::vector<std::string> unknown;
-    std::set<std::string> missing; // asked for once: a file may hold a million empty entries
     for (const std::string& entry : entries) {
-        if (missing.count(entry) != 0)
-            continue;
-        const Lookup lookup = appendDevice(adapter, entry, devices);
-        if (lookup != Lookup::Found)
-            missing.insert(entry);
-        if (lookup == Lookup::Unknown)
+        if (appendDevice(adapter, entry, devices) == Lookup::Unknown)
             unknown.push_back(entry);
     }
     return unknown;
