@@ -145,7 +145,7 @@ MessagePtr BusLink::call(DBusMessage* message, int timeoutMs, DBusError& error) 
         waiter.deadline = Clock::now() + Milliseconds(timeoutMs < 0 ? defaultTimeoutMs : timeoutMs);
     }
     {
-        // Sent without a pending call, which costs a third of the whole exchange: libdbus makes an
+        // Sent without a pending call, which is a third of the work of a raw call: libdbus makes an
         // error message for each beforehand. Locked from here on, so that the filter finds the
         // waiter however soon the reply comes; sending neither dispatches nor waits.
         Lock lock(m_mutex);
