@@ -20,7 +20,7 @@ std::string indented(const std::string& lines) {
     std::istringstream stream(lines);
     std::string result;
     for (std::string line; std::getline(stream, line);)
-        result += "  " + line + "\n";
+        result.append("  ").append(line).append("\n");
     return result;
 }
 
@@ -33,7 +33,8 @@ std::string checkAdapter(const std::string& text) {
 void addOptions(CLI::App& program, Options& options) {
     program.add_option("--adapter", options.adapter, "The adapter: hci0, or its address")
         ->type_name("ADAPTER")
-        ->transform([](std::string text) { return isAddress(text) ? upperCase(text) : text; })
+        ->transform(
+            [](const std::string& text) { return isAddress(text) ? upperCase(text) : text; })
         ->check(checkAdapter);
     program.add_flag("--json", options.json,
                      "Results for programs: one document, or one line for each event");

@@ -37,9 +37,9 @@ BusFeed::BusFeed(const std::vector<std::string>& rules)
         dbus_bus_add_match(m_connection.get(), rule.c_str(), &error);
         if (!dbus_error_is_set(&error))
             continue;
-        const Failure failure = refusal("cannot watch the bus", textOf(error.message));
+        const std::string reason = textOf(error.message);
         dbus_error_free(&error);
-        throw failure;
+        throw refusal("cannot watch the bus", reason);
     }
 }
 
@@ -76,7 +76,7 @@ bool BusFeed::isDaemonChange(const Signal& signal) {
 }
 
 bool BusFeed::isDaemonGone(const Signal& signal) {
-    return isDaemonChange(signal) && signal.arguments[2] == "";
+    return isDaemonChange(signal) && display(signal.arguments[2]).empty();
 }
 
 } // namespace Kesbt

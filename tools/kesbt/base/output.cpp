@@ -19,7 +19,7 @@ namespace {
 
 std::string hexadecimal(const Json& number, int digits) {
     char text[16];
-    std::snprintf(text, sizeof text, "0x%0*x", digits, number.get<unsigned>());
+    static_cast<void>(std::snprintf(text, sizeof text, "0x%0*x", digits, number.get<unsigned>()));
     return text;
 }
 
@@ -45,7 +45,8 @@ std::string formatTime(bool local, const char* format, const char* ending) {
     char seconds[32];
     const std::size_t length = strftime(seconds, sizeof seconds, format, &parts);
     char fraction[8];
-    std::snprintf(fraction, sizeof fraction, ".%03d", static_cast<int>(now.tv_usec / 1000) % 1000);
+    static_cast<void>(std::snprintf(fraction, sizeof fraction, ".%03d",
+                                    static_cast<int>(now.tv_usec / 1000) % 1000));
     return std::string(seconds, length) + fraction + ending;
 }
 
@@ -109,9 +110,10 @@ void printProperties(const Json& properties) {
         }
         std::string heading = name;
         for (const auto& element : value) {
-            const std::string text = display(element);
+            std::string text = display(element);
             const std::string meaning = uuidName(text);
-            table.add({{heading, Colour::Bold}, text + (meaning.empty() ? "" : "  ") + meaning});
+            text.append(meaning.empty() ? 0 : 2, ' ').append(meaning);
+            table.add({{heading, Colour::Bold}, text});
             heading.clear();
         }
     }

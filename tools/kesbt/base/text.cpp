@@ -27,8 +27,8 @@ std::string printable(const std::string& text) {
             result += "\\n";
         } else if (byte < 0x20 || byte == 0x7f || wide) {
             char escape[8];
-            std::snprintf(escape, sizeof escape, "\\x%02x",
-                          wide ? static_cast<unsigned char>(text[++i]) : byte);
+            static_cast<void>(std::snprintf(escape, sizeof escape, "\\x%02x",
+                                            wide ? static_cast<unsigned char>(text[++i]) : byte));
             result += escape;
         } else {
             result += text[i];
