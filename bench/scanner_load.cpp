@@ -96,6 +96,7 @@ struct Result {
 
 Result askFromAllClients(const char* program, int seconds) {
     std::vector<std::unique_ptr<ChildProcess>> clients;
+    clients.reserve(clientCount);
     for (int client = 0; client < clientCount; ++client)
         clients.push_back(std::make_unique<ChildProcess>(
             std::vector<std::string>{program, "--client", adapterNames[client % 2],
