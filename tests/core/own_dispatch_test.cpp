@@ -113,6 +113,7 @@ TEST_F(OwnDispatchTest, CallsAndSignalsOfOtherThreadsAreNotLostToIt) {
     mainLoop([&] { return callsDone && seen().count() == count; });
     caller.join();
     std::vector<std::string> expected;
+    expected.reserve(count);
     for (int i = 0; i < count; ++i)
         expected.push_back(std::to_string(i));
     EXPECT_EQ(seen().events(), expected);

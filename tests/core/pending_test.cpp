@@ -163,7 +163,7 @@ TEST_F(PendingTest, TheInterruptHandlersStayAndAnInterruptionInBetweenEndsTheNex
         sigaction(number, nullptr, &installed);
         EXPECT_NE(installed.sa_handler, SIG_DFL);
         EXPECT_TRUE(installed.sa_flags & SA_NOCLDSTOP);
-        raise(number);
+        EXPECT_EQ(raise(number), 0);
         EXPECT_EQ(callPending("Slow"), 0);
         expectNoReply();
     }
@@ -235,7 +235,7 @@ TEST_F(PendingTest, AnInterruptionLeavesTheRequestsThatAreStillQueued) {
     static const DBusObjectPathVTable interrupting = [] {
         DBusObjectPathVTable table{};
         table.message_function = [](DBusConnection* connection, DBusMessage* request, void* data) {
-            raise(SIGINT);
+            EXPECT_EQ(raise(SIGINT), 0);
             return serve(connection, request, data);
         };
         return table;

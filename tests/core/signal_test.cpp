@@ -400,6 +400,7 @@ TEST_F(SignalTest, ProxiesComeAndGoInOtherThreadsWhileSignalsAreDelivered) {
     };
     const ReceiveLoop running(loop);
     std::vector<std::thread> threads;
+    threads.reserve(3);
     for (int i = 0; i < 3; ++i) {
         threads.emplace_back([&] {
             for (int round = 0; round < 50; ++round) {
