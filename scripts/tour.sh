@@ -95,7 +95,9 @@ run kesbt wait found 00:11:22:33:44:08
 run kesbt scan list
 stop_all
 run kesbt scan stop
-kill "$(scannerd_pid)" # it would end by itself half a minute after its last new scan
+scannerd=$(scannerd_pid)
+kill "$scannerd" # it would end by itself half a minute after its last new scan
+while kill -0 "$scannerd" 2>/dev/null; do sleep 0.1; done
 
 if [ -n "${KES_TOUR_ISOLATED:-}" ]; then
     say "The headset is to be connected by itself whenever it appears"
