@@ -97,7 +97,7 @@ stop_all
 run kesbt scan stop
 scannerd=$(scannerd_pid)
 kill "$scannerd" # it would end by itself half a minute after its last new scan
-while kill -0 "$scannerd" 2>/dev/null; do sleep 0.1; done
+while [ -n "$(tr -d '\0' 2>/dev/null <"/proc/$scannerd/cmdline")" ]; do sleep 0.1; done
 
 if [ -n "${KES_TOUR_ISOLATED:-}" ]; then
     say "The headset is to be connected by itself whenever it appears"
