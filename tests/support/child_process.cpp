@@ -8,6 +8,7 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cstdlib>
 #include <stdexcept>
 
@@ -104,12 +105,20 @@ void ChildProcess::kill() {
 int ChildProcess::wait(Milliseconds limit) {
     if (m_status >= 0)
         return m_status;
+    const auto deadline = std::chrono::steady_clock::now() + limit;
     const auto descriptor = static_cast<int>(syscall(SYS_pidfd_open, m_pid, 0));
     pollfd ended{descriptor, POLLIN, 0};
-    poll(&ended, 1, static_cast<int>(limit.count()));
-    close(descriptor);
     int status = 0;
-    if (waitpid(m_pid, &status, WNOHANG) == m_pid)
+    bool isEnded = waitpid(m_pid, &status, WNOHANG) == m_pid;
+    while (!isEnded && std::chrono::steady_clock::now() < deadline) {
+        auto left = std::chrono::ceil<Milliseconds>(deadline - std::chrono::steady_clock::now());
+        if (descriptor < 0) // valgrind knows no such descriptors
+            left = std::min(left, Milliseconds(10));
+        poll(&ended, 1, static_cast<int>(left.count()));
+        isEnded = waitpid(m_pid, &status, WNOHANG) == m_pid;
+    }
+    close(descriptor);
+    if (isEnded)
         m_status = WIFEXITED(status) ? WEXITSTATUS(status) : 128 + WTERMSIG(status);
     return m_status;
 }
