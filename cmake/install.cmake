@@ -1,4 +1,5 @@
-# What an installation holds. Components: runtime (the library), dev, tools, sim.
+# What an installation holds. Components: runtime (the library), dev, doc, sim, and
+# one for each program: kesbt, scannerd, autoconnectd.
 include(CMakePackageConfigHelpers)
 
 install(TARGETS kesbluetooth EXPORT kesbluetoothTargets
