@@ -1,9 +1,9 @@
 # Installs a program to a prefix that is chosen only then, and checks that the file that starts it
 # names it there.
-#   cmake -Dscript=CMAKE_INSTALL_SCRIPT -Dprefix=FOLDER -Dfile=FILE_BELOW_IT -Dkey=KEY -P THIS
+#   cmake -Dscript=CMAKE_INSTALL_SCRIPT -Dcomponent=NAME -Dprefix=FOLDER -Dfile=FILE_BELOW_IT -Dkey=KEY -P THIS
 file(REMOVE_RECURSE ${prefix})
 execute_process(
-    COMMAND ${CMAKE_COMMAND} -DCMAKE_INSTALL_COMPONENT=tools -DCMAKE_INSTALL_PREFIX=${prefix}
+    COMMAND ${CMAKE_COMMAND} -DCMAKE_INSTALL_COMPONENT=${component} -DCMAKE_INSTALL_PREFIX=${prefix}
         -P ${script}
     OUTPUT_QUIET COMMAND_ERROR_IS_FATAL ANY)
 file(STRINGS ${prefix}/${file} line REGEX "^${key}=")
