@@ -3,5 +3,7 @@
 
 /// Marks what libkesbluetooth exports; everything else is built with hidden visibility.
 #define KESBLUETOOTH_API __attribute__((visibility("default")))
+/// Marks private members of exported classes that nobody else can use.
+#define KESBLUETOOTH_LOCAL __attribute__((visibility("hidden")))
 
 #endif

@@ -205,14 +205,16 @@ private:
     int appendBasic(int type, const void* value);
     DictResult parseDictionary(DBusMessageIter& iter, Dict& dict);
     template <class Wire, class Value>
-    int readBasic(int type, Value& value);
+    KESBLUETOOTH_LOCAL int readBasic(int type, Value& value);
     template <class Text>
-    int readTexts(std::vector<Text>& texts);
+    KESBLUETOOTH_LOCAL int readTexts(std::vector<Text>& texts);
 
     template <class Callback>
-    int subscribe(Registry<Callback>& registry, const char* member, Callback callback);
+    KESBLUETOOTH_LOCAL int subscribe(Registry<Callback>& registry, const char* member,
+                                     Callback callback);
     template <class Callback>
-    void takeMembers(Registry<Callback>& registry, std::vector<std::string>& members);
+    KESBLUETOOTH_LOCAL void takeMembers(Registry<Callback>& registry,
+                                        std::vector<std::string>& members);
     void unsubscribeAll();
     std::string matchRule(const std::string& member) const;
     static void dispatch(void* proxy, DBusMessage* message);
