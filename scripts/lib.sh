@@ -11,6 +11,7 @@ build_packages=(g++ cmake ninja-build pkg-config dbus libdbus-1-dev libglib2.0-d
     libdbus-glib-1-dev libbluetooth-dev libboost-dev libcli11-dev nlohmann-json3-dev)
 test_packages=(libgtest-dev bubblewrap)
 lint_packages=(clang-format-14 clang-tidy-14)
+docs_packages=(doxygen scdoc)
 bench_packages=(libbenchmark-dev libsdbus-c++-dev python3 util-linux)
 
 # Installs the named Debian packages that are missing; quiet when none is.

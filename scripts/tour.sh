@@ -1,21 +1,29 @@
 #!/usr/bin/env bash
-# The tour that try.sh shows. It expects the programs in PATH, and is run in a mount namespace of
-# its own where that is possible: what it writes to /etc and /tmp is then seen by nobody else.
+# A tour of what the programs do, against the simulated daemon on private buses. It expects the
+# programs in PATH and needs no Bluetooth. Where that is possible it runs in a mount namespace of its
+# own: what it writes to /etc and /tmp is then seen by nobody else.
 set -euo pipefail
 
-# The simulated adapters' hciconfig stands in /usr/bin, and /etc and /tmp can be written.
-if [ "${1:-}" = isolated ]; then
+case "${1:-}" in
+'')
+    enter=(unshare --mount)
+    [ "$(id -u)" -eq 0 ] || enter=(unshare --user --map-root-user --mount)
+    "${enter[@]}" true 2>/dev/null && exec "${enter[@]}" "$0" isolated
+    echo "Without namespaces: no HCI versions, and no auto-connect, which writes to /etc."
+    ;;
+isolated) # The simulated adapters' hciconfig stands in /usr/bin, and /etc and /tmp can be written.
+    hciconfig=${KES_TOUR_HCICONFIG:-$(dirname "$(realpath "$0")")/host}
     layer=$(mktemp -d)
     mount -t tmpfs tmpfs "$layer"
     mkdir "$layer"/{etc,etc-work,tmp,tmp-work}
-    mount -t overlay overlay -o "lowerdir=$KES_TOUR_HCICONFIG:/usr/bin" /usr/bin
+    mount -t overlay overlay -o "lowerdir=$hciconfig:/usr/bin" /usr/bin
     mount -t overlay overlay -o "lowerdir=/etc,upperdir=$layer/etc,workdir=$layer/etc-work" /etc
     mount -t overlay overlay -o "lowerdir=/tmp,upperdir=$layer/tmp,workdir=$layer/tmp-work" /tmp
     mkdir -p /etc/bluetooth
     mount -t tmpfs tmpfs /etc/bluetooth # one that was there belongs to somebody else
     export KES_TOUR_ISOLATED=1
-    shift
-fi
+    ;;
+esac
 if [ "${1:-}" != inside ]; then
     exec bluez4-sim ${KES_TOUR_SERVICES:+--session-services="$KES_TOUR_SERVICES"} -- "$0" inside
 fi

@@ -1,0 +1,72 @@
+# Debian packages, one for each component: `cpack` in a build folder that was configured for /usr,
+# or scripts/packages.sh. Names and versions follow from the project's version.
+set(CPACK_GENERATOR DEB)
+set(CPACK_PACKAGE_VENDOR "Kestrine Bluetooth")
+set(CPACK_PACKAGE_CONTACT "Kestrine Bluetooth developers <bluetooth@kestrine.com>")
+set(CPACK_PACKAGE_DESCRIPTION_FILE ${PROJECT_SOURCE_DIR}/packaging/description.txt)
+set(CPACK_STRIP_FILES ON)
+set(CPACK_DEB_COMPONENT_INSTALL ON)
+set(CPACK_COMPONENTS_ALL runtime dev doc sim kesbt scannerd autoconnectd)
+set(CPACK_DEBIAN_FILE_NAME DEB-DEFAULT)
+set(CPACK_DEBIAN_PACKAGE_RELEASE 1)
+set(CPACK_DEBIAN_PACKAGE_CONTROL_STRICT_PERMISSION ON)
+set(CPACK_DEBIAN_PACKAGE_SHLIBDEPS ON)
+set(CPACK_DEBIAN_PACKAGE_SHLIBDEPS_PRIVATE_DIRS ${PROJECT_BINARY_DIR}/src)
+set(version ${PROJECT_VERSION}-${CPACK_DEBIAN_PACKAGE_RELEASE})
+set(library libkesbluetooth${PROJECT_VERSION_MAJOR})
+
+# kesbluetooth_package(COMPONENT NAME SECTION DEPENDS SUMMARY TEXT)
+macro(kesbluetooth_package component name section depends summary text)
+    string(TOUPPER ${component} upper)
+    set(CPACK_DEBIAN_${upper}_PACKAGE_NAME ${name})
+    set(CPACK_DEBIAN_${upper}_PACKAGE_SECTION ${section})
+    set(CPACK_DEBIAN_${upper}_PACKAGE_DEPENDS "${depends}")
+    set(CPACK_DEBIAN_${upper}_DESCRIPTION "${summary}\n${text}")
+endmacro()
+
+kesbluetooth_package(runtime ${library} libs "" "Client library for the BlueZ 4 Bluetooth daemon"
+"Proxies for the manager, adapters, devices and their audio and remote-control
+interfaces over D-Bus, a pairing agent, and a scan that programs share.")
+set(CPACK_DEBIAN_RUNTIME_PACKAGE_GENERATE_SHLIBS ON)
+
+kesbluetooth_package(dev libkesbluetooth-dev libdevel
+    "${library} (= ${version}), libdbus-1-dev, libdbus-glib-1-dev, libboost-dev"
+    "Client library for the BlueZ 4 Bluetooth daemon - development files"
+"Headers, the CMake package kesbluetooth, the pkg-config file and kesbluetooth(7).
+bluez4-sim lets programs be tried without hardware.")
+set(CPACK_DEBIAN_DEV_PACKAGE_SUGGESTS "libkesbluetooth-doc, bluez4-sim")
+
+kesbluetooth_package(doc libkesbluetooth-doc doc ""
+    "Client library for the BlueZ 4 Bluetooth daemon - documentation"
+"The reference of all classes, pages on tasks, threads and lifetimes, and examples.")
+set(CPACK_DEBIAN_DOC_PACKAGE_ARCHITECTURE all)
+
+kesbluetooth_package(kesbt kesbt utils "${library} (>= ${PROJECT_VERSION})"
+    "Bluetooth from the command line, through BlueZ 4"
+"Shows adapters and devices, finds and pairs devices, connects headsets, answers
+pairing requests and keeps the auto-connect lists; for people and, with --json,
+for programs.")
+set(CPACK_DEBIAN_KESBT_PACKAGE_RECOMMENDS kesbt-scannerd)
+set(CPACK_DEBIAN_KESBT_PACKAGE_SUGGESTS "kesbt-autoconnectd, bluez4-sim")
+
+kesbluetooth_package(scannerd kesbt-scannerd utils "${library} (>= ${PROJECT_VERSION})"
+    "Bluetooth discovery that programs share"
+"Runs the discovery of BlueZ 4's daemon for several programs at once. The session
+bus starts it when it is asked.")
+set(CPACK_DEBIAN_SCANNERD_PACKAGE_RECOMMENDS "default-dbus-session-bus | dbus-session-bus")
+
+kesbluetooth_package(autoconnectd kesbt-autoconnectd utils "${library} (>= ${PROJECT_VERSION})"
+    "Connects listed Bluetooth devices whenever they are in reach"
+"Headsets of the auto-connect lists are connected as they appear. The service is
+not enabled by the installation.")
+set(maintainer ${PROJECT_SOURCE_DIR}/packaging/debian/autoconnectd)
+set(CPACK_DEBIAN_AUTOCONNECTD_PACKAGE_CONTROL_EXTRA
+    ${maintainer}/postinst ${maintainer}/prerm ${maintainer}/postrm)
+
+kesbluetooth_package(sim bluez4-sim devel "dbus-daemon | dbus, libglib2.0-bin"
+    "Simulated BlueZ 4 Bluetooth daemon"
+"Behaves on D-Bus as BlueZ 4.101 does, with adapters and devices that are told
+what to do, so that Bluetooth programs can be tried and tested without hardware.")
+set(CPACK_DEBIAN_SIM_PACKAGE_RECOMMENDS "kesbt, kesbt-scannerd, kesbt-autoconnectd")
+
+include(CPack)

@@ -1,0 +1,44 @@
+#!/bin/bash
+# What a new user does with the packages beside this file, in a Debian system that has nothing else:
+# installs them, takes the tour, reads a manual page, builds the examples, removes everything.
+set -euo pipefail
+cd /packages
+export DEBIAN_FRONTEND=noninteractive
+
+say() { printf '%s\n' "-- $*"; }
+fail() { printf '%s\n' "$*" >&2; exit 1; }
+install() { apt-get install -y -qq --no-install-recommends "$@" >install.log 2>&1 || { cat install.log >&2; fail "$* cannot be installed"; }; }
+package() { find /packages -name "$1_*.deb"; }
+
+apt-get update -qq
+install man-db
+say "The programs"
+install "$(package libkesbluetooth1)" "$(package kesbt)" "$(package kesbt-scannerd)" \
+    "$(package kesbt-autoconnectd)" "$(package bluez4-sim)"
+for program in kesbt kesbt-scannerd kesbt-autoconnectd bluez4-sim; do
+    "$program" --version | grep -q '[0-9]\.[0-9]' || fail "$program tells no version"
+    ! ldd "$(command -v "$program")" | grep 'not found' || fail "$program lacks a library"
+    man "$program" | grep -q 'EXIT STATUS' || fail "$program has no manual page"
+done
+[ -e /usr/share/dbus-1/services/com.kestrine.bluetooth.service ] || fail "no bus can start the scanner"
+grep -q '^ExecStart=/usr/bin/kesbt-autoconnectd$' /usr/lib/systemd/system/kesbt-autoconnectd.service
+
+say "The tour"
+/usr/share/kesbluetooth/tour.sh >tour.log 2>&1 || { cat tour.log >&2; fail "the tour fails"; }
+for shown in 'HCIVersion *4' '00:11:22:33:44:01' 'State=connected' 'That was the tour'; do
+    grep -q "$shown" tour.log || { cat tour.log >&2; fail "the tour does not show $shown"; }
+done
+
+say "The examples"
+# libbluetooth-dev has headers in the same folder.
+install "$(package libkesbluetooth-dev)" "$(package libkesbluetooth-doc)" libbluetooth-dev \
+    g++ make cmake pkg-config
+man kesbluetooth | grep -q Manager || fail "no manual page of the library"
+[ -s /usr/share/doc/libkesbluetooth-doc/html/index.html ] || fail "no reference"
+cp -r /usr/share/doc/libkesbluetooth-doc/examples /tmp/examples
+./run.sh /tmp/examples
+
+say "All of it goes again"
+apt-get purge -y -qq 'libkesbluetooth*' 'kesbt*' bluez4-sim >/dev/null 2>&1
+left=$(find / -xdev -path /packages -prune -o -path /var -prune -o -name '*kesb*' -print -o -name 'bluez4-sim*' -print)
+[ -z "$left" ] || fail "these are left behind: $left"
