@@ -6,7 +6,7 @@
 # BENCH_FOLDER names another build folder than build-bench.
 source "$(dirname "$0")/lib.sh"
 
-rounds=3 repetitions=30 lists=20 signals=3 idle=20 shortest=0.1 scanner=15
+rounds=3 repetitions=30 lists=20 signals=8 idle=20 shortest=0.1 scanner=15
 folder=${BENCH_FOLDER:-$root/build-bench} results=$root/docs
 case "${1:-}" in
 --quick) rounds=1 repetitions=3 lists=1 signals=1 idle=1 shortest=0.005 scanner=1 results=$folder ;;

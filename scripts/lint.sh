@@ -1,8 +1,9 @@
 #!/usr/bin/env bash
-# Checks the layout with clang-format and the code with clang-tidy; --fix lays the files out.
+# Checks the layout with clang-format and the code with clang-tidy; --fix lays the files out,
+# --layout checks the layout only.
 source "$(dirname "$0")/lib.sh"
 
-need_packages "${build_packages[@]}" "${test_packages[@]}" "${lint_packages[@]}"
+need_packages "${lint_packages[@]}"
 cd "$root"
 mapfile -t files < <(git ls-files '*.cpp' '*.h')
 if [ "${1:-}" = --fix ]; then
@@ -11,7 +12,9 @@ if [ "${1:-}" = --fix ]; then
 fi
 clang-format-14 --dry-run --Werror "${files[@]}"
 echo "clang-format: ${#files[@]} files are clean"
+[ "${1:-}" != --layout ] || exit 0
 
+need_packages "${build_packages[@]}" "${test_packages[@]}"
 build "$root/build" -DKESBLUETOOTH_BUILD_TESTS=ON
 # The benchmarks need libraries that nothing else does.
 mapfile -t sources < <(git ls-files '*.cpp' ':!bench/')
