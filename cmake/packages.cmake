@@ -3,7 +3,7 @@
 set(CPACK_GENERATOR DEB)
 set(CPACK_PACKAGE_VENDOR "Kestrine Bluetooth")
 set(CPACK_PACKAGE_CONTACT "Kestrine Bluetooth developers <bluetooth@kestrine.com>")
-set(CPACK_PACKAGE_DESCRIPTION_FILE ${PROJECT_SOURCE_DIR}/packaging/description.txt)
+set(CPACK_PACKAGE_DESCRIPTION_SUMMARY "") # each package has its own
 set(CPACK_STRIP_FILES ON)
 set(CPACK_DEB_COMPONENT_INSTALL ON)
 set(CPACK_COMPONENTS_ALL runtime dev doc sim kesbt scannerd autoconnectd)
@@ -11,6 +11,8 @@ set(CPACK_DEBIAN_FILE_NAME DEB-DEFAULT)
 set(CPACK_DEBIAN_PACKAGE_RELEASE 1)
 set(CPACK_DEBIAN_PACKAGE_CONTROL_STRICT_PERMISSION ON)
 set(CPACK_DEBIAN_PACKAGE_SHLIBDEPS ON)
+set(CPACK_DEBIAN_PACKAGE_GENERATE_SHLIBS ON)
+set(CPACK_DEBIAN_PACKAGE_GENERATE_SHLIBS_POLICY ">=")
 set(CPACK_DEBIAN_PACKAGE_SHLIBDEPS_PRIVATE_DIRS ${PROJECT_BINARY_DIR}/src)
 set(version ${PROJECT_VERSION}-${CPACK_DEBIAN_PACKAGE_RELEASE})
 set(library libkesbluetooth${PROJECT_VERSION_MAJOR})
@@ -27,7 +29,6 @@ endmacro()
 kesbluetooth_package(runtime ${library} libs "" "Client library for the BlueZ 4 Bluetooth daemon"
 "Proxies for the manager, adapters, devices and their audio and remote-control
 interfaces over D-Bus, a pairing agent, and a scan that programs share.")
-set(CPACK_DEBIAN_RUNTIME_PACKAGE_GENERATE_SHLIBS ON)
 
 kesbluetooth_package(dev libkesbluetooth-dev libdevel
     "${library} (= ${version}), libdbus-1-dev, libdbus-glib-1-dev, libboost-dev"
