@@ -40,10 +40,11 @@ public:
     /// Gives back one requestSession() (ReleaseSession). @return as requestSession()
     int releaseSession();
 
-    /// Starts (StartDiscovery) or stops (StopDiscovery) looking for devices. The daemon counts: it
-    /// needs one stop for each start. What is found is told by the signal DeviceFound.
+    /// Starts looking for devices (StartDiscovery). The daemon counts: it needs one stop for each
+    /// start. What is found is told by the signal DeviceFound.
     /// @return 0 when the call was handed to the bus, otherwise -1
     int startDiscovery();
+    /// Takes back one startDiscovery() (StopDiscovery). @return as startDiscovery()
     int stopDiscovery();
 
     /// Looks up a device that the daemon already knows (FindDevice).
@@ -93,6 +94,7 @@ public:
 
     /// Ends a createDevice() or createPairedDevice() of this process that is under way
     /// (CancelDeviceCreation), from another thread or after an interruption.
+    /// @param address see findDevice()
     /// @return 0 when the call was handed to the bus, otherwise -1
     int cancelDeviceCreation(const char* address);
 
@@ -108,6 +110,7 @@ public:
     /// Requests are answered only by a thread that dispatches the system bus connection, as
     /// createPairedDevice() does while it waits. One that the receive thread reads while nobody
     /// waits there stays unanswered, and the daemon gives up.
+    /// @param agent not owned; has to live until its unregisterPath()
     /// @return 0 when the call was handed to the bus, otherwise -1
     int registerAgent(const Agent& agent);
     /// Takes that back (UnregisterAgent). @return as registerAgent()
@@ -123,10 +126,13 @@ public:
     /// @param callback gets the device's address; null selects deviceDisappearedHandler()
     /// @return 0, or -1 when the bus refuses (logged)
     int setDeviceDisappearedHandler(StringCallback callback);
-    /// Each subscribes to the signal of its name: the daemon knows a new device, or forgot one.
-    /// @param callback gets the device's path; null selects the default callback below
+    /// Subscribes to DeviceCreated: the daemon knows a new device.
+    /// @param callback gets the device's path; null selects deviceCreatedHandler()
     /// @return 0, or -1 when the bus refuses (logged)
     int setDeviceCreatedHandler(ObjectPathCallback callback);
+    /// Subscribes to DeviceRemoved: the daemon has forgotten a device.
+    /// @param callback gets the device's path; null selects deviceRemovedHandler()
+    /// @return 0, or -1 when the bus refuses (logged)
     int setDeviceRemovedHandler(ObjectPathCallback callback);
 
     /// Default callback. Prints "ADDRESS was found by PATH", then the properties, one a line, then
@@ -135,9 +141,10 @@ public:
                                    const Dict* properties);
     /// Default callback. Prints "ADDRESS was disappeared in PATH".
     static void deviceDisappearedHandler(RemoteObject* sender, const char* address);
-    /// Default callbacks. They print "POINTER was created by PATH" and "POINTER was removed by
-    /// PATH", where POINTER is the argument's address in memory, not the device's path.
+    /// Default callback. Prints "POINTER was created by PATH", where POINTER is the argument's
+    /// address in memory, not the device's path.
     static void deviceCreatedHandler(RemoteObject* sender, const ObjectPath* device);
+    /// Default callback. Prints "POINTER was removed by PATH", with POINTER as above.
     static void deviceRemovedHandler(RemoteObject* sender, const ObjectPath* device);
 };
 

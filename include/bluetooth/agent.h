@@ -72,6 +72,7 @@ public:
     /// Sets whether passkeys, confirmations and authorisations are refused with
     /// org.bluez.Error.Rejected, at once; false by default. PIN codes are given all the same.
     void setReject(bool reject) { m_reject = reject; }
+    /// What setReject() set.
     bool getReject() const { return m_reject; }
 
     /// Replaces the function that gets every message to the agent's path. It serves from the next
@@ -84,6 +85,7 @@ public:
     /// @param capability not copied: it must outlive the agent
     /// @return 0; -1 for null
     int setCapability(const char* capability);
+    /// What setCapability() set.
     const char* getCapability() const { return m_capability; }
 
     /// What serves the agent's path unless setDispatcher() says otherwise: passes the message to
@@ -93,25 +95,31 @@ public:
     /// Does nothing; for programs that fill a handler table of their own.
     static void handlerUnregisterDispatcher(DBusConnection* connection, void* agent);
 
-    /// Each answers the method of its name on the connection that it came from.
+    /// Answers RequestPinCode on the connection that it came from. The other handlers do the same
+    /// for their methods.
     /// @return DBUS_HANDLER_RESULT_HANDLED when answered. Arguments that are not the method's are
     ///         logged and not answered, and are NOT_YET_HANDLED (but HANDLED for RequestPinCode).
     ///         NEED_MEMORY when no answer could be made (logged).
     static DBusHandlerResult requestPinCode(DBusConnection* connection, DBusMessage* message,
                                             void* agent);
+    /// Answers RequestPasskey. @return as requestPinCode()
     static DBusHandlerResult requestPasskey(DBusConnection* connection, DBusMessage* message,
                                             void* agent);
+    /// Answers RequestConfirmation. @return as requestPinCode()
     static DBusHandlerResult requestConfirmation(DBusConnection* connection, DBusMessage* message,
                                                  void* agent);
+    /// Answers Authorize. @return as requestPinCode()
     static DBusHandlerResult authorize(DBusConnection* connection, DBusMessage* message,
                                        void* agent);
+    /// Answers Cancel: the daemon gave a request up. @return as requestPinCode()
     static DBusHandlerResult cancel(DBusConnection* connection, DBusMessage* message, void* agent);
+    /// Answers Release: the daemon needs the agent no longer. @return as requestPinCode()
     static DBusHandlerResult release(DBusConnection* connection, DBusMessage* message, void* agent);
 
-    /// Do nothing, and handlerDispatcher() calls neither. @return NOT_YET_HANDLED
+    /// Does nothing, and handlerDispatcher() does not call it. @return NOT_YET_HANDLED
     static DBusHandlerResult displayPasskey(DBusConnection* connection, DBusMessage* message,
                                             void* agent);
-    /// @return HANDLED
+    /// Does nothing, and handlerDispatcher() does not call it. @return HANDLED
     static DBusHandlerResult confirmModeChange(DBusConnection* connection, DBusMessage* message,
                                                void* agent);
 

@@ -19,10 +19,11 @@ public:
     /// @return a new Audio, deleted by the caller; null when the daemon is not on the bus
     static Audio* getAudio(const char* path);
 
-    /// Asks the daemon to connect (Connect) or disconnect (Disconnect) all audio profiles that the
-    /// device has. Watch the property "State" to learn what came of it.
+    /// Asks the daemon to connect all audio profiles that the device has (Connect). Watch the
+    /// property "State" to learn what came of it.
     /// @return 0 when the call was handed to the bus, otherwise -1
     int connect();
+    /// Asks the daemon to disconnect them (Disconnect). @return as connect()
     int disconnect();
 };
 

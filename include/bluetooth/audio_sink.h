@@ -5,7 +5,8 @@
 
 namespace Bluetooth {
 
-/// The proxy of one remote device's stereo sink, e.g. a headset (interface org.bluez.AudioSink).
+/// The proxy of one remote device's stereo sink, such as a headset (interface
+/// org.bluez.AudioSink).
 ///
 /// Properties, threads, errors and what blocks: see BluezObject.
 /// Lifetime: created by getAudioSink() and deleted by the caller.
@@ -19,10 +20,11 @@ public:
     /// @return a new AudioSink, deleted by the caller; null when the daemon is not on the bus
     static AudioSink* getAudioSink(const char* path);
 
-    /// Asks the daemon to connect (Connect) or disconnect (Disconnect) the sink. The signals
-    /// Connected and Disconnected tell when it happened.
+    /// Asks the daemon to connect the sink (Connect). The signal Connected tells when it happened.
     /// @return 0 when the call was handed to the bus, otherwise -1
     int connect();
+    /// Asks the daemon to disconnect it (Disconnect). The signal Disconnected tells when it
+    /// happened. @return as connect()
     int disconnect();
 
     /// Asks whether the sink is connected (IsConnected).
@@ -31,21 +33,25 @@ public:
     /// Blocks until the daemon answers, at most 25 s.
     int isConnected(bool& connected);
 
-    /// Each subscribes to the signal of its name: the sink was connected or disconnected, audio
-    /// began or ceased to flow.
+    /// Subscribes to Connected: the sink was connected.
     /// @param callback gets the proxy that runs the loop, which need not be this one; null selects
-    ///                 the default callback below
+    ///                 the default callback, here connectedHandler()
     /// @return 0, or -1 when the bus refuses (logged)
     int setConnectedHandler(NoArgumentCallback callback);
+    /// Subscribes to Disconnected: the sink was disconnected. Otherwise as setConnectedHandler().
     int setDisconnectedHandler(NoArgumentCallback callback);
+    /// Subscribes to Playing: audio began to flow. Otherwise as setConnectedHandler().
     int setPlayingHandler(NoArgumentCallback callback);
+    /// Subscribes to Stopped: audio ceased to flow. Otherwise as setConnectedHandler().
     int setStoppedHandler(NoArgumentCallback callback);
 
-    /// Default callbacks. They print "Connected from PATH", "Disconnected from PATH", "Playing in
-    /// PATH" and "Stopped in PATH".
+    /// Default callback. Prints "Connected from PATH".
     static void connectedHandler(RemoteObject* sender);
+    /// Default callback. Prints "Disconnected from PATH".
     static void disconnectedHandler(RemoteObject* sender);
+    /// Default callback. Prints "Playing in PATH".
     static void playingHandler(RemoteObject* sender);
+    /// Default callback. Prints "Stopped in PATH".
     static void stoppedHandler(RemoteObject* sender);
 };
 

@@ -38,6 +38,8 @@ public:
     bool getEnable(const char* adapter) const;
 
     /// Rewrites the file and tells the daemon (reload(); that there may be none is no failure).
+    /// @param adapter    address of the adapter
+    /// @param enable     the flag
     /// @param deviceList written after the flag as it stands, so each address needs a comma before
     ///                   it: ",AA:BB:CC:DD:EE:FF". Without the first comma the text is written
     ///                   all the same, and readers miss its first character.
@@ -46,6 +48,8 @@ public:
 
     /// Drops every entry equal to `device` (case matters), rewrites the file and tells the daemon.
     /// The list of an adapter whose flag is not "1" is left as it is.
+    /// @param adapter address of the adapter
+    /// @param device  address of the device, as it is in the file
     /// @return true when the file was processed, whether or not it could be rewritten; false when
     ///         it is beyond 1 MiB or cannot be read to its end, which leaves it as it is
     bool removeDevice(const char* adapter, const char* device);
@@ -53,6 +57,7 @@ public:
     /// The devices of one adapter's list, enabled or not. Entries that the adapter does not know
     /// are removed from an enabled file, one after the other (removeDevice()). Entries that the
     /// daemon gave no answer about (it hangs or restarts, the adapter was pulled out) are kept.
+    /// @param adapter address of the adapter
     /// @return a new list, possibly empty, deleted by the caller; null when the daemon or the
     ///         adapter is not there, or the file cannot be opened
     /// Blocks for one call of the daemon for each entry.
@@ -65,6 +70,7 @@ public:
     DeviceList* getAutoConnectDeviceList();
 
     /// Writes a command to the daemon's pipe, as it stands and without a line end. Never waits.
+    /// @param command e.g. "pause"
     /// @return true when all of it was written; false also when no daemon reads the pipe
     bool sendCommand(const char* command) const;
     /// Tells the daemon to read the files again ("1").

@@ -3,6 +3,10 @@
 
 #include <bluetooth/export.h>
 
+/// @file
+/// What daemons and management tools need beside the Bluetooth daemon's objects. Any thread may call
+/// the functions.
+
 namespace Bluetooth {
 
 /// How long getNameFromAddr() waits for the remote device. The value is the time-out in
@@ -22,6 +26,7 @@ enum GetNameTimeout : int {
 /// The lock lasts as long as the descriptor, normally as long as the process; the file stays.
 /// It is a record lock: it belongs to the process (a second call of the same process succeeds),
 /// is not inherited by fork(), and ends when the process closes any descriptor of the file.
+/// @param path         the file; its folder must be there
 /// @param flags        bit 0 (value 1) makes the descriptor close-on-exec; others are ignored
 /// @param reportLocked whether it is logged that another process holds the lock
 /// @return the open descriptor; -1 on failure (logged) with errno set, EAGAIN or EACCES when
@@ -49,6 +54,7 @@ KESBLUETOOTH_API char* getAddressFromPath(const char* path);
 /// @param address the device, e.g. "00:11:22:33:44:55"
 /// @param name    receives the name, cut to fit and always terminated; untouched on failure
 /// @param size    size of `name` in bytes
+/// @param timeout how long to wait, in milliseconds
 /// @return 0, or -1
 /// Blocks until the device answers or the time is over.
 KESBLUETOOTH_API int getNameFromAddr(const char* address, char* name, int size,

@@ -23,6 +23,8 @@ class KESBLUETOOTH_API Connection {
 public:
     Connection() = delete;
 
+    /// Gives the connection, which is opened when the process has none to that bus.
+    /// @param type DBUS_BUS_SYSTEM or DBUS_BUS_SESSION
     /// @return the shared connection with one more reference, or null when the bus cannot be
     ///         reached (logged)
     /// Blocks while connecting. May be called from any thread.

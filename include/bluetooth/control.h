@@ -25,20 +25,24 @@ public:
     /// Blocks until the daemon answers, at most 25 s.
     int isConnected(bool& connected);
 
-    /// Presses and releases a volume key (VolumeDown, VolumeUp).
+    /// Presses and releases the key that lowers the volume (VolumeDown).
     /// @return 0 when the call was handed to the bus, whether or not the device reacts; else -1
     int volumeDown();
+    /// Presses and releases the key that raises the volume (VolumeUp). @return as volumeDown()
     int volumeUp();
 
-    /// Each subscribes to the signal of its name: the remote control was connected or disconnected.
+    /// Subscribes to Connected: the remote control was connected.
     /// @param callback gets the proxy that runs the loop, which need not be this one; null selects
-    ///                 the default callback below
+    ///                 the default callback, here connectedHandler()
     /// @return 0, or -1 when the bus refuses (logged)
     int setConnectedHandler(NoArgumentCallback callback);
+    /// Subscribes to Disconnected: the remote control was disconnected. Otherwise as
+    /// setConnectedHandler().
     int setDisconnectedHandler(NoArgumentCallback callback);
 
-    /// Default callbacks. They print "Connected from PATH" and "Disconnected from PATH".
+    /// Default callback. Prints "Connected from PATH".
     static void connectedHandler(RemoteObject* sender);
+    /// Default callback. Prints "Disconnected from PATH".
     static void disconnectedHandler(RemoteObject* sender);
 };
 

@@ -35,6 +35,7 @@ KESBLUETOOTH_API std::string stringArrayToString(const std::vector<std::string>&
 /// @return the entries in their order, each ended by a newline; "" for an empty dictionary
 KESBLUETOOTH_API std::string dictToString(const Dict& dict);
 
+/// @param dict       the properties
 /// @param terminator follows every entry, the last one too, e.g. ";"
 /// @return the entries in their order; "" for an empty dictionary
 KESBLUETOOTH_API std::string dictConquerToString(const Dict& dict, const std::string& terminator);
@@ -52,6 +53,7 @@ KESBLUETOOTH_API DictEntry* stringToEntry(const std::string& item);
 
 /// Parses a dictionary. Items without ":" are skipped. What follows the last separator is not
 /// read: every entry must be terminated, as dictConquerToString() does it.
+/// @param text       what to parse
 /// @param separators a set of characters, each of which ends an item
 /// @return a new dictionary, deleted by the caller; null when it would have no entry
 KESBLUETOOTH_API Dict* stringDivideToDict(const std::string& text, const std::string& separators);

@@ -1,6 +1,9 @@
 #ifndef KESBLUETOOTH_EXPORT_H
 #define KESBLUETOOTH_EXPORT_H
 
+/// @file
+/// What libkesbluetooth exports.
+
 /// Marks what libkesbluetooth exports; everything else is built with hidden visibility.
 #define KESBLUETOOTH_API __attribute__((visibility("default")))
 /// Marks private members of exported classes that nobody else can use.

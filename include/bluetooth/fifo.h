@@ -30,12 +30,14 @@ public:
     virtual ~Fifo();
 
     /// Writes once. Up to 4096 bytes (PIPE_BUF) are written whole or not at all.
+    /// @param data   what to write; null fails
     /// @param length number of bytes
     /// @return 0 when all was written; -1 otherwise (logged, except for null data): the pipe is
     ///         full or has no reader any more. No SIGPIPE is raised.
     int writeData(const void* data, int length);
 
     /// Reads once, waiting for the first byte.
+    /// @param buffer receives the bytes
     /// @param length the buffer's size in bytes
     /// @return 0, also at the end of the data and for fewer bytes than asked for; -1 on failure
     ///         (logged). The number of bytes is deliberately not told: clear the buffer first and

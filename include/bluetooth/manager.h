@@ -32,6 +32,7 @@ public:
     /// Gives the adapter that the daemon prefers (DefaultAdapter).
     /// @return a new Adapter, deleted by the caller; null when there is none, the daemon cannot be
     ///         reached, or leaves the bus meanwhile
+    /// Blocks until the daemon answers, at most 25 s. So do the three operations that follow.
     Adapter* defaultAdapter();
 
     /// Looks an adapter up (FindAdapter).
@@ -51,19 +52,23 @@ public:
     ///         Elements are null when the daemon leaves the bus meanwhile.
     AdapterList* listAdapters();
 
-    /// Each subscribes to the signal of its name: an adapter came or went, or another one is the
-    /// default adapter now.
+    /// Subscribes to AdapterAdded: an adapter was plugged in.
     /// @param callback called on the receive thread with this proxy and the adapter's path; null
-    ///                 selects the default callback below
+    ///                 selects the default callback, here adapterAddedHandler()
     /// @return 0, or -1 when the bus refuses (logged)
     int setAdapterAddedHandler(ObjectPathCallback callback);
+    /// Subscribes to AdapterRemoved: an adapter was pulled out. Otherwise as
+    /// setAdapterAddedHandler().
     int setAdapterRemovedHandler(ObjectPathCallback callback);
+    /// Subscribes to DefaultAdapterChanged: the daemon prefers another adapter now. Otherwise as
+    /// setAdapterAddedHandler().
     int setDefaultAdapterChangedHandler(ObjectPathCallback callback);
 
-    /// Default callbacks. They print "ADAPTER was added by /", "ADAPTER was removed by /" and
-    /// "Default adpater is ADAPTER in / now" (sic).
+    /// Default callback. Prints "ADAPTER was added by /".
     static void adapterAddedHandler(RemoteObject* sender, const ObjectPath* adapter);
+    /// Default callback. Prints "ADAPTER was removed by /".
     static void adapterRemovedHandler(RemoteObject* sender, const ObjectPath* adapter);
+    /// Default callback. Prints "Default adpater is ADAPTER in / now" (sic).
     static void defaultAdapterChangedHandler(RemoteObject* sender, const ObjectPath* adapter);
 };
 

@@ -14,6 +14,9 @@
 #include <string>
 #include <vector>
 
+/// @file
+/// The proxy that all others are made of, and the body of its receive thread.
+
 namespace Bluetooth {
 
 /// The proxy of one interface of one object of a remote D-Bus service.
@@ -42,6 +45,8 @@ public:
     /// @param destination bus name of the service, e.g. "org.bluez"
     /// @param path        object path, e.g. "/org/bluez/1234/hci0"
     /// @param interface   interface name, e.g. "org.bluez.Adapter"
+    /// @param busType     the service's bus: DBUS_BUS_SYSTEM or DBUS_BUS_SESSION
+    ///
     /// The texts are copied and must not be null. They are not checked here: a call through a
     /// proxy with an unusable name fails. Connects to the bus when the process has not yet; when
     /// that fails, calls fail too.
@@ -61,20 +66,28 @@ public:
     DBusConnection* getConnection() const { return m_connection; }
     /// This process's unique name on the bus, e.g. ":1.42"; "" without a connection.
     const char* getConnectionName() const;
+    /// The service's bus name as the constructor was given it; valid while the proxy lives.
     const char* getDestination() const { return m_destination.c_str(); }
+    /// The object path, in the same way.
     const char* getPath() const { return m_path.c_str(); }
+    /// The interface name, in the same way.
     const char* getInterface() const { return m_interface.c_str(); }
 
     /// Begins a method call and forgets the one begun before.
+    /// @param method the method's name, e.g. "GetProperties"
     /// @return 0; -1 with error 1 for a null name (the call begun before is kept) or error 6
     int newMessage(const char* method);
 
-    /// Each appends one argument (D-Bus type b, s, o, u, q) to the call begun by newMessage().
+    /// Appends one argument to the call begun by newMessage(): D-Bus type b.
     /// @return 0; -1 with error 1 for null, 3 for a path that does not begin with "/", else 7
     int append(bool value);
+    /// Appends one argument of D-Bus type s. @return as append(bool)
     int append(const char* text);
+    /// Appends one argument of D-Bus type o. @return as append(bool)
     int append(const ObjectPath& path);
+    /// Appends one argument of D-Bus type u. @return as append(bool)
     int append(unsigned int value);
+    /// Appends one argument of D-Bus type q. @return as append(bool)
     int append(unsigned short value);
 
     /// Appends one argument of D-Bus type v.
@@ -106,12 +119,16 @@ public:
     /// @param reply owned by the proxy afterwards; null is error 2
     int setReplyMessage(DBusMessage* reply);
 
-    /// Each reads the held reply's first argument and lets go of the reply.
+    /// Reads the held reply's first argument, a text, and lets go of the reply.
     /// @return 0; -1 with error 2 when no reply is held, 4 for an argument of another type
     int getReplyValue(std::string& text);
+    /// Reads a boolean. Otherwise as the one for a text.
     int getReplyValue(bool& value);
-    /// An empty array of any type is an empty list.
+    /// Reads an array of texts; an empty array of any type is an empty list. Otherwise as the one
+    /// for a text.
     int getReplyValue(std::vector<std::string>& texts);
+    /// Reads an array of paths; an empty array of any type is an empty list. Otherwise as the one
+    /// for a text.
     int getReplyValue(std::vector<ObjectPath>& paths);
 
     /// Reads a path. Services answer with a text where something went wrong: such a text is stored
@@ -126,14 +143,25 @@ public:
 
     /// Forgets the error.
     void resetError();
+    /// Whether an operation failed since resetError().
     bool hasError() const { return m_errorNumber != 0; }
     /// 0 for none; see getErrorMessage().
     int getErrorNumber() const { return m_errorNumber; }
-    /// The error as text: "" for none, the D-Bus error message for number 11, and for the others
-    /// 1 "Parameter is null", 2 "Reply message is null", 3 "Invalid path", 4 "Invalid reply value",
-    /// 5 "Invalid reply format", 6 "Failed to create message", 7 "Failed to append args to
-    /// message", 8 "Failed to append args = iterator", 9 "Failed to open container", 10 "Failed to
-    /// send message".
+    /// The error as text: "" for none, otherwise by getErrorNumber():
+    ///
+    /// | number | text                               |
+    /// |--------|------------------------------------|
+    /// | 1      | "Parameter is null"                |
+    /// | 2      | "Reply message is null"            |
+    /// | 3      | "Invalid path"                     |
+    /// | 4      | "Invalid reply value"              |
+    /// | 5      | "Invalid reply format"             |
+    /// | 6      | "Failed to create message"         |
+    /// | 7      | "Failed to append args to message" |
+    /// | 8      | "Failed to append args = iterator" |
+    /// | 9      | "Failed to open container"         |
+    /// | 10     | "Failed to send message"           |
+    /// | 11     | the D-Bus error's own text         |
     std::string getErrorMessage();
 
     /// Three lines that tell the destination, the path and the interface.
@@ -141,19 +169,23 @@ public:
     /// Writes getInfo() to standard output.
     void printInfo() const;
 
-    /// Each subscribes to a signal of this proxy's interface and path; the kind tells which
-    /// arguments the signal has. A signal fires for every proxy of its interface that subscribed
-    /// to it, whichever object sent it. Subscribing twice fires twice.
+    /// Subscribes to a signal of this proxy's interface and path. A signal fires for every proxy of
+    /// its interface that subscribed to it, whichever object sent it. Subscribing twice fires
+    /// twice. This operation is for signals without arguments, the others for their kinds.
     /// @param member   the signal's name, e.g. "PropertyChanged"
-    /// @param callback must not be null; called on the receive thread with this proxy, except that
-    ///                 a NoArgumentCallback gets the proxy that runs the loop
+    /// @param callback must not be null; called on the receive thread, here with the proxy that
+    ///                 runs the loop, in all other kinds with this proxy
     /// @return 0; -1 when the bus refuses or cannot be reached, or an argument is null or no
     ///         signal name (logged; nothing is subscribed)
     /// Blocks until the bus has answered.
     int setSignalHandlerNoArgument(const char* member, NoArgumentCallback callback);
+    /// For signals with a text. Otherwise as setSignalHandlerNoArgument().
     int setSignalHandlerString(const char* member, StringCallback callback);
+    /// For signals with a path. Otherwise as setSignalHandlerNoArgument().
     int setSignalHandlerObjectPath(const char* member, ObjectPathCallback callback);
+    /// For signals with a name and a value. Otherwise as setSignalHandlerNoArgument().
     int setSignalHandlerStringVariant(const char* member, StringVariantCallback callback);
+    /// For signals with a text and properties. Otherwise as setSignalHandlerNoArgument().
     int setSignalHandlerStringDict(const char* member, StringDictCallback callback);
 
     /// Starts the receive thread of this proxy's bus. One for each bus is enough for all proxies.
@@ -168,16 +200,22 @@ public:
     /// @return 0, or pthread_join's error number (ESRCH when startLoop() was not called)
     int waitLoop();
 
-    /// Each offers one message to the subscriptions of its kind; the receive thread calls them.
+    /// Offers one message to the subscriptions without arguments. The receive thread calls this and
+    /// the four that follow.
     void signalHandlerDispatcherNoArgument(DBusMessage* message);
+    /// Offers it to those with a text.
     void signalHandlerDispatcherString(DBusMessage* message);
+    /// Offers it to those with a path.
     void signalHandlerDispatcherObjectPath(DBusMessage* message);
+    /// Offers it to those with a name and a value.
     void signalHandlerDispatcherStringVariant(DBusMessage* message);
+    /// Offers it to those with a text and properties.
     void signalHandlerDispatcherStringDict(DBusMessage* message);
 
-    /// Each decodes one half of a dictionary entry, or of a (name, value) pair of arguments.
+    /// Decodes the name of a dictionary entry, or of a (name, value) pair of arguments.
     /// @return 0; -1 with error 4, and the half keeps what it held
     int parseEntryName(DBusMessageIter& iter, DictEntry& entry);
+    /// Decodes the value of it. @return as parseEntryName()
     int parseEntryValue(DBusMessageIter& iter, DictEntry& entry);
 
 private:

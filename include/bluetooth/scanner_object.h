@@ -11,6 +11,9 @@
 #include <set>
 #include <string>
 
+/// @file
+/// The served object of the scanner service, and the handlers of its methods.
+
 namespace Bluetooth {
 
 /// Addresses of devices ("00:11:22:33:44:55"), ordered byte by byte.
@@ -25,7 +28,7 @@ using AddressSet = std::set<std::string>;
 /// guarded by the current ScannerServer and change while its loop runs: read them only when it
 /// does not.
 struct KESBLUETOOTH_API ScannerObject {
-    GObject parent;
+    GObject parent; ///< what GObject keeps
     /// Adapter object path -> addresses found on that adapter and not disappeared.
     std::map<std::string, std::shared_ptr<AddressSet>> finders;
 

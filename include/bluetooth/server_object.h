@@ -11,6 +11,9 @@
 #include <memory>
 #include <mutex>
 
+/// @file
+/// The frame of a served object, and its timer.
+
 namespace Bluetooth {
 
 /// The frame of an object that this library serves on a bus with dbus-glib: the bus connection, the
@@ -27,6 +30,8 @@ public:
     /// goes away later.
     /// @param busName well-known name to request, e.g. "com.kestrine.bluetooth"
     /// @param path    object path to serve at, e.g. "/"
+    /// @param type    the bus: DBUS_BUS_SYSTEM or DBUS_BUS_SESSION
+    ///
     /// The texts are borrowed: they must outlive the object.
     ServerObject(const char* busName, const char* path, DBusBusType type);
     ServerObject(const ServerObject&) = delete;
@@ -70,11 +75,12 @@ public:
     /// This process's unique name on the bus, e.g. ":1.42"; "" without a connection.
     const char* getConnectionName() const;
 
-    /// On purpose these tell about the bus itself, whatever name and path are served:
-    /// "org.freedesktop.DBus", "/org/freedesktop/DBus" and "org.freedesktop.DBus". "" without a
-    /// connection.
+    /// "org.freedesktop.DBus": on purpose this and the next two tell about the bus itself, whatever
+    /// name and path are served. "" without a connection.
     const char* getBusName() const;
+    /// "/org/freedesktop/DBus"; "" without a connection.
     const char* getPath() const;
+    /// "org.freedesktop.DBus"; "" without a connection.
     const char* getInterface() const;
 
 private:

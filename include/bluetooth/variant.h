@@ -8,6 +8,9 @@
 #include <utility>
 #include <vector>
 
+/// @file
+/// The values of properties.
+
 namespace Bluetooth {
 
 /// The value of one property. The order of the alternatives is part of the interface; which()
