@@ -4,8 +4,7 @@
 #include <bluetooth/export.h>
 
 /// @file
-/// What daemons and management tools need beside the Bluetooth daemon's objects. Any thread may call
-/// the functions.
+/// What daemons and management tools need beside proxies. Any thread may call the functions.
 
 namespace Bluetooth {
 
