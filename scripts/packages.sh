@@ -28,7 +28,8 @@ debootstrap --variant=minbase bookworm "$system" "$mirror" >"$folder/debootstrap
 rm -f "$system/etc/apt/sources.list"
 cp -r /etc/apt/sources.list* /etc/apt/apt.conf.d "$system/etc/apt/"
 mkdir "$system/packages"
-cp "$folder"/*.deb "$root/tests/packages/user.sh" "$root/tests/examples/run.sh" "$system/packages/"
+cp "$folder"/*.deb "$root/tests/packages/user.sh" "$root/tests/examples/run.sh" \
+    "$root/README.md" "$system/packages/"
 
 # A root folder has to be a mount for namespaces to be made in it.
 unshare --mount --pid --fork bash -euc '

@@ -38,6 +38,12 @@ man kesbluetooth | grep -q Manager || fail "no manual page of the library"
 cp -r /usr/share/doc/libkesbluetooth-doc/examples /tmp/examples
 ./run.sh /tmp/examples
 
+say "The first program"
+sed -n '/^```cpp$/,/^```$/{/^```/!p}' README.md >first.cpp
+# shellcheck disable=SC2046 # one word for each flag
+g++ -std=c++17 first.cpp -o first $(pkg-config --cflags --libs kesbluetooth)
+bluez4-sim -- ./first | grep -q '^/org/bluez/[0-9]*/hci0$' || fail "the first program does not list hci0"
+
 say "All of it goes again"
 apt-get purge -y -qq 'libkesbluetooth*' 'kesbt*' bluez4-sim >/dev/null 2>&1
 left=$(find / -xdev -path /packages -prune -o -path /var -prune -o -name '*kesb*' -print -o -name 'bluez4-sim*' -print)
