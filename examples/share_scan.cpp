@@ -1,0 +1,48 @@
+// Shows the devices that the shared scan finds. Any number of programs may ask at once: the adapter
+// searches only once for all of them.
+//   share_scan [SECONDS]     10 by default
+#include <bluetooth/bluez_object.h>
+#include <bluetooth/dict_codec.h>
+#include <bluetooth/scanner.h>
+
+#include <cstdlib>
+#include <iostream>
+#include <memory>
+#include <set>
+#include <string>
+#include <unistd.h>
+
+using namespace Bluetooth;
+
+int fail(const std::string& text, int status = 1) {
+    std::cerr << text << '\n';
+    return status;
+}
+
+int main(int argc, char** argv) {
+    const long seconds = argc > 1 ? std::strtol(argv[1], nullptr, 10) : 10;
+    if (argc > 2 || seconds <= 0)
+        return fail("usage: share_scan [SECONDS]", 2);
+    if (!BluezObject::hasBluetoothd())
+        return fail("bluetoothd is not running; start it and try again");
+
+    Scanner scanner;
+    std::set<std::string> shown;
+    for (long second = 0; second < seconds; ++second) {
+        // The first question starts the service and its search: normally no device is there yet.
+        const std::unique_ptr<std::vector<std::pair<std::string, Dict*>>> devices(
+            scanner.listDevices("hci0", false));
+        if (!devices)
+            return fail(scanner.hasError()
+                            ? "is kesbt-scannerd installed? " + scanner.getErrorMessage()
+                            : "there is no adapter hci0; plug one in and try again");
+        for (const auto& [address, dict] : *devices) {
+            const std::unique_ptr<Dict> properties(dict); // ours, as the list is
+            if (shown.insert(address).second)
+                std::cout << address << "  " << find(properties.get(), "RSSI") << " dBm  "
+                          << find(properties.get(), "Name") << std::endl;
+        }
+        sleep(1);
+    }
+    return 0; // removeFinder() would end the search for everybody; the service ends by itself
+}

@@ -1,0 +1,16 @@
+#!/usr/bin/env bash
+# Writes the documentation of the classes and the pages to build/docs/html. Any warning is a failure.
+# Installs the Debian package that is missing.
+source "$(dirname "$0")/lib.sh"
+
+need_packages doxygen
+cd "$root"
+KESBLUETOOTH_VERSION=$(sed -n 's/^project(kesbluetooth VERSION \([0-9.]*\).*/\1/p' CMakeLists.txt)
+[ -n "$KESBLUETOOTH_VERSION" ] || die "CMakeLists.txt tells no version"
+KESBLUETOOTH_DOCS=$root/build/docs
+export KESBLUETOOTH_VERSION KESBLUETOOTH_DOCS
+rm -rf "$KESBLUETOOTH_DOCS"/{html,examples}
+mkdir -p "$KESBLUETOOTH_DOCS"
+doxygen docs/Doxyfile
+cp -r examples "$KESBLUETOOTH_DOCS/" # the pages link to them
+echo "Written: build/docs/html/index.html"
