@@ -23,6 +23,7 @@ public:
     explicit Adapter(const char* path);
     ~Adapter() override;
 
+    /// Makes the proxy of an adapter when the daemon is there (ListNames of the bus).
     /// @param path e.g. "/org/bluez/1234/hci0"; not checked
     /// @return a new Adapter, deleted by the caller; null when the daemon is not on the bus
     static Adapter* getAdapter(const char* path);
@@ -31,6 +32,7 @@ public:
     /// that /usr/bin/hciconfig tells. The text is empty when that program prints no version, and
     /// the entry is missing when it cannot be started (logged).
     /// @return a new dictionary, deleted by the caller; null when the daemon's part fails
+    ///
     /// Blocks until the daemon answers, at most 25 s, and while hciconfig runs.
     Dict* getProperties() override;
 
@@ -53,24 +55,28 @@ public:
     ///                 way
     /// @return a new Device, deleted by the caller; null when the daemon does not know the address,
     ///         cannot be reached, or leaves the bus meanwhile
+    ///
     /// Blocks until the daemon answers, at most 25 s.
     Device* findDevice(const char* address, bool logError);
 
     /// Gives the device at a place in the daemon's list (ListDevices).
     /// @param index from 0
     /// @return a new Device, deleted by the caller; null past the end (not logged) or on failure
+    ///
     /// Blocks until the daemon answers, at most 25 s.
     Device* getDeviceByIndex(unsigned int index);
 
     /// Lists all devices that the daemon knows on this adapter (ListDevices).
     /// @return a new list, deleted by the caller, empty when there is no device; null on failure.
     ///         Elements are null when the daemon leaves the bus meanwhile.
+    ///
     /// Blocks until the daemon answers, at most 25 s.
     DeviceList* listDevices();
 
     /// Connects to a device and makes it known to the daemon without pairing (CreateDevice).
     /// @param address see findDevice()
     /// @return a new Device, deleted by the caller; null on failure
+    ///
     /// Blocks until the daemon answers, at most 25 s: the daemon may still succeed after that.
     Device* createDevice(const char* address);
 

@@ -28,7 +28,7 @@ namespace Bluetooth {
 /// Lifetime: unregisterPath() comes before the destruction, which does not do it.
 class KESBLUETOOTH_API Agent {
 public:
-    /// What the agent can do, for setCapability().
+    // What the agent can do, for setCapability().
     static const char* const PSZ_NO_INPUT_NO_OUTPUT; ///< "NoInputNoOutput"
     static const char* const PSZ_KEYBOARD_ONLY;      ///< "KeyboardOnly"
     static const char* const PSZ_DISPLAY_YES_NO;     ///< "DisplayYesNo", the default
@@ -66,7 +66,7 @@ public:
     /// @param seconds 0 (the default) for not at all
     /// @return 0; -1 when negative (logged)
     int setPasskeyDelay(int seconds);
-    /// In seconds.
+    /// What setPasskeyDelay() set, in seconds.
     int getPasskeyDelay() const { return m_passkeyDelay; }
 
     /// Sets whether passkeys, confirmations and authorisations are refused with

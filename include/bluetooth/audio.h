@@ -15,6 +15,7 @@ public:
     explicit Audio(const char* path);
     ~Audio() override;
 
+    /// Makes the proxy of a device's audio when the daemon is there (ListNames of the bus).
     /// @param path the device's, e.g. "/org/bluez/1234/hci0/dev_00_11_22_33_44_55"; not checked
     /// @return a new Audio, deleted by the caller; null when the daemon is not on the bus
     static Audio* getAudio(const char* path);

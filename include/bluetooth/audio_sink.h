@@ -16,6 +16,7 @@ public:
     explicit AudioSink(const char* path);
     ~AudioSink() override;
 
+    /// Makes the proxy of a device's stereo sink when the daemon is there (ListNames of the bus).
     /// @param path the device's, e.g. "/org/bluez/1234/hci0/dev_00_11_22_33_44_55"; not checked
     /// @return a new AudioSink, deleted by the caller; null when the daemon is not on the bus
     static AudioSink* getAudioSink(const char* path);
@@ -30,6 +31,7 @@ public:
     /// Asks whether the sink is connected (IsConnected).
     /// @param connected receives the answer; unchanged on failure
     /// @return 0, or -1 on any failure
+    ///
     /// Blocks until the daemon answers, at most 25 s.
     int isConnected(bool& connected);
 

@@ -32,6 +32,7 @@ public:
     /// @return true for a regular file that may be read and written
     bool checkConfigFile(const char* path) const;
 
+    /// Tells whether an adapter's devices are to be connected.
     /// @param adapter address of the adapter, e.g. "AA:BB:CC:DD:EE:FF"
     /// @return the flag: true when the number at the beginning of the file is not 0; false also
     ///         when it cannot be read
@@ -60,6 +61,7 @@ public:
     /// @param adapter address of the adapter
     /// @return a new list, possibly empty, deleted by the caller; null when the daemon or the
     ///         adapter is not there, or the file cannot be opened
+    ///
     /// Blocks for one call of the daemon for each entry.
     DeviceList* getDeviceList(const char* adapter);
 

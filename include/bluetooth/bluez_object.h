@@ -22,6 +22,7 @@ namespace Bluetooth {
 /// threads at once. Signal callbacks run on the receive thread that startLoop() began.
 class KESBLUETOOTH_API BluezObject : public RemoteObject {
 public:
+    /// For the daemon's interfaces that have a class of their own, use that.
     /// @param path      object path, e.g. "/org/bluez/1234/hci0"
     /// @param interface interface name, e.g. "org.bluez.Adapter"
     BluezObject(const char* path, const char* interface);
@@ -29,6 +30,7 @@ public:
 
     /// Reads all properties of the object (GetProperties).
     /// @return a new dictionary, deleted by the caller; null on any failure, never a part of it
+    ///
     /// Blocks until the daemon answers, at most 25 s.
     virtual Dict* getProperties();
 
@@ -52,6 +54,7 @@ public:
     /// Tells whether the Bluetooth daemon is on the system bus at this moment. The bus is asked
     /// each time, once, since the daemon may come and go.
     /// @return false also when the bus cannot be asked
+    ///
     /// Blocks until the bus answers, at most 25 s.
     static bool hasBluetoothd();
 };

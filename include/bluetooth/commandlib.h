@@ -39,6 +39,7 @@ KESBLUETOOTH_API int createPidFile(const char* path, int flags, bool reportLocke
 /// The running daemon is found by its executable's path containing "bluetoothd" anywhere: a
 /// program of a longer name or in a folder of such a name counts too.
 /// @return 0 when bluetoothd runs afterwards; -1 otherwise (logged)
+///
 /// Blocks for 1 s when a daemon was killed, and until the started program returns.
 KESBLUETOOTH_API int restartBluetoothd();
 
@@ -55,6 +56,7 @@ KESBLUETOOTH_API char* getAddressFromPath(const char* path);
 /// @param size    size of `name` in bytes
 /// @param timeout how long to wait, in milliseconds
 /// @return 0, or -1
+///
 /// Blocks until the device answers or the time is over.
 KESBLUETOOTH_API int getNameFromAddr(const char* address, char* name, int size,
                                      GetNameTimeout timeout);

@@ -27,6 +27,7 @@ public:
     /// @param type DBUS_BUS_SYSTEM or DBUS_BUS_SESSION
     /// @return the shared connection with one more reference, or null when the bus cannot be
     ///         reached (logged)
+    ///
     /// Blocks while connecting. May be called from any thread.
     static DBusConnection* get(DBusBusType type);
 

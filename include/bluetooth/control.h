@@ -15,6 +15,7 @@ public:
     explicit Control(const char* path);
     ~Control() override;
 
+    /// Makes the proxy of a remote control when the daemon is there (ListNames of the bus).
     /// @param path the device's, e.g. "/org/bluez/1234/hci0/dev_00_11_22_33_44_55"; not checked
     /// @return a new Control, deleted by the caller; null when the daemon is not on the bus
     static Control* getControl(const char* path);
@@ -22,6 +23,7 @@ public:
     /// Asks whether the remote control is connected (IsConnected).
     /// @param connected receives the answer; unchanged on failure
     /// @return 0, or -1 on any failure
+    ///
     /// Blocks until the daemon answers, at most 25 s.
     int isConnected(bool& connected);
 

@@ -20,6 +20,7 @@ public:
     /// names such as ":1.42" and well-known ones such as "org.bluez".
     /// @return a new list, deleted by the caller; never null. On failure it is empty, the error is
     ///         logged and stays in the proxy (hasError()).
+    ///
     /// Blocks until the bus answers, at most 25 s.
     std::vector<std::string>* listNames();
 };

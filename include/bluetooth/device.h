@@ -15,6 +15,7 @@ public:
     explicit Device(const char* path);
     ~Device() override;
 
+    /// Makes the proxy of a device when the daemon is there (ListNames of the bus).
     /// @param path e.g. "/org/bluez/1234/hci0/dev_00_11_22_33_44_55"; not checked
     /// @return a new Device, deleted by the caller; null when the daemon is not on the bus
     static Device* getDevice(const char* path);
@@ -23,6 +24,7 @@ public:
     /// @param pattern which services: a UUID, a short one such as "0x110b", or "" for all
     /// @return a new dictionary, deleted by the caller, of record handle (in decimal) and record
     ///         (XML text); null on any failure, never a part of it
+    ///
     /// Blocks until the daemon answers, at most 25 s.
     Dict* discoverServices(const char* pattern);
 

@@ -21,20 +21,25 @@
 
 namespace Bluetooth {
 
+/// A value as text.
 /// @return the value as text: decimal digits for numbers, "1" or "0" for a boolean, a text as it
 ///         is, an array as stringArrayToString() gives it
 KESBLUETOOTH_API std::string variantToString(const Variant& value);
 
+/// A value as boolean.
 /// @return the boolean held; false for every other type. Nothing is converted: the text "1" is
-/// false
+///         false
 KESBLUETOOTH_API bool variantToBool(const Variant& value);
 
+/// An array as text.
 /// @return the elements joined by ", " in square brackets, e.g. "[a1, b2]"; "[]" for none
 KESBLUETOOTH_API std::string stringArrayToString(const std::vector<std::string>& texts);
 
+/// A dictionary as lines.
 /// @return the entries in their order, each ended by a newline; "" for an empty dictionary
 KESBLUETOOTH_API std::string dictToString(const Dict& dict);
 
+/// A dictionary as text, with a terminator of the caller's.
 /// @param dict       the properties
 /// @param terminator follows every entry, the last one too, e.g. ";"
 /// @return the entries in their order; "" for an empty dictionary

@@ -26,12 +26,14 @@ public:
     Manager();
     ~Manager() override;
 
+    /// Makes the proxy when the daemon is there (ListNames of the bus).
     /// @return a new Manager, deleted by the caller; null when the daemon is not on the bus
     static Manager* getManager();
 
     /// Gives the adapter that the daemon prefers (DefaultAdapter).
     /// @return a new Adapter, deleted by the caller; null when there is none, the daemon cannot be
     ///         reached, or leaves the bus meanwhile
+    ///
     /// Blocks until the daemon answers, at most 25 s. So do the three operations that follow.
     Adapter* defaultAdapter();
 

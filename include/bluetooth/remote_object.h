@@ -42,6 +42,7 @@ namespace Bluetooth {
 /// Subscribe before startLoop() where no signal may be missed.
 class KESBLUETOOTH_API RemoteObject {
 public:
+    /// Makes a proxy of any object.
     /// @param destination bus name of the service, e.g. "org.bluez"
     /// @param path        object path, e.g. "/org/bluez/1234/hci0"
     /// @param interface   interface name, e.g. "org.bluez.Adapter"
@@ -112,6 +113,7 @@ public:
     /// @return 0 when the call was sent, also when no reply came (getReplyValue() then gives error
     ///         2); -1 with error 11. A reply that is a D-Bus error counts as a reply: reading a
     ///         path from it gives its text.
+    ///
     /// One thread of the process at a time may wait here.
     int sendMessagePending();
 
@@ -177,6 +179,7 @@ public:
     ///                 runs the loop, in all other kinds with this proxy
     /// @return 0; -1 when the bus refuses or cannot be reached, or an argument is null or no
     ///         signal name (logged; nothing is subscribed)
+    ///
     /// Blocks until the bus has answered.
     int setSignalHandlerNoArgument(const char* member, NoArgumentCallback callback);
     /// For signals with a text. Otherwise as setSignalHandlerNoArgument().

@@ -40,6 +40,7 @@ struct KESBLUETOOTH_API ScannerObject {
     /// @return the new, empty set; null when there is no current server or no such adapter.
     ///         When the adapter has a finder already, that one is kept, and the returned set stays
     ///         empty though discovery was started once more.
+    ///
     /// The set is not the caller's; it is gone after scanner_object_remove_finder() for the
     /// adapter. Blocks until the daemon has answered.
     AddressSet* addFinder(const char* adapterId);
@@ -63,6 +64,7 @@ KESBLUETOOTH_API GType scanner_object_get_type();
 /// @param error     receives "Object %s not found", "Server %s not found", "Adapter %s not found"
 ///                  or "Set %s not found", with the adapterId
 /// @return FALSE with `error` set on failure
+///
 /// Blocks until the daemon has answered.
 KESBLUETOOTH_API gboolean scanner_object_list_devices(ScannerObject* object, const char* adapterId,
                                                       GHashTable** devices, GError** error);
@@ -74,6 +76,7 @@ KESBLUETOOTH_API gboolean scanner_object_list_devices(ScannerObject* object, con
 /// @param error receives "Scanner or AdapterId is null". On purpose it is not set for an adapter
 ///              that the daemon does not know: the bus then tells a text of its own.
 /// @return FALSE on failure
+///
 /// Blocks until the daemon has answered.
 KESBLUETOOTH_API gboolean scanner_object_remove_finder(ScannerObject* object, const char* adapterId,
                                                        GError** error);

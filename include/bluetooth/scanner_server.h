@@ -63,11 +63,13 @@ public:
     /// Reads from the daemon which devices it knows: they are left out of all answers. Done for
     /// each ListDevices. Without the daemon this is logged and none is left out.
     void updateFilterSet();
+    /// Tells which devices are left out of answers.
     /// @return whether the daemon knew the device when updateFilterSet() was called last
     bool isInFilterSet(const std::string& address);
 
     /// Keeps the properties of a found device, in place of those before.
     void putInfoToMap(const std::string& address, const std::string& text);
+    /// The properties of a found device.
     /// @return the text kept; "" for an unknown address, for which an empty entry is kept from then
     std::string getInfoFromMap(const std::string& address);
 

@@ -56,6 +56,7 @@ public:
     /// @return false, logged, when the bus did not take the request, the path is taken, or the bus
     ///         name or the path given to the constructor is none. Whether
     ///         the name came to be owned, or this process only waits for it, is not looked at.
+    ///
     /// Blocks until the bus answers.
     bool prepareObjectInfo(GType type, const DBusGObjectInfo* info, GObject* object);
 

@@ -37,6 +37,7 @@ using StringDictCallback = void (*)(RemoteObject* receiver, const char* text, co
 template <class Callback>
 class SignalHandler {
 public:
+    /// Keeps the three.
     /// @param subscriber the proxy, not owned
     /// @param signalName the signal's name
     /// @param function   what is to be called
