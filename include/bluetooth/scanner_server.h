@@ -81,7 +81,7 @@ private:
     friend class ServerObject; // startLoop() begins and ends the receiving
     friend class Finders;
 
-    /// A discovery that was started for a finder.
+    // A discovery that was started for a finder.
     struct Discovery {
         std::shared_ptr<Adapter> adapter;  // subscribed; destroying it ends the subscriptions
         std::shared_ptr<AddressSet> found; // the finder's, or nobody's when there was a finder
