@@ -10,8 +10,9 @@ namespace {
 
 constexpr const char* summary =
     "A simulated BlueZ 4 daemon: org.bluez without hardware.\n\n"
-    "With COMMAND, starts a private system bus and session bus with the daemon on them, runs the\n"
-    "command there and exits with its status. Without, serves on the system bus until SIGTERM.";
+    "With COMMAND, starts a private system bus and session bus with the daemon on\n"
+    "them, runs the command there and exits with its status. Without, serves on the\n"
+    "system bus until SIGTERM.";
 
 struct Raw {
     char* scenario = nullptr;
@@ -52,19 +53,19 @@ Options parseOptions(int argc, char** argv) {
         {"time-scale", 't', 0, G_OPTION_ARG_DOUBLE, &options.timeScale,
          "Multiply all simulated times, e.g. 0.01", "X"},
         {"ready-fd", 0, 0, G_OPTION_ARG_INT, &options.readyFd,
-         "Write a line to this descriptor once the adapters are there", "FD"},
+         "Write a line there once the adapters are up", "FD"},
         {"print-ready", 0, 0, G_OPTION_ARG_NONE, &raw.printReady, "The same on standard output",
          nullptr},
         {"verbose", 'v', 0, G_OPTION_ARG_NONE, &raw.verbose, "Write each call to standard error",
          nullptr},
         {"no-daemon", 0, 0, G_OPTION_ARG_NONE, &raw.noDaemon,
-         "Private buses only, for a command that shall miss the daemon", nullptr},
+         "Private buses only: the command misses the daemon", nullptr},
         {"session-services", 0, 0, G_OPTION_ARG_FILENAME_ARRAY, &raw.sessionServices,
-         "Folder of service files for the private session bus (repeatable)", "DIR"},
+         "Service files for the session bus (repeatable)", "DIR"},
         {"list-scenario", 0, 0, G_OPTION_ARG_NONE, &raw.listScenario,
          "Print the built-in scenario and exit", nullptr},
         {"list-behaviours", 0, 0, G_OPTION_ARG_NONE, &raw.listBehaviours,
-         "Print the behaviours that a device can have and exit", nullptr},
+         "Print the behaviours of devices and exit", nullptr},
         {"version", 0, 0, G_OPTION_ARG_NONE, &raw.version, "Print the version and exit", nullptr},
         {G_OPTION_REMAINING, 0, 0, G_OPTION_ARG_FILENAME_ARRAY, &raw.command, nullptr, nullptr},
         {nullptr, 0, 0, G_OPTION_ARG_NONE, nullptr, nullptr, nullptr}};

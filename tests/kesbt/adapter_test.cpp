@@ -6,23 +6,12 @@ namespace {
 
 class AdapterVerbs : public KesbtTest {};
 
-TEST_F(AdapterVerbs, ListAndInfoHaveStableJson) {
+TEST_F(AdapterVerbs, AdaptersAreListedAndChosenByNameOrAddress) {
     const Json adapters = run({"adapters", "--json"}).json();
     ASSERT_EQ(adapters.size(), 2U);
-    EXPECT_EQ(keys(adapters[0]), (Arguments{"adapter", "path", "default", "properties"}));
-    EXPECT_EQ(adapters[0]["adapter"], "hci0");
     EXPECT_EQ(adapters[0]["default"], true);
     EXPECT_EQ(adapters[1]["default"], false);
-
-    const Json info = run({"--json", "adapter", "info"}).json();
-    EXPECT_EQ(info["path"], adapters[0]["path"]);
-    EXPECT_EQ(info["properties"]["Address"], "00:1A:7D:DA:71:10");
-    EXPECT_EQ(info["properties"]["Class"], 0x6e0100);
-    EXPECT_EQ(info["properties"]["Powered"], true);
-    EXPECT_TRUE(info["properties"]["UUIDs"].is_array());
-}
-
-TEST_F(AdapterVerbs, AnAdapterIsChosenByNameOrAddress) {
+    EXPECT_EQ(run({"--json", "adapter", "info"}).json()["path"], adapters[0]["path"]);
     for (const char* choice : {"hci1", "00:1A:7D:DA:71:11", "00:1a:7d:da:71:11"})
         EXPECT_EQ(run({"--adapter", choice, "adapter", "--json"}).json()["adapter"], "hci1");
     EXPECT_EQ(failure({"adapter", "--adapter", "hci9"}),
@@ -55,7 +44,7 @@ TEST_F(AdapterVerbs, SetRefusesWhatCannotBeSet) {
     EXPECT_EQ(adapterProperties()["PairableTimeout"], 0);
 }
 
-TEST_F(AdapterVerbs, ACallThatIsAcceptedButDoesNothingIsAFailure) {
+TEST_F(AdapterVerbs, ACallThatDoesNothingOrIsNotAnsweredIsAFailure) {
     // The daemon answers and changes nothing: only reading back shows it.
     peer = std::make_unique<RawPeer>(bus.address());
     control("DropName");
@@ -71,6 +60,11 @@ TEST_F(AdapterVerbs, ACallThatIsAcceptedButDoesNothingIsAFailure) {
     EXPECT_NE(failure({"--timeout", "0.3", "adapter", "set", "Powered", "off"})
                   .find("Did not receive a reply"),
               std::string::npos);
+    // The library's own calls wait for longer than the user wants to.
+    liar.neverReply("GetProperties");
+    EXPECT_EQ(failure({"--timeout", "0.3", "adapter", "set", "Powered", "off"}),
+              "no answer within the time-out; try again or give a longer --timeout\n");
+    failure({"adapter", "info", "--timeout", "0.3"});
 }
 
 TEST_F(AdapterVerbs, NamesFromOutsideCannotControlTheTerminal) {
@@ -86,7 +80,9 @@ TEST_F(AdapterVerbs, ColoursAreForTerminalsOnlyAndNoColorEndsThem) {
             .out;
     };
     EXPECT_NE(onTerminal("X=").find("\033["), std::string::npos);
+    EXPECT_NE(onTerminal("NO_COLOR=").find("\033["), std::string::npos); // not empty, to count
     EXPECT_EQ(onTerminal("NO_COLOR=1").find("\033["), std::string::npos);
+    EXPECT_EQ(onTerminal("TERM=dumb").find("\033["), std::string::npos);
     EXPECT_EQ(run({"adapters"}).out.find("\033["), std::string::npos);
 }
 

@@ -93,6 +93,28 @@ TEST_F(HostVerbs, CommandsNeedTheAutoConnectDaemon) {
     EXPECT_EQ(reader.readAll(), "pause");
 }
 
+TEST_F(HostVerbs, ARestartedDaemonHasToComeToTheBus) {
+    if (geteuid() != 0)
+        GTEST_SKIP() << "only root may restart bluetoothd";
+    const auto install = [](const std::string& program, const std::string& arguments = "") {
+        const std::string copy = "/usr/sbin/bluetoothd-program"; // told by its executable's name
+        std::filesystem::remove(copy);
+        std::filesystem::copy_file(program, copy);
+        std::ofstream("/usr/sbin/bluetoothd") << "#!/bin/sh\n"
+                                              << copy << arguments << " >/dev/null 2>&1 &\n";
+        std::filesystem::permissions("/usr/sbin/bluetoothd", std::filesystem::perms::owner_all);
+    };
+    std::ofstream("/tmp/bluetooth.info_hci0");
+    daemon->kill();
+    install("/usr/bin/sleep", " 60");
+    EXPECT_EQ(failure({"restart-daemon", "--timeout", "0.2"}),
+              "bluetoothd was started and did not come to the system bus within the time-out; try "
+              "again or give a longer --timeout\n");
+    install(BLUEZ4_SIM);
+    EXPECT_EQ(run({"restart-daemon", "--json"}).json(), (Json{{"restarted", true}}));
+    EXPECT_EQ(run({"adapters"}).status, 0);
+}
+
 TEST_F(HostVerbs, WithoutAdaptersThereIsNothingToRestartOrAsk) {
     const Result name = run({"name", headset, "--timeout", "100"});
     EXPECT_EQ(name.status, 1);

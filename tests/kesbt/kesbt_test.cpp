@@ -64,13 +64,6 @@ std::string failure(const Arguments& arguments, int status) {
     return result.err;
 }
 
-std::vector<std::string> keys(const Json& object) {
-    std::vector<std::string> names;
-    for (const auto& [name, value] : object.items())
-        names.push_back(name);
-    return names;
-}
-
 Json awaitEvent(ChildProcess& program, const std::string& member, const Json& value) {
     for (std::string line = program.readLine(); !line.empty(); line = program.readLine()) {
         const Json event = Json::parse(line);

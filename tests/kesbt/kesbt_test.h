@@ -53,9 +53,6 @@ Result runCommand(const Arguments& command);
 /// standard output. @return the line
 std::string failure(const Arguments& arguments, int status = 1);
 
-/// The names of an object's members, in their order.
-std::vector<std::string> keys(const Json& object);
-
 /// The next event of a stream for which `member` is `value`.
 Json awaitEvent(ChildProcess& program, const std::string& member, const Json& value);
 

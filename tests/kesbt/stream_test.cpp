@@ -33,7 +33,6 @@ TEST_F(Streams, DiscoverTellsWhatAppearsChangesAndVanishes) {
         w(gps).dict("sv", [](Writer& d) { d.entry("RSSI", Var{std::int32_t{-20}}); });
     });
     const Json changed = awaitEvent(*discover, "address", gps);
-    EXPECT_EQ(keys(changed), (Arguments{"event", "time", "address", "properties", "changed"}));
     EXPECT_EQ(changed["event"], "changed");
     EXPECT_EQ(changed["changed"], Json::array({"RSSI"}));
     EXPECT_EQ(changed["properties"]["RSSI"], -20);
@@ -90,8 +89,6 @@ TEST_F(Streams, MonitorShowsEverySignalAlsoOfWhatComesLater) {
 
     run({"adapter", "set", "Discoverable", "on"});
     const Json changed = awaitEvent(*monitor, "arguments", {"Discoverable", true});
-    EXPECT_EQ(keys(changed),
-              (Arguments{"event", "time", "path", "interface", "member", "arguments"}));
     EXPECT_EQ(changed["interface"], "org.bluez.Adapter");
     EXPECT_EQ(changed["member"], "PropertyChanged");
 
@@ -126,8 +123,6 @@ TEST_F(Streams, MonitorIsReadableByPeople) {
 
 TEST_F(Streams, WaitEndsWhenItIsSoAndFailsWhenTimeIsOver) {
     EXPECT_EQ(run({"wait", "found", gps}), (Result{0, "00:11:22:33:44:04 is found\n", ""}));
-    EXPECT_EQ(run({"wait", "powered", "--json"}).json(),
-              (Json{{"subject", "hci0"}, {"reached", "powered"}}));
     EXPECT_EQ(failure({"--timeout", "0.2", "wait", "connected", mouse}),
               "00:11:22:33:44:06 was not connected within the time-out; try again or give a longer "
               "--timeout\n");
@@ -144,6 +139,17 @@ TEST_F(Streams, WaitEndsWhenItIsSoAndFailsWhenTimeIsOver) {
     expectEnd(*interrupted, 1,
               "interrupted before 00:11:22:33:44:07 was paired; repeat the command to go on "
               "waiting\n");
+
+    // What cannot come true any more is not waited for.
+    const auto searching = start({"wait", "found", "00:11:22:33:44:99"});
+    awaitCall("StartDiscovery", 2);
+    run({"adapter", "set", "Powered", "off"});
+    expectEnd(*searching, 1,
+              "hci0 was switched off; switch it on: kesbt adapter set Powered true\n");
+    const auto pulledOut = start({"wait", "powered"});
+    awaitCall("GetProperties", calls("GetProperties") + 1);
+    control("RemoveAdapter", [](Writer& w) { w("hci0"); });
+    expectEnd(*pulledOut, 1, "hci0 was removed; plug it in and repeat the command\n");
 }
 
 } // namespace

@@ -6,15 +6,18 @@ namespace Bluetooth::Test {
 
 namespace {
 
-const Arguments verbs = {"names",    "monitor",     "adapters", "adapter",        "discover",
-                         "scan",     "devices",     "device",   "create",         "remove",
-                         "services", "pair",        "cancel",   "agent",          "audio",
-                         "volume",   "autoconnect", "name",     "restart-daemon", "wait"};
-
 TEST(Usage, WrongUsageIsOneLineThatSaysWhereToReadOnAndStatus2) {
     const std::vector<std::pair<Arguments, std::string>> wrong = {
         {{}, "a verb is missing; see: kesbt --help\n"},
-        {{"adaptres"}, "there is no verb \"adaptres\"; see: kesbt --help\n"},
+        {{"help"}, "there is no verb \"help\"; see: kesbt --help\n"},
+        {{"adaptres"},
+         "there is no verb \"adaptres\" (did you mean adapters?); see: kesbt --help\n"},
+        {{"wait", "pared", headset},
+         "there is no verb \"pared\" (did you mean paired?); see: kesbt wait --help\n"},
+        {{"devices", "--timout=5"},
+         "there is no option \"--timout=5\" (did you mean --timeout?); see: kesbt devices "
+         "--help\n"},
+        {{"devices", "too", "much"}, "\"too\" is too much; see: kesbt devices --help\n"},
         {{"audio"}, "a verb is missing; see: kesbt audio --help\n"},
         {{"audio", "play", headset}, "there is no verb \"play\"; see: kesbt audio --help\n"},
         {{"device"}, "ADDRESS is required; see: kesbt device --help\n"},
@@ -28,7 +31,8 @@ TEST(Usage, WrongUsageIsOneLineThatSaysWhereToReadOnAndStatus2) {
         {{"pair", headset, "--pin", "12345678901234567"},
          "--pin: a PIN has 1 to 16 characters; see: kesbt pair --help\n"},
         {{"pair", headset, "--capability", "Telepathy"},
-         "--capability: \"Telepathy\" is no capability; see: kesbt pair --help\n"},
+         "--capability: \"Telepathy\" is none of DisplayYesNo, DisplayOnly, KeyboardOnly, "
+         "NoInputNoOutput; see: kesbt pair --help\n"},
         {{"agent", "--delay", "-1"},
          "--delay: \"-1\" is no number from 0 to 9999; see: kesbt agent --help\n"},
         {{"name", headset, "--timeout", "soon"},
@@ -36,31 +40,14 @@ TEST(Usage, WrongUsageIsOneLineThatSaysWhereToReadOnAndStatus2) {
     };
     for (const auto& [arguments, line] : wrong)
         EXPECT_EQ(failure(arguments, 2), line);
-    failure({"devices", "too", "much"}, 2);
-    failure({"devices", "--colour"}, 2);
 }
 
-TEST(Usage, EveryVerbHasHelpWithExamples) {
-    const Result help = run({"--help"});
-    EXPECT_EQ(help.status, 0);
-    EXPECT_EQ(help.err, "");
-    for (const std::string& verb : verbs) {
-        EXPECT_NE(help.out.find("\n  " + verb + " "), std::string::npos) << verb;
-        const Result own = run({verb, "--help"});
-        EXPECT_EQ(own.status, 0);
-        EXPECT_NE(own.out.find("Examples:\n  kesbt "), std::string::npos) << own;
-    }
+TEST(Usage, ResultsThatCannotBeWrittenAreAFailureAndGoNowhereElse) {
     EXPECT_EQ(run({"--version"}), (Result{0, "kesbt " KESBT_VERSION "\n", ""}));
-}
-
-TEST(Usage, ResultsThatCannotBeWrittenAreAFailure) {
     EXPECT_EQ(runCommand({"sh", "-c", std::string(KESBT) + " --help >/dev/full"}),
               (Result{1, "",
                       "cannot write the results: No space left on device; check where "
                       "standard output goes\n"}));
-}
-
-TEST(Usage, ResultsGoNowhereElseWhenStandardOutputIsClosed) {
     const PrivateBus bus(PrivateBus::Kind::System);
     EXPECT_EQ(runCommand({"sh", "-c", std::string(KESBT) + " names >&-"}),
               (Result{1, "", "standard output is closed; give results somewhere to go\n"}));

@@ -48,16 +48,16 @@ int fail(const std::string& problem) {
 
 /// @return -1 to go on, otherwise the exit status
 int parse(int argc, char** argv, Options& options) {
-    CLI::App app("Connects the Bluetooth devices of the auto-connect files "
+    CLI::App app("Connects the Bluetooth devices of the auto-connect files\n"
                  "(/etc/bluetooth/autoconnect/) and keeps them connected.",
                  PROGRAM);
     app.set_version_flag("--version", std::string(PROGRAM) + ' ' + KESBLUETOOTH_VERSION);
     app.add_flag("-f,--foreground", options.foreground,
-                 "Stay in the foreground and log to standard error too");
+                 "Stay in the foreground, log to standard error too");
     app.add_option("--pid-file", options.pidFile, "PID file and lock of the only instance")
         ->capture_default_str();
     app.add_option("--interval", options.interval,
-                   "Seconds to the second attempt at a device that is away; doubles each time")
+                   "Seconds to the second attempt at a device that is\naway; doubles each time")
         ->capture_default_str()
         ->check(CLI::Range(1, DAY));
     app.add_option("--max-interval", options.maxInterval, "Longest time between two attempts")

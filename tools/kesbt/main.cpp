@@ -1,5 +1,6 @@
 // kesbt: works with Bluetooth from the command line, through BlueZ 4's bluetoothd.
 
+#include "base/answer_limit.h"
 #include "base/failure.h"
 #include "base/output.h"
 #include "base/text.h"
@@ -37,13 +38,14 @@ void addOptions(CLI::App& program, Options& options) {
             [](const std::string& text) { return isAddress(text) ? upperCase(text) : text; })
         ->check(checkAdapter);
     program.add_flag("--json", options.json,
-                     "Results for programs: one document, or one line for each event");
+                     "Results for programs: one document, or one line an event");
     program
         .add_option_function<double>(
             "--timeout",
             [&options](double seconds) {
                 options.timeout = seconds;
                 options.limited = true;
+                AnswerLimit::set(options);
             },
             "How long the daemon may take, in seconds (default: 25)")
         ->type_name("SECONDS")
@@ -61,6 +63,32 @@ void addVerbs(CLI::App& program, const Options& options) {
     }
 }
 
+/// What can stand behind the verb that was chosen.
+std::vector<std::string> words(const CLI::App& program, const CLI::App& chosen) {
+    std::vector<std::string> result;
+    for (const CLI::App* verb : chosen.get_subcommands({}))
+        result.push_back(verb->get_name());
+    for (const CLI::App* app : {&program, &chosen}) {
+        for (const CLI::Option* option : app->get_options()) {
+            for (const std::string& name : option->get_lnames())
+                result.push_back("--" + name);
+        }
+    }
+    return result;
+}
+
+std::string unknownWord(const std::string& word, const CLI::App& program, const CLI::App& chosen) {
+    std::string what;
+    if (word.rfind('-', 0) == 0)
+        what = "there is no option " + quoted(word);
+    else if (!chosen.get_subcommands({}).empty())
+        what = "there is no verb " + quoted(word);
+    else
+        what = quoted(word) + " is too much";
+    const std::string meant = nearest(word.substr(0, word.find('=')), words(program, chosen));
+    return meant.empty() ? what : what + " (did you mean " + meant + "?)";
+}
+
 /// One line that tells what is wrong and where to read on.
 Failure usageFailure(const CLI::App& program, const CLI::ParseError& error) {
     std::string command = "kesbt";
@@ -70,13 +98,16 @@ Failure usageFailure(const CLI::App& program, const CLI::ParseError& error) {
         command += " " + chosen->get_name();
     }
     std::string what = error.what();
+    const std::vector<std::string> rest = program.remaining(true);
     const std::string option = what.substr(0, what.find(':'));
     if (program.get_option_no_throw(option) && !chosen->get_option_no_throw(option))
         command = "kesbt"; // an option of every verb
-    if (dynamic_cast<const CLI::RequiredError*>(&error) && !chosen->get_subcommands({}).empty()) {
-        const std::vector<std::string> rest = program.remaining(true);
-        what = rest.empty() ? "a verb is missing" : "there is no verb " + quoted(rest.front());
-    }
+    const bool lacksVerb =
+        dynamic_cast<const CLI::RequiredError*>(&error) && !chosen->get_subcommands({}).empty();
+    if (lacksVerb && rest.empty())
+        what = "a verb is missing";
+    else if (lacksVerb || dynamic_cast<const CLI::ExtrasError*>(&error))
+        what = unknownWord(rest.front(), program, *chosen);
     return wrongUsage(printable(what) + "; see: " + command + " --help");
 }
 
@@ -96,6 +127,8 @@ int run(int argc, char** argv) {
     CLI::App program("Works with Bluetooth through bluetoothd (BlueZ 4).", "kesbt");
     program.fallthrough(); // global options may stand behind the verb too
     program.require_subcommand(1);
+    constexpr std::size_t nameColumns = 20;
+    program.get_formatter()->column_width(nameColumns);
     program.get_formatter()->label("SUBCOMMAND", "VERB ...");
     program.footer("kesbt VERB --help tells more about a verb and gives examples.\n"
                    "Exit status: 0 success, 1 failure, 2 wrong usage.\n");

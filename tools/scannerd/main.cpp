@@ -29,15 +29,18 @@ int fail(const std::string& problem) {
 
 /// @return -1 to go on, otherwise the exit status
 int parse(int argc, char** argv) {
-    CLI::App app("Lets the programs of a session share the discovery of Bluetooth devices "
-                 "(com.kestrine.bluetooth on the session bus). The bus starts it when a program "
+    CLI::App app("Lets the programs of a session share the discovery of Bluetooth devices\n"
+                 "(com.kestrine.bluetooth on the session bus). The bus starts it when a program\n"
                  "asks for devices; it ends by itself 30 seconds after the last discovery began.",
                  PROGRAM);
     app.set_version_flag("--version", std::string(PROGRAM) + ' ' + KESBLUETOOTH_VERSION);
     try {
         app.parse(argc, argv);
     } catch (const CLI::ParseError& problem) {
-        return app.exit(problem) == 0 ? EXIT_SUCCESS : WRONG_USAGE;
+        if (problem.get_exit_code() == 0) // --help, --version
+            return app.exit(problem);
+        std::cerr << PROGRAM << ": " << problem.what() << "; see " << PROGRAM << " --help\n";
+        return WRONG_USAGE;
     }
     return -1;
 }

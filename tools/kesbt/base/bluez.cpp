@@ -1,5 +1,6 @@
 #include "base/bluez.h"
 
+#include "base/answer_limit.h"
 #include "base/table.h"
 #include "base/text.h"
 
@@ -24,6 +25,7 @@ std::string addressOf(const Device& device) {
 } // namespace
 
 std::unique_ptr<Manager> openManager() {
+    const AnswerLimit limit;
     std::unique_ptr<Manager> manager(Manager::getManager());
     if (!manager)
         throw daemonAbsent();
@@ -31,6 +33,7 @@ std::unique_ptr<Manager> openManager() {
 }
 
 std::unique_ptr<Adapter> openAdapter(Manager& manager, const Options& options) {
+    const AnswerLimit limit;
     const bool chosen = !options.adapter.empty();
     std::unique_ptr<Adapter> adapter(chosen ? manager.findAdapter(options.adapter.c_str())
                                             : manager.defaultAdapter());
@@ -50,11 +53,13 @@ std::unique_ptr<Adapter> openAdapter(const Options& options) {
 }
 
 std::string defaultAdapterPath(Manager& manager) {
+    const AnswerLimit limit;
     const std::unique_ptr<Adapter> adapter(manager.defaultAdapter());
     return adapter ? adapter->getPath() : "";
 }
 
 std::unique_ptr<Device> openDevice(Adapter& adapter, const std::string& address) {
+    const AnswerLimit limit;
     std::unique_ptr<Device> device(adapter.findDevice(address.c_str(), false));
     if (device)
         return device;
@@ -75,6 +80,7 @@ std::string adapterName(const Bluetooth::RemoteObject& object) {
 }
 
 Json readProperties(Bluetooth::BluezObject& object) {
+    const AnswerLimit limit;
     const std::unique_ptr<Bluetooth::Dict> properties(
         object.Bluetooth::BluezObject::getProperties());
     if (!properties)
@@ -83,6 +89,7 @@ Json readProperties(Bluetooth::BluezObject& object) {
 }
 
 Json readOptional(Bluetooth::BluezObject& object) {
+    const AnswerLimit limit;
     const std::unique_ptr<Bluetooth::Dict> properties(object.getProperties());
     if (properties)
         return toJson(*properties);

@@ -79,6 +79,14 @@ Failure daemonLost() {
     return Failure("bluetoothd has left the system bus; start it again and repeat the command");
 }
 
+Failure adapterRemoved(const std::string& adapter) {
+    return Failure(adapter + " was removed; plug it in and repeat the command");
+}
+
+Failure adapterOff(const std::string& adapter) {
+    return Failure(adapter + " was switched off; switch it on: kesbt adapter set Powered true");
+}
+
 Failure refusal(const std::string& what, Bluetooth::RemoteObject& proxy) {
     const std::string reason = proxy.getErrorMessage();
     return Bluetooth::BluezObject::hasBluetoothd() ? refusal(what, reason) : daemonAbsent();

@@ -33,6 +33,10 @@ Failure daemonLost();
 Failure refusal(const std::string& what, Bluetooth::RemoteObject& proxy);
 Failure refusal(const std::string& what, const std::string& reason);
 
+/// The adapter cannot go on.
+Failure adapterRemoved(const std::string& adapter);
+Failure adapterOff(const std::string& adapter);
+
 /// A call went well, but what it should have changed has not changed within the time-out.
 Failure notConfirmed(const std::string& what);
 

@@ -47,12 +47,12 @@ std::shared_ptr<AgentSettings> addAgentOptions(CLI::App& command) {
     auto settings = std::make_shared<AgentSettings>();
     command
         .add_option("--pin", settings->pin,
-                    "What is answered to a request for a PIN code or a passkey (default: 5820)")
+                    "The answer to a request for a PIN code or a\npasskey (default: 5820)")
         ->type_name("TEXT")
         ->check(checkPin);
     command
         .add_option("--capability", settings->capability,
-                    "What this side can do: DisplayYesNo (default), DisplayOnly, KeyboardOnly or "
+                    "What this side can do: DisplayYesNo (default),\nDisplayOnly, KeyboardOnly or "
                     "NoInputNoOutput")
         ->type_name("NAME")
         ->check([](const std::string& text) {
@@ -62,7 +62,8 @@ std::shared_ptr<AgentSettings> addAgentOptions(CLI::App& command) {
                 if (text == known)
                     return std::string();
             }
-            return quoted(text) + " is no capability";
+            return quoted(text) + " is none of DisplayYesNo, DisplayOnly, KeyboardOnly, "
+                                  "NoInputNoOutput";
         });
     command.add_option("--delay", settings->delay, "Wait so long before each answer")
         ->type_name("SECONDS")
@@ -73,7 +74,7 @@ std::shared_ptr<AgentSettings> addAgentOptions(CLI::App& command) {
             return isNumber ? std::string() : quoted(text) + " is no number from 0 to 9999";
         });
     command.add_flag("--reject", settings->reject,
-                     "Refuse passkeys, confirmations and services (a PIN code is given all the "
+                     "Refuse passkeys, confirmations and services (a PIN\ncode is given all the "
                      "same)");
     return settings;
 }

@@ -3,8 +3,32 @@
 #include <algorithm>
 #include <cctype>
 #include <cstdio>
+#include <numeric>
 
 namespace Kesbt {
+
+namespace {
+
+/// How many characters have to be inserted, left out, replaced or swapped with their neighbour.
+std::size_t distance(const std::string& from, const std::string& to) {
+    std::vector<std::size_t> beforeLast(to.size() + 1);
+    std::vector<std::size_t> last(to.size() + 1);
+    std::iota(last.begin(), last.end(), 0U);
+    for (std::size_t i = 1; i <= from.size(); ++i) {
+        std::vector<std::size_t> row(to.size() + 1, i);
+        for (std::size_t j = 1; j <= to.size(); ++j) {
+            const std::size_t replaced = last[j - 1] + (from[i - 1] == to[j - 1] ? 0 : 1);
+            row[j] = std::min({last[j] + 1, row[j - 1] + 1, replaced});
+            if (i > 1 && j > 1 && from[i - 1] == to[j - 2] && from[i - 2] == to[j - 1])
+                row[j] = std::min(row[j], beforeLast[j - 2] + 1);
+        }
+        beforeLast = std::move(last);
+        last = std::move(row);
+    }
+    return last.back();
+}
+
+} // namespace
 
 std::string upperCase(std::string text) {
     std::transform(text.begin(), text.end(), text.begin(),
@@ -62,6 +86,19 @@ bool isAddress(const std::string& text) {
 
 std::string lastComponent(const std::string& path) {
     return path.substr(path.rfind('/') + 1);
+}
+
+std::string nearest(const std::string& typed, const std::vector<std::string>& words) {
+    std::string best;
+    std::size_t least = 1 + std::max<std::size_t>(1, typed.size() / 3); // more is another word
+    for (const std::string& word : words) {
+        const std::size_t mistakes = distance(typed, word);
+        if (mistakes < least) {
+            least = mistakes;
+            best = word;
+        }
+    }
+    return best;
 }
 
 } // namespace Kesbt

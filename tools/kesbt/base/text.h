@@ -2,6 +2,7 @@
 #define KESBT_BASE_TEXT_H
 
 #include <string>
+#include <vector>
 
 namespace Kesbt {
 
@@ -20,6 +21,9 @@ std::string padded(const std::string& text, std::size_t width);
 bool isAddress(const std::string& text);
 /// The last component of an object path: "hci0" of "/org/bluez/1234/hci0".
 std::string lastComponent(const std::string& path);
+
+/// The word that was most likely meant where one was mistyped; "" when none is near.
+std::string nearest(const std::string& typed, const std::vector<std::string>& words);
 
 } // namespace Kesbt
 

@@ -1,3 +1,4 @@
+#include "base/answer_limit.h"
 #include "base/bluez.h"
 #include "base/text.h"
 #include "base/verb.h"
@@ -16,6 +17,7 @@ using Bluetooth::Variant;
 constexpr std::size_t longestName = 248; // bytes; the controller cuts what is longer
 
 void showAdapter(const Options& options) {
+    const AnswerLimit limit;
     const auto manager = openManager();
     const auto adapter = openAdapter(*manager, options);
     // The proxy's own properties: they have the HCI version too.
@@ -33,6 +35,14 @@ void showAdapter(const Options& options) {
                   {"Default", document["default"]}};
     lines.update(document["properties"]);
     printProperties(lines);
+}
+
+std::unique_ptr<Bluetooth::Dict> typedProperties(Bluetooth::Adapter& adapter) {
+    const AnswerLimit limit;
+    std::unique_ptr<Bluetooth::Dict> properties(adapter.Bluetooth::BluezObject::getProperties());
+    if (!properties)
+        throw refusal("cannot read the properties of " + adapterName(adapter), adapter);
+    return properties;
 }
 
 const Bluetooth::DictEntry& findProperty(const Bluetooth::Dict& properties, const std::string& name,
@@ -95,11 +105,7 @@ void setProperty(const Options& options, const std::string& givenName,
                  const std::string& givenValue) {
     const auto adapter = openAdapter(options);
     const std::string adapterText = adapterName(*adapter);
-    const std::unique_ptr<Bluetooth::Dict> properties(
-        adapter->Bluetooth::BluezObject::getProperties());
-    if (!properties)
-        throw refusal("cannot read the properties of " + adapterText, *adapter);
-
+    const std::unique_ptr<Bluetooth::Dict> properties = typedProperties(*adapter);
     const auto& [name, old] = findProperty(*properties, givenName, adapterText);
     const Variant wanted = boost::apply_visitor(ParseAs(givenValue, name), old);
     adapter->resetError();
@@ -131,13 +137,13 @@ void setProperty(const Options& options, const std::string& givenName,
 
 void build(CLI::App& command, const Options& options) {
     command.require_subcommand(0, 1);
-    CLI::App* info = command.add_subcommand("info", "Show all properties (what is done without a "
-                                                    "further word)");
+    CLI::App* info = command.add_subcommand("info", "Show all properties (also without this word)");
     CLI::App* set = command.add_subcommand("set", "Set a property and show its old and new value");
     set->footer("Can be set: Name, Powered, Discoverable, Pairable, DiscoverableTimeout,\n"
                 "PairableTimeout. Booleans are true or false, time-outs are seconds.\n\n"
                 "Examples:\n  kesbt adapter set Powered true\n"
-                "  kesbt --adapter hci1 adapter set Name \"Living room\"");
+                "  kesbt --adapter hci1 adapter set Name \"Living room\"\n\n" +
+                command.get_footer().substr(command.get_footer().rfind("\n\n") + 2));
 
     auto name = std::make_shared<std::string>();
     auto value = std::make_shared<std::string>();

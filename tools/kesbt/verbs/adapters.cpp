@@ -1,3 +1,4 @@
+#include "base/answer_limit.h"
 #include "base/bluez.h"
 #include "base/table.h"
 #include "base/verb.h"
@@ -9,6 +10,7 @@ namespace Kesbt {
 namespace {
 
 Json readAdapters(Bluetooth::Manager& manager) {
+    const AnswerLimit limit;
     const std::unique_ptr<Bluetooth::AdapterList> adapters(manager.listAdapters());
     if (!adapters)
         throw refusal("cannot list the adapters", manager);

@@ -87,8 +87,7 @@ void build(CLI::App& command, const Options& options) {
 } // namespace
 
 extern const Verb agentVerb;
-const Verb agentVerb = {"agent", "Pairing",
-                        "Answer devices that want to pair with an adapter, until Ctrl-C",
+const Verb agentVerb = {"agent", "Pairing", "Answer devices that want to pair, until Ctrl-C",
                         "kesbt agent --pin 1234\n"
                         "kesbt --adapter hci1 agent --reject\nkesbt agent --json",
                         build};

@@ -1,3 +1,4 @@
+#include "base/answer_limit.h"
 #include "base/bluez.h"
 #include "base/verb.h"
 #include "base/waiting.h"
@@ -80,6 +81,7 @@ void build(CLI::App& command, const Options& options) {
     add("disconnect", "Disconnect them",
         [&options](const std::string& address) { change(options, address, false); });
     add("status", "Show what is connected", [&options](const std::string& address) {
+        const AnswerLimit limit;
         AudioDevice device = openAudio(options, address);
         printStatus(options, device, address);
     });

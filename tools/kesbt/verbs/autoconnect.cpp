@@ -1,3 +1,4 @@
+#include "base/answer_limit.h"
 #include "base/autoconnect_file.h"
 #include "base/bluez.h"
 #include "base/text.h"
@@ -62,6 +63,7 @@ void change(const Options& options, const std::string& device, bool listed) {
 }
 
 void listKnown(const Options& options) {
+    const AnswerLimit limit;
     openManager();
     const std::string adapter = adapterAddress(options);
     AutoConnectFile file(adapter);
@@ -74,6 +76,7 @@ void listKnown(const Options& options) {
 }
 
 void listTargets(const Options& options) {
+    const AnswerLimit limit;
     openManager();
     const std::unique_ptr<Bluetooth::DeviceList> devices(AutoConnect().getAutoConnectDeviceList());
     if (!devices)
@@ -107,7 +110,7 @@ void build(CLI::App& parent, const Options& options) {
         [&options] { enable(options, false); });
     addChange("add", "Put a device into the adapter's list", true);
     addChange("remove", "Take a device out of it", false);
-    add("list", "Show the listed devices that the adapter knows; others leave an enabled list",
+    add("list", "Show the listed devices that the adapter knows;\nothers leave an enabled list",
         [&options] { listKnown(options); });
     add("targets", "Show all devices that are to be connected, of all adapters",
         [&options] { listTargets(options); });
@@ -125,8 +128,14 @@ const Verb autoconnectVerb = {"autoconnect", "Host",
                               "Say which devices are connected by themselves",
                               "kesbt autoconnect add 00:11:22:33:44:55\n"
                               "kesbt autoconnect enable\n"
+                              "kesbt autoconnect list\n"
+                              "kesbt autoconnect targets --json\n"
                               "kesbt --adapter hci1 autoconnect show --json\n"
-                              "kesbt autoconnect pause",
+                              "kesbt autoconnect disable\n"
+                              "kesbt autoconnect remove 00:11:22:33:44:55\n"
+                              "kesbt autoconnect reload\n"
+                              "kesbt autoconnect pause\n"
+                              "kesbt autoconnect resume",
                               build};
 
 } // namespace Kesbt

@@ -33,9 +33,7 @@ void build(CLI::App& command, const Options& options) {
 } // namespace
 
 extern const Verb cancelVerb;
-const Verb cancelVerb = {"cancel", "Pairing",
-                         "Stop the creation of a device (the daemon lets only the program that "
-                         "began it)",
+const Verb cancelVerb = {"cancel", "Pairing", "Stop a creation; only for the program that began it",
                          "kesbt cancel 00:11:22:33:44:55", build};
 
 } // namespace Kesbt

@@ -1,3 +1,4 @@
+#include "base/answer_limit.h"
 #include "base/bluez.h"
 #include "base/verb.h"
 
@@ -8,6 +9,7 @@ namespace {
 void build(CLI::App& command, const Options& options) {
     const auto address = addAddress(command);
     command.callback([&options, address] {
+        const AnswerLimit limit;
         const auto device = openDevice(options, *address);
         printDevice(options, *device);
     });

@@ -1,3 +1,4 @@
+#include "base/answer_limit.h"
 #include "base/bluez.h"
 #include "base/verb.h"
 
@@ -8,6 +9,7 @@ namespace Kesbt {
 namespace {
 
 void listDevices(const Options& options) {
+    const AnswerLimit limit;
     const auto adapter = openAdapter(options);
     const std::unique_ptr<Bluetooth::DeviceList> devices(adapter->listDevices());
     if (!devices)

@@ -55,11 +55,9 @@ void watch(const Options& options, const Bluetooth::Adapter& adapter, BusFeed& d
             else if (event->kind == Event::Kind::Disappeared)
                 devices.vanished(event->subject);
             else if (event->kind == Event::Kind::Removed && event->subject == adapter.getPath())
-                throw Failure(adapterName(adapter) +
-                              " was removed; plug it in and repeat the command");
+                throw adapterRemoved(adapterName(adapter));
             else if (event->kind == Event::Kind::Powered && event->value == false)
-                throw Failure(adapterName(adapter) +
-                              " was switched off; switch it on: kesbt adapter set Powered true");
+                throw adapterOff(adapterName(adapter));
         }
         for (Signal signal; daemon.next(signal);) {
             if (BusFeed::isDaemonGone(signal))

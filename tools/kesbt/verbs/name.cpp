@@ -39,10 +39,10 @@ void showName(const Options& options, const std::string& address, int timeoutMs)
 
 void build(CLI::App& command, const Options& options) {
     const auto address = addAddress(command);
-    auto timeoutMs = std::make_shared<int>(Bluetooth::GET_NAME_TIMEOUT_DEFAULT);
+    auto timeoutMs = std::make_shared<int>(0);
     command
         .add_option("--timeout", *timeoutMs,
-                    "How long the device may take, in milliseconds (default: 10000)")
+                    "How long the device may take, in milliseconds\n(default: 10000)")
         ->type_name("MS")
         ->check([](const std::string& text) {
             constexpr std::size_t longest = 8;
@@ -50,7 +50,13 @@ void build(CLI::App& command, const Options& options) {
                                   text.find_first_not_of("0123456789") == std::string::npos;
             return isNumber ? std::string() : quoted(text) + " is no time such as 5000";
         });
-    command.callback([&options, address, timeoutMs] { showName(options, *address, *timeoutMs); });
+    command.callback([&options, address, timeoutMs] {
+        int limit = *timeoutMs;
+        if (limit == 0) // before the verb it is the option of every verb
+            limit = options.limited ? static_cast<int>(options.timeLimit().count())
+                                    : Bluetooth::GET_NAME_TIMEOUT_DEFAULT;
+        showName(options, *address, limit);
+    });
 }
 
 } // namespace

@@ -1,3 +1,4 @@
+#include "base/answer_limit.h"
 #include "base/failure.h"
 #include "base/output.h"
 #include "base/text.h"
@@ -12,6 +13,7 @@ namespace Kesbt {
 namespace {
 
 void listNames(const Options& options) {
+    const AnswerLimit limit;
     Bluetooth::DBusObject bus;
     const std::unique_ptr<std::vector<std::string>> names(bus.listNames());
     if (!bus.getConnection())

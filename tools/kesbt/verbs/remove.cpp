@@ -1,3 +1,4 @@
+#include "base/answer_limit.h"
 #include "base/bluez.h"
 #include "base/verb.h"
 #include "base/waiting.h"
@@ -15,6 +16,7 @@ void removeDevice(const Options& options, const std::string& address) {
         Bluetooth::ObjectPath(device->getPath()));
 
     const auto isGone = [&] {
+        const AnswerLimit limit;
         const std::unique_ptr<Bluetooth::Device> found(adapter->findDevice(address.c_str(), false));
         return !found && adapter->getErrorMessage() == "Does Not Exist";
     };

@@ -1,7 +1,9 @@
 #include "base/failure.h"
 #include "base/output.h"
 #include "base/verb.h"
+#include "base/waiting.h"
 
+#include <bluetooth/bluez_object.h>
 #include <bluetooth/commandlib.h>
 
 #include <glob.h>
@@ -29,6 +31,9 @@ void restartDaemon(const Options& options) {
                             "by hand and read what it says"
                           : "bluetoothd was not restarted: no adapter is plugged in (there is no "
                             "/tmp/bluetooth.info_* file); plug one in");
+    // That its process runs is not enough: it may fail to come to the bus.
+    if (!waitUntil(Bluetooth::BluezObject::hasBluetoothd, options.timeLimit()))
+        throw notConfirmed("bluetoothd was started and did not come to the system bus");
     if (options.json)
         printDocument({{"restarted", true}});
     else

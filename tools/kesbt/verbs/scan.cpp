@@ -1,3 +1,4 @@
+#include "base/answer_limit.h"
 #include "base/bluez.h"
 #include "base/device_watch.h"
 #include "base/table.h"
@@ -39,6 +40,7 @@ Json typedValue(const std::string& name, const Json& text) {
 
 /// Which process the service is, "" for none. It ends by itself and is started by questions.
 std::string serviceOwner() {
+    const AnswerLimit limit;
     Bluetooth::RemoteObject bus("org.freedesktop.DBus", "/org/freedesktop/DBus",
                                 "org.freedesktop.DBus", DBUS_BUS_SESSION);
     if (!bus.getConnection())
@@ -64,6 +66,7 @@ Failure scanFailure(Scanner& scanner, const std::string& adapter) {
 
 /// The properties of each device, by address.
 std::map<std::string, Json> readDevices(Scanner& scanner, const std::string& adapter) {
+    const AnswerLimit limit;
     const std::unique_ptr<std::vector<std::pair<std::string, Bluetooth::Dict*>>> devices(
         scanner.listDevices(adapter.c_str(), false));
     if (!devices)
@@ -115,7 +118,7 @@ void watch(const Options& options) {
         const auto next = Clock::now() + interval;
         const auto devices = readDevices(scanner, adapter);
         const std::string ownerNow = serviceOwner();
-        if (ownerNow != owner)
+        if (ownerNow != owner && !watch.devices().empty())
             complete = Clock::now() + rediscovery;
         owner = ownerNow;
         for (const auto& [address, properties] : devices)
@@ -145,7 +148,8 @@ void stop(const Options& options) {
 
 void build(CLI::App& command, const Options& options) {
     command.require_subcommand(1);
-    command.add_subcommand("list", "Show the devices found so far; the first time starts the scan")
+    command
+        .add_subcommand("list", "Show the devices found so far; the first time starts\nthe scan")
         ->callback([&options] { list(options); });
     command.add_subcommand("watch", "Ask each second and show what came, changed and went")
         ->callback([&options] { watch(options); });

@@ -62,7 +62,7 @@ void build(CLI::App& command, const Options& options) {
     auto pattern = std::make_shared<std::string>();
     command
         .add_option("PATTERN", *pattern,
-                    "Which services: a UUID, a short one such as 0x110b, or a name such as spp")
+                    "Which services: a UUID such as 0x110b, or a name\nsuch as spp")
         ->type_name("");
     command.callback([&options, address, pattern] { listServices(options, *address, *pattern); });
 }

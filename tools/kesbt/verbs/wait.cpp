@@ -1,3 +1,4 @@
+#include "base/answer_limit.h"
 #include "base/bluez.h"
 #include "base/bus_feed.h"
 #include "base/text.h"
@@ -18,7 +19,13 @@ struct Goal {
     std::function<void(const Signal&)> observe = [](const Signal&) {};
 };
 
-void await(const Options& options, BusFeed& feed, const Goal& goal) {
+bool isRemoval(const Signal& signal, const Bluetooth::Adapter& adapter) {
+    return signal.member == "AdapterRemoved" && !signal.arguments.empty() &&
+           signal.arguments[0] == adapter.getPath();
+}
+
+void await(const Options& options, BusFeed& feed, const Bluetooth::Adapter& adapter,
+           const Goal& goal) {
     Interrupt interrupt;
     const auto deadline =
         options.limited ? Clock::now() + options.timeLimit() : Clock::time_point::max();
@@ -32,6 +39,8 @@ void await(const Options& options, BusFeed& feed, const Goal& goal) {
         for (Signal signal; feed.next(signal);) {
             if (BusFeed::isDaemonGone(signal))
                 throw daemonLost();
+            if (isRemoval(signal, adapter))
+                throw adapterRemoved(adapterName(adapter));
             goal.observe(signal);
         }
     }
@@ -51,32 +60,37 @@ void awaitFound(const Options& options, const std::string& address) {
     bool isFound = false;
     Goal goal = {"found", address, [&isFound] { return isFound; }};
     goal.observe = [&](const Signal& signal) {
-        isFound = isFound || (signal.member == "DeviceFound" && signal.path == adapter->getPath() &&
-                              !signal.arguments.empty() && signal.arguments[0] == address);
+        if (signal.path != adapter->getPath())
+            return;
+        if (signal.member == "PropertyChanged" && signal.arguments == Json{"Powered", false})
+            throw adapterOff(adapterName(*adapter));
+        isFound = isFound || (signal.member == "DeviceFound" && !signal.arguments.empty() &&
+                              signal.arguments[0] == address);
     };
     ask(options, "cannot start a discovery on " + adapterName(*adapter), *adapter,
         "StartDiscovery"); // it ends with this process
-    await(options, feed, goal);
+    await(options, feed, *adapter, goal);
 }
 
 void awaitDevice(const Options& options, const std::string& address, const char* name,
                  const char* property) {
     BusFeed feed = openFeed();
     const auto adapter = openAdapter(options);
-    await(options, feed, {name, address, [&] {
-                              // It may become known only later.
-                              const std::unique_ptr<Bluetooth::Device> device(
-                                  adapter->findDevice(address.c_str(), false));
-                              return device && readProperties(*device).value(property, false);
-                          }});
+    const auto isSo = [&] {
+        const AnswerLimit limit;
+        // It may become known only later.
+        const std::unique_ptr<Bluetooth::Device> device(
+            adapter->findDevice(address.c_str(), false));
+        return device && readProperties(*device).value(property, false);
+    };
+    await(options, feed, *adapter, {name, address, isSo});
 }
 
 void awaitPower(const Options& options) {
     BusFeed feed = openFeed();
     const auto adapter = openAdapter(options);
-    await(options, feed, {"powered", adapterName(*adapter), [&] {
-                              return readProperties(*adapter).value("Powered", false);
-                          }});
+    const auto isOn = [&] { return readProperties(*adapter).value("Powered", false); };
+    await(options, feed, *adapter, {"powered", adapterName(*adapter), isOn});
 }
 
 void build(CLI::App& command, const Options& options) {
@@ -105,6 +119,7 @@ extern const Verb waitVerb;
 const Verb waitVerb = {"wait", "General", "Wait until something is so; the exit status tells",
                        "kesbt wait found 00:11:22:33:44:55\n"
                        "kesbt --timeout 60 wait connected 00:11:22:33:44:55\n"
+                       "kesbt wait paired 00:11:22:33:44:55 && echo paired\n"
                        "kesbt --adapter hci1 wait powered",
                        build};
 
