@@ -15,7 +15,7 @@ need_packages "${build_packages[@]}" "${test_packages[@]}"
 echo "Building in build ..."
 build "$root/build"
 # Not through ctest, which ends a test after two minutes. Each in a process of its own.
-tests=$root/build/tests/fault/soak-tests
+tests=$root/build/tests/soak-tests
 "$tests" --gtest_list_tests | while read -r name; do
     case "$name" in
     *.) suite=$name ;;

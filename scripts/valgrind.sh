@@ -4,7 +4,7 @@
 #   scripts/valgrind.sh [GTEST_FILTER]    the filter holds for each of the programs
 source "$(dirname "$0")/lib.sh"
 
-filter=${1:-DictionaryTest.*:CallTest.*:SignalTest.*:PendingTest.*:AgentTest.*:*Codec*:ProxyTest.*:ServerTest.*}
+filter=${1:-DecodingTest.*:CallTest.*:SignalTest.*:PendingTest.*:AgentTest.*:*Codec*:ProxyTest.*:ServerTest.*}
 need_packages "${build_packages[@]}" "${test_packages[@]}" valgrind
 echo "Building in build ..."
 build "$root/build" -DKESBLUETOOTH_BUILD_TESTS=ON -DKESBLUETOOTH_SANITIZE=
@@ -14,7 +14,7 @@ rm -rf "$log"
 mkdir "$log"
 list() {
     local program name suite
-    for program in core/core-tests bluez/bluez-tests scanner/scanner-server-tests; do
+    for program in core-tests bluez-tests scanner-tests; do
         "$root/build/tests/$program" --gtest_list_tests --gtest_filter="$filter" |
             while read -r name; do
                 case "$name" in

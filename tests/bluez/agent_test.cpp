@@ -1,7 +1,6 @@
 // The pairing agent: what it answers to each request, and how.
 
-#include "bluez/daemon_test.h"
-#include "support/receive_loop.h"
+#include "support/peer_test.h"
 
 #include <bluetooth/adapter.h>
 #include <bluetooth/agent.h>
@@ -65,9 +64,7 @@ constexpr const char* notUnregistered = "agent.cpp Failed to unregister agent pa
 MessagePtr call(const char* member, const Writer::Build& arguments,
                 const char* interface = "org.bluez.Agent") {
     MessagePtr message(dbus_message_new_method_call(nullptr, "/agent", interface, member));
-    Writer writer(message.get());
-    if (arguments)
-        arguments(writer);
+    Writer(message.get(), arguments);
     return message;
 }
 

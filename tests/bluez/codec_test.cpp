@@ -2,6 +2,8 @@
 
 #include <bluetooth/dict_codec.h>
 
+#include "support/latch.h"
+
 #include <gtest/gtest.h>
 
 #include <limits>
@@ -10,8 +12,6 @@
 namespace Bluetooth::Test {
 
 namespace {
-
-using Texts = std::vector<std::string>;
 
 Variant text(const char* value) {
     return Variant(std::string(value));

@@ -1,6 +1,6 @@
 // What each operation of the proxies asks the daemon, and what becomes of the answer.
 
-#include "bluez/daemon_test.h"
+#include "support/peer_test.h"
 
 #include <bluetooth/adapter.h>
 #include <bluetooth/adapter_list.h>

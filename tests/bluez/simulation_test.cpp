@@ -25,8 +25,6 @@ namespace Bluetooth::Test {
 
 namespace {
 
-using Texts = std::vector<std::string>;
-
 constexpr const char* headset = "00:11:22:33:44:01";  // JustWorks, with a sink and a control
 constexpr const char* keyboard = "00:11:22:33:44:02"; // DisplayPasskey
 constexpr const char* phone = "00:11:22:33:44:03";    // ConfirmPasskey
@@ -35,11 +33,6 @@ constexpr const char* speaker = "00:11:22:33:44:05";  // Vanishing
 constexpr const char* mouse = "00:11:22:33:44:06";    // AlreadyPaired with hci0
 constexpr const char* laptop = "00:11:22:33:44:07";   // Unconnectable
 constexpr const char* carKit = "00:11:22:33:44:08";   // EnterPasskey 424242
-
-Recorder<std::string>& seen() {
-    static Recorder<std::string> recorder;
-    return recorder;
-}
 
 bool wasSeen(const std::string& what, Milliseconds limit = patience) {
     return seen().waitUntil(
@@ -275,7 +268,7 @@ TEST_F(SimulationTest, ADaemonThatLeavesIsMissedAndOneThatIsBackIsUsed) {
     const std::unique_ptr<Adapter> renewed(manager->findAdapter("hci0"));
     ASSERT_TRUE(renewed);
     EXPECT_STRNE(renewed->getPath(), adapter->getPath());
-    simulation.kill();
+    simulation.process().kill();
     EXPECT_TRUE(simulation.peer().waitForOwner("org.bluez", false));
     EXPECT_FALSE(BluezObject::hasBluetoothd());
 }

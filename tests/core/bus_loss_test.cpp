@@ -1,7 +1,6 @@
 // The bus goes away, and comes back.
 
-#include "support/core_test.h"
-#include "support/receive_loop.h"
+#include "support/peer_test.h"
 
 #include <bluetooth/connection.h>
 
@@ -26,21 +25,14 @@ Milliseconds cpuTimeOfIdling() {
     return std::chrono::duration_cast<Milliseconds>(used() - before);
 }
 
-Recorder<std::string>& seen() {
-    static Recorder<std::string> recorder;
-    return recorder;
-}
-
 void onString(RemoteObject*, const char* text) {
     seen().add(text);
 }
 
 } // namespace
 
-class BusLossTest : public CoreTest {
+class BusLossTest : public LoopTest {
 protected:
-    void SetUp() override { KES_NEEDS_RECEIVE_LOOP(); }
-
     /// The bus is there again, with a peer that answers Ask.
     void restartBus() {
         bus.start();
@@ -75,7 +67,7 @@ TEST_F(BusLossTest, ANewBusIsConnectedToAfterwards) {
     const std::string oldName = proxy.getConnectionName();
     bus.kill();
     EXPECT_EQ(Connection::get(busType), nullptr);
-    EXPECT_EQ(log.take(), std::vector<std::string>{"connection.cpp Failed to get bus connection"});
+    EXPECT_EQ(log.take(), Texts{"connection.cpp Failed to get bus connection"});
     for (int round = 0; round < 3; ++round) {
         restartBus();
         RemoteObject renewed(peerName, peerPath, peerInterface, busType);
@@ -90,10 +82,9 @@ TEST_F(BusLossTest, ANewBusIsConnectedToAfterwards) {
 }
 
 TEST_F(BusLossTest, TheLoopNeitherSpinsNorHangsAndSubscriptionsCanBeMadeAnew) {
-    auto loop = std::make_unique<RemoteObject>(peerName, "/loop", "com.example.Loop", busType);
     auto subscribed = std::make_unique<RemoteObject>(peerName, peerPath, peerInterface, busType);
     ASSERT_EQ(subscribed->setSignalHandlerString("Changed", onString), 0);
-    ASSERT_EQ(loop->startLoop(), 0);
+    ASSERT_EQ(loop.startLoop(), 0);
     peer.emit(peerPath, peerInterface, "Changed", [](Writer& w) { w("before"); });
     ASSERT_TRUE(seen().waitFor(1));
     bus.kill();
@@ -114,8 +105,8 @@ TEST_F(BusLossTest, TheLoopNeitherSpinsNorHangsAndSubscriptionsCanBeMadeAnew) {
         again->emit(peerPath, peerInterface, "Changed", [](Writer& w) { w("after"); });
         ASSERT_TRUE(seen().waitFor(2));
     }
-    EXPECT_EQ(seen().events(), (std::vector<std::string>{"before", "after"}));
-    EXPECT_EQ(loop->waitLoop(), 0);
+    EXPECT_EQ(seen().events(), (Texts{"before", "after"}));
+    EXPECT_EQ(loop.waitLoop(), 0);
 }
 
 TEST_F(BusLossTest, NothingSpinsWithoutALoopEither) {

@@ -1,7 +1,6 @@
 // Many threads, one connection: no reply and no signal is lost, and no call waits for another's.
 
-#include "support/core_test.h"
-#include "support/receive_loop.h"
+#include "support/peer_test.h"
 #include "support/scale.h"
 
 #include <algorithm>
@@ -78,15 +77,13 @@ void onNumber(RemoteObject*, const char* text) {
 
 } // namespace
 
-class ConcurrencyTest : public CoreTest {
+class ConcurrencyTest : public LoopTest {
 protected:
     void SetUp() override {
         KES_NEEDS_RECEIVE_LOOP();
         peer.handle("Echo", echo);
         peer.stopRecording();
     }
-
-    RemoteObject loop{peerName, "/loop", "com.example.Loop", busType};
 };
 
 TEST_F(ConcurrencyTest, NoReplyAndNoSignalIsLostWhenFourThreadsCallAndCallbacksCallBack) {

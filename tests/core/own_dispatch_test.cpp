@@ -1,7 +1,6 @@
 // Programs that dispatch the shared connection themselves, as those with a main loop do.
 
-#include "support/core_test.h"
-#include "support/receive_loop.h"
+#include "support/peer_test.h"
 
 #include <atomic>
 #include <memory>
@@ -9,29 +8,7 @@
 
 namespace Bluetooth::Test {
 
-namespace {
-
-Recorder<std::string>& seen() {
-    static Recorder<std::string> recorder;
-    return recorder;
-}
-
-/// What the program's object does when it is asked; its answer goes back.
-std::function<std::string()>& onRequest() {
-    static std::function<std::string()> action;
-    return action;
-}
-
-DBusHandlerResult serve(DBusConnection* connection, DBusMessage* request, void*) {
-    const MessagePtr reply(dbus_message_new_method_return(request));
-    Writer(reply.get())(onRequest()());
-    dbus_connection_send(connection, reply.get(), nullptr);
-    return DBUS_HANDLER_RESULT_HANDLED;
-}
-
-} // namespace
-
-class OwnDispatchTest : public CoreTest {
+class OwnDispatchTest : public LoopTest {
 protected:
     void SetUp() override {
         KES_NEEDS_RECEIVE_LOOP();
@@ -50,13 +27,7 @@ protected:
 };
 
 TEST_F(OwnDispatchTest, HandlersOfTheProgramMayCall) {
-    static const DBusObjectPathVTable handlers = [] {
-        DBusObjectPathVTable table{};
-        table.message_function = serve;
-        return table;
-    }();
-    ASSERT_TRUE(
-        dbus_connection_register_object_path(proxy.getConnection(), "/object", &handlers, nullptr));
+    serveObject(proxy.getConnection());
     onRequest() = [this] {
         RemoteObject inner(peerName, peerPath, peerInterface, busType);
         std::string answer;
@@ -77,9 +48,7 @@ TEST_F(OwnDispatchTest, HandlersOfTheProgramMayCall) {
     EXPECT_TRUE(peer.waitForCalls("Take", 1));
     // On the same thread, outside its dispatch, requests are answered while a call waits.
     peer.handle("Pair", [this](DBusMessage* pair) {
-        MessagePtr request(dbus_message_new_method_call(proxy.getConnectionName(), "/object",
-                                                        "com.example.Object", "Do"));
-        peer.send(std::move(request));
+        peer.send(requestTo(proxy.getConnectionName()));
         return MessagePtr(dbus_message_new_method_return(pair));
     });
     bool asked = false;
@@ -96,7 +65,6 @@ TEST_F(OwnDispatchTest, CallsAndSignalsOfOtherThreadsAreNotLostToIt) {
     ASSERT_EQ(proxy.setSignalHandlerString(
                   "Changed", [](RemoteObject*, const char* text) { seen().add(text); }),
               0);
-    RemoteObject loop(peerName, "/loop", "com.example.Loop", busType);
     const ReceiveLoop running(loop);
     constexpr int count = 300;
     std::atomic<bool> callsDone{false};

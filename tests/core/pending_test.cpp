@@ -1,7 +1,6 @@
 // Calls without a time limit: what ends the wait, and who is served during it.
 
-#include "support/core_test.h"
-#include "support/receive_loop.h"
+#include "support/peer_test.h"
 
 #include <csignal>
 #include <memory>
@@ -12,25 +11,15 @@ namespace Bluetooth::Test {
 
 namespace {
 
-constexpr const char* agentPath = "/agent";
-
-/// Who answered requests to the object at agentPath.
+/// Who answered requests to the object of this process.
 Recorder<std::thread::id>& served() {
     static Recorder<std::thread::id> recorder;
     return recorder;
 }
 
-DBusHandlerResult serve(DBusConnection* connection, DBusMessage* request, void*) {
-    served().add(std::this_thread::get_id());
-    const MessagePtr reply(dbus_message_new_method_return(request));
-    Writer(reply.get())("5820");
-    dbus_connection_send(connection, reply.get(), nullptr);
-    return DBUS_HANDLER_RESULT_HANDLED;
-}
-
 } // namespace
 
-class PendingTest : public CoreTest {
+class PendingTest : public LoopTest {
 protected:
     void SetUp() override {
         KES_NEEDS_RECEIVE_LOOP();
@@ -54,17 +43,15 @@ protected:
 
     void serveAgent() {
         served().clear();
-        static const DBusObjectPathVTable handlers = [] {
-            DBusObjectPathVTable table{};
-            table.message_function = serve;
-            return table;
-        }();
-        ASSERT_TRUE(dbus_connection_register_object_path(proxy.getConnection(), agentPath,
-                                                         &handlers, nullptr));
+        onRequest() = [] {
+            served().add(std::this_thread::get_id());
+            return std::string("5820");
+        };
+        serveObject(proxy.getConnection());
     }
 
     std::future<MessagePtr> askAgent(Milliseconds timeout = patience) {
-        return peer.call(proxy.getConnectionName(), agentPath, "com.example.Agent", "Ask", {},
+        return peer.call(proxy.getConnectionName(), "/object", "com.example.Object", "Do", {},
                          timeout);
     }
 
@@ -72,16 +59,13 @@ protected:
     void pairAsks(int count) {
         peer.handle("Pair", [this, count](DBusMessage* pair) {
             for (int i = 0; i < count; ++i) {
-                MessagePtr request(dbus_message_new_method_call(
-                    proxy.getConnectionName(), agentPath, "com.example.Agent", "Ask"));
+                MessagePtr request = requestTo(proxy.getConnectionName());
                 dbus_message_set_no_reply(request.get(), true);
                 peer.send(std::move(request));
             }
             return MessagePtr(dbus_message_new_method_return(pair));
         });
     }
-
-    RemoteObject loop{peerName, "/loop", "com.example.Loop", busType};
 };
 
 TEST_F(PendingTest, TheReplyIsHeldWhateverItIs) {
@@ -232,17 +216,11 @@ TEST_F(PendingTest, ARequestThatComesAtOnceIsNotLeftToTheReceiveThread) {
 }
 
 TEST_F(PendingTest, AnInterruptionLeavesTheRequestsThatAreStillQueued) {
-    static const DBusObjectPathVTable interrupting = [] {
-        DBusObjectPathVTable table{};
-        table.message_function = [](DBusConnection* connection, DBusMessage* request, void* data) {
-            EXPECT_EQ(raise(SIGINT), 0);
-            return serve(connection, request, data);
-        };
-        return table;
-    }();
-    served().clear();
-    ASSERT_TRUE(dbus_connection_register_object_path(proxy.getConnection(), agentPath,
-                                                     &interrupting, nullptr));
+    serveAgent();
+    onRequest() = [answer = onRequest()] {
+        EXPECT_EQ(raise(SIGINT), 0);
+        return answer();
+    };
     pairAsks(3);
     ASSERT_EQ(callPending("Pair"), 0);
     expectNoReply();

@@ -2,9 +2,11 @@
 // libdbus and in the C++ library. The operation then reports an error or throws std::bad_alloc,
 // works the next time, and has leaked nothing.
 
+#include "core/process.h"
 #include "fault/failing_malloc.h"
 #include "host/auto_connect_file.h"
-#include "support/core_test.h"
+#include "host/namespace_test.h"
+#include "support/peer_test.h"
 #include "support/scale.h"
 #include "support/simulation.h"
 
@@ -15,6 +17,8 @@
 #include <bluetooth/device_list.h>
 #include <bluetooth/dict_codec.h>
 #include <bluetooth/manager.h>
+
+#include <sys/wait.h>
 
 #include <fstream>
 #include <functional>
@@ -179,6 +183,17 @@ TEST_F(MemoryTest, DecodingAndTextSurviveEachFailedAllocation) {
         EXPECT_EQ(count, entries.size());
         return true;
     });
+}
+
+TEST_F(MemoryTest, AProgramIsStartedOrNothingOfItIsLeftBehind) {
+    const Texts arguments{"-a", "-b"};
+    const auto before = countOpenDescriptors();
+    checkEachAllocation("a program", [&] {
+        ProcessReader::open("/bin/true", arguments);
+        return true;
+    });
+    EXPECT_EQ(countOpenDescriptors(), before);
+    EXPECT_EQ(waitpid(-1, nullptr, WNOHANG), -1) << "no process is left";
 }
 
 } // namespace Bluetooth::Test

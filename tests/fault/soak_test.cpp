@@ -1,8 +1,7 @@
 // Long use leaves nothing behind. scripts/soak.sh runs these at full length.
 
 #include "fault/soak.h"
-#include "support/core_test.h"
-#include "support/receive_loop.h"
+#include "support/peer_test.h"
 
 namespace Bluetooth::Test {
 
@@ -23,7 +22,7 @@ void onFound(RemoteObject*, const char*, const Dict* properties) {
 
 } // namespace
 
-class SoakTest : public CoreTest {
+class SoakTest : public LoopTest {
 protected:
     void SetUp() override {
         KES_NEEDS_RECEIVE_LOOP();
@@ -53,8 +52,6 @@ protected:
             ASSERT_TRUE(batches().waitFor(1)); // else the inbox grows, as it should
         }
     }
-
-    RemoteObject loop{peerName, "/loop", "com.example.Loop", busType};
 };
 
 TEST_F(SoakTest, CallsLeaveMemoryAndDescriptorsFlat) {

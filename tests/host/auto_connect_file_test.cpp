@@ -2,14 +2,12 @@
 
 #include <bluetooth/auto_connect.h>
 
-#include <fcntl.h>
-#include <sys/stat.h>
 #include <sys/syscall.h>
-#include <unistd.h>
 
 #include <cerrno>
 #include <limits>
 #include <locale>
+#include <memory>
 
 namespace {
 
@@ -31,8 +29,6 @@ namespace Bluetooth::Test {
 
 namespace {
 
-using Lines = std::vector<std::string>;
-
 constexpr const char* adapter = "AA:BB:CC:DD:EE:FF";
 
 std::string line(const std::string& message) {
@@ -46,27 +42,18 @@ class AutoConnectFileTest : public NamespaceTest {
 protected:
     void SetUp() override {
         NamespaceTest::SetUp();
-        mkfifo(commandPipe, 0600);
-        m_pipe = open(commandPipe, O_RDONLY | O_NONBLOCK | O_CLOEXEC);
         std::filesystem::remove_all("/small/x");
+        pipe = std::make_unique<PipeReader>(commandPipe);
     }
-    void TearDown() override { close(m_pipe); }
 
     void write(const std::string& content) {
         std::filesystem::create_directory(configFolder);
         writeFile(file, content);
     }
     std::string content() const { return readFile(file); }
-    /// The commands that the daemon got since the last call.
-    std::string commands() const {
-        char bytes[100];
-        const ssize_t length = read(m_pipe, bytes, sizeof bytes);
-        return std::string(bytes, length < 0 ? 0 : static_cast<std::size_t>(length));
-    }
-
     /// Every operation on the adapter's file fails with the same line.
     void expectAllFail(const std::string& message) {
-        const Lines lines{line(message)};
+        const Texts lines{line(message)};
         EXPECT_FALSE(config.checkConfigFile(file.c_str()));
         EXPECT_EQ(log.take(), lines);
         EXPECT_FALSE(config.getEnable(adapter));
@@ -75,14 +62,12 @@ protected:
         EXPECT_EQ(log.take(), lines);
         EXPECT_FALSE(config.removeDevice(adapter, "X"));
         EXPECT_EQ(log.take(), lines);
-        EXPECT_EQ(commands(), "");
+        EXPECT_EQ(pipe->take(), "");
     }
 
     const std::string file = std::string(configFolder) + adapter;
     AutoConnect config;
-
-private:
-    int m_pipe = -1;
+    std::unique_ptr<PipeReader> pipe; ///< the end of the daemon that is told of changes
 };
 
 TEST_F(AutoConnectFileTest, MissingFileIsCreatedDisabledAndEmpty) {
@@ -93,8 +78,8 @@ TEST_F(AutoConnectFileTest, MissingFileIsCreatedDisabledAndEmpty) {
     EXPECT_EQ(status.st_mode, static_cast<mode_t>(S_IFDIR | 0755));
     EXPECT_FALSE(config.getEnable("aa:bb:cc:dd:ee:ff"));
     EXPECT_EQ(readFile(std::string(configFolder) + "aa:bb:cc:dd:ee:ff"), "0") << "no case folding";
-    EXPECT_EQ(commands(), "");
-    EXPECT_EQ(log.take(), Lines());
+    EXPECT_EQ(pipe->take(), "");
+    EXPECT_EQ(log.take(), Texts());
 }
 
 TEST_F(AutoConnectFileTest, SetWritesFlagAndListAsGivenAndTellsTheDaemon) {
@@ -111,14 +96,14 @@ TEST_F(AutoConnectFileTest, SetWritesFlagAndListAsGivenAndTellsTheDaemon) {
     for (const auto& testCase : cases) {
         EXPECT_TRUE(config.set(adapter, testCase.enable, testCase.list));
         EXPECT_EQ(content(), testCase.content);
-        EXPECT_EQ(commands(), "1");
+        EXPECT_EQ(pipe->take(), "1");
         EXPECT_EQ(config.getEnable(adapter), testCase.enable);
     }
-    EXPECT_EQ(log.take(), Lines());
+    EXPECT_EQ(log.take(), Texts());
 }
 
 TEST_F(AutoConnectFileTest, SetSucceedsWithoutADaemon) {
-    TearDown();
+    pipe.reset();
     EXPECT_TRUE(config.set(adapter, true, ",A"));
     EXPECT_EQ(content(), "1,A");
     EXPECT_EQ(log.take().size(), 1u) << "the pipe's line only";
@@ -152,7 +137,7 @@ TEST_F(AutoConnectFileTest, EnableIsANumberOtherThanZero) {
     EXPECT_TRUE(config.set(adapter, true, ",A"));
     EXPECT_EQ(content(), "1,A");
     std::locale::global(before);
-    EXPECT_EQ(log.take(), Lines());
+    EXPECT_EQ(log.take(), Texts());
 }
 
 TEST_F(AutoConnectFileTest, RemoveDeviceDropsExactMatchesOfAnEnabledList) {
@@ -173,20 +158,20 @@ TEST_F(AutoConnectFileTest, RemoveDeviceDropsExactMatchesOfAnEnabledList) {
         write(testCase.before);
         EXPECT_TRUE(config.removeDevice(adapter, "A"));
         EXPECT_EQ(content(), testCase.after) << testCase.before;
-        EXPECT_EQ(commands(), "1");
+        EXPECT_EQ(pipe->take(), "1");
     }
     // Disabled, or no flag at all: untouched.
     for (const char* before : {"0,A,B", "", "2,A", "111:22,A", "yes,A", "-1,A"}) {
         write(before);
         EXPECT_TRUE(config.removeDevice(adapter, "A"));
         EXPECT_EQ(content(), before);
-        EXPECT_EQ(commands(), "");
+        EXPECT_EQ(pipe->take(), "");
     }
-    EXPECT_EQ(log.take(), Lines());
+    EXPECT_EQ(log.take(), Texts());
 }
 
 TEST_F(AutoConnectFileTest, NullArgumentsAreLogged) {
-    const Lines noAdapter{line("Adapter address is null.")};
+    const Texts noAdapter{line("Adapter address is null.")};
     EXPECT_FALSE(config.getEnable(nullptr));
     EXPECT_EQ(log.take(), noAdapter);
     EXPECT_FALSE(config.set(nullptr, true, nullptr));
@@ -196,11 +181,11 @@ TEST_F(AutoConnectFileTest, NullArgumentsAreLogged) {
     EXPECT_EQ(config.getDeviceList(nullptr), nullptr);
     EXPECT_EQ(log.take(), noAdapter);
     EXPECT_FALSE(config.set(adapter, true, nullptr));
-    EXPECT_EQ(log.take(), Lines{line("Device address list is null.")});
+    EXPECT_EQ(log.take(), Texts{line("Device address list is null.")});
     EXPECT_FALSE(config.removeDevice(adapter, nullptr));
-    EXPECT_EQ(log.take(), Lines{line("Device address is null.")});
+    EXPECT_EQ(log.take(), Texts{line("Device address is null.")});
     EXPECT_FALSE(config.checkConfigFile(nullptr));
-    EXPECT_EQ(log.take(), Lines{line("Config '(null)' can not be open.")});
+    EXPECT_EQ(log.take(), Texts{line("Config '(null)' can not be open.")});
     EXPECT_FALSE(std::filesystem::exists(configFolder));
 }
 
@@ -231,8 +216,8 @@ TEST_F(AutoConnectFileTest, AFullDiskIsReportedAndDoesNoMore) {
     std::filesystem::create_directory(configFolder);
     std::filesystem::create_symlink("/small/x", file);
     EXPECT_FALSE(config.set(adapter, true, std::string(70000, ',').c_str()));
-    EXPECT_EQ(log.take(), Lines{line("Can not write config file '" + file + "'.")});
-    EXPECT_EQ(commands(), "") << "nothing that is worth reading again";
+    EXPECT_EQ(log.take(), Texts{line("Can not write config file '" + file + "'.")});
+    EXPECT_EQ(pipe->take(), "") << "nothing that is worth reading again";
     EXPECT_FALSE(config.removeDevice(nullptr, "A"));
     log.take();
 
@@ -240,7 +225,7 @@ TEST_F(AutoConnectFileTest, AFullDiskIsReportedAndDoesNoMore) {
     std::filesystem::resize_file("/small/filler", 0);
     writeFile("/small/filler", std::string(100000, 'x'));
     EXPECT_FALSE(config.getEnable(adapter)) << "the file can be made, but not its one byte";
-    EXPECT_EQ(log.take(), Lines{line("Config '" + file + "' can not be written.")});
+    EXPECT_EQ(log.take(), Texts{line("Config '" + file + "' can not be written.")});
     std::filesystem::remove("/small/filler");
 }
 
@@ -252,9 +237,9 @@ TEST_F(AutoConnectFileTest, AListThatCannotBeReadToItsEndIsKept) {
     readableUpTo = 8000; // the flag and the first entries
     EXPECT_FALSE(config.removeDevice(adapter, "A"));
     readableUpTo = std::numeric_limits<off_t>::max();
-    EXPECT_EQ(log.take(), Lines{line("Config '" + file + "' can not be read to its end.")});
+    EXPECT_EQ(log.take(), Texts{line("Config '" + file + "' can not be read to its end.")});
     EXPECT_TRUE(content() == list);
-    EXPECT_EQ(commands(), "");
+    EXPECT_EQ(pipe->take(), "");
     EXPECT_TRUE(config.removeDevice(adapter, "A"));
     EXPECT_EQ(content().size(), list.size() - 2);
 }
@@ -266,19 +251,19 @@ TEST_F(AutoConnectFileTest, LongListsAreKeptAndHugeFilesNotRead) {
     ASSERT_TRUE(config.set(adapter, true, (list + ",A").c_str()));
     EXPECT_TRUE(config.removeDevice(adapter, "A"));
     EXPECT_EQ(content(), '1' + list);
-    commands();
+    pipe->take();
 
     const std::string longLine = "1," + std::string(500000, 'x');
     write(longLine + ",A");
     EXPECT_TRUE(config.removeDevice(adapter, "A"));
     EXPECT_EQ(content(), longLine);
-    commands();
+    pipe->take();
 
     write("1,A,B");
     std::filesystem::resize_file(file, std::uintmax_t(100) << 30); // a hole, and no comma in it
     EXPECT_FALSE(config.getEnable(adapter));
     EXPECT_FALSE(config.removeDevice(adapter, "A"));
-    EXPECT_EQ(log.take(), Lines(2, line("Config '" + file + "' is too large.")));
+    EXPECT_EQ(log.take(), Texts(2, line("Config '" + file + "' is too large.")));
     EXPECT_EQ(std::filesystem::file_size(file), std::uintmax_t(100) << 30);
     EXPECT_TRUE(config.set(adapter, true, ",A")) << "and it can be replaced";
     EXPECT_EQ(content(), "1,A");

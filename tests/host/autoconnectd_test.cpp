@@ -1,31 +1,38 @@
-#include "host/sim_test.h"
+// The auto-connect daemon in its own process.
 
-#include <bluetooth/auto_connect.h>
+#include "host/auto_connect_fixture.h"
+
 #include <bluetooth/commandlib.h>
 
 #include <signal.h>
-#include <sys/stat.h>
 
 #include <memory>
+#include <thread>
 
 namespace Bluetooth::Test {
 
 namespace {
 
 using namespace std::string_literals;
-using Lines = std::vector<std::string>;
 
 constexpr const char* pidFile = "/tmp/test.pid";
 
-std::vector<std::string> commandLine(const std::string& arguments, const char* file = pidFile) {
+Texts commandLine(const std::string& arguments, const char* file = pidFile) {
     return {"sh", "-c",
             "exec " KESBT_AUTOCONNECTD " --pid-file "s + file + " " + arguments + " 2>&1"};
+}
+
+/// What a daemon said that ended by itself with this status.
+std::string outputOf(const Texts& command, int status = 1) {
+    ChildProcess daemon(command, ChildProcess::Output::Capture);
+    EXPECT_EQ(daemon.wait(), status);
+    return daemon.readAll();
 }
 
 /// A daemon in the foreground, and its log.
 class Daemon {
 public:
-    explicit Daemon(const std::string& arguments = "--interval 1")
+    explicit Daemon(const std::string& arguments = "--interval 1 --max-interval 1")
         : m_process(commandLine("--foreground " + arguments), ChildProcess::Output::Capture) {}
 
     /// @return whether the line has come; lines before it are passed over
@@ -51,90 +58,64 @@ public:
 
 private:
     ChildProcess m_process;
-    Lines m_log;
+    Texts m_log;
 };
 
 } // namespace
 
-class AutoConnectDaemonTest : public SimTest {
+class AutoConnectDaemonTest : public AutoConnectFixture {
 protected:
-    void SetUp() override {
-        SimTest::SetUp();
-        setConfig(adapter0, "1,"s + headset + "," + carKit + "," + keyboard);
-        setConfig(adapter1, "1,"s + speaker);
-        other.addMatch("type='signal',member='CallReceived'");
-        writeFile("/usr/bin/hciconfig", "#!/bin/sh\n");
-        std::filesystem::permissions("/usr/bin/hciconfig", std::filesystem::perms::all);
+    std::size_t connectCalls(const char* interface) {
+        return simulation.countCalls("s:org.bluez."s + interface + " s:Connect ");
     }
 
-    /// The interfaces on which the daemon was told to connect.
-    Lines connectCalls() {
-        control("ClearFaults"); // answered after the signals that were under way
-        Lines interfaces;
-        for (const std::string& signal : other.signals().events()) {
-            for (const char* interface : {"org.bluez.AudioSink", "org.bluez.Audio"}) {
-                if (signal.find("s:"s + interface + " s:Connect ") != std::string::npos)
-                    interfaces.push_back(interface);
-            }
-        }
-        return interfaces;
-    }
-    void disconnect(const char* address) {
-        control("DropLink", [&](Writer& w) { w("hci0")(address); });
-    }
-
-    AutoConnect commands;
     const std::string headsetConnected = headset + " connected"s;
 };
 
 TEST_F(AutoConnectDaemonTest, ConnectsAtStartBySinkOrAllAudio) {
+    setConfig(adapter0, "1,"s + headset + "," + carKit + "," + keyboard);
+    setConfig(adapter1, "1,"s + speaker);
     Daemon daemon;
-    Lines connected;
-    EXPECT_TRUE(daemon.waitFor(headsetConnected));
-    EXPECT_TRUE(daemon.waitFor(carKit + " connected"s) || daemon.count(carKit + " connected"s));
-    EXPECT_TRUE(daemon.count(speaker + " connected"s) || daemon.waitFor(speaker + " connected"s));
-    EXPECT_EQ(connectCalls(),
-              (Lines{"org.bluez.AudioSink", "org.bluez.Audio", "org.bluez.AudioSink"}));
+    for (const char* device : {headset, carKit, speaker}) {
+        const std::string connected = device + " connected"s;
+        EXPECT_TRUE(daemon.count(connected) || daemon.waitFor(connected)) << device;
+    }
+    EXPECT_EQ(connectCalls("AudioSink"), 2u);
+    EXPECT_EQ(connectCalls("Audio"), 1u);
     EXPECT_EQ(daemon.stop(), 0);
-    daemon.waitFor("stopped");
-    EXPECT_EQ(daemon.count("stopped"), 1);
+    EXPECT_TRUE(daemon.waitFor("stopped"));
 }
 
 TEST_F(AutoConnectDaemonTest, ADeviceThatIsAwayIsConnectedWhenItAppears) {
     setConfig(adapter0, "1,"s + headset);
-    setConfig(adapter1, "0");
-    setConnectable(headset, false);
+    simulation.setDevice(headset, "Connectable", false);
     Daemon daemon;
     EXPECT_TRUE(daemon.waitFor("connecting "s + headset));
-    setConnectable(headset, true);
+    simulation.setDevice(headset, "Connectable", true);
     EXPECT_TRUE(daemon.waitFor(headsetConnected));
-    disconnect(headset);
+    simulation.control("DropLink", [&](Writer& w) { w("hci0")(headset); });
     EXPECT_TRUE(daemon.waitFor(headset + " disconnected"s));
     EXPECT_TRUE(daemon.waitFor(headsetConnected)) << "and again when it comes back";
     EXPECT_EQ(daemon.stop(SIGINT), 0);
 }
 
 TEST_F(AutoConnectDaemonTest, CommandsThatRunTogetherAreCarriedOutInOrder) {
-    setConfig(adapter0, "0");
-    setConfig(adapter1, "0");
-    Daemon daemon("--interval 1 --max-interval 1");
+    Daemon daemon;
     ASSERT_TRUE(daemon.waitFor("started"));
-    EXPECT_TRUE(commands.sendCommand("pause1pauseresumexpause"));
+    EXPECT_TRUE(autoConnect.sendCommand("pause1pauseresumexpause"));
     EXPECT_TRUE(daemon.waitFor("no command: \"x\""));
     for (const char* line : {"paused", "paused", "resumed", "paused"})
         EXPECT_TRUE(daemon.waitFor(line));
 
-    EXPECT_TRUE(commands.set(adapter0, true, (","s + headset).c_str()));
+    EXPECT_TRUE(autoConnect.set(adapter0, true, (","s + headset).c_str()));
     EXPECT_TRUE(daemon.waitFor("watching "s + headset)) << "files are read while it pauses ...";
     EXPECT_FALSE(daemon.waitFor("connecting "s + headset, Milliseconds(1500)));
-    EXPECT_EQ(connectCalls(), Lines()) << "... and nothing is connected";
-    EXPECT_TRUE(commands.resume());
+    EXPECT_EQ(connectCalls("AudioSink"), 0u) << "... and nothing is connected";
+    EXPECT_TRUE(autoConnect.resume());
     EXPECT_TRUE(daemon.waitFor(headsetConnected));
 }
 
-TEST_F(AutoConnectDaemonTest, EveryCommandOfManySendersArrives) {
-    setConfig(adapter0, "0");
-    setConfig(adapter1, "0");
+TEST_F(AutoConnectDaemonTest, EveryCommandOfManySendersArrivesAlsoThroughAPipeMadeAnew) {
     Daemon daemon;
     ASSERT_TRUE(daemon.waitFor("started"));
     constexpr int senders = 4;
@@ -148,53 +129,45 @@ TEST_F(AutoConnectDaemonTest, EveryCommandOfManySendersArrives) {
         });
     for (std::thread& thread : threads)
         thread.join();
-    EXPECT_TRUE(commands.resume());
+    EXPECT_TRUE(autoConnect.resume());
     EXPECT_TRUE(daemon.waitFor("resumed"));
     EXPECT_EQ(daemon.count("paused"), senders * each);
-}
 
-TEST_F(AutoConnectDaemonTest, FollowsTheBluetoothDaemonAndItsAdapters) {
-    control("DropName");
-    Daemon daemon;
-    EXPECT_TRUE(daemon.waitFor("bluetoothd is not running; waiting for it"));
-    control("RegainName");
-    EXPECT_TRUE(daemon.waitFor(headsetConnected));
-
-    setConfig(adapter0, "0");
-    setConfig(adapter1, "1,"s + speaker);
-    control("RemoveAdapter", [](Writer& w) { w("hci1"); });
-    EXPECT_TRUE(commands.reload());
-    control("Restart"); // every path is new
-    control("AddAdapter", [](Writer& w) {
-        w.dict("sv", [](Writer& e) { e.entry("Address", Var{std::string(adapter1)}); });
-    });
-    EXPECT_TRUE(daemon.waitFor(speaker + " connected"s));
-    EXPECT_EQ(daemon.stop(), 0);
-}
-
-TEST_F(AutoConnectDaemonTest, ARemovedPipeIsMadeAnew) {
-    Daemon daemon("--interval 1 --max-interval 1");
-    ASSERT_TRUE(daemon.waitFor("started"));
     std::filesystem::remove(commandPipe);
     while (!std::filesystem::is_fifo(commandPipe))
         usleep(10000);
-    while (!commands.pause()) // made, and not yet opened
+    while (!autoConnect.pause()) // made, and not yet opened
         usleep(1000);
     EXPECT_TRUE(daemon.waitFor("paused"));
 }
 
-TEST_F(AutoConnectDaemonTest, GoesIntoTheBackgroundOnceItIsReady) {
-    // Taken from the folder it is started in, not from the one it goes to.
-    ChildProcess starter({"sh", "-c", "cd /tmp && exec " KESBT_AUTOCONNECTD " --pid-file test.pid"},
-                         ChildProcess::Output::Capture);
-    EXPECT_EQ(starter.wait(), 0);
-    EXPECT_EQ(starter.readAll(), "") << "the output is let go of";
-    const int pid = std::stoi(readFile(pidFile));
-    EXPECT_TRUE(commands.reload()) << "it listens";
+TEST_F(AutoConnectDaemonTest, FollowsTheBluetoothDaemonAndItsAdapters) {
+    setConfig(adapter0, "1,"s + headset);
+    simulation.control("DropName");
+    Daemon daemon("--interval 1");
+    EXPECT_TRUE(daemon.waitFor("bluetoothd is not running; waiting for it"));
+    simulation.control("RegainName");
+    EXPECT_TRUE(daemon.waitFor(headsetConnected));
 
-    ChildProcess second(commandLine(""), ChildProcess::Output::Capture);
-    EXPECT_EQ(second.wait(), 1);
-    EXPECT_EQ(second.readAll(),
+    setConfig(adapter0, "0");
+    setConfig(adapter1, "1,"s + speaker);
+    simulation.control("RemoveAdapter", [](Writer& w) { w("hci1"); });
+    EXPECT_TRUE(autoConnect.reload());
+    simulation.control("Restart"); // every path is new
+    simulation.control("AddAdapter", [](Writer& w) {
+        w.dict("sv", [](Writer& e) { e.entry("Address", Var{std::string(adapter1)}); });
+    });
+    EXPECT_TRUE(daemon.waitFor(speaker + " connected"s));
+}
+
+TEST_F(AutoConnectDaemonTest, GoesIntoTheBackgroundOnceItIsReady) {
+    // The file is taken from the folder it is started in, not from the one it goes to.
+    EXPECT_EQ(
+        outputOf({"sh", "-c", "cd /tmp && exec " KESBT_AUTOCONNECTD " --pid-file test.pid"}, 0), "")
+        << "the output is let go of";
+    const int pid = std::stoi(readFile(pidFile));
+    EXPECT_TRUE(autoConnect.reload()) << "it listens";
+    EXPECT_EQ(outputOf(commandLine("")),
               "kesbt-autoconnectd: already running (/tmp/test.pid is locked); stop the other one, "
               "or choose another file with --pid-file\n");
     EXPECT_EQ(kill(pid, SIGTERM), 0);
@@ -205,42 +178,32 @@ TEST_F(AutoConnectDaemonTest, GoesIntoTheBackgroundOnceItIsReady) {
 
 TEST_F(AutoConnectDaemonTest, AFailedStartIsOneLineThatSaysWhatToDo) {
     writeFile(commandPipe, "a file");
-    const struct {
-        const char* pidFile;
-        std::string line;
-    } cases[] = {
-        {"/nowhere/x", "cannot write /nowhere/x: No such file or directory; run as root, or choose "
-                       "another file with --pid-file"},
-        {pidFile, "/tmp/kes_bluetooth_autoconnect is not a pipe that can be read; remove it and "
-                  "start again"},
-    };
-    for (const auto& testCase : cases) {
-        for (const char* mode : {"--foreground", ""}) {
-            ChildProcess daemon(commandLine(mode, testCase.pidFile), ChildProcess::Output::Capture);
-            EXPECT_EQ(daemon.wait(), 1);
-            EXPECT_EQ(daemon.readAll(), "kesbt-autoconnectd: " + testCase.line + "\n");
-        }
+    const std::string name = "kesbt-autoconnectd: ";
+    for (const char* mode : {"--foreground", ""}) {
+        EXPECT_EQ(outputOf(commandLine(mode, "/nowhere/x")),
+                  name + "cannot write /nowhere/x: No such file or directory; run as root, or "
+                         "choose another file with --pid-file\n");
+        EXPECT_EQ(outputOf(commandLine(mode)),
+                  name + "/tmp/kes_bluetooth_autoconnect is not a pipe that can be read; remove it "
+                         "and start again\n");
     }
     std::filesystem::remove(commandPipe);
-    bus.kill();
-    ChildProcess alone(commandLine("-f"), ChildProcess::Output::Capture);
-    EXPECT_EQ(alone.wait(), 1);
-    EXPECT_EQ(alone.readAll(), "kesbt-autoconnectd: cannot reach the system bus; start "
-                               "dbus-daemon, or set DBUS_SYSTEM_BUS_ADDRESS\n");
+    simulation.bus().kill();
+    EXPECT_EQ(outputOf(commandLine("-f")),
+              name + "cannot reach the system bus; start dbus-daemon, or set "
+                     "DBUS_SYSTEM_BUS_ADDRESS\n");
     for (const char* wrong : {"--interval 0", "--max-interval x", "--unknown", "word"}) {
-        ChildProcess daemon(commandLine(wrong), ChildProcess::Output::Capture);
-        EXPECT_EQ(daemon.wait(), 2);
-        const std::string text = daemon.readAll();
+        const std::string text = outputOf(commandLine(wrong), 2);
         EXPECT_EQ(std::count(text.begin(), text.end(), '\n'), 1) << text;
     }
     for (const char* right : {"--help", "--version"})
-        EXPECT_EQ(ChildProcess(commandLine(right), ChildProcess::Output::Capture).wait(), 0);
+        outputOf(commandLine(right), 0);
 }
 
 TEST_F(AutoConnectDaemonTest, EndsWhenTheBusGoes) {
-    Daemon daemon("--interval 1 --max-interval 1");
+    Daemon daemon;
     ASSERT_TRUE(daemon.waitFor("started"));
-    bus.kill();
+    simulation.bus().kill();
     const char* const reason = "the system bus has gone; start again when it is back";
     EXPECT_TRUE(daemon.waitFor(reason));
     EXPECT_EQ(daemon.stop(0), 1);

@@ -15,8 +15,6 @@ namespace Bluetooth::Test {
 
 namespace {
 
-using Lines = std::vector<std::string>;
-
 constexpr const char* daemonProgram = "/usr/sbin/bluetoothd";
 constexpr const char* marker = "/tmp/bluetooth.info_0";
 
@@ -64,7 +62,7 @@ TEST_F(ProcessLookupTest, MatchesAnyPartOfTheExecutablesPath) {
               "/tmp/bluetoothd-tool");
     EXPECT_EQ(getPidFromName("/tmp/blue"), pid);
     EXPECT_EQ(getPidFromName("toothd-tools"), -1);
-    EXPECT_EQ(log.take(), Lines());
+    EXPECT_EQ(log.take(), Texts());
 }
 
 TEST_F(ProcessLookupTest, FirstIsTheFirstAsTextNotAsNumber) {
@@ -96,7 +94,7 @@ TEST_F(RestartTest, WithoutAnAdapterTheRunningDaemonIsLeftAlone) {
     startDaemon(daemonProgram);
     const int running = getPidFromName("bluetoothd");
     EXPECT_EQ(restartBluetoothd(), -1);
-    EXPECT_EQ(log.take(), Lines{"commandlib.cpp No dongle. Stop restarting bluetoothd..."});
+    EXPECT_EQ(log.take(), Texts{"commandlib.cpp No dongle. Stop restarting bluetoothd..."});
     EXPECT_EQ(getPidFromName("bluetoothd"), running);
 }
 
@@ -110,7 +108,7 @@ TEST_F(RestartTest, KillsTheRunningDaemonAndStartsANewOneThatInheritsNothing) {
     const int now = getPidFromName("bluetoothd");
     EXPECT_GT(now, 0);
     EXPECT_NE(now, old);
-    EXPECT_EQ(log.take(), Lines());
+    EXPECT_EQ(log.take(), Texts());
 
     const std::filesystem::directory_iterator inherited("/proc/" + std::to_string(now) + "/fd");
     EXPECT_EQ(std::distance(begin(inherited), end(inherited)), 3) << "no PID lock, no socket";
@@ -125,7 +123,7 @@ TEST_F(RestartTest, ADaemonThatDoesNotStartIsAFailureWhateverItReturns) {
     writeFile(daemonProgram, "#!/bin/sh\nexit 0\n");
     std::filesystem::permissions(daemonProgram, std::filesystem::perms::all);
     EXPECT_EQ(restartBluetoothd(), -1) << "it ends with success and leaves no process";
-    EXPECT_EQ(log.take(), Lines(2, "commandlib.cpp Failed to start bluetoothd"));
+    EXPECT_EQ(log.take(), Texts(2, "commandlib.cpp Failed to start bluetoothd"));
 }
 
 TEST(AddressFromPathTest, TakesAllThatFollowsTheDevice) {

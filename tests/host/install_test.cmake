@@ -1,14 +1,15 @@
 # Installs a program to a prefix that is chosen only then, and checks that the file that starts it
 # names it there.
-#   cmake -Dscript=CMAKE_INSTALL_SCRIPT -Dcomponent=NAME -Dprefix=FOLDER -Dfile=FILE_BELOW_IT -Dkey=KEY -P THIS
+#   cmake -Dscript=CMAKE_INSTALL_SCRIPT -Dcomponent=NAME -Dprefix=FOLDER -P THIS
 file(REMOVE_RECURSE ${prefix})
 execute_process(
     COMMAND ${CMAKE_COMMAND} -DCMAKE_INSTALL_COMPONENT=${component} -DCMAKE_INSTALL_PREFIX=${prefix}
         -P ${script}
     OUTPUT_QUIET COMMAND_ERROR_IS_FATAL ANY)
-file(STRINGS ${prefix}/${file} line REGEX "^${key}=")
-string(REPLACE "${key}=" "" program "${line}")
+file(GLOB_RECURSE services ${prefix}/*.service)
+file(STRINGS ${services} line REGEX "^Exec(Start)?=")
+string(REGEX REPLACE "^Exec(Start)?=" "" program "${line}")
 string(FIND "${program}" "${prefix}/" place)
 if(NOT place EQUAL 0 OR NOT EXISTS "${program}")
-    message(FATAL_ERROR "${file} starts \"${program}\"")
+    message(FATAL_ERROR "${services} starts \"${program}\"")
 endif()

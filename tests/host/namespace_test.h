@@ -5,6 +5,10 @@
 
 #include <gtest/gtest.h>
 
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
 #include <cstdlib>
 #include <filesystem>
 #include <fstream>
@@ -25,6 +29,37 @@ inline std::string readFile(const std::string& path) {
 inline void writeFile(const std::string& path, const std::string& content) {
     std::ofstream(path, std::ios::binary) << content;
 }
+
+inline void writeProgram(const std::string& path, const std::string& script) {
+    writeFile(path, "#!/bin/sh\n" + script);
+    std::filesystem::permissions(path, std::filesystem::perms(0755));
+}
+
+inline auto countOpenDescriptors() {
+    return std::distance(std::filesystem::directory_iterator("/proc/self/fd"), {});
+}
+
+/// A daemon's end of a pipe, which does not wait for a writer.
+class PipeReader {
+public:
+    explicit PipeReader(const char* pipe) {
+        mkfifo(pipe, 0600);
+        m_descriptor = open(pipe, O_RDONLY | O_NONBLOCK | O_CLOEXEC);
+    }
+    ~PipeReader() { close(m_descriptor); }
+    PipeReader(const PipeReader&) = delete;
+    PipeReader& operator=(const PipeReader&) = delete;
+
+    /// @return what has been written since the last call
+    std::string take() const {
+        char bytes[100];
+        const ssize_t length = read(m_descriptor, bytes, sizeof bytes);
+        return std::string(bytes, length < 0 ? 0 : static_cast<std::size_t>(length));
+    }
+
+private:
+    int m_descriptor;
+};
 
 /// Uses the library's fixed paths, which are this test's own: ctest runs it through
 /// tests/host/in_namespace.sh. Begins with an empty /etc/bluetooth.

@@ -13,8 +13,6 @@ namespace Bluetooth::Test {
 
 namespace {
 
-using Lines = std::vector<std::string>;
-
 constexpr const char* path = "/tmp/test.pid";
 constexpr int closeOnExec = 1;
 
@@ -78,7 +76,7 @@ TEST_F(PidFileTest, HoldsTheProcessIdAndNothingElse) {
     EXPECT_EQ(readFile(path), std::to_string(getpid()) + "\n");
     close(second);
     close(descriptor);
-    EXPECT_EQ(log.take(), Lines());
+    EXPECT_EQ(log.take(), Texts());
 }
 
 TEST_F(PidFileTest, NewFileIsForItsOwnerOnly) {
@@ -95,10 +93,10 @@ TEST_F(PidFileTest, AnotherProcessKeepsItsLockAndItsNumber) {
         const OtherDaemon other(path);
         EXPECT_EQ(createPidFile(path, 0, false), -1);
         EXPECT_EQ(errno, EAGAIN);
-        EXPECT_EQ(log.take(), Lines());
+        EXPECT_EQ(log.take(), Texts());
         EXPECT_EQ(createPidFile(path, closeOnExec, true), -1);
         EXPECT_EQ(log.take(),
-                  Lines{line("PID file '/tmp/test.pid' is locked; Daemon is already running")});
+                  Texts{line("PID file '/tmp/test.pid' is locked; Daemon is already running")});
         EXPECT_EQ(readFile(path), std::to_string(other.pid()) + "\n");
     }
     const int descriptor = createPidFile(path, 0, true);
@@ -123,7 +121,7 @@ TEST_F(PidFileTest, EachFailureHasItsOwnLineAndLeavesNothingOpen) {
     writeFile("/small/filler", std::string(100000, 'x'));
     for (const auto& testCase : cases) {
         EXPECT_EQ(createPidFile(testCase.path, closeOnExec, true), -1);
-        EXPECT_EQ(log.take(), Lines{line(testCase.message.c_str())});
+        EXPECT_EQ(log.take(), Texts{line(testCase.message.c_str())});
     }
     std::filesystem::remove("/small/filler");
     const int after = dup(0);

@@ -5,6 +5,8 @@
 #include <bluetooth/hci_lib.h>
 #include <gtest/gtest.h>
 
+#include "support/latch.h"
+
 #include <string>
 #include <vector>
 
@@ -82,9 +84,8 @@ TEST_F(RemoteNameTest, AsksTheRoutingAdapterAndClosesIt) {
     char name[32];
     EXPECT_EQ(getNameFromAddr(address, name, sizeof name, static_cast<GetNameTimeout>(1234)), 0);
     EXPECT_STREQ(name, "Headset");
-    EXPECT_EQ(controller.calls,
-              (std::vector<std::string>{"route 00:11:22:AA:BB:CC", "open 3",
-                                        "name 55 00:11:22:AA:BB:CC 248 1234", "close 55"}));
+    EXPECT_EQ(controller.calls, (Texts{"route 00:11:22:AA:BB:CC", "open 3",
+                                       "name 55 00:11:22:AA:BB:CC 248 1234", "close 55"}));
 }
 
 TEST_F(RemoteNameTest, CutsTheNameAndWritesNothingBeyond) {

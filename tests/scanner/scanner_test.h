@@ -8,10 +8,8 @@
 
 #include <gtest/gtest.h>
 
-#include <functional>
 #include <memory>
 #include <string>
-#include <vector>
 
 namespace Bluetooth::Test {
 
@@ -25,39 +23,34 @@ inline constexpr const char* speaker = "00:11:22:33:44:03"; // in reach of hci1 
 /// An answer that tells of no device, as argumentsOf() writes it.
 inline constexpr const char* emptyAnswer = "a(e(s: s:))";
 
-/// The simulated daemon and a session bus, for a scanner service. Discovery goes in rounds of 0.1
-/// s.
+/// The simulated daemon and a session bus, for a scanner service. Discovery goes in rounds of
+/// 0.1 s.
 class ScannerTest : public ::testing::Test {
 protected:
     ScannerTest();
 
-    /// Changes, or with "AddDevice" adds, a device.
-    template <class Value>
-    void setDevice(const char* address, const char* key, Value value,
-                   const char* method = "SetDevice") {
-        simulation.control(method, [&](Writer& w) {
-            w(address).dict("sv", [&](Writer& e) { e.entry(key, Var{value}); });
-        });
+    void comeInReach(const char* address) { simulation.setDevice(address, "Present", true); }
+
+    /// How often the daemon has been told so far to start or stop a discovery.
+    std::size_t starts(const char* adapter) { return simulation.countCalls(on(adapter, "Start")); }
+    std::size_t stops(const char* adapter) { return simulation.countCalls(on(adapter, "Stop")); }
+    bool awaitStarts(const char* adapter, std::size_t count) {
+        return simulation.awaitCalls(on(adapter, "Start"), count);
     }
-
-    void comeInReach(const char* address) { setDevice(address, "Present", true); }
-
-    /// How often the daemon has been called so far.
-    std::size_t countCalls(const char* adapter, const char* member);
-    bool awaitCalls(const char* adapter, const char* member, std::size_t count);
-    /// @return the unique name of the one who called the daemon last
-    std::string lastCaller();
+    static std::string on(const char* adapter, const char* what) {
+        return std::string("/") + adapter + " s:org.bluez.Adapter s:" + what + "Discovery ";
+    }
+    /// @return the path of an adapter
+    std::string pathOf(const char* adapter);
 
     /// Calls the service and awaits its answer.
     /// @return its arguments as text; for an error its text after "ERROR "
     std::string call(const char* method, const char* adapterId);
     std::string ask(const char* adapterId) { return call("ListDevices", adapterId); }
-    /// Asks until the answer is as wanted: the service tells nobody when it has found something.
+    /// Asks until a device is listed, or gone: the service tells nobody when it has found
+    /// something.
     /// @return the last answer
-    std::string askUntil(const char* adapterId,
-                         const std::function<bool(const std::string&)>& wanted);
-    std::string askUntilListed(const char* adapterId, const char* address);
-    std::string askUntilGone(const char* adapterId, const char* address);
+    std::string askUntilListed(const char* adapterId, const char* address, bool listed = true);
 
     SyslogCapture log;
     Simulation simulation;

@@ -14,8 +14,6 @@ namespace Bluetooth::Test {
 
 namespace {
 
-using Texts = std::vector<std::string>;
-
 /// The fields up to an empty one.
 Texts fieldsAt(const char* data) {
     Texts fields;
@@ -73,13 +71,6 @@ class ServerTest : public ScannerTest {
 protected:
     void SetUp() override { KES_NEEDS_RECEIVE_LOOP(); }
 
-    std::string adapterPath(const char* name) {
-        const MessagePtr reply = system
-                                     .call("org.bluez", "/", "org.bluez.Manager", "FindAdapter",
-                                           [name](Writer& w) { w(name); })
-                                     .get();
-        return argumentsOf(reply.get()).substr(std::string("o:").size());
-    }
     static bool ticks(ScannerServer& server, int count) {
         bool all = true;
         for (int tick = 0; tick < count; ++tick)
@@ -121,31 +112,27 @@ TEST_F(ServerTest, FrameTellsAboutTheBus) {
 
 TEST_F(ServerTest, OnlyReachingZeroEndsTheLoop) {
     ScannerServer server;
+    EXPECT_TRUE(server.isInFilterSet(mouse));
+    EXPECT_FALSE(server.isInFilterSet(phone));
+    EXPECT_EQ(server.getInfoFromMap(phone), "");
+    server.putInfoToMap(phone, "a: 1;");
+    server.putInfoToMap(phone, "b: 2;");
+    EXPECT_EQ(server.getInfoFromMap(phone), "b: 2;");
     EXPECT_TRUE(ticks(server, 29));
     server.addAdapterFounder("hci0");
     EXPECT_TRUE(ticks(server, 29));
     server.addAdapterFounder("hci9"); // no finder, no more time
     server.startLoop();               // the timer's tick is the thirtieth
     EXPECT_TRUE(ticks(server, 40));   // below zero it goes on
-    EXPECT_EQ(countCalls("hci0", "StartDiscovery"), 1u);
+    EXPECT_EQ(starts("hci0"), 1u);
     server.stopDiscovery();
-    EXPECT_EQ(countCalls("hci0", "StopDiscovery"), 1u);
-}
-
-TEST_F(ServerTest, RunsOneLoopAtATime) {
-    RunningServer running;
-    EXPECT_EQ(ask("hci0"), emptyAnswer);
-    running.server.startLoop(); // returns
-    comeInReach(phone);
-    askUntilListed("hci0", phone);
-    running.server.quitLoop();
-    EXPECT_TRUE(running.waitForEnd());
+    EXPECT_EQ(stops("hci0"), 1u);
 }
 
 TEST_F(ServerTest, SecondFinderOfAnAdapterIsNotListed) {
     ScannerServer server;
     const ObjectPtr object = makeObject();
-    const std::string path = adapterPath("hci0");
+    const std::string path = pathOf("hci0");
     AddressSet* first = object->addFinder(path.c_str());
     ASSERT_NE(first, nullptr);
     AddressSet* second = object->addFinder(path.c_str());
@@ -153,7 +140,7 @@ TEST_F(ServerTest, SecondFinderOfAnAdapterIsNotListed) {
     EXPECT_NE(first, second);
     EXPECT_EQ(object->getListByName(path), first);
     EXPECT_EQ(object->finders.size(), 1u);
-    EXPECT_EQ(countCalls("hci0", "StartDiscovery"), 2u);
+    EXPECT_EQ(starts("hci0"), 2u);
     EXPECT_EQ(object->addFinder("/org/bluez/1/hci9"), nullptr);
     EXPECT_EQ(object->getListByName("/org/bluez/1/hci9"), nullptr);
 
@@ -161,22 +148,26 @@ TEST_F(ServerTest, SecondFinderOfAnAdapterIsNotListed) {
     EXPECT_TRUE(scanner_object_remove_finder(object.get(), "hci0", &error));
     EXPECT_EQ(error, nullptr);
     EXPECT_TRUE(object->finders.empty());
-    EXPECT_EQ(countCalls("hci0", "StopDiscovery"), 1u); // of two: the other runs on
+    EXPECT_EQ(stops("hci0"), 1u); // of two: the other runs on
 }
 
-TEST_F(ServerTest, SignalMakesAFinder) {
+TEST_F(ServerTest, SignalMakesAFinderWhileOneLoopRuns) {
     RunningServer running;
+    EXPECT_EQ(ask("hci1"), emptyAnswer);
+    running.server.startLoop(); // returns: one loop at a time
     running.server.addAdapterFounder("hci0");
     running.server.addAdapterFounder("00:1A:7D:DA:71:10"); // the same adapter once more
     comeInReach(phone);
     askUntilListed("hci0", phone);
-    EXPECT_EQ(countCalls("hci0", "StartDiscovery"), 2u);
+    EXPECT_EQ(starts("hci0"), 2u);
 
     EXPECT_EQ(call("RemoveFinder", "hci0"), "");
-    setDevice("00:11:22:33:44:99", "Name", "New", "AddDevice");
-    ASSERT_TRUE(awaitCalls("hci0", "StartDiscovery", 3)); // nobody asked
+    simulation.setDevice("00:11:22:33:44:99", "Name", "New", "AddDevice");
+    ASSERT_TRUE(awaitStarts("hci0", 3)); // nobody asked
     askUntilListed("hci0", "00:11:22:33:44:99");
-    EXPECT_EQ(countCalls("hci0", "StartDiscovery"), 3u);
+    EXPECT_EQ(starts("hci0"), 3u);
+    running.server.quitLoop();
+    EXPECT_TRUE(running.waitForEnd());
 }
 
 TEST_F(ServerTest, HandlersTellWhatIsMissing) {
@@ -217,16 +208,6 @@ TEST_F(ServerTest, HandlersTellWhatIsMissing) {
     EXPECT_EQ(devices, nullptr);
 }
 
-TEST_F(ServerTest, KeepsTextsAndKnownAddresses) {
-    ScannerServer server;
-    EXPECT_TRUE(server.isInFilterSet(mouse));
-    EXPECT_FALSE(server.isInFilterSet(phone));
-    EXPECT_EQ(server.getInfoFromMap(phone), "");
-    server.putInfoToMap(phone, "a: 1;");
-    server.putInfoToMap(phone, "b: 2;");
-    EXPECT_EQ(server.getInfoFromMap(phone), "b: 2;");
-}
-
 TEST_F(ServerTest, IncompleteConstructionIsLogged) {
     {
         const ScannerServer first;
@@ -256,8 +237,8 @@ TEST_F(ServerTest, WithoutSessionBusNothingIsServed) {
 
 TEST_F(ServerTest, FindersComeAndGoWhileDevicesAreFound) {
     for (int device = 10; device < 60; ++device)
-        setDevice(("00:11:22:33:55:" + std::to_string(device)).c_str(), "RSSIVariation",
-                  std::uint32_t{20}, "AddDevice");
+        simulation.setDevice(("00:11:22:33:55:" + std::to_string(device)).c_str(), "RSSIVariation",
+                             std::uint32_t{20}, "AddDevice");
     RunningServer running;
     std::vector<std::thread> clients;
     for (const char* adapter : {"hci0", "hci1", "hci0", "hci1"}) {

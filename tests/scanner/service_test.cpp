@@ -28,13 +28,24 @@ DevicesPtr list(Scanner& scanner, const char* adapterId, bool logErrors = true) 
     return DevicesPtr(scanner.listDevices(adapterId, logErrors));
 }
 
+/// @return what the program wrote to its output and to its errors
+std::pair<std::string, std::string> run(const std::string& argument, int status) {
+    Texts command{KESBT_SCANNERD};
+    if (!argument.empty())
+        command.push_back(argument);
+    ChildProcess program(command, ChildProcess::Output::Capture);
+    EXPECT_EQ(program.wait(), status);
+    const std::string output = program.readAll();
+    return {output, program.readErrors()};
+}
+
 } // namespace
 
 class ServiceTest : public ScannerTest {
 protected:
     void startService() {
-        service = std::make_unique<ChildProcess>(std::vector<std::string>{KESBT_SCANNERD},
-                                                 ChildProcess::Output::Capture);
+        service =
+            std::make_unique<ChildProcess>(Texts{KESBT_SCANNERD}, ChildProcess::Output::Capture);
         ASSERT_TRUE(session.waitForOwner(serviceName, true)) << service->readErrors();
     }
     /// Ends the service as a user would. @return its exit status
@@ -69,26 +80,14 @@ protected:
     std::unique_ptr<ChildProcess> service;
 };
 
-TEST_F(ServiceTest, FirstAnswerIsEmptyAndStartsDiscoveryOnce) {
+TEST_F(ServiceTest, DevicesAreListedWithTheirPropertiesFromTheSecondAnswerOn) {
     startService();
-    EXPECT_EQ(ask("hci0"), emptyAnswer);
-    EXPECT_EQ(countCalls("hci0", "StartDiscovery"), 1u);
-    EXPECT_EQ(countCalls("hci1", "StartDiscovery"), 0u);
-
     Scanner scanner;
-    const DevicesPtr first = list(scanner, "hci1");
-    ASSERT_TRUE(first);
-    EXPECT_TRUE(first->empty());
-    EXPECT_EQ(countCalls("hci1", "StartDiscovery"), 1u);
-
-    comeInReach(phone);
-    askUntilListed("hci0", phone);
-    EXPECT_EQ(countCalls("hci0", "StartDiscovery"), 1u);
-    EXPECT_EQ(stopService(), 0);
-}
-
-TEST_F(ServiceTest, ClientGetsTheProperties) {
-    startService();
+    const DevicesPtr none = list(scanner, "hci0");
+    ASSERT_TRUE(none);
+    EXPECT_TRUE(none->empty());
+    EXPECT_EQ(starts("hci0"), 1u);
+    EXPECT_EQ(starts("hci1"), 0u);
     comeInReach(phone);
     const std::string answer = askUntilListed("hci0", phone);
     EXPECT_NE(answer.find(
@@ -96,8 +95,8 @@ TEST_F(ServiceTest, ClientGetsTheProperties) {
               std::string::npos)
         << answer;
     EXPECT_NE(answer.find("Trusted: 0;)"), std::string::npos) << answer;
+    EXPECT_EQ(starts("hci0"), 1u);
 
-    Scanner scanner;
     const DevicesPtr devices = list(scanner, "00:1A:7D:DA:71:10"); // by the adapter's address
     ASSERT_TRUE(devices);
     ASSERT_EQ(devices->size(), 1u);
@@ -108,15 +107,10 @@ TEST_F(ServiceTest, ClientGetsTheProperties) {
     EXPECT_TRUE(properties[1] == DictEntry("Class", std::string("360")));
     EXPECT_EQ(find(&properties, "Paired"), "0");
     EXPECT_TRUE(log.take().empty());
-}
 
-TEST_F(ServiceTest, DevicesDisappearAndComeBackWithNewProperties) {
-    startService();
-    comeInReach(phone);
-    askUntilListed("hci0", phone);
-    setDevice(phone, "Present", false);
-    askUntilGone("hci0", phone);
-    setDevice(phone, "RSSI", std::int16_t{-40});
+    simulation.setDevice(phone, "Present", false);
+    askUntilListed("hci0", phone, false);
+    simulation.setDevice(phone, "RSSI", std::int16_t{-40});
     comeInReach(phone);
     EXPECT_NE(askUntilListed("hci0", phone).find("RSSI: -40;"), std::string::npos);
 }
@@ -127,13 +121,9 @@ TEST_F(ServiceTest, DevicesThatTheDaemonKnowsAreLeftOut) {
     comeInReach(phone);
     EXPECT_FALSE(lists(askUntilListed("hci0", phone), mouse));
 
-    const MessagePtr adapter = system
-                                   .call("org.bluez", "/", "org.bluez.Manager", "FindAdapter",
-                                         [](Writer& w) { w("hci0"); })
-                                   .get();
-    const std::string adapterPath = argumentsOf(adapter.get()).substr(2);
     const auto onAdapter = [&](const char* method, const RawPeer::Build& arguments) {
-        return system.call("org.bluez", adapterPath, "org.bluez.Adapter", method, arguments).get();
+        return system.call("org.bluez", pathOf("hci0"), "org.bluez.Adapter", method, arguments)
+            .get();
     };
     const MessagePtr created = onAdapter("CreateDevice", [](Writer& w) { w(phone); });
     const std::string devicePath = argumentsOf(created.get()).substr(2);
@@ -147,22 +137,22 @@ TEST_F(ServiceTest, AdaptersHaveFindersOfTheirOwn) {
     ask("hci0");
     comeInReach(speaker);
     askUntilListed("hci1", speaker);
-    EXPECT_EQ(countCalls("hci0", "StartDiscovery"), 1u);
-    EXPECT_EQ(countCalls("hci1", "StartDiscovery"), 1u);
+    EXPECT_EQ(starts("hci0"), 1u);
+    EXPECT_EQ(starts("hci1"), 1u);
     // Signals reach the proxies of all adapters: what one finds is told by the others too.
     askUntilListed("hci0", speaker);
 
     EXPECT_EQ(call("RemoveFinder", "hci0"), "");
-    EXPECT_EQ(countCalls("hci0", "StopDiscovery"), 1u);
-    EXPECT_EQ(countCalls("hci1", "StopDiscovery"), 0u);
+    EXPECT_EQ(stops("hci0"), 1u);
+    EXPECT_EQ(stops("hci1"), 0u);
     // The removed finder does not come back with what the other adapter finds.
-    setDevice("00:11:22:33:44:99", "Adapter", "hci1", "AddDevice");
+    simulation.setDevice("00:11:22:33:44:99", "Adapter", "hci1", "AddDevice");
     askUntilListed("hci1", "00:11:22:33:44:99");
-    EXPECT_EQ(countCalls("hci0", "StartDiscovery"), 1u);
+    EXPECT_EQ(starts("hci0"), 1u);
 
     // The next question begins anew.
     EXPECT_EQ(ask("hci0"), emptyAnswer);
-    EXPECT_EQ(countCalls("hci0", "StartDiscovery"), 2u);
+    EXPECT_EQ(starts("hci0"), 2u);
     comeInReach(phone);
     askUntilListed("hci0", phone);
 }
@@ -175,7 +165,7 @@ TEST_F(ServiceTest, AnswersToWrongAndNeedlessCalls) {
     EXPECT_EQ(call("RemoveFinder", "hci0"), ""); // without a finder
     EXPECT_EQ(call("RemoveFinder", "hci9"),
               "ERROR Method invoked for RemoveFinder returned FALSE but did not set error");
-    EXPECT_EQ(countCalls("hci0", "StopDiscovery"), 0u);
+    EXPECT_EQ(stops("hci0"), 0u);
 
     const MessagePtr data =
         session.call(serviceName, "/", "org.freedesktop.DBus.Introspectable", "Introspect").get();
@@ -195,7 +185,8 @@ TEST_F(ServiceTest, RoundsOfFindersLeaveRulesAndMemoryFlat) {
         }
     };
     rounds(100);
-    const std::string caller = lastCaller();
+    const std::string lastCall = simulation.calls().back();
+    const std::string caller = lastCall.substr(lastCall.rfind("s:") + 2);
     const long rules = matchRules(caller);
     const long memory = residentKiB();
     rounds(isSanitized ? 200 : 1000);
@@ -230,18 +221,15 @@ TEST_F(ServiceTest, DaemonMayComeLateGoAndComeBack) {
 
 TEST_F(ServiceTest, GoesOnWhenAClientLeavesWithoutItsAnswer) {
     startService();
-    simulation.control("DelayNext",
-                       [](Writer& w) { w("org.bluez.Manager")("FindAdapter")(std::uint32_t{50}); });
+    simulation.delayNext("org.bluez.Manager", "FindAdapter", 50);
     {
         RawPeer leaving(sessionBus.address());
         leaving.call(serviceName, "/", serviceInterface, "ListDevices",
                      [](Writer& w) { w("hci0"); });
-        ASSERT_TRUE(system.signals().waitUntil([](const auto& signals) {
-            return !signals.empty() && signals.back().find("FindAdapter") != std::string::npos;
-        }));
+        ASSERT_TRUE(simulation.awaitCalls("s:FindAdapter "));
     }
     EXPECT_EQ(ask("hci1"), emptyAnswer);
-    EXPECT_EQ(countCalls("hci0", "StartDiscovery"), 1u); // it was carried out all the same
+    EXPECT_EQ(starts("hci0"), 1u); // it was carried out all the same
     EXPECT_EQ(stopService(), 0);
 }
 
@@ -253,19 +241,19 @@ TEST_F(ServiceTest, EndsWithDiscoveryStoppedEverywhere) {
         EXPECT_EQ(stopService(signal), 0);
         EXPECT_EQ(service->readAll() + service->readErrors(), "");
     }
-    EXPECT_EQ(countCalls("hci0", "StopDiscovery"), 2u);
-    EXPECT_EQ(countCalls("hci1", "StopDiscovery"), 2u);
+    EXPECT_EQ(stops("hci0"), 2u);
+    EXPECT_EQ(stops("hci1"), 2u);
 }
 
-TEST_F(ServiceTest, RunsOnceInASession) {
+TEST_F(ServiceTest, RunsOnceInASessionAndTellsItsUsage) {
     startService();
-    ChildProcess second({KESBT_SCANNERD}, ChildProcess::Output::Capture);
-    EXPECT_EQ(second.wait(), 1);
-    EXPECT_EQ(second.readAll(), "");
-    const std::string said = second.readErrors();
+    const std::string said = run("", 1).second;
     EXPECT_EQ(said.find("kesbt-scannerd: already running in this session, as :1."), 0u) << said;
     EXPECT_EQ(said.find('\n'), said.size() - 1);
     EXPECT_EQ(ask("hci0"), emptyAnswer); // the first goes on
+    EXPECT_EQ(run("--version", 0).first, "kesbt-scannerd 1.0.0\n");
+    run("--help", 0);
+    run("--nonsense", 2);
 }
 
 TEST_F(ServiceTest, EndsWithItsBuses) {
@@ -273,8 +261,7 @@ TEST_F(ServiceTest, EndsWithItsBuses) {
     ask("hci0");
     simulation.bus().kill();
     EXPECT_EQ(service->wait(), 1);
-    service->readAll();
-    EXPECT_EQ(service->readErrors(),
+    EXPECT_EQ(service->readAll() + service->readErrors(),
               "kesbt-scannerd: the system bus has gone; start again when it is back\n");
 
     simulation.bus().start();
@@ -282,25 +269,10 @@ TEST_F(ServiceTest, EndsWithItsBuses) {
     ask("hci0"); // now it is past its start
     sessionBus.kill();
     EXPECT_EQ(service->wait(), 1);
-    service->readAll();
-    EXPECT_EQ(service->readErrors(),
+    EXPECT_EQ(service->readAll() + service->readErrors(),
               "kesbt-scannerd: the session bus has gone; start again when it is back\n");
 
-    ChildProcess without({KESBT_SCANNERD}, ChildProcess::Output::Capture);
-    EXPECT_EQ(without.wait(), 1);
-    without.readAll();
-    EXPECT_EQ(without.readErrors().find("kesbt-scannerd: cannot reach the session bus; "), 0u);
-}
-
-TEST_F(ServiceTest, TellsItsUsage) {
-    const auto run = [](const char* argument) {
-        ChildProcess program({KESBT_SCANNERD, argument}, ChildProcess::Output::Capture);
-        const int status = program.wait();
-        return std::make_pair(status, program.readAll());
-    };
-    EXPECT_EQ(run("--version"), std::make_pair(0, std::string("kesbt-scannerd 1.0.0\n")));
-    EXPECT_EQ(run("--help").first, 0);
-    EXPECT_EQ(run("--nonsense").first, 2);
+    EXPECT_EQ(run("", 1).second.find("kesbt-scannerd: cannot reach the session bus; "), 0u);
 }
 
 TEST_F(ServiceTest, ClientsWithoutServiceStartIt) {
@@ -325,9 +297,8 @@ TEST_F(ServiceTest, ClientIsSilentAboutAdaptersThatAreNot) {
     EXPECT_FALSE(scanner.removeFinder("hci0"));
     EXPECT_FALSE(scanner.hasError());
     EXPECT_FALSE(session.hasOwner(serviceName)); // it was not asked, and so not started
-    EXPECT_EQ(log.take(), (std::vector<std::string>{"manager.cpp No such adapter",
-                                                    "manager.cpp Parameter is null",
-                                                    "manager.cpp No such adapter"}));
+    EXPECT_EQ(log.take(), (Texts{"manager.cpp No such adapter", "manager.cpp Parameter is null",
+                                 "manager.cpp No such adapter"}));
 }
 
 TEST_F(ServiceTest, ClientTellsWhatTheServiceRefuses) {
@@ -338,7 +309,7 @@ TEST_F(ServiceTest, ClientTellsWhatTheServiceRefuses) {
     EXPECT_EQ(scanner.getErrorMessage(), "Adapter hci0 not found");
     EXPECT_TRUE(log.take().empty());
     EXPECT_FALSE(list(scanner, "hci0", true));
-    EXPECT_EQ(log.take(), std::vector<std::string>{"scanner.cpp Adapter hci0 not found"});
+    EXPECT_EQ(log.take(), Texts{"scanner.cpp Adapter hci0 not found"});
 
     EXPECT_TRUE(scanner.removeFinder("hci0")); // queued: the answer is not waited for
     EXPECT_FALSE(scanner.hasError());

@@ -1,4 +1,4 @@
-#include "sim/sim_fixture.h"
+#include "sim/sim_test.h"
 
 namespace Bluetooth::Test {
 
@@ -7,57 +7,61 @@ namespace {
 using ControlTest = SimTest;
 
 TEST_F(ControlTest, TheNextCallFailsOnceOrWaits) {
-    client->control("FailNext",
-                    "('org.bluez.Adapter', 'ListDevices', 'org.example.Error.Made', 'up')");
-    EXPECT_EQ(client->call(adapter, "Adapter.FindDevice", "('x',)"),
-              "error org.bluez.Error.DoesNotExist: Does Not Exist");
-    EXPECT_EQ(client->call(adapter, "Adapter.ListDevices"), "error org.example.Error.Made: up");
-    EXPECT_EQ(client->call(adapter, "Adapter.ListDevices"), "reply []");
-    client->control("DelayNext", "('org.bluez.Adapter', 'ListDevices', uint32 30)");
-    client->start("late", adapter, "Adapter.ListDevices");
-    client->start("prompt", adapter, "Adapter.ListDevices");
-    EXPECT_EQ(client->until("reply late"), (Lines{"reply prompt []", "reply late []"}));
+    simulation.failNext("org.bluez.Adapter", "ListDevices", "org.example.Error.Made", "up");
+    EXPECT_EQ(client->call("Adapter.FindDevice", "('x',)"), "error DoesNotExist: Does Not Exist");
+    EXPECT_EQ(client->call("Adapter.ListDevices"), "error org.example.Error.Made: up");
+    EXPECT_EQ(client->call("Adapter.ListDevices"), "reply []");
+    simulation.delayNext("org.bluez.Adapter", "ListDevices", 30);
+    client->start("late", "Adapter.ListDevices");
+    EXPECT_EQ(client->trace("Adapter.ListDevices", "()", "reply late"),
+              lines("reply call []", "reply late []"));
 }
 
 TEST_F(ControlTest, AnySignalCanBeEmittedAndComesBeforeTheAnswer) {
     const auto emit = [&](const std::string& arguments) {
-        client->call("", "com.kestrine.bluetooth.Sim.EmitSignal",
-                     "(objectpath '" + adapter + "', 'org.bluez.Adapter', " + arguments + ")");
+        client->call("com.kestrine.bluetooth.Sim.EmitSignal",
+                     "(objectpath '" + base + "hci0', 'org.bluez.Adapter', " + arguments + ")");
         return client->taken();
     };
-    EXPECT_EQ(emit("'DeviceFound', <(uint32 5, [true])>"), (Lines{"hci0 DeviceFound 5 [true]"}));
-    EXPECT_EQ(emit("'Made.Up', <@av []>").size(), 0U); // refused: not a member name
-    EXPECT_EQ(emit("'AdapterAdded', <@av []>"), (Lines{"hci0 AdapterAdded"}));
-    EXPECT_EQ(emit("'PropertyChanged', <'alone'>"), (Lines{"hci0 PropertyChanged 'alone'"}));
+    EXPECT_EQ(emit("'DeviceFound', <(uint32 5, [true])>"), lines("hci0 DeviceFound 5 [true]"));
+    EXPECT_EQ(emit("'Made.Up', <@av []>"), Texts{}); // refused: not a member name
+    EXPECT_EQ(emit("'AdapterAdded', <@av []>"), lines("hci0 AdapterAdded"));
+    EXPECT_EQ(emit("'PropertyChanged', <'alone'>"), lines("hci0 PropertyChanged 'alone'"));
 }
 
 TEST_F(ControlTest, CallsAreRecordedInOrder) {
     client->control("ClearCalls");
-    client->start("set", adapter, "Adapter.SetProperty", "('Pairable', <true>)");
-    client->start("find", "/", "Manager.FindAdapter", "('hci1',)");
+    client->start("set", "Adapter.SetProperty", "('Pairable', <true>)");
+    client->start("find", "Manager.FindAdapter", "('hci1',)");
     EXPECT_EQ(client->control("GetCalls"),
               "reply [('hci0', 'org.bluez.Adapter', 'SetProperty', [<'Pairable'>, <<true>>]), "
               "('/', 'org.bluez.Manager', 'FindAdapter', [<'hci1'>])]");
 }
 
 TEST_F(ControlTest, WrongSettingsChangeNothing) {
-    const auto add = [&](const std::string& settings) {
-        return client->call("", "com.kestrine.bluetooth.Sim.AddDevice",
+    const auto refused = [&](const std::string& settings) {
+        return client->call("com.kestrine.bluetooth.Sim.AddDevice",
                             "('00:11:22:33:44:55', {" + settings + "})");
     };
     const std::string failed = "error com.kestrine.bluetooth.Sim.Error.Failed: ";
-    EXPECT_EQ(add("'Nothing': <'x'>"), failed + "Nothing: there is no such key");
-    EXPECT_EQ(add("'Passkey': <'1000000'>"),
+    EXPECT_EQ(refused("'Nothing': <'x'>"), failed + "Nothing: there is no such key");
+    EXPECT_EQ(refused("'Passkey': <'1000000'>"),
               failed + "Passkey: \"1000000\" is not a number from 0 to 999999");
-    EXPECT_EQ(add("'Behaviour': <'Magic'>"), failed + "Behaviour: \"Magic\" is not a behaviour");
-    addDevice(phone);
-    EXPECT_EQ(add("'Name': <'x'>"), failed + "there is a device 00:11:22:33:44:55 already");
+    EXPECT_EQ(refused("'Behaviour': <'Magic'>"),
+              failed + "Behaviour: \"Magic\" is not a behaviour");
+    add();
+    EXPECT_EQ(refused("'Name': <'x'>"), failed + "there is a device 00:11:22:33:44:55 already");
 }
 
-TEST_F(ControlTest, TheDaemonKnowsNothingOfIt) {
-    client->start("x", "/com/kestrine/bluetooth/Sim", "Manager.GetProperties");
-    EXPECT_EQ(client->until("error x").back().substr(0, 48),
-              "error x org.freedesktop.DBus.Error.UnknownObject");
+TEST_F(ControlTest, AgentsCanBeCalledWithAnything) {
+    registerAgent();
+    client->agentAnswers("RequestPinCode", "('1234',)");
+    client->agentAnswers("Nonsense", "!org.freedesktop.DBus.Error.UnknownMethod");
+    EXPECT_EQ(client->control("CallAgent", "('hci0', '', 'RequestPinCode', <(int16 5, 'x')>)"),
+              "reply '' '' [<'1234'>]");
+    EXPECT_EQ(client->taken().back(), "agent RequestPinCode 5 'x'");
+    EXPECT_EQ(client->control("CallAgent", "('hci0', 'org.bluez.Other', 'Nonsense', <@av []>)"),
+              "reply 'org.freedesktop.DBus.Error.UnknownMethod' 'said no' []");
 }
 
 } // namespace

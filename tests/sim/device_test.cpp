@@ -1,264 +1,178 @@
-#include "sim/sim_fixture.h"
+#include "sim/sim_test.h"
 
 namespace Bluetooth::Test {
 
 namespace {
 
-constexpr const char* headset =
+using DeviceTest = SimTest;
+
+constexpr const char* serialPort = "'00001101-0000-1000-8000-00805f9b34fb'";
+const std::string headset =
     "'Name': <'Headset'>, 'Class': <uint32 0x240404>, 'UUIDs': <['110b', '110e']>";
-
-class DeviceTest : public SimTest {
-protected:
-    std::string device = "dev_00_11_22_33_44_55 ";
-    std::string path = "'hci0/dev_00_11_22_33_44_55'";
-
-    void startCreating() {
-        client->taken();
-        client->start("create", adapter, "Adapter.CreateDevice", "('00:11:22:33:44:55',)");
-    }
-};
+const std::string unknownDevice = "error DoesNotExist: Does Not Exist";
 
 TEST_F(DeviceTest, CreatingADeviceAnnouncesItAndAnswersAfterTheSearch) {
-    addDevice(phone, "'Name': <'Phone'>, 'UUIDs': <['1101']>, 'Vendor': <uint16 15>");
-    startCreating();
-    EXPECT_EQ(
-        client->until("reply create"),
-        (Lines{"hci0 DeviceCreated " + path, "hci0 Devices=[" + path + "]",
-               device + "Connected=true", device + "Name='Phone'", device + "Alias='Phone'",
-               device + "Vendor=15", device + "Product=0", device + "Version=0",
-               device + "UUIDs=['00001101-0000-1000-8000-00805f9b34fb']", "reply create " + path}));
-    EXPECT_EQ(client->call(devicePath(), "Device.GetProperties"),
+    add("'Name': <'Phone'>, 'UUIDs': <['1101']>, 'Vendor': <uint16 15>");
+    const std::string uuids = std::string("[") + serialPort + "]";
+    EXPECT_EQ(client->trace("Adapter.CreateDevice", byAddress),
+              created + lines("phone Connected=true", "phone Name='Phone'", "phone Alias='Phone'",
+                              "phone Vendor=15", "phone Product=0", "phone Version=0",
+                              "phone UUIDs=" + uuids, "reply call phone"));
+    EXPECT_EQ(client->call("Device.GetProperties"),
               "reply {'Address': <'00:11:22:33:44:55'>, 'Name': <'Phone'>, 'Alias': <'Phone'>, "
               "'Vendor': <15>, 'Product': <0>, 'Version': <0>, 'Paired': <false>, 'Trusted': "
-              "<false>, 'Blocked': <false>, 'Connected': <true>, 'UUIDs': "
-              "<['00001101-0000-1000-8000-00805f9b34fb']>, 'Services': <[]>, 'Adapter': <'hci0'>}");
-    EXPECT_EQ(client->call(adapter, "Adapter.FindDevice", "('00:11:22:33:44:55',)"),
-              "reply " + path);
-    EXPECT_EQ(createDevice(phone), "error org.bluez.Error.AlreadyExists: Already Exists");
+              "<false>, 'Blocked': <false>, 'Connected': <true>, 'UUIDs': <" +
+                  uuids + ">, 'Services': <[]>, 'Adapter': <'hci0'>}");
+    EXPECT_EQ(client->call("Adapter.FindDevice", byAddress), "reply phone");
+    EXPECT_EQ(client->call("Adapter.CreateDevice", byAddress),
+              "error AlreadyExists: Already Exists");
+    add("", "00:aa:bb:cc:dd:ee");
+    EXPECT_EQ(client->call("Adapter.CreateDevice", "('00:aa:bb:cc:dd:ee',)"),
+              "reply 'hci0/dev_00_AA_BB_CC_DD_EE'");
 }
 
 TEST_F(DeviceTest, ADeviceThatDoesNotAnswerIsTakenBack) {
-    addDevice(phone, "'Behaviour': <'Unconnectable'>");
-    startCreating();
-    EXPECT_EQ(client->until("hci0 DeviceRemoved"),
-              (Lines{"hci0 DeviceCreated " + path, "hci0 Devices=[" + path + "]",
-                     "error create org.bluez.Error.Failed: Host is down", "hci0 Devices=[]",
-                     "hci0 DeviceRemoved " + path}));
-    EXPECT_EQ(createDevice("00:11:22:33:44"),
-              "error org.bluez.Error.InvalidArguments: Invalid arguments in method call");
-    EXPECT_EQ(client->call(adapter, "Adapter.FindDevice", "('junk',)"),
-              "error org.bluez.Error.DoesNotExist: Does Not Exist");
+    add("'Behaviour': <'Unconnectable'>");
+    EXPECT_EQ(client->trace("Adapter.CreateDevice", byAddress, "hci0 DeviceRemoved"),
+              created + lines("error call Failed: Host is down") + removed);
+    EXPECT_EQ(client->call("Adapter.CreateDevice", "('00:11:22:33:44',)"), "error " + badArguments);
+    EXPECT_EQ(client->call("Adapter.FindDevice", "('junk',)"), unknownDevice);
 }
 
-TEST_F(DeviceTest, LowerCaseAddressesGiveUpperCasePaths) {
-    addDevice("00:aa:bb:cc:dd:ee");
-    EXPECT_EQ(createDevice("00:aa:bb:cc:dd:ee"), "reply 'hci0/dev_00_AA_BB_CC_DD_EE'");
-}
-
-TEST_F(DeviceTest, OnlyItsCallerCancelsACreation) {
+TEST_F(DeviceTest, ACreationEndsWithItsCallerWhoAloneCancelsIt) {
     const std::string cancel = "Adapter.CancelDeviceCreation";
-    const std::string address = "('00:11:22:33:44:55',)";
-    EXPECT_EQ(client->call(adapter, cancel, address),
-              "error org.bluez.Error.DoesNotExist: Does Not Exist");
-    EXPECT_EQ(client->call(adapter, cancel, "('x',)"),
-              "error org.bluez.Error.InvalidArguments: Invalid arguments in method call");
-    client->control("SetTimes", "({'PageTimeout': <60000000>},)");
-    startCreating();
-    client->until("hci0 Devices");
-    SimClient other;
-    EXPECT_EQ(other.call(adapter, cancel, address),
-              "error org.bluez.Error.NotAuthorized: Operation Not Authorized");
-    EXPECT_EQ(other.call(adapter, "Adapter.RemoveDevice", "(objectpath '" + devicePath() + "',)"),
-              "error org.bluez.Error.DoesNotExist: Device creation in progress");
-    client->start("cancel", adapter, cancel, address);
-    EXPECT_EQ(client->until("reply cancel"),
-              (Lines{"hci0 Devices=[]", "hci0 DeviceRemoved " + path,
-                     "error create org.bluez.Error.Failed: Operation canceled", "reply cancel"}));
-}
-
-TEST_F(DeviceTest, ACreationEndsWithItsCaller) {
-    client->control("SetTimes", "({'PageTimeout': <60000000>},)");
+    EXPECT_EQ(client->call(cancel, byAddress), unknownDevice);
+    EXPECT_EQ(client->call(cancel, "('x',)"), "error " + badArguments);
+    setTimes("'PageTimeout': <60000000>");
+    client->start("create", "Adapter.CreateDevice", byAddress);
+    client->until(created[1]);
     auto other = std::make_unique<SimClient>();
-    other->start("create", adapter, "Adapter.CreateDevice", "('00:11:22:33:44:55',)");
-    client->until("hci0 Devices=[" + path + "]");
-    other.reset();
-    EXPECT_EQ(client->until("hci0 DeviceRemoved"),
-              (Lines{"hci0 Devices=[]", "hci0 DeviceRemoved " + path}));
-}
+    other->base();
+    EXPECT_EQ(other->call(cancel, byAddress), "error NotAuthorized: Operation Not Authorized");
+    EXPECT_EQ(other->call("Adapter.RemoveDevice", byPath),
+              "error DoesNotExist: Device creation in progress");
+    EXPECT_EQ(client->trace(cancel, byAddress),
+              removed + lines("error create Failed: Operation canceled", "reply call"));
 
-TEST_F(DeviceTest, AnUnusedLinkDropsByItself) {
-    client->control("SetTimes", "({'IdleDisconnect': <4000>},)");
-    addDevice(phone);
-    createDevice(phone);
-    client->until(device + "Connected=false");
-    EXPECT_EQ(client->call(adapter, "Adapter.ListDevices"), "reply [" + path + "]");
+    other->start("create", "Adapter.CreateDevice", byAddress);
+    client->until(created[1]);
+    other.reset();
+    EXPECT_EQ(client->until("hci0 DeviceRemoved"), removed);
 }
 
 TEST_F(DeviceTest, ARemovedDeviceIsGone) {
-    addDevice(phone);
-    createDevice(phone);
-    client->taken();
-    const std::string argument = "(objectpath '" + devicePath() + "',)";
-    client->start("remove", adapter, "Adapter.RemoveDevice", argument);
-    EXPECT_EQ(client->until("hci0 DeviceRemoved"),
-              (Lines{device + "DisconnectRequested", "reply remove", device + "Connected=false",
-                     "hci0 Devices=[]", "hci0 DeviceRemoved " + path}));
-    EXPECT_EQ(client->call(adapter, "Adapter.RemoveDevice", argument),
-              "error org.bluez.Error.DoesNotExist: Does Not Exist");
-    EXPECT_EQ(client->call(devicePath(), "Device.Disconnect").substr(0, 47),
-              "error org.freedesktop.DBus.Error.UnknownObject:");
-
-    createDevice(phone);
-    client->control("DropLink", "('hci0', '00:11:22:33:44:55')");
-    client->taken();
-    client->start("remove", adapter, "Adapter.RemoveDevice", argument);
-    EXPECT_EQ(client->until("reply remove"),
-              (Lines{"hci0 Devices=[]", "hci0 DeviceRemoved " + path, "reply remove"}));
+    create();
+    EXPECT_EQ(client->trace("Adapter.RemoveDevice", byPath, "hci0 DeviceRemoved"),
+              lines("phone DisconnectRequested", "reply call", "phone Connected=false") + removed);
+    EXPECT_EQ(client->call("Adapter.RemoveDevice", byPath), unknownDevice);
+    EXPECT_EQ(
+        client->call("Device.Disconnect").find("error org.freedesktop.DBus.Error.UnknownObject:"),
+        0U);
+    client->call("Adapter.CreateDevice", byAddress);
+    client->control("DropLink", onAdapter);
+    EXPECT_EQ(client->trace("Adapter.RemoveDevice", byPath), removed + lines("reply call"));
 }
 
-TEST_F(DeviceTest, DisconnectIsAnnouncedFirst) {
-    addDevice(phone);
-    createDevice(phone);
-    client->taken();
-    client->start("bye", devicePath(), "Device.Disconnect");
-    EXPECT_EQ(client->until(device + "Connected"),
-              (Lines{device + "DisconnectRequested", "reply bye", device + "Connected=false"}));
-    EXPECT_EQ(client->call(devicePath(), "Device.Disconnect"),
-              "error org.bluez.Error.NotConnected: Not Connected");
+TEST_F(DeviceTest, LinksEndByThemselvesOrAfterAnAnnouncement) {
+    create();
+    EXPECT_EQ(client->trace("Device.Disconnect", "()", "phone Connected"),
+              lines("phone DisconnectRequested", "reply call", "phone Connected=false"));
+    EXPECT_EQ(client->call("Device.Disconnect"), "error NotConnected: Not Connected");
+    EXPECT_EQ(client->call("Adapter.RemoveDevice", byPath), "reply");
+    setTimes("'IdleDisconnect': <4000>");
+    client->call("Adapter.CreateDevice", byAddress);
+    client->until("phone Connected=false");
+    EXPECT_EQ(client->call("Adapter.ListDevices"), "reply [phone]");
 }
 
 TEST_F(DeviceTest, PropertiesAreSaidBeforeTheReply) {
-    addDevice(phone, "'Name': <'Phone'>");
-    createDevice(phone);
-    client->taken();
-    const auto set = [&](const char* name, const char* value) {
-        client->start("set", devicePath(), "Device.SetProperty",
-                      std::string("('") + name + "', <" + value + ">)");
-        client->control("ClearFaults");
-        return client->taken();
-    };
-    EXPECT_EQ(set("Alias", "'Mine'"), (Lines{device + "Alias='Mine'", "reply set"}));
-    EXPECT_EQ(set("Alias", "'Mine'"), (Lines{"reply set"}));
-    EXPECT_EQ(set("Alias", "''"), (Lines{device + "Alias=''", "reply set"}));
-    EXPECT_NE(client->call(devicePath(), "Device.GetProperties").find("'Alias': <'Phone'>"),
-              std::string::npos);
-    EXPECT_EQ(set("Trusted", "true"), (Lines{device + "Trusted=true", "reply set"}));
-    EXPECT_EQ(set("Blocked", "true"),
-              (Lines{device + "Connected=false", device + "Blocked=true", "reply set"}));
-    const Lines refused = {
-        "error set org.bluez.Error.InvalidArguments: Invalid arguments in method call"};
-    EXPECT_EQ(set("Paired", "true"), refused);
-    EXPECT_EQ(set("Trusted", "'true'"), refused);
+    create("'Name': <'Phone'>");
+    EXPECT_EQ(set("Alias", "'Mine'", "Device"), lines("phone Alias='Mine'", "reply set"));
+    EXPECT_EQ(set("Alias", "'Mine'", "Device"), lines("reply set"));
+    EXPECT_EQ(set("Alias", "''", "Device"), lines("phone Alias=''", "reply set"));
+    EXPECT_NE(client->call("Device.GetProperties").find("'Alias': <'Phone'>"), std::string::npos);
+    EXPECT_EQ(set("Trusted", "true", "Device"), lines("phone Trusted=true", "reply set"));
+    EXPECT_EQ(set("Blocked", "true", "Device"),
+              lines("phone Connected=false", "phone Blocked=true", "reply set"));
+    EXPECT_EQ(set("Paired", "true", "Device"), lines("error set " + badArguments));
+    EXPECT_EQ(set("Trusted", "'true'", "Device"), lines("error set " + badArguments));
 }
 
 TEST_F(DeviceTest, ServicesAreFoundByAnyFormOfTheirClass) {
-    addDevice(phone, "'UUIDs': <['1101', '110b']>");
-    createDevice(phone);
+    create("'UUIDs': <['1101', '110b']>");
     const auto discover = [&](const std::string& pattern) {
-        return client->call(devicePath(), "Device.DiscoverServices", "('" + pattern + "',)");
+        return client->call("Device.DiscoverServices", "('" + pattern + "',)");
     };
     const std::string serial = discover("0x1101");
-    EXPECT_EQ(
-        serial.substr(0, 93),
-        "reply {65536: '<?xml version=\"1.0\" encoding=\"UTF-8\" ?>\\n\\n<record>\\n\\t<attribute "
-        "id=\"0x0000\">");
+    EXPECT_EQ(serial.find("reply {65536: '<?xml version=\"1.0\" encoding=\"UTF-8\" "
+                          "?>\\n\\n<record>\\n\\t<attribute id=\"0x0000\">"),
+              0U);
     for (const char* form : {"1101", "spp", "00001101-0000-1000-8000-00805F9B34FB"})
         EXPECT_EQ(discover(form), serial) << form;
     EXPECT_NE(discover("").find("65537: "), std::string::npos);
     EXPECT_EQ(discover("1200"), "reply {}");
-    EXPECT_EQ(discover("nonsense"),
-              "error org.bluez.Error.InvalidArguments: Invalid arguments in method call");
+    EXPECT_EQ(discover("nonsense"), "error " + badArguments);
 }
 
 TEST_F(DeviceTest, ASearchCanBeCancelledByItsCaller) {
-    addDevice(phone);
-    createDevice(phone);
-    EXPECT_EQ(client->call(devicePath(), "Device.CancelDiscovery"),
-              "error org.bluez.Error.DoesNotExist: Does Not Exist");
-    client->control("SetTimes", "({'ServiceSearch': <60000000>},)");
-    client->taken();
-    client->start("search", devicePath(), "Device.DiscoverServices", "('',)");
-    EXPECT_EQ(client->call(devicePath(), "Device.DiscoverServices", "('',)"),
-              "error org.bluez.Error.InProgress: In Progress");
-    client->start("cancel", devicePath(), "Device.CancelDiscovery");
-    EXPECT_EQ(client->until("reply cancel"),
-              (Lines{"error search org.bluez.Error.Failed: Operation canceled", "reply cancel"}));
-    setProperty(adapter, "Adapter", "Powered", "false");
-    EXPECT_EQ(client->call(devicePath(), "Device.DiscoverServices", "('',)"),
-              "error org.bluez.Error.Failed: No route to host");
+    create();
+    EXPECT_EQ(client->call("Device.CancelDiscovery"), unknownDevice);
+    setTimes("'ServiceSearch': <60000000>");
+    client->start("search", "Device.DiscoverServices", "('',)");
+    EXPECT_EQ(client->call("Device.DiscoverServices", "('',)"), "error InProgress: In Progress");
+    EXPECT_EQ(client->trace("Device.CancelDiscovery"),
+              lines("error search Failed: Operation canceled", "reply call"));
+    set("Powered", "false");
+    EXPECT_EQ(client->call("Device.DiscoverServices", "('',)"), "error Failed: No route to host");
 }
 
 TEST_F(DeviceTest, AudioConnectsWithAllItsInterfacesAndDisconnects) {
-    addDevice(phone, headset);
-    createDevice(phone);
-    client->taken();
-    EXPECT_EQ(client->call(devicePath(), "Control.VolumeUp"),
-              "error org.bluez.Error.NotConnected: Not Connected");
-    client->start("sink", devicePath(), "AudioSink.Connect");
-    EXPECT_EQ(client->until("reply sink"),
-              (Lines{device + "State='connecting'", device + "State='connecting'",
-                     device + "Connected", device + "Connected=true", device + "State='connected'",
-                     device + "State='connected'", "reply sink"}));
-    EXPECT_EQ(client->until(device + "Connected=true"),
-              (Lines{device + "Connected", device + "Connected=true"}));
-    EXPECT_EQ(client->call(devicePath(), "Control.VolumeUp"), "reply");
-    EXPECT_EQ(client->call(devicePath(), "AudioSink.Connect"),
-              "error org.bluez.Error.AlreadyConnected: Already Connected");
+    create(headset);
+    EXPECT_EQ(client->call("Control.VolumeUp"), "error NotConnected: Not Connected");
+    const Texts connected{"phone Connected", "phone Connected=true"};
+    EXPECT_EQ(client->trace("AudioSink.Connect"),
+              lines("phone State='connecting'", "phone State='connecting'") + connected +
+                  lines("phone State='connected'", "phone State='connected'", "reply call"));
+    EXPECT_EQ(client->until("phone Connected=true"), connected);
+    EXPECT_EQ(client->call("Control.VolumeUp"), "reply");
+    EXPECT_EQ(client->call("AudioSink.Connect"), "error AlreadyConnected: Already Connected");
     client->control("SetPlaying", "('hci0', '00:11:22:33:44:55', true)");
     EXPECT_EQ(client->taken(),
-              (Lines{device + "Playing", device + "Playing=true", device + "State='playing'"}));
-    EXPECT_EQ(client->call(devicePath(), "AudioSink.GetProperties"),
+              lines("phone Playing", "phone Playing=true", "phone State='playing'"));
+    EXPECT_EQ(client->call("AudioSink.GetProperties"),
               "reply {'State': <'playing'>, 'Connected': <true>, 'Playing': <true>}");
-    client->start("off", devicePath(), "Audio.Disconnect");
-    const Lines lines = client->until("reply off");
-    EXPECT_EQ(lines.front(), device + "Stopped");
-    EXPECT_EQ(client->call(devicePath(), "Audio.GetProperties"),
-              "reply {'State': <'disconnected'>}");
-    EXPECT_EQ(client->call(devicePath(), "Audio.Disconnect"),
-              "error org.bluez.Error.NotConnected: Not Connected");
-}
-
-TEST_F(DeviceTest, AudioOfADeviceThatIsAwayFails) {
-    addDevice(phone, headset);
-    createDevice(phone);
-    setDevice(phone, "'Connectable': <false>");
-    client->taken();
-    client->start("audio", devicePath(), "Audio.Connect");
-    EXPECT_EQ(client->until("error audio").back(),
-              "error audio org.bluez.Error.Failed: Connect Failed");
+    EXPECT_EQ(client->trace("Audio.Disconnect").front(), "phone Stopped");
+    EXPECT_EQ(client->call("Audio.GetProperties"), "reply {'State': <'disconnected'>}");
+    EXPECT_EQ(client->call("Audio.Disconnect"), "error NotConnected: Not Connected");
+    client->control("SetDevice", "('00:11:22:33:44:55', {'Connectable': <false>})");
+    EXPECT_EQ(client->call("Audio.Connect"), "error Failed: Connect Failed");
 }
 
 TEST_F(DeviceTest, AServiceOfAnUntrustedDeviceNeedsTheAgentsConsent) {
-    addDevice(phone, std::string(headset) + ", 'ConnectsBack': <true>");
-    createDevice(phone);
-    client->call(adapter, "Adapter.RegisterAgent", "(objectpath '/agent', '')");
-    const std::string asked = "agent Authorize " + path + " '0000110d-0000-1000-8000-00805f9b34fb'";
+    create(headset + ", 'ConnectsBack': <true>");
+    registerAgent();
+    const std::string asked = "agent Authorize phone '0000110d-0000-1000-8000-00805f9b34fb'";
     client->agentAnswers("Authorize", "!org.bluez.Error.Rejected");
-    EXPECT_EQ(client->call(devicePath(), "AudioSink.Connect"),
-              "error org.bluez.Error.Failed: Stream setup failed");
+    EXPECT_EQ(client->call("AudioSink.Connect"), "error Failed: Stream setup failed");
     client->until(asked);
     client->agentAnswers("Authorize", "");
     client->control("ConnectService", "('hci0', '00:11:22:33:44:55', '110d')");
     client->until(asked);
-    client->until(device + "State='connected'");
-    client->call(devicePath(), "Audio.Disconnect");
-    setProperty(devicePath(), "Device", "Trusted", "true");
-    client->taken();
-    EXPECT_EQ(client->call(devicePath(), "Audio.Connect"), "reply");
-    for (const std::string& line : client->taken())
+    client->until("phone State='connected'");
+    client->call("Audio.Disconnect");
+    set("Trusted", "true", "Device");
+    for (const std::string& line : client->trace("Audio.Connect"))
         EXPECT_EQ(line.find("agent"), std::string::npos) << line;
 }
 
 TEST_F(DeviceTest, ADeviceThatConnectsByItselfStaysOnlyAsLongAsItsLink) {
-    addDevice(phone, "'UUIDs': <['1101']>");
-    client->control("ConnectDevice", "('hci0', '00:11:22:33:44:55')");
-    EXPECT_EQ(client->until(device + "UUIDs"),
-              (Lines{"hci0 DeviceCreated " + path, "hci0 Devices=[" + path + "]",
-                     device + "Connected=true",
-                     device + "UUIDs=['00001101-0000-1000-8000-00805f9b34fb']"}));
-    client->control("DropLink", "('hci0', '00:11:22:33:44:55')");
-    EXPECT_EQ(client->taken(),
-              (Lines{device + "Connected=false", "hci0 Devices=[]", "hci0 DeviceRemoved " + path}));
+    add("'UUIDs': <['1101']>");
+    client->control("ConnectDevice", onAdapter);
+    EXPECT_EQ(client->until("phone UUIDs"),
+              created +
+                  lines("phone Connected=true", std::string("phone UUIDs=[") + serialPort + "]"));
+    client->control("DropLink", onAdapter);
+    EXPECT_EQ(client->taken(), lines("phone Connected=false") + removed);
 }
 
 } // namespace

@@ -5,12 +5,15 @@
 #include <condition_variable>
 #include <cstddef>
 #include <mutex>
+#include <string>
 #include <utility>
 #include <vector>
 
 namespace Bluetooth::Test {
 
 using Milliseconds = std::chrono::milliseconds;
+
+using Texts = std::vector<std::string>;
 
 /// How long tests wait for what must come. Only a failing test waits this long.
 inline constexpr Milliseconds patience{20000};
@@ -57,6 +60,12 @@ private:
     mutable std::condition_variable m_changed;
     std::vector<Event> m_events;
 };
+
+/// What the callbacks of a test say.
+inline Recorder<std::string>& seen() {
+    static auto& recorder = *new Recorder<std::string>; // written to until the very end
+    return recorder;
+}
 
 /// Opens once and stays open.
 class Latch {

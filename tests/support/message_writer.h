@@ -6,6 +6,7 @@
 #include <cstdint>
 #include <functional>
 #include <string>
+#include <type_traits>
 
 namespace Bluetooth::Test {
 
@@ -22,12 +23,46 @@ struct Var {
 template <class Value>
 Var(Value) -> Var<Value>;
 
+/// The D-Bus type of a number.
+template <class Number>
+constexpr const char* numberType() {
+    if (std::is_floating_point_v<Number>)
+        return "d";
+    constexpr const char* types[] = {"y", "q", "u", "t", "", "n", "i", "x"};
+    int place = std::is_signed_v<Number> ? 4 : 0;
+    for (std::size_t size = sizeof(Number); size > 1; size /= 2)
+        ++place;
+    return types[place];
+}
+
+inline const char* signatureOf(const char*) {
+    return "s";
+}
+inline const char* signatureOf(const std::string&) {
+    return "s";
+}
+inline const char* signatureOf(const Path&) {
+    return "o";
+}
+template <class Value>
+const char* signatureOf(const Var<Value>&) {
+    return "v";
+}
+template <class Number>
+std::enable_if_t<std::is_arithmetic_v<Number>, const char*> signatureOf(Number) {
+    return std::is_same_v<Number, bool> ? "b" : numberType<Number>();
+}
+
 /// Appends arguments of any type, good or bad: w("hci0")(Path{"/"})(Var{std::int16_t{-60}}).
 class Writer {
 public:
     using Build = std::function<void(Writer&)>;
 
     explicit Writer(DBusMessage* message) { dbus_message_iter_init_append(message, &m_iter); }
+    Writer(DBusMessage* message, const Build& arguments) : Writer(message) {
+        if (arguments)
+            arguments(*this);
+    }
 
     Writer& operator()(const char* value) { return basic(DBUS_TYPE_STRING, &value); }
     Writer& operator()(const std::string& value) { return (*this)(value.c_str()); }
@@ -39,15 +74,10 @@ public:
         const dbus_bool_t boolean = value;
         return basic(DBUS_TYPE_BOOLEAN, &boolean);
     }
-    Writer& operator()(std::uint8_t value) { return basic(DBUS_TYPE_BYTE, &value); }
-    Writer& operator()(std::uint16_t value) { return basic(DBUS_TYPE_UINT16, &value); }
-    Writer& operator()(std::int16_t value) { return basic(DBUS_TYPE_INT16, &value); }
-    Writer& operator()(std::uint32_t value) { return basic(DBUS_TYPE_UINT32, &value); }
-    Writer& operator()(std::int32_t value) { return basic(DBUS_TYPE_INT32, &value); }
-    Writer& operator()(std::uint64_t value) { return basic(DBUS_TYPE_UINT64, &value); }
-    Writer& operator()(std::int64_t value) { return basic(DBUS_TYPE_INT64, &value); }
-    Writer& operator()(double value) { return basic(DBUS_TYPE_DOUBLE, &value); }
-
+    template <class Number>
+    std::enable_if_t<std::is_arithmetic_v<Number>, Writer&> operator()(Number value) {
+        return basic(*signatureOf(value), &value);
+    }
     template <class Value>
     Writer& operator()(const Var<Value>& variant) {
         return container(DBUS_TYPE_VARIANT, signatureOf(variant.value),
@@ -77,23 +107,6 @@ public:
 
 private:
     Writer() = default;
-
-    static const char* signatureOf(const char*) { return "s"; }
-    static const char* signatureOf(const std::string&) { return "s"; }
-    static const char* signatureOf(const Path&) { return "o"; }
-    static const char* signatureOf(bool) { return "b"; }
-    static const char* signatureOf(std::uint8_t) { return "y"; }
-    static const char* signatureOf(std::uint16_t) { return "q"; }
-    static const char* signatureOf(std::int16_t) { return "n"; }
-    static const char* signatureOf(std::uint32_t) { return "u"; }
-    static const char* signatureOf(std::int32_t) { return "i"; }
-    static const char* signatureOf(std::uint64_t) { return "t"; }
-    static const char* signatureOf(std::int64_t) { return "x"; }
-    static const char* signatureOf(double) { return "d"; }
-    template <class Value>
-    static const char* signatureOf(const Var<Value>&) {
-        return "v";
-    }
 
     Writer& basic(int type, const void* value) {
         dbus_message_iter_append_basic(&m_iter, type, value);

@@ -21,12 +21,6 @@ MessagePtr methodCall(const std::string& destination, const std::string& path,
                                                    interface.c_str(), member.c_str()));
 }
 
-void build(const MessagePtr& message, const Writer::Build& arguments) {
-    Writer writer(message.get());
-    if (arguments)
-        arguments(writer);
-}
-
 } // namespace
 
 std::string SeenCall::text() const {
@@ -66,7 +60,7 @@ void RawPeer::reply(const std::string& member, Build arguments, Milliseconds del
         member,
         [arguments = std::move(arguments)](DBusMessage* call) {
             MessagePtr reply(dbus_message_new_method_return(call));
-            build(reply, arguments);
+            Writer(reply.get(), arguments);
             return reply;
         },
         delay);
@@ -108,7 +102,7 @@ void RawPeer::send(MessagePtr message) {
 void RawPeer::emit(const std::string& path, const std::string& interface, const std::string& member,
                    const Build& arguments) {
     MessagePtr signal(dbus_message_new_signal(path.c_str(), interface.c_str(), member.c_str()));
-    build(signal, arguments);
+    Writer(signal.get(), arguments);
     send(std::move(signal));
 }
 
@@ -116,7 +110,7 @@ std::future<MessagePtr> RawPeer::call(const std::string& destination, const std:
                                       const std::string& interface, const std::string& member,
                                       const Build& arguments, Milliseconds timeout) {
     auto message = std::make_shared<MessagePtr>(methodCall(destination, path, interface, member));
-    build(*message, arguments);
+    Writer(message->get(), arguments);
     auto own = std::make_shared<OwnCall>();
     own->deadline = Clock::now() + timeout;
     std::future<MessagePtr> result = own->reply.get_future();
@@ -188,10 +182,6 @@ bool RawPeer::waitForOwner(const std::string& name, bool owned, Milliseconds lim
     }
 }
 
-std::string RawPeer::uniqueName() {
-    return dbus_bus_get_unique_name(m_connection);
-}
-
 void RawPeer::becomeMonitor() {
     run([this](DBusConnection* connection) {
         const MessagePtr call = methodCall(DBUS_SERVICE_DBUS, DBUS_PATH_DBUS,
@@ -213,12 +203,6 @@ std::vector<std::string> RawPeer::callTexts() const {
             texts.push_back(call.text());
     }
     return texts;
-}
-
-std::size_t RawPeer::count(const std::string& member) const {
-    const std::vector<SeenCall> seen = m_calls.events();
-    return static_cast<std::size_t>(std::count_if(
-        seen.begin(), seen.end(), [&](const SeenCall& call) { return call.member == member; }));
 }
 
 bool RawPeer::waitForCalls(const std::string& member, std::size_t expected,

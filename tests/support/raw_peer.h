@@ -71,7 +71,6 @@ public:
     bool hasOwner(const std::string& name);
     /// @return whether the name came to be owned, or not owned, in time
     bool waitForOwner(const std::string& name, bool owned, Milliseconds limit = patience);
-    std::string uniqueName();
 
     /// From now on only watches what all others say on the bus; calls() then holds their calls.
     void becomeMonitor();
@@ -79,7 +78,6 @@ public:
     std::vector<SeenCall> calls() const { return m_calls.events(); }
     /// calls() as texts, without those to the bus itself.
     std::vector<std::string> callTexts() const;
-    std::size_t count(const std::string& member) const;
     bool waitForCalls(const std::string& member, std::size_t count,
                       Milliseconds limit = patience) const;
     void forgetCalls() { m_calls.clear(); }

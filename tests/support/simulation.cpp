@@ -2,6 +2,7 @@
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <fstream>
 
 namespace Bluetooth::Test {
@@ -9,10 +10,9 @@ namespace Bluetooth::Test {
 namespace {
 
 constexpr const char* controlName = "com.kestrine.bluetooth.Sim";
-constexpr const char* controlPath = "/com/kestrine/bluetooth/Sim";
 
-std::vector<std::string> command(const std::string& scenario) {
-    std::vector<std::string> words{BLUEZ4_SIM, "--print-ready", "--time-scale", "0.01"};
+Texts command(const std::string& scenario) {
+    Texts words{BLUEZ4_SIM, "--print-ready", "--time-scale", "0.01"};
     if (!scenario.empty()) {
         const std::string file = testFolder() + "/scenario.conf";
         std::ofstream(file) << scenario;
@@ -21,34 +21,52 @@ std::vector<std::string> command(const std::string& scenario) {
     return words;
 }
 
-} // namespace
-
-Simulation::Simulation(const std::string& scenario)
-    : m_process(command(scenario), ChildProcess::Output::Capture) {
-    EXPECT_EQ(m_process.readLine(), "ready");
+std::size_t countIn(const Texts& signals, const std::string& what) {
+    return static_cast<std::size_t>(
+        std::count_if(signals.begin(), signals.end(), [&](const std::string& signal) {
+            return signal.find(what) != std::string::npos;
+        }));
 }
 
-std::future<MessagePtr> Simulation::startControl(const std::string& method,
-                                                 const Build& arguments) {
-    return m_peer.call(controlName, controlPath, controlName, method, arguments);
+} // namespace
+
+// Leaks would hide in GLib's slabs.
+Simulation::Simulation(const std::string& scenario)
+    : m_process(command(scenario), ChildProcess::Output::Capture, {"G_SLICE=always-malloc"}) {
+    if (m_process.readLine() != "ready")
+        throw std::runtime_error("bluez4-sim does not start: " + m_process.readErrors());
 }
 
 MessagePtr Simulation::control(const std::string& method, const Build& arguments) {
-    MessagePtr reply = startControl(method, arguments).get();
+    constexpr const char* path = "/com/kestrine/bluetooth/Sim";
+    MessagePtr reply = m_peer.call(controlName, path, controlName, method, arguments).get();
     EXPECT_TRUE(reply && dbus_message_get_type(reply.get()) != DBUS_MESSAGE_TYPE_ERROR)
         << method << ": " << (reply ? argumentsOf(reply.get()) : "no reply");
     return reply;
 }
 
-void Simulation::emit(const std::string& path, const std::string& interface,
-                      const std::string& member, const char* signature, const Build& argument) {
-    control("EmitSignal",
-            [&](Writer& w) { w(Path{path})(interface)(member).variant(signature, argument); });
-}
-
 void Simulation::failNext(const char* interface, const char* method, const char* name,
                           const char* text) {
     control("FailNext", [&](Writer& w) { w(interface)(method)(name)(text); });
+}
+
+void Simulation::delayNext(const char* interface, const char* method, std::uint32_t milliseconds) {
+    control("DelayNext", [&](Writer& w) { w(interface)(method)(milliseconds); });
+}
+
+Texts Simulation::calls() {
+    // Answered when the daemon has handled, and told of, what was sent to it before.
+    control("ClearFaults");
+    return m_peer.signals().events();
+}
+
+std::size_t Simulation::countCalls(const std::string& what) {
+    return countIn(calls(), what);
+}
+
+bool Simulation::awaitCalls(const std::string& what, std::size_t count) {
+    return m_peer.signals().waitUntil(
+        [&](const Texts& signals) { return countIn(signals, what) >= count; });
 }
 
 } // namespace Bluetooth::Test

@@ -5,7 +5,6 @@
 #include "support/raw_peer.h"
 
 #include <string>
-#include <vector>
 
 namespace Bluetooth::Test {
 
@@ -21,13 +20,27 @@ public:
 
     /// Calls the control interface and waits. A failure fails the test.
     MessagePtr control(const std::string& method, const Build& arguments = {});
-    std::future<MessagePtr> startControl(const std::string& method, const Build& arguments = {});
-    void emit(const std::string& path, const std::string& interface, const std::string& member,
-              const char* signature, const Build& argument);
+    /// Changes, or with "AddDevice" adds, a device.
+    template <class Value>
+    void setDevice(const char* device, const char* key, const Value& value,
+                   const char* method = "SetDevice") {
+        control(method, [&](Writer& w) {
+            w(device).dict("sv", [&](Writer& e) { e.entry(key, Var{value}); });
+        });
+    }
     void failNext(const char* interface, const char* method, const char* name, const char* text);
-    /// Kills the daemon's process.
-    void kill() { m_process.kill(); }
+    void delayNext(const char* interface, const char* method, std::uint32_t milliseconds);
 
+    /// From now on it is seen what the daemon is asked.
+    void watchCalls() { m_peer.addMatch("type='signal',member='CallReceived'"); }
+    /// How often the daemon has been asked so far.
+    /// @param what part of the call's "o:PATH s:INTERFACE s:METHOD s:CALLER "
+    std::size_t countCalls(const std::string& what);
+    bool awaitCalls(const std::string& what, std::size_t count = 1);
+    /// The calls so far, as awaitCalls() sees them.
+    Texts calls();
+
+    ChildProcess& process() { return m_process; }
     PrivateBus& bus() { return m_bus; }
     /// Another participant, for the test to look with.
     RawPeer& peer() { return m_peer; }

@@ -2,7 +2,6 @@
 
 #include <syslog.h>
 
-#include <algorithm>
 #include <cstdarg>
 #include <cstdio>
 #include <cstdlib>
@@ -11,8 +10,8 @@ namespace Bluetooth::Test {
 
 namespace {
 
-Recorder<LogLine>& lines() {
-    static auto& recorder = *new Recorder<LogLine>; // logged to until the very end
+Recorder<std::string>& lines() {
+    static auto& recorder = *new Recorder<std::string>; // logged to until the very end
     return recorder;
 }
 
@@ -20,50 +19,23 @@ void record(int priority, const char* format, va_list args) {
     char* text = nullptr;
     if (vasprintf(&text, format, args) < 0)
         return;
-    lines().add({priority, text});
+    std::string line = text;
     free(text);
+    const std::size_t colon = line.find(".cpp:") + 4;
+    const std::size_t end = line.find_first_not_of("0123456789", colon + 1);
+    if (colon < line.find(' ') && end != std::string::npos && line[end] == ' ')
+        line.erase(colon, end - colon);
+    if (priority != LOG_ERR)
+        line += " (priority " + std::to_string(priority) + ")";
+    lines().add(line);
 }
 
 } // namespace
 
-std::string LogLine::withoutNumber() const {
-    std::string result = text;
-    const std::size_t colon = text.find(".cpp:") + 4;
-    const std::size_t end = text.find_first_not_of("0123456789", colon + 1);
-    if (colon < text.find(' ') && end != std::string::npos && text[end] == ' ')
-        result.erase(colon, end - colon);
-    if (priority != LOG_ERR)
-        result += " (priority " + std::to_string(priority) + ")";
-    return result;
-}
-
-SyslogCapture::SyslogCapture() {
-    lines().clear();
-}
-
-SyslogCapture::~SyslogCapture() {
-    lines().clear();
-}
-
-std::vector<std::string> SyslogCapture::take() {
-    std::vector<std::string> texts;
-    for (const LogLine& line : lines().events())
-        texts.push_back(line.withoutNumber());
+Texts SyslogCapture::take() {
+    Texts texts = lines().events();
     lines().clear();
     return texts;
-}
-
-bool SyslogCapture::waitFor(const std::string& text, Milliseconds limit) const {
-    return lines().waitUntil(
-        [&](const std::vector<LogLine>& all) {
-            return std::any_of(all.begin(), all.end(),
-                               [&](const LogLine& line) { return line.withoutNumber() == text; });
-        },
-        limit);
-}
-
-bool SyslogCapture::waitForCount(std::size_t count, Milliseconds limit) const {
-    return lines().waitFor(count, limit);
 }
 
 } // namespace Bluetooth::Test
@@ -79,19 +51,11 @@ void syslog(int priority, const char* format, ...) {
     va_end(args);
 }
 
-void vsyslog(int priority, const char* format, va_list args) {
-    Bluetooth::Test::record(priority, format, args);
-}
-
 void __syslog_chk(int priority, int /*flag*/, const char* format, ...) {
     va_list args;
     va_start(args, format);
     Bluetooth::Test::record(priority, format, args);
     va_end(args);
-}
-
-void __vsyslog_chk(int priority, int /*flag*/, const char* format, va_list args) {
-    Bluetooth::Test::record(priority, format, args);
 }
 }
 // NOLINTEND(bugprone-reserved-identifier,cert-dcl*,readability-inconsistent-declaration*)

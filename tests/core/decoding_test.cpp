@@ -1,6 +1,6 @@
-// How property dictionaries and values are decoded.
+// How replies become values of the library.
 
-#include "support/core_test.h"
+#include "support/peer_test.h"
 
 #include <bluetooth/dict_codec.h>
 
@@ -21,25 +21,133 @@ std::string described(const Dict& dict) {
 
 } // namespace
 
-class DictionaryTest : public CoreTest {
+class DecodingTest : public CoreTest {
 protected:
-    int read(const Writer::Build& arguments, Dict& dict) {
-        peer.reply("GetProperties", arguments);
+    /// Holds a reply with these arguments for the proxy.
+    void hold(const Writer::Build& arguments) {
+        MessagePtr reply(dbus_message_new(DBUS_MESSAGE_TYPE_METHOD_RETURN));
+        Writer(reply.get(), arguments);
+        ASSERT_EQ(proxy.setReplyMessage(reply.release()), 0);
+    }
+
+    /// Reads the held reply and then once more, when none may be left.
+    template <class Value>
+    int readOnce(Value& value) {
         proxy.resetError();
-        EXPECT_EQ(call("GetProperties"), 0);
-        const int result = proxy.getReplyValue(dict);
+        const int result = proxy.getReplyValue(value);
         const int number = proxy.getErrorNumber();
-        Dict none;
-        EXPECT_EQ(proxy.getReplyValue(none), -1); // whatever came of it, the reply is gone
+        const std::string text = proxy.getErrorMessage();
+        Value another{};
+        EXPECT_EQ(proxy.getReplyValue(another), -1);
         EXPECT_EQ(proxy.getErrorNumber(), 2);
-        errorNumber = number;
+        EXPECT_EQ(proxy.getErrorMessage(), "Reply message is null");
+        readError = {number, text};
         return result;
     }
 
-    int errorNumber = 0;
+    std::pair<int, std::string> readError;
+    const std::pair<int, std::string> noError{0, ""};
+    const std::pair<int, std::string> wrongType{4, "Invalid reply value"};
+
+    int read(const Writer::Build& arguments, Dict& dict) {
+        hold(arguments);
+        return readOnce(dict);
+    }
 };
 
-TEST_F(DictionaryTest, ValuesAreKeptInOrderWithTheirAlternatives) {
+TEST_F(DecodingTest, TextsAndBooleansAreReadFromTheirOwnTypeOnly) {
+    std::string text;
+    hold([](Writer& w) { w("hello")(5u); }); // what follows the first argument is not looked at
+    EXPECT_EQ(readOnce(text), 0);
+    EXPECT_EQ(text, "hello");
+    EXPECT_EQ(readError, noError);
+    for (const bool value : {true, false}) {
+        bool read = !value;
+        hold([value](Writer& w) { w(value); });
+        EXPECT_EQ(readOnce(read), 0);
+        EXPECT_EQ(read, value);
+    }
+    bool flag = true;
+    const Writer::Build neither[] = {{},
+                                     [](Writer& w) { w(Path{"/"}); },
+                                     [](Writer& w) { w(1u); },
+                                     [](Writer& w) { w(Var{"text"}); },
+                                     [](Writer& w) { w.array("s"); }};
+    for (const auto& reply : neither) {
+        hold(reply);
+        EXPECT_EQ(readOnce(text), -1);
+        EXPECT_EQ(readError, wrongType);
+        hold(reply);
+        EXPECT_EQ(readOnce(flag), -1);
+        EXPECT_EQ(readError, wrongType);
+    }
+    EXPECT_EQ(text, "hello");
+    EXPECT_TRUE(flag);
+}
+
+TEST_F(DecodingTest, ATextWhereAPathWasAskedForIsTheServicesError) {
+    ObjectPath path;
+    hold([](Writer& w) { w(Path{"/org/bluez"}); });
+    EXPECT_EQ(readOnce(path), 0);
+    EXPECT_STREQ(path, "/org/bluez");
+    EXPECT_EQ(readError, noError);
+
+    hold([](Writer& w) { w("No such adapter"); });
+    EXPECT_EQ(readOnce(path), -2);
+    EXPECT_STREQ(path, "No such adapter");
+    EXPECT_EQ(readError, std::make_pair(11, std::string("No such adapter")));
+
+    // Of any other type: number 11 as well, and whatever text there was before stays.
+    for (const Writer::Build& reply : {Writer::Build(), Writer::Build([](Writer& w) { w(3u); })}) {
+        path = ObjectPath("/kept");
+        hold(reply);
+        EXPECT_EQ(readOnce(path), -1);
+        EXPECT_EQ(readError, std::make_pair(11, std::string()));
+        EXPECT_STREQ(path, "/kept");
+    }
+    hold([](Writer& w) { w("older text"); });
+    EXPECT_EQ(proxy.getReplyValue(path), -2);
+    hold([](Writer& w) { w(true); });
+    EXPECT_EQ(proxy.getReplyValue(path), -1);
+    EXPECT_EQ(proxy.getErrorMessage(), "older text");
+    hold({}); // the proxy's destructor releases what is left
+    EXPECT_EQ(proxy.newMessage("Unsent"), 0);
+}
+
+TEST_F(DecodingTest, ListsAreReadFromArraysOfTexts) {
+    const struct {
+        Writer::Build reply;
+        int result;
+        Texts list;
+    } cases[] = {
+        {[](Writer& w) { w.array("s", [](Writer& a) { a("a")("")("b"); }); }, 0, {"a", "", "b"}},
+        {[](Writer& w) { w.array("o", [](Writer& a) { a(Path{"/a"})(Path{"/"}); }); },
+         0,
+         {"/a", "/"}},
+        {[](Writer& w) { w.array("s"); }, 0, {}},
+        {[](Writer& w) { w.array("u"); }, 0, {}}, // empty of whatever type
+        {[](Writer& w) { w.dict("sv"); }, 0, {}},
+        {[](Writer& w) { w.array("u", [](Writer& a) { a(1u); }); }, -1, {"before"}},
+        {[](Writer& w) { w.array("x", [](Writer& a) { a(std::int64_t{-1}); }); }, -1, {"before"}},
+        {[](Writer& w) { w.dict("sv", [](Writer& d) { d.entry("a", Var{1u}); }); }, -1, {"before"}},
+        {[](Writer& w) { w.array("as", [](Writer& a) { a.array("s"); }); }, -1, {"before"}},
+        {[](Writer& w) { w("a"); }, -1, {"before"}},
+        {{}, -1, {"before"}},
+    };
+    for (const auto& given : cases) {
+        Texts texts{"before"};
+        hold(given.reply);
+        EXPECT_EQ(readOnce(texts), given.result);
+        EXPECT_EQ(texts, given.list);
+        EXPECT_EQ(readError, given.result == 0 ? noError : wrongType);
+        std::vector<ObjectPath> paths{ObjectPath("before")};
+        hold(given.reply);
+        EXPECT_EQ(readOnce(paths), given.result);
+        EXPECT_EQ(Texts(paths.begin(), paths.end()), given.list);
+    }
+}
+
+TEST_F(DecodingTest, ValuesAreKeptInOrderWithTheirAlternatives) {
     Dict dict{{"before", Variant(1u)}};
     EXPECT_EQ(read(
                   [](Writer& w) {
@@ -69,14 +177,14 @@ TEST_F(DictionaryTest, ValuesAreKeptInOrderWithTheirAlternatives) {
                   },
                   dict),
               0);
-    EXPECT_EQ(errorNumber, 0);
+    EXPECT_EQ(readError, noError);
     EXPECT_EQ(described(dict),
               "Address=3:00:11;Adapter=3:/hci0;Class=0:4294967295;Vendor=1:65535;RSSI=5:-60;"
               "Lowest=5:-32768;Paired=2:1;Paired=2:0;UUIDs=4:[a1, b2];Devices=4:[/dev];"
               "Numbers=4:[];");
 }
 
-TEST_F(DictionaryTest, NumberedKeysAndBareTextsAreUnderstood) {
+TEST_F(DecodingTest, NumberedKeysAndBareTextsAreUnderstood) {
     Dict dict;
     EXPECT_EQ(read([](Writer& w) { w.dict("us", [](Writer& d) { d.entry(65536u, "<record/>"); }); },
                    dict),
@@ -89,7 +197,7 @@ TEST_F(DictionaryTest, NumberedKeysAndBareTextsAreUnderstood) {
     EXPECT_TRUE(dict.empty());
 }
 
-TEST_F(DictionaryTest, AnEmptyNameEndsTheDictionaryWithSuccess) {
+TEST_F(DecodingTest, AnEmptyNameEndsTheDictionaryWithSuccess) {
     Dict dict;
     EXPECT_EQ(read(
                   [](Writer& w) {
@@ -101,10 +209,10 @@ TEST_F(DictionaryTest, AnEmptyNameEndsTheDictionaryWithSuccess) {
                   dict),
               0);
     EXPECT_EQ(described(dict), "a=0:1;b=0:2;");
-    EXPECT_EQ(errorNumber, 0);
+    EXPECT_EQ(readError, noError);
 }
 
-TEST_F(DictionaryTest, DecodingStopsAtTheFirstBadEntryAndKeepsThoseBefore) {
+TEST_F(DecodingTest, DecodingStopsAtTheFirstBadEntryAndKeepsThoseBefore) {
     const auto afterOne = [](const Writer::Build& bad) {
         return [bad](Writer& w) {
             w.dict("sv", [&](Writer& d) {
@@ -132,7 +240,7 @@ TEST_F(DictionaryTest, DecodingStopsAtTheFirstBadEntryAndKeepsThoseBefore) {
     Dict dict;
     for (const auto& value : values) {
         EXPECT_EQ(read(afterOne(value), dict), -1);
-        EXPECT_EQ(errorNumber, 4);
+        EXPECT_EQ(readError, wrongType);
         EXPECT_EQ(described(dict), "good=0:1;");
     }
     const Writer::Build badNamesOrValues[] = {
@@ -142,12 +250,12 @@ TEST_F(DictionaryTest, DecodingStopsAtTheFirstBadEntryAndKeepsThoseBefore) {
     };
     for (const auto& reply : badNamesOrValues) {
         EXPECT_EQ(read(reply, dict), -1);
-        EXPECT_EQ(errorNumber, 4);
+        EXPECT_EQ(readError, wrongType);
         EXPECT_TRUE(dict.empty());
     }
 }
 
-TEST_F(DictionaryTest, WhatIsNoDictionaryLeavesTheOldEntries) {
+TEST_F(DecodingTest, WhatIsNoDictionaryLeavesTheOldEntries) {
     const Writer::Build replies[] = {
         {},
         [](Writer& w) { w("text"); },
@@ -157,16 +265,12 @@ TEST_F(DictionaryTest, WhatIsNoDictionaryLeavesTheOldEntries) {
     for (const auto& reply : replies) {
         Dict dict{{"old", Variant(1u)}};
         EXPECT_EQ(read(reply, dict), -1);
-        EXPECT_EQ(errorNumber, 5);
+        EXPECT_EQ(readError, std::make_pair(5, std::string("Invalid reply format")));
         EXPECT_EQ(described(dict), "old=0:1;");
     }
-    EXPECT_EQ(call("NoSuchMethod"), -1);
-    Dict dict;
-    EXPECT_EQ(proxy.getReplyValue(dict), -1);
-    EXPECT_EQ(proxy.getErrorMessage(), "Reply message is null");
 }
 
-TEST_F(DictionaryTest, AFailedValueKeepsWhatTheEntryHeld) {
+TEST_F(DecodingTest, AFailedValueKeepsWhatTheEntryHeld) {
     MessagePtr message(dbus_message_new_signal(peerPath, peerInterface, "Changed"));
     Writer(message.get())(Path{"/name"})(Var{1.5})("text");
     DBusMessageIter iter;

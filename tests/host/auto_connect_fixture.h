@@ -1,0 +1,48 @@
+#ifndef KESBLUETOOTH_TESTS_AUTO_CONNECT_FIXTURE_H
+#define KESBLUETOOTH_TESTS_AUTO_CONNECT_FIXTURE_H
+
+#include "host/namespace_test.h"
+#include "support/simulation.h"
+
+#include <bluetooth/auto_connect.h>
+
+namespace Bluetooth::Test {
+
+inline constexpr const char* adapter0 = "00:1A:7D:DA:71:10";
+inline constexpr const char* adapter1 = "00:1A:7D:DA:71:11";
+inline constexpr const char* headset = "00:11:22:33:44:01";  // hci0, with a sink
+inline constexpr const char* carKit = "00:11:22:33:44:02";   // hci0, without a sink
+inline constexpr const char* keyboard = "00:11:22:33:44:03"; // hci0, no audio
+inline constexpr const char* speaker = "00:11:22:33:44:04";  // hci1, with a sink
+inline constexpr const char* stranger = "DE:AD:BE:EF:00:01"; // known to none
+
+/// The simulated daemon knows four devices; there are no lists of devices to connect yet.
+class AutoConnectFixture : public NamespaceTest {
+protected:
+    void SetUp() override {
+        NamespaceTest::SetUp();
+        simulation.watchCalls();
+        // Adapters ask it for their version; it is missing here, and not what is tested.
+        writeProgram("/usr/bin/hciconfig", "");
+    }
+
+    static void setConfig(const char* adapter, const std::string& content) {
+        std::filesystem::create_directory(configFolder);
+        writeFile(std::string(configFolder) + adapter, content);
+    }
+    static std::string config(const char* adapter) {
+        return readFile(std::string(configFolder) + adapter);
+    }
+
+    Simulation simulation{
+        "[Adapter hci0]\nAddress=00:1A:7D:DA:71:10\n[Adapter hci1]\nAddress=00:1A:7D:DA:71:11\n"
+        "[Device 00:11:22:33:44:01]\nAdapter=hci0\nKnown=true\nUUIDs=110b;110e\n"
+        "[Device 00:11:22:33:44:02]\nAdapter=hci0\nKnown=true\nUUIDs=1108;111e\n"
+        "[Device 00:11:22:33:44:03]\nAdapter=hci0\nKnown=true\nUUIDs=1124\n"
+        "[Device 00:11:22:33:44:04]\nAdapter=hci1\nKnown=true\nUUIDs=110b\n"};
+    AutoConnect autoConnect;
+};
+
+} // namespace Bluetooth::Test
+
+#endif
