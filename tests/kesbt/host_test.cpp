@@ -17,14 +17,8 @@ constexpr const char* adapterAddress = "00:1A:7D:DA:71:10";
 constexpr const char* folder = "/etc/bluetooth/autoconnect/";
 const std::string file = std::string(folder) + adapterAddress;
 
-class HostVerbs : public KesbtTest {
+class HostVerbs : public HostTest {
 protected:
-    void SetUp() override {
-        ASSERT_NE(getenv("KESBLUETOOTH_TEST_NAMESPACE"), nullptr)
-            << "this would change the machine's own files: run it with ctest";
-        std::filesystem::remove_all("/etc/bluetooth");
-        std::filesystem::create_directory("/etc/bluetooth");
-    }
     static std::string content() {
         std::ifstream stream(file, std::ios::binary);
         return std::string(std::istreambuf_iterator<char>(stream), {});

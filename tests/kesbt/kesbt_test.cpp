@@ -1,6 +1,8 @@
 #include "kesbt/kesbt_test.h"
 
 #include <algorithm>
+#include <cstdlib>
+#include <filesystem>
 #include <ostream>
 
 namespace Bluetooth::Test {
@@ -77,6 +79,13 @@ Json awaitEvent(ChildProcess& program, const std::string& member, const Json& va
 KesbtTest::KesbtTest(const std::string& timeScale)
     : daemon(startSim(timeScale)), peer(std::make_unique<RawPeer>(bus.address())) {
     peer->addMatch(std::string("type='signal',interface='") + simName + "'");
+}
+
+HostTest::HostTest() {
+    if (!getenv("KESBLUETOOTH_TEST_NAMESPACE"))
+        throw std::runtime_error("this would change the machine's own files: run it with ctest");
+    std::filesystem::remove_all("/etc/bluetooth");
+    std::filesystem::create_directory("/etc/bluetooth");
 }
 
 MessagePtr KesbtTest::control(const char* method, const RawPeer::Build& arguments) {

@@ -75,6 +75,12 @@ protected:
     std::unique_ptr<RawPeer> peer;
 };
 
+/// The same for the verbs that use the machine's fixed paths: ctest runs it in a namespace.
+class HostTest : public KesbtTest {
+protected:
+    HostTest();
+};
+
 } // namespace Bluetooth::Test
 
 #endif
