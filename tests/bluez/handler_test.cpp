@@ -1,5 +1,6 @@
 // Signals of the daemon: the callbacks that a program sets, and what the default ones print.
 
+#include "support/callbacks.h"
 #include "support/peer_test.h"
 #include "support/stdout_capture.h"
 
@@ -7,7 +8,6 @@
 #include <bluetooth/audio_sink.h>
 #include <bluetooth/control.h>
 #include <bluetooth/device.h>
-#include <bluetooth/dict_codec.h>
 #include <bluetooth/manager.h>
 
 #include <functional>
@@ -16,23 +16,6 @@
 namespace Bluetooth::Test {
 
 namespace {
-
-void onSignal(RemoteObject* receiver) {
-    seen().add(receiver->getPath());
-}
-void onPath(RemoteObject* receiver, const ObjectPath* path) {
-    seen().add(receiver->getPath() + (" " + path->str()));
-}
-void onText(RemoteObject* receiver, const char* text) {
-    seen().add(receiver->getPath() + (" " + std::string(text)));
-}
-void onProperty(RemoteObject* receiver, const char* name, const Variant* value) {
-    seen().add(receiver->getPath() + (" " + std::string(name)) + "=" + variantToString(*value));
-}
-void onDevice(RemoteObject* receiver, const char* text, const Dict* dict) {
-    seen().add(receiver->getPath() + (" " + std::string(text)) + " " +
-               dictConquerToString(*dict, ";"));
-}
 
 void newAdapter(Writer& w) {
     w(Path{"/new"});
@@ -85,76 +68,77 @@ TEST_F(HandlerTest, EachSetterSubscribesToItsSignal) {
         std::string printed;
     } cases[] = {
         {manager, "AdapterAdded", newAdapter,
-         set(manager, &Manager::setAdapterAddedHandler, onPath), "/ /new", "/new was added by /\n"},
+         set(manager, &Manager::setAdapterAddedHandler, onPath), "path / /new",
+         "/new was added by /\n"},
         {manager, "AdapterRemoved", newAdapter,
-         set(manager, &Manager::setAdapterRemovedHandler, onPath), "/ /new",
+         set(manager, &Manager::setAdapterRemovedHandler, onPath), "path / /new",
          "/new was removed by /\n"},
         {manager, "DefaultAdapterChanged", newAdapter,
-         set(manager, &Manager::setDefaultAdapterChangedHandler, onPath), "/ /new",
+         set(manager, &Manager::setDefaultAdapterChangedHandler, onPath), "path / /new",
          "Default adpater is /new in / now\n"},
         {adapter, "PropertyChanged", powered,
-         set(adapter, &Adapter::setPropertyChangedHandler, onProperty),
-         "/org/bluez/42/hci0 Powered=1", "Powered was changed in /org/bluez/42/hci0 with 1\n"},
-        {adapter, "DeviceFound", foundDevice,
-         set(adapter, &Adapter::setDeviceFoundHandler, onDevice),
-         "/org/bluez/42/hci0 00:11:22:33:44:55 Name: Phone;RSSI: -60;",
+         set(adapter, &Adapter::setPropertyChangedHandler, onVariant),
+         "variant /org/bluez/42/hci0 Powered=1",
+         "Powered was changed in /org/bluez/42/hci0 with 1\n"},
+        {adapter, "DeviceFound", foundDevice, set(adapter, &Adapter::setDeviceFoundHandler, onDict),
+         "dict /org/bluez/42/hci0 00:11:22:33:44:55 Name: Phone;RSSI: -60;",
          "00:11:22:33:44:55 was found" + onAdapter + "Name: Phone\nRSSI: -60\n\n"},
         {adapter, "DeviceDisappeared", [](Writer& w) { w(address); },
-         set(adapter, &Adapter::setDeviceDisappearedHandler, onText),
-         "/org/bluez/42/hci0 00:11:22:33:44:55",
+         set(adapter, &Adapter::setDeviceDisappearedHandler, onString),
+         "string /org/bluez/42/hci0 00:11:22:33:44:55",
          "00:11:22:33:44:55 was disappeared in /org/bluez/42/hci0\n"},
         {adapter, "DeviceCreated", newDevice,
-         set(adapter, &Adapter::setDeviceCreatedHandler, onPath), "/org/bluez/42/hci0 " + path,
+         set(adapter, &Adapter::setDeviceCreatedHandler, onPath), "path /org/bluez/42/hci0 " + path,
          "POINTER was created" + onAdapter},
         {adapter, "DeviceRemoved", newDevice,
-         set(adapter, &Adapter::setDeviceRemovedHandler, onPath), "/org/bluez/42/hci0 " + path,
+         set(adapter, &Adapter::setDeviceRemovedHandler, onPath), "path /org/bluez/42/hci0 " + path,
          "POINTER was removed" + onAdapter},
         // Without arguments a callback gets the proxy that runs the loop.
         {device,
          "DisconnectRequested",
          {},
-         set(device, &Device::setDisconnectRequestedHandler, onSignal),
-         "/loop",
+         set(device, &Device::setDisconnectRequestedHandler, onNothing),
+         "nothing /loop",
          "Disconnect requested from /loop\n"},
         {sink,
          "Connected",
          {},
-         set(sink, &AudioSink::setConnectedHandler, onSignal),
-         "/loop",
+         set(sink, &AudioSink::setConnectedHandler, onNothing),
+         "nothing /loop",
          "Connected from /loop\n"},
         {sink,
          "Disconnected",
          {},
-         set(sink, &AudioSink::setDisconnectedHandler, onSignal),
-         "/loop",
+         set(sink, &AudioSink::setDisconnectedHandler, onNothing),
+         "nothing /loop",
          "Disconnected from /loop\n"},
         {sink,
          "Playing",
          {},
-         set(sink, &AudioSink::setPlayingHandler, onSignal),
-         "/loop",
+         set(sink, &AudioSink::setPlayingHandler, onNothing),
+         "nothing /loop",
          "Playing in /loop\n"},
         {sink,
          "Stopped",
          {},
-         set(sink, &AudioSink::setStoppedHandler, onSignal),
-         "/loop",
+         set(sink, &AudioSink::setStoppedHandler, onNothing),
+         "nothing /loop",
          "Stopped in /loop\n"},
         {control,
          "Connected",
          {},
-         set(control, &Control::setConnectedHandler, onSignal),
-         "/loop",
+         set(control, &Control::setConnectedHandler, onNothing),
+         "nothing /loop",
          "Connected from /loop\n"},
         {control,
          "Disconnected",
          {},
-         set(control, &Control::setDisconnectedHandler, onSignal),
-         "/loop",
+         set(control, &Control::setDisconnectedHandler, onNothing),
+         "nothing /loop",
          "Disconnected from /loop\n"},
         {control, "PropertyChanged", powered,
-         set(control, &Control::setPropertyChangedHandler, onProperty), path + " Powered=1",
-         "Powered was changed in " + path + " with 1\n"},
+         set(control, &Control::setPropertyChangedHandler, onVariant),
+         "variant " + path + " Powered=1", "Powered was changed in " + path + " with 1\n"},
     };
     const ReceiveLoop running(loop);
     for (const auto& given : cases) {

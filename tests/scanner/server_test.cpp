@@ -4,8 +4,6 @@
 #include "support/receive_loop.h"
 #include "support/stdout_capture.h"
 
-#include "scanner/scanner_object_info.h"
-
 #include <bluetooth/scanner_server.h>
 
 #include <thread>
@@ -13,14 +11,6 @@
 namespace Bluetooth::Test {
 
 namespace {
-
-/// The fields up to an empty one.
-Texts fieldsAt(const char* data) {
-    Texts fields;
-    for (; *data; data += fields.back().size() + 1)
-        fields.emplace_back(data);
-    return fields;
-}
 
 struct Unref {
     void operator()(ScannerObject* object) const { g_object_unref(object); }
@@ -78,20 +68,6 @@ protected:
         return all;
     }
 };
-
-TEST(ScannerObjectInfoTest, IsLaidOutForDBusGLib) {
-    const DBusGObjectInfo& info = scannerObjectInfo();
-    EXPECT_EQ(info.format_version, 1);
-    ASSERT_EQ(info.n_method_infos, 2);
-    EXPECT_EQ(info.method_infos[0].data_offset, 0);
-    EXPECT_EQ(info.method_infos[1].data_offset, 72);
-    EXPECT_EQ(fieldsAt(info.data), (Texts{serviceInterface, "ListDevices", "S", "arg0", "I", "s",
-                                          "arg1", "O", "F", "N", "a{ss}"}));
-    EXPECT_EQ(fieldsAt(info.data + 72),
-              (Texts{serviceInterface, "RemoveFinder", "S", "arg0", "I", "s"}));
-    EXPECT_STREQ(info.exported_signals, "");
-    EXPECT_STREQ(info.exported_properties, "");
-}
 
 TEST_F(ServerTest, FrameTellsAboutTheBus) {
     ServerObject frame("com.example.Frame", "/frame", DBUS_BUS_SESSION);
