@@ -156,9 +156,7 @@ protected:
         std::thread script([&] {
             EXPECT_TRUE(daemon.waitForCalls("CreatePairedDevice", 1));
             daemonDoes();
-            MessagePtr reply(dbus_message_new_method_return(pairing.get()));
-            Writer(reply.get())(Path{devicePath});
-            daemon.send(std::move(reply));
+            daemon.send(replyTo(pairing.get(), [](Writer& w) { w(Path{devicePath}); }));
         });
         const std::unique_ptr<Device> paired(adapter.createPairedDevice(address, by));
         script.join();

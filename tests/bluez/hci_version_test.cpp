@@ -106,16 +106,4 @@ TEST_F(HciVersionTest, TheToolIsAskedForTheLastPartOfThePathUnlessTheDaemonFails
     EXPECT_EQ(log.take(), Texts{"bluez_object.cpp Broken"});
 }
 
-TEST_F(HciVersionTest, ManyReadingsLeaveNeitherProcessesNorDescriptors) {
-    install("ls -l /proc/$$/fd | wc -l; printf '\\tHCI Version: 2.1\\n'");
-    EXPECT_EQ(properties(), "Name: office;HCIVersion: 2.1;");
-    const auto before = countOpenDescriptors();
-    for (int i = 0; i < 20; ++i)
-        properties();
-    EXPECT_EQ(countOpenDescriptors(), before);
-    std::ifstream children("/proc/self/task/" + std::to_string(getpid()) + "/children");
-    const std::string all((std::istreambuf_iterator<char>(children)), {});
-    EXPECT_EQ(std::count(all.begin(), all.end(), ' '), 1) << all; // the bus
-}
-
 } // namespace Bluetooth::Test

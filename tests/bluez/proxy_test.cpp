@@ -140,9 +140,7 @@ TEST_F(ProxyTest, OperationsThatGiveAnObjectReadItsPath) {
         // The daemon may be gone by the time its answer is used.
         daemon.handle(method, [&](DBusMessage* request) {
             daemon.disown("org.bluez");
-            MessagePtr reply(dbus_message_new_method_return(request));
-            Writer(reply.get())(Path{"/new"});
-            return reply;
+            return replyTo(request, [](Writer& w) { w(Path{"/new"}); });
         });
         EXPECT_FALSE(given.operation());
         EXPECT_EQ(log.take(), Texts{});
@@ -287,10 +285,7 @@ TEST_F(ProxyTest, ListingAdaptersNeitherLogsNorForgetsAnEarlierError) {
 TEST_F(ProxyTest, ListsHoldNullsForADaemonThatLeftAndSkipThemWhenDeleted) {
     const auto leaving = [&](DBusMessage* request) {
         daemon.disown("org.bluez");
-        MessagePtr reply(dbus_message_new_method_return(request));
-        Writer writer(reply.get());
-        twoPaths(writer);
-        return reply;
+        return replyTo(request, twoPaths);
     };
     daemon.handle("ListAdapters", leaving);
     daemon.handle("ListDevices", leaving);

@@ -1,7 +1,6 @@
 // Many threads, one connection: no reply and no signal is lost, and no call waits for another's.
 
 #include "support/peer_test.h"
-#include "support/scale.h"
 
 #include <algorithm>
 #include <atomic>
@@ -16,11 +15,9 @@ using Clock = std::chrono::steady_clock;
 
 /// Answers with the argument.
 MessagePtr echo(DBusMessage* call) {
-    MessagePtr reply(dbus_message_new_method_return(call));
     const char* text = "";
     dbus_message_get_args(call, nullptr, DBUS_TYPE_STRING, &text, DBUS_TYPE_INVALID);
-    Writer(reply.get())(text);
-    return reply;
+    return replyTo(call, [text](Writer& w) { w(text); });
 }
 
 struct Echoes {

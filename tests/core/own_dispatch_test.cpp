@@ -49,7 +49,7 @@ TEST_F(OwnDispatchTest, HandlersOfTheProgramMayCall) {
     // On the same thread, outside its dispatch, requests are answered while a call waits.
     peer.handle("Pair", [this](DBusMessage* pair) {
         peer.send(requestTo(proxy.getConnectionName()));
-        return MessagePtr(dbus_message_new_method_return(pair));
+        return replyTo(pair);
     });
     bool asked = false;
     onRequest() = [&asked] {

@@ -35,6 +35,14 @@ protected:
         return proxy.sendMessagePending();
     }
 
+    /// Does something as soon as Slow has been called.
+    std::thread onceSlowWaits(const std::function<void()>& action) {
+        return std::thread([this, action] {
+            EXPECT_TRUE(peer.waitForCalls("Slow", 1));
+            action();
+        });
+    }
+
     void expectNoReply() {
         std::string text;
         EXPECT_EQ(proxy.getReplyValue(text), -1);
@@ -63,7 +71,7 @@ protected:
                 dbus_message_set_no_reply(request.get(), true);
                 peer.send(std::move(request));
             }
-            return MessagePtr(dbus_message_new_method_return(pair));
+            return replyTo(pair);
         });
     }
 };
@@ -97,14 +105,10 @@ TEST_F(PendingTest, ALateReplyAfterAnInterruptionChangesNothing) {
         peer.forgetCalls();
         MessagePtr late;
         peer.handle("Slow", [&](DBusMessage* request) {
-            late.reset(dbus_message_new_method_return(request));
-            Writer(late.get())("late");
+            late = replyTo(request, [](Writer& w) { w("late"); });
             return MessagePtr();
         });
-        std::thread interrupter([&] {
-            EXPECT_TRUE(peer.waitForCalls("Slow", 1));
-            kill(getpid(), number);
-        });
+        std::thread interrupter = onceSlowWaits([&] { kill(getpid(), number); });
         EXPECT_EQ(callPending("Slow"), 0);
         interrupter.join();
         expectNoReply();
@@ -114,9 +118,7 @@ TEST_F(PendingTest, ALateReplyAfterAnInterruptionChangesNothing) {
             "Next",
             [&](DBusMessage* request) {
                 peer.send(std::move(late));
-                MessagePtr reply(dbus_message_new_method_return(request));
-                Writer(reply.get())("mine");
-                return reply;
+                return replyTo(request, [](Writer& w) { w("mine"); });
             },
             Milliseconds(50));
         std::string text;
@@ -128,10 +130,7 @@ TEST_F(PendingTest, ALateReplyAfterAnInterruptionChangesNothing) {
 
 TEST_F(PendingTest, ALateReplyForADestroyedProxyIsDropped) {
     peer.reply("Slow", {}, Milliseconds(200));
-    std::thread interrupter([&] {
-        EXPECT_TRUE(peer.waitForCalls("Slow", 1));
-        kill(getpid(), SIGINT);
-    });
+    std::thread interrupter = onceSlowWaits([&] { kill(getpid(), SIGINT); });
     auto doomed = std::make_unique<RemoteObject>(peerName, peerPath, peerInterface, busType);
     ASSERT_EQ(doomed->newMessage("Slow"), 0);
     EXPECT_EQ(doomed->sendMessagePending(), 0);
@@ -159,10 +158,7 @@ TEST_F(PendingTest, TheInterruptHandlersStayAndAnInterruptionInBetweenEndsTheNex
 
 TEST_F(PendingTest, TheWaitEndsWhenTheConnectionCloses) {
     peer.neverReply("Slow");
-    std::thread killer([&] {
-        EXPECT_TRUE(peer.waitForCalls("Slow", 1));
-        bus.kill();
-    });
+    std::thread killer = onceSlowWaits([&] { bus.kill(); });
     EXPECT_EQ(callPending("Slow"), 0); // it had been sent
     killer.join();
     // libdbus itself answers what is pending on a connection that closes.
@@ -196,7 +192,7 @@ TEST_F(PendingTest, RequestsAreServedOnTheWaitingThreadWhileTheReceiveThreadDeli
             EXPECT_EQ(argumentsOf(answer.get()), "s:5820");
         }
         EXPECT_TRUE(delivered.waitFor(20)); // before the wait ends
-        peer.send(MessagePtr(dbus_message_new_method_return(request.get())));
+        peer.send(replyTo(request.get()));
     });
     EXPECT_EQ(callPending("Pair"), 0);
     daemon.join();

@@ -1,7 +1,7 @@
 #ifndef KESBLUETOOTH_TESTS_FAULT_SOAK_H
 #define KESBLUETOOTH_TESTS_FAULT_SOAK_H
 
-#include "support/scale.h"
+#include "support/latch.h"
 
 #include <gtest/gtest.h>
 

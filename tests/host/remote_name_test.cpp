@@ -79,16 +79,13 @@ protected:
     RemoteNameTest() { controller = {}; }
 };
 
-TEST_F(RemoteNameTest, AsksTheRoutingAdapterAndClosesIt) {
+TEST_F(RemoteNameTest, AsksTheRoutingAdapterAndCutsTheName) {
     controller.name = "Headset";
     char name[32];
     EXPECT_EQ(getNameFromAddr(address, name, sizeof name, static_cast<GetNameTimeout>(1234)), 0);
     EXPECT_STREQ(name, "Headset");
     EXPECT_EQ(controller.calls, (Texts{"route 00:11:22:AA:BB:CC", "open 3",
                                        "name 55 00:11:22:AA:BB:CC 248 1234", "close 55"}));
-}
-
-TEST_F(RemoteNameTest, CutsTheNameAndWritesNothingBeyond) {
     controller.name = std::string(500, 'n');
     const std::string untouched(300, 'x');
     EXPECT_EQ(lookUp(1, 0), '\0' + untouched.substr(1));
@@ -99,21 +96,18 @@ TEST_F(RemoteNameTest, CutsTheNameAndWritesNothingBeyond) {
 }
 
 TEST_F(RemoteNameTest, FailureLeavesTheBufferAndClosesWhatWasOpened) {
-    const std::string untouched(300, 'x');
-    controller.result = -1;
     controller.name = "half a name";
-    EXPECT_EQ(lookUp(300, -1), untouched);
-    EXPECT_EQ(controller.calls.back(), "close 55");
-
-    controller.calls.clear();
+    const auto failsAfter = [](const std::string& lastCall) {
+        controller.calls.clear();
+        EXPECT_EQ(lookUp(300, -1), std::string(300, 'x'));
+        EXPECT_EQ(controller.calls.back(), lastCall);
+    };
+    controller.result = -1;
+    failsAfter("close 55");
     controller.device = -1;
-    EXPECT_EQ(lookUp(300, -1), untouched);
-    EXPECT_EQ(controller.calls.back(), "open 3");
-
-    controller.calls.clear();
+    failsAfter("open 3");
     controller.route = -1;
-    EXPECT_EQ(lookUp(300, -1), untouched);
-    EXPECT_EQ(controller.calls.size(), 1u);
+    failsAfter("route 00:11:22:AA:BB:CC");
 }
 
 TEST_F(RemoteNameTest, UnusableArgumentsReachNoController) {

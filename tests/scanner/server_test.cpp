@@ -174,9 +174,7 @@ TEST_F(ServerTest, HandlersTellWhatIsMissing) {
         daemon.handle("FindAdapter", [&isGone](DBusMessage* message) {
             if (isGone.exchange(true))
                 return MessagePtr(dbus_message_new_error(message, "org.bluez.Error", "gone"));
-            MessagePtr reply(dbus_message_new_method_return(message));
-            Writer(reply.get())(Path{"/org/bluez/1/hci0"});
-            return reply;
+            return replyTo(message, [](Writer& w) { w(Path{"/org/bluez/1/hci0"}); });
         });
         EXPECT_EQ(listDevices(object.get()), "3/0 Set hci0 not found");
     }

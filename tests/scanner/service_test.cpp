@@ -1,7 +1,6 @@
 // The service in its own process (kesbt-scannerd), asked over the bus and by its client.
 
 #include "scanner/scanner_test.h"
-#include "support/scale.h"
 
 #include <bluetooth/dict_codec.h>
 #include <bluetooth/scanner.h>

@@ -13,6 +13,12 @@ namespace Bluetooth::Test {
 
 using Milliseconds = std::chrono::milliseconds;
 
+#if defined(__SANITIZE_THREAD__) || defined(__SANITIZE_ADDRESS__)
+inline constexpr bool isSanitized = true;
+#else
+inline constexpr bool isSanitized = false;
+#endif
+
 using Texts = std::vector<std::string>;
 
 /// How long tests wait for what must come. Only a failing test waits this long.

@@ -58,11 +58,7 @@ void RawPeer::handle(const std::string& member, Handler handler, Milliseconds de
 void RawPeer::reply(const std::string& member, Build arguments, Milliseconds delay) {
     handle(
         member,
-        [arguments = std::move(arguments)](DBusMessage* call) {
-            MessagePtr reply(dbus_message_new_method_return(call));
-            Writer(reply.get(), arguments);
-            return reply;
-        },
+        [arguments = std::move(arguments)](DBusMessage* call) { return replyTo(call, arguments); },
         delay);
 }
 

@@ -31,6 +31,12 @@ struct SeenCall {
     std::string text() const;
 };
 
+inline MessagePtr replyTo(DBusMessage* call, const Writer::Build& arguments = {}) {
+    MessagePtr reply(dbus_message_new_method_return(call));
+    Writer(reply.get(), arguments);
+    return reply;
+}
+
 /// A participant on a bus that does exactly what a test says, malformed messages included. It has
 /// a connection and a thread of its own, apart from the library's.
 ///
