@@ -10,7 +10,6 @@
 #include <bluetooth/device.h>
 #include <bluetooth/manager.h>
 
-#include <functional>
 #include <regex>
 
 namespace Bluetooth::Test {
@@ -50,111 +49,58 @@ protected:
 };
 
 TEST_F(HandlerTest, EachSetterSubscribesToItsSignal) {
-    // Each setter is called with a callback of ours, and with null for the default one.
-    using Set = std::function<int(bool own)>;
-    const auto set = [](auto& proxy, auto setter, auto callback) {
-        return Set([&proxy, setter, callback](bool own) {
-            return (proxy.*setter)(own ? callback : nullptr);
-        });
-    };
-    const std::string onAdapter = std::string(" by ") + adapterPath + "\n";
-    const std::string path(devicePath);
-    const struct {
-        RemoteObject& proxy;
-        const char* member;
-        Writer::Build arguments;
-        Set set;
-        std::string reported;
-        std::string printed;
-    } cases[] = {
-        {manager, "AdapterAdded", newAdapter,
-         set(manager, &Manager::setAdapterAddedHandler, onPath), "path / /new",
-         "/new was added by /\n"},
-        {manager, "AdapterRemoved", newAdapter,
-         set(manager, &Manager::setAdapterRemovedHandler, onPath), "path / /new",
-         "/new was removed by /\n"},
-        {manager, "DefaultAdapterChanged", newAdapter,
-         set(manager, &Manager::setDefaultAdapterChangedHandler, onPath), "path / /new",
-         "Default adpater is /new in / now\n"},
-        {adapter, "PropertyChanged", powered,
-         set(adapter, &Adapter::setPropertyChangedHandler, onVariant),
-         "variant /org/bluez/42/hci0 Powered=1",
-         "Powered was changed in /org/bluez/42/hci0 with 1\n"},
-        {adapter, "DeviceFound", foundDevice, set(adapter, &Adapter::setDeviceFoundHandler, onDict),
-         "dict /org/bluez/42/hci0 00:11:22:33:44:55 Name: Phone;RSSI: -60;",
-         "00:11:22:33:44:55 was found" + onAdapter + "Name: Phone\nRSSI: -60\n\n"},
-        {adapter, "DeviceDisappeared", [](Writer& w) { w(address); },
-         set(adapter, &Adapter::setDeviceDisappearedHandler, onString),
-         "string /org/bluez/42/hci0 00:11:22:33:44:55",
-         "00:11:22:33:44:55 was disappeared in /org/bluez/42/hci0\n"},
-        {adapter, "DeviceCreated", newDevice,
-         set(adapter, &Adapter::setDeviceCreatedHandler, onPath), "path /org/bluez/42/hci0 " + path,
-         "POINTER was created" + onAdapter},
-        {adapter, "DeviceRemoved", newDevice,
-         set(adapter, &Adapter::setDeviceRemovedHandler, onPath), "path /org/bluez/42/hci0 " + path,
-         "POINTER was removed" + onAdapter},
-        // Without arguments a callback gets the proxy that runs the loop.
-        {device,
-         "DisconnectRequested",
-         {},
-         set(device, &Device::setDisconnectRequestedHandler, onNothing),
-         "nothing /loop",
-         "Disconnect requested from /loop\n"},
-        {sink,
-         "Connected",
-         {},
-         set(sink, &AudioSink::setConnectedHandler, onNothing),
-         "nothing /loop",
-         "Connected from /loop\n"},
-        {sink,
-         "Disconnected",
-         {},
-         set(sink, &AudioSink::setDisconnectedHandler, onNothing),
-         "nothing /loop",
-         "Disconnected from /loop\n"},
-        {sink,
-         "Playing",
-         {},
-         set(sink, &AudioSink::setPlayingHandler, onNothing),
-         "nothing /loop",
-         "Playing in /loop\n"},
-        {sink,
-         "Stopped",
-         {},
-         set(sink, &AudioSink::setStoppedHandler, onNothing),
-         "nothing /loop",
-         "Stopped in /loop\n"},
-        {control,
-         "Connected",
-         {},
-         set(control, &Control::setConnectedHandler, onNothing),
-         "nothing /loop",
-         "Connected from /loop\n"},
-        {control,
-         "Disconnected",
-         {},
-         set(control, &Control::setDisconnectedHandler, onNothing),
-         "nothing /loop",
-         "Disconnected from /loop\n"},
-        {control, "PropertyChanged", powered,
-         set(control, &Control::setPropertyChangedHandler, onVariant),
-         "variant " + path + " Powered=1", "Powered was changed in " + path + " with 1\n"},
-    };
     const ReceiveLoop running(loop);
-    for (const auto& given : cases) {
-        const std::string what = std::string(given.proxy.getInterface()) + "." + given.member;
+    const auto check = [&](auto& proxy, const std::string& member, auto setter, auto callback,
+                           const Writer::Build& arguments, const std::string& reported,
+                           const std::string& printed) {
+        const std::string what = std::string(proxy.getInterface()) + "." + member;
         seen().clear();
         // The default one is in front, since it subscribed last: it has printed when ours is told.
-        ASSERT_EQ(given.set(true), 0) << what;
-        ASSERT_EQ(given.set(false), 0) << what;
+        ASSERT_EQ((proxy.*setter)(callback), 0) << what;
+        ASSERT_EQ((proxy.*setter)(nullptr), 0) << what;
         StdoutCapture output;
-        daemon.emit(given.proxy.getPath(), given.proxy.getInterface(), given.member,
-                    given.arguments);
+        daemon.emit(proxy.getPath(), proxy.getInterface(), member, arguments);
         ASSERT_TRUE(seen().waitFor(1)) << what;
         const std::regex pointer("0x[0-9a-f]+");
-        EXPECT_EQ(std::regex_replace(output.take(), pointer, "POINTER"), given.printed) << what;
-        EXPECT_EQ(seen().events(), Texts{given.reported}) << what;
-    }
+        EXPECT_EQ(std::regex_replace(output.take(), pointer, "POINTER"), printed) << what;
+        EXPECT_EQ(seen().events(), Texts{reported}) << what;
+    };
+    const std::string onAdapter = std::string(" ") + adapterPath;
+    const std::string onDevice = std::string(" ") + devicePath;
+    check(manager, "AdapterAdded", &Manager::setAdapterAddedHandler, onPath, newAdapter,
+          "path / /new", "/new was added by /\n");
+    check(manager, "AdapterRemoved", &Manager::setAdapterRemovedHandler, onPath, newAdapter,
+          "path / /new", "/new was removed by /\n");
+    check(manager, "DefaultAdapterChanged", &Manager::setDefaultAdapterChangedHandler, onPath,
+          newAdapter, "path / /new", "Default adpater is /new in / now\n");
+    check(adapter, "PropertyChanged", &Adapter::setPropertyChangedHandler, onVariant, powered,
+          "variant" + onAdapter + " Powered=1", "Powered was changed in" + onAdapter + " with 1\n");
+    check(adapter, "DeviceFound", &Adapter::setDeviceFoundHandler, onDict, foundDevice,
+          "dict" + onAdapter + " 00:11:22:33:44:55 Name: Phone;RSSI: -60;",
+          "00:11:22:33:44:55 was found by" + onAdapter + "\nName: Phone\nRSSI: -60\n\n");
+    check(
+        adapter, "DeviceDisappeared", &Adapter::setDeviceDisappearedHandler, onString,
+        [](Writer& w) { w(address); }, "string" + onAdapter + " 00:11:22:33:44:55",
+        "00:11:22:33:44:55 was disappeared in" + onAdapter + "\n");
+    check(adapter, "DeviceCreated", &Adapter::setDeviceCreatedHandler, onPath, newDevice,
+          "path" + onAdapter + onDevice, "POINTER was created by" + onAdapter + "\n");
+    check(adapter, "DeviceRemoved", &Adapter::setDeviceRemovedHandler, onPath, newDevice,
+          "path" + onAdapter + onDevice, "POINTER was removed by" + onAdapter + "\n");
+    check(control, "PropertyChanged", &Control::setPropertyChangedHandler, onVariant, powered,
+          "variant" + onDevice + " Powered=1", "Powered was changed in" + onDevice + " with 1\n");
+    // Without arguments a callback gets the proxy that runs the loop.
+    const auto checkEvent = [&](auto& proxy, const std::string& member, auto setter,
+                                const std::string& printed) {
+        check(proxy, member, setter, onNothing, {}, "nothing /loop", printed + " /loop\n");
+    };
+    checkEvent(device, "DisconnectRequested", &Device::setDisconnectRequestedHandler,
+               "Disconnect requested from");
+    checkEvent(sink, "Connected", &AudioSink::setConnectedHandler, "Connected from");
+    checkEvent(sink, "Disconnected", &AudioSink::setDisconnectedHandler, "Disconnected from");
+    checkEvent(sink, "Playing", &AudioSink::setPlayingHandler, "Playing in");
+    checkEvent(sink, "Stopped", &AudioSink::setStoppedHandler, "Stopped in");
+    checkEvent(control, "Connected", &Control::setConnectedHandler, "Connected from");
+    checkEvent(control, "Disconnected", &Control::setDisconnectedHandler, "Disconnected from");
     EXPECT_EQ(log.take(), Texts{});
 }
 

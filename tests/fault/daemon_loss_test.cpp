@@ -2,6 +2,7 @@
 // scan. What the library does then is used meanwhile by other threads.
 
 #include "fault/soak.h"
+#include "support/callbacks.h"
 #include "support/receive_loop.h"
 #include "support/simulation.h"
 #include "support/syslog_capture.h"
@@ -13,7 +14,6 @@
 #include <bluetooth/manager.h>
 #include <bluetooth/scanner.h>
 
-#include <algorithm>
 #include <atomic>
 #include <functional>
 #include <memory>
@@ -24,25 +24,20 @@ namespace Bluetooth::Test {
 namespace {
 
 /// Lists everything, whatever of it is there.
-void listAll() {
-    const std::unique_ptr<Manager> manager(Manager::getManager());
-    const std::unique_ptr<AdapterList> adapters(manager ? manager->listAdapters() : nullptr);
-    if (!adapters)
-        return;
-    for (Adapter* adapter : *adapters) {
-        if (adapter) // null when the daemon went meanwhile
-            delete adapter->listDevices();
-    }
-}
-
-/// @return how many adapters there are, none of them null; -1 when the daemon is not there
-long countAdapters() {
+/// @return how many adapters there are; -1 when the daemon is not
+long listAll() {
     const std::unique_ptr<Manager> manager(Manager::getManager());
     const std::unique_ptr<AdapterList> adapters(manager ? manager->listAdapters() : nullptr);
     if (!adapters)
         return -1;
-    EXPECT_EQ(std::count(adapters->begin(), adapters->end(), nullptr), 0);
-    return static_cast<long>(adapters->size());
+    long count = 0;
+    for (Adapter* adapter : *adapters) {
+        if (adapter) { // null when the daemon went meanwhile
+            delete adapter->listDevices();
+            ++count;
+        }
+    }
+    return count;
 }
 
 /// Asks the scanner service. @return how many devices it has found; -1 without an answer
@@ -87,15 +82,6 @@ private:
     std::thread m_thread;
 };
 
-Recorder<std::string>& found() {
-    static Recorder<std::string> recorder;
-    return recorder;
-}
-
-void onFound(RemoteObject*, const char* address, const Dict*) {
-    found().add(address);
-}
-
 } // namespace
 
 /// The simulated daemon, a session bus, and the scanner service in its own process.
@@ -110,10 +96,10 @@ protected:
         for (int round = 0; round < rounds; ++round) {
             simulation.control("DropName");
             ASSERT_FALSE(BluezObject::hasBluetoothd());
-            ASSERT_EQ(countAdapters(), -1);
+            ASSERT_EQ(listAll(), -1);
             simulation.control("RegainName");
             ASSERT_TRUE(BluezObject::hasBluetoothd());
-            ASSERT_EQ(countAdapters(), 2);
+            ASSERT_EQ(listAll(), 2);
             log.take();
         }
     }
@@ -126,7 +112,7 @@ protected:
 };
 
 TEST_F(DaemonLossTest, ListsAndTheScannerSurviveADaemonThatComesAndGoes) {
-    const Meanwhile listing(listAll);
+    const Meanwhile listing([] { listAll(); });
     const Meanwhile asking([] { scan(); });
     dropAndRegain(20);
     const Holdings before;
@@ -144,10 +130,10 @@ TEST_F(DaemonLossTest, TheLossOfTheBusEndsAScanWithErrors) {
     const std::unique_ptr<Manager> manager(Manager::getManager());
     const std::unique_ptr<Adapter> adapter(manager->findAdapter("hci0"));
     ASSERT_TRUE(adapter);
-    ASSERT_EQ(adapter->setDeviceFoundHandler(onFound), 0);
+    ASSERT_EQ(adapter->setDeviceFoundHandler(onDict), 0);
     const ReceiveLoop running(*manager);
     ASSERT_EQ(adapter->startDiscovery(), 0);
-    ASSERT_TRUE(found().waitFor(1));
+    ASSERT_TRUE(seen().waitFor(1));
     ASSERT_TRUE(scanUntilFound());
     log.take();
 

@@ -127,22 +127,18 @@ TEST_F(RestartTest, ADaemonThatDoesNotStartIsAFailureWhateverItReturns) {
 }
 
 TEST(AddressFromPathTest, TakesAllThatFollowsTheDevice) {
-    const struct {
-        const char* path;
-        const char* address;
-    } cases[] = {
+    const std::pair<const char*, const char*> cases[] = {
         {"/org/bluez/1234/hci0/dev_00_11_22_33_44_55", "00:11:22:33:44:55"},
         {"/dev_AA_BB/service_1", "AA:BB/service:1"},
         {"/dev_1/dev_2", "1/dev:2"},
         {"dev_", ""},
-    };
-    for (const auto& testCase : cases) {
-        char* const address = getAddressFromPath(testCase.path);
-        EXPECT_STREQ(address, testCase.address);
-        free(address);
+        {"/org/bluez/1234/hci0", nullptr},
+        {nullptr, nullptr}};
+    for (const auto& [path, address] : cases) {
+        char* const found = getAddressFromPath(path);
+        EXPECT_STREQ(found, address);
+        free(found);
     }
-    EXPECT_EQ(getAddressFromPath("/org/bluez/1234/hci0"), nullptr);
-    EXPECT_EQ(getAddressFromPath(nullptr), nullptr);
 }
 
 } // namespace Bluetooth::Test

@@ -115,32 +115,28 @@ TEST_F(FifoTest, ReadErrorsAreLogged) {
     EXPECT_STREQ(buffer, "te");
 }
 
-TEST_F(FifoTest, CommandsAreWrittenWithoutAnyEnd) {
-    const PipeReader reader(commandPipe);
+TEST_F(FifoTest, CommandsAreWrittenWithoutAnyEndToWhateverStandsThere) {
     const AutoConnect autoConnect;
-    EXPECT_TRUE(autoConnect.reload());
-    EXPECT_TRUE(autoConnect.pause());
-    EXPECT_TRUE(autoConnect.reload());
-    EXPECT_TRUE(autoConnect.resume());
-    EXPECT_TRUE(autoConnect.sendCommand("x"));
-    EXPECT_FALSE(autoConnect.sendCommand(nullptr));
-    EXPECT_EQ(reader.take(), "1pause1resumex");
-    EXPECT_EQ(log.take(), Texts());
-}
-
-TEST_F(FifoTest, CommandWithoutAReaderFailsWithOneLineAndLeavesThePipe) {
     const mode_t mask = umask(0);
-    EXPECT_FALSE(AutoConnect().reload());
+    EXPECT_FALSE(autoConnect.reload()) << "nobody reads it";
     umask(mask);
     EXPECT_EQ(log.take(), Texts{"fifo.cpp Error opening the named file "
                                 "/tmp/kes_bluetooth_autoconnect, errno is 6."});
-    EXPECT_EQ(modeOf(commandPipe), static_cast<mode_t>(S_IFIFO | 0666));
-}
+    EXPECT_EQ(modeOf(commandPipe), static_cast<mode_t>(S_IFIFO | 0666)) << "but it stays";
 
-TEST_F(FifoTest, CommandIsWrittenIntoAnOrdinaryFileThatStandsThere) {
+    const PipeReader reader(commandPipe);
+    EXPECT_TRUE(autoConnect.reload());
+    EXPECT_TRUE(autoConnect.pause());
+    EXPECT_TRUE(autoConnect.resume());
+    EXPECT_TRUE(autoConnect.sendCommand("x"));
+    EXPECT_FALSE(autoConnect.sendCommand(nullptr));
+    EXPECT_EQ(reader.take(), "1pauseresumex");
+
+    std::filesystem::remove(commandPipe);
     writeFile(commandPipe, "old text");
-    EXPECT_TRUE(AutoConnect().pause());
+    EXPECT_TRUE(autoConnect.pause());
     EXPECT_EQ(readFile(commandPipe), "pauseext");
+    EXPECT_EQ(log.take(), Texts());
 }
 
 } // namespace Bluetooth::Test

@@ -74,18 +74,15 @@ TEST(ProcessTest, ArgumentsReachTheProgramAsTheyAreWithoutAShell) {
 }
 
 TEST(ProcessTest, AProgramThatCannotBeStartedIsSeen) {
-    const struct {
-        const char* program;
-        int error;
-    } cases[] = {
-        {"/nowhere/hciconfig", ENOENT}, {"/etc/passwd", EACCES}, {"/", EACCES}, {nullptr, EINVAL}};
-    for (const auto& testCase : cases) {
+    for (const auto& [program, error] :
+         {std::pair("/nowhere/hciconfig", ENOENT), std::pair("/etc/passwd", EACCES),
+          std::pair("/", EACCES), std::pair(static_cast<const char*>(nullptr), EINVAL)}) {
         errno = 0;
-        EXPECT_EQ(ProcessReader::open(testCase.program, {"-a"}), nullptr);
-        EXPECT_EQ(errno, testCase.error) << testCase.program;
+        EXPECT_EQ(ProcessReader::open(program, {"-a"}), nullptr);
+        EXPECT_EQ(errno, error) << program;
         errno = 0;
-        EXPECT_EQ(runProcess(testCase.program, {}), -1);
-        EXPECT_EQ(errno, testCase.error) << testCase.program;
+        EXPECT_EQ(runProcess(program, {}), -1);
+        EXPECT_EQ(errno, error) << program;
     }
     EXPECT_TRUE(hasNoChild());
 }
