@@ -8,7 +8,9 @@ options=(-DKESBLUETOOTH_BUILD_TESTS=ON -DKESBLUETOOTH_SANITIZE=)
 if [ "${1:-}" = --sanitize ]; then
     [ $# -ge 2 ] || { echo "usage: check.sh [--sanitize KIND] [ctest option...]" >&2; exit 2; }
     folder=$root/build-${2//,/-}
-    options=(-DKESBLUETOOTH_BUILD_TESTS=ON -DKESBLUETOOTH_SANITIZE="$2")
+    # Optimised as little as the sanitizers advise, which halves the time to compile.
+    options=(-DKESBLUETOOTH_BUILD_TESTS=ON -DKESBLUETOOTH_SANITIZE="$2"
+        -DCMAKE_CXX_FLAGS_RELWITHDEBINFO="-O1 -g1")
     shift 2
 fi
 

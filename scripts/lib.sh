@@ -41,7 +41,9 @@ build() {
     local folder=$1 log
     shift
     log=$(mktemp)
+    # What was compiled in one build folder is not compiled again in another.
     local launcher=()
+    export CCACHE_BASEDIR=$root CCACHE_NOHASHDIR=1
     command -v ccache >/dev/null && launcher=(-DCMAKE_CXX_COMPILER_LAUNCHER=ccache)
     if ! { cmake -S "$root" -B "$folder" -G Ninja "${launcher[@]}" "$@" && cmake --build "$folder" --target "$build_target"; } >"$log" 2>&1; then
         cat "$log" >&2
