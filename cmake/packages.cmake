@@ -70,4 +70,9 @@ kesbluetooth_package(sim bluez4-sim devel "dbus-daemon | dbus, libglib2.0-bin"
 what to do, so that Bluetooth programs can be tried and tested without hardware.")
 set(CPACK_DEBIAN_SIM_PACKAGE_RECOMMENDS "kesbt, kesbt-scannerd, kesbt-autoconnectd")
 
+# The library makes the last folder of its lists, not those above.
+if(CMAKE_INSTALL_PREFIX STREQUAL /usr)
+    install(DIRECTORY DESTINATION /etc/bluetooth COMPONENT runtime)
+endif()
+
 include(CPack)

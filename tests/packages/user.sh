@@ -36,7 +36,12 @@ install "$(package libkesbluetooth-dev)" "$(package libkesbluetooth-doc)" libblu
 man kesbluetooth | grep -q Manager || fail "no manual page of the library"
 [ -s /usr/share/doc/libkesbluetooth-doc/html/index.html ] || fail "no reference"
 cp -r /usr/share/doc/libkesbluetooth-doc/examples /tmp/examples
-./run.sh /tmp/examples
+cmake -S /tmp/examples -B /tmp/by-cmake >make.log && cmake --build /tmp/by-cmake >>make.log ||
+    { cat make.log >&2; fail "the examples cannot be built with CMake"; }
+make -C /tmp/examples >make.log || fail "the examples cannot be built with pkg-config"
+for folder in /tmp/by-cmake /tmp/examples; do
+    KESBLUETOOTH_TEST_NAMESPACE=1 ./run.sh "$folder" >/dev/null
+done
 
 say "The first program"
 sed -n '/^```cpp$/,/^```$/{/^```/!p}' README.md >first.cpp
