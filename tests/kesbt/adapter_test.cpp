@@ -76,11 +76,12 @@ TEST_F(AdapterVerbs, NamesFromOutsideCannotControlTheTerminal) {
 TEST_F(AdapterVerbs, ColoursAreForTerminalsOnlyAndNoColorEndsThem) {
     const auto onTerminal = [](const std::string& environment) {
         return runCommand({"env", "TERM=xterm", environment, "script", "-qec",
-                           std::string(KESBT) + " adapters", "/dev/null"})
+                           KESBT " adapters; " KESBT " wait found 00:11:22:33:44:01", "/dev/null"})
             .out;
     };
     EXPECT_NE(onTerminal("X=").find("\033["), std::string::npos);
-    EXPECT_NE(onTerminal("NO_COLOR=").find("\033["), std::string::npos); // not empty, to count
+    EXPECT_NE(onTerminal("X=").find("Waiting until"), std::string::npos); // and only there
+    EXPECT_NE(onTerminal("NO_COLOR=").find("\033["), std::string::npos);  // not empty, to count
     EXPECT_EQ(onTerminal("NO_COLOR=1").find("\033["), std::string::npos);
     EXPECT_EQ(onTerminal("TERM=dumb").find("\033["), std::string::npos);
     EXPECT_EQ(run({"adapters"}).out.find("\033["), std::string::npos);

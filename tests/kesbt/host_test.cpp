@@ -94,8 +94,11 @@ TEST_F(HostVerbs, ARestartedDaemonHasToComeToTheBus) {
         const std::string copy = "/usr/sbin/bluetoothd-program"; // told by its executable's name
         std::filesystem::remove(copy);
         std::filesystem::copy_file(program, copy);
-        std::ofstream("/usr/sbin/bluetoothd") << "#!/bin/sh\n"
-                                              << copy << arguments << " >/dev/null 2>&1 &\n";
+        // It returns once the program runs, as a daemon that puts itself into the background does.
+        std::ofstream("/usr/sbin/bluetoothd")
+            << "#!/bin/sh\n"
+            << copy << arguments << " >/dev/null 2>&1 &\n"
+            << "until readlink /proc/$!/exe | grep -q bluetoothd; do :; done\n";
         std::filesystem::permissions("/usr/sbin/bluetoothd", std::filesystem::perms::owner_all);
     };
     std::ofstream("/tmp/bluetooth.info_hci0");

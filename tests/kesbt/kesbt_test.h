@@ -67,7 +67,7 @@ protected:
     void setTimeScale(double scale);
     /// Waits until the daemon has received that many calls of a method.
     void awaitCall(const std::string& member, std::size_t count = 1);
-    std::size_t calls(const std::string& member) const;
+    std::size_t calls(const std::string& member);
     Json adapterProperties() const { return run({"adapter", "--json"}).json()["properties"]; }
 
     PrivateBus bus{PrivateBus::Kind::System};

@@ -146,8 +146,9 @@ TEST_F(Streams, WaitEndsWhenItIsSoAndFailsWhenTimeIsOver) {
     run({"adapter", "set", "Powered", "off"});
     expectEnd(*searching, 1,
               "hci0 was switched off; switch it on: kesbt adapter set Powered true\n");
+    const std::size_t read = calls("GetProperties");
     const auto pulledOut = start({"wait", "powered"});
-    awaitCall("GetProperties", calls("GetProperties") + 1);
+    awaitCall("GetProperties", read + 1);
     control("RemoveAdapter", [](Writer& w) { w("hci0"); });
     expectEnd(*pulledOut, 1, "hci0 was removed; plug it in and repeat the command\n");
 }

@@ -61,7 +61,7 @@ TEST(Usage, WithoutASystemBusTheLineSaysSo) {
                                       "try: bluez4-sim -- kesbt adapters\n");
 }
 
-TEST(Usage, WithoutADaemonTheLineSaysSo) {
+TEST(Usage, WithoutADaemonOrWithAnotherTheLineSaysSo) {
     const PrivateBus bus(PrivateBus::Kind::System);
     for (const Arguments& arguments :
          {Arguments{"adapters"}, Arguments{"adapter", "set", "Powered", "on"}, Arguments{"devices"},
@@ -72,6 +72,16 @@ TEST(Usage, WithoutADaemonTheLineSaysSo) {
           Arguments{"autoconnect", "targets"}})
         EXPECT_EQ(failure(arguments), absentDaemon);
     EXPECT_EQ(run({"names"}).out.substr(0, 21), "org.freedesktop.DBus\n");
+
+    RawPeer newer(bus.address(), "org.bluez");
+    for (const char* method : {"DefaultAdapter", "ListAdapters"})
+        newer.replyError(method, DBUS_ERROR_UNKNOWN_METHOD,
+                         "Method \"DefaultAdapter\" with signature \"\" on interface "
+                         "\"org.bluez.Manager\" doesn't exist\n");
+    for (const char* verb : {"adapters", "devices"})
+        EXPECT_EQ(failure({verb}),
+                  "the bluetoothd on the system bus is not one of BlueZ 4; install "
+                  "that, or try: bluez4-sim -- kesbt adapters\n");
 }
 
 TEST(Usage, TheSimulatedDaemonRunsItAndPassesItsStatusOn) {

@@ -52,6 +52,11 @@ const char* adviceFor(const std::string& reason) {
     return nullptr;
 }
 
+/// Whether the daemon has no such object (any more).
+bool lacks(const std::string& reason, const std::string& interface) {
+    return reason.find('"' + interface + "\" doesn't exist") != std::string::npos;
+}
+
 /// The daemon ends some of its texts with a line break, and libdbus's are long.
 std::string firstSentence(std::string text) {
     text = text.substr(0, text.find('\n'));
@@ -89,10 +94,17 @@ Failure adapterOff(const std::string& adapter) {
 
 Failure refusal(const std::string& what, Bluetooth::RemoteObject& proxy) {
     const std::string reason = proxy.getErrorMessage();
+    if (lacks(reason, "org.bluez.Adapter"))
+        return adapterRemoved(lastComponent(proxy.getPath()));
     return Bluetooth::BluezObject::hasBluetoothd() ? refusal(what, reason) : daemonAbsent();
 }
 
 Failure refusal(const std::string& what, const std::string& reason) {
+    // BlueZ 5 has the same bus name and other objects.
+    if (lacks(reason, "org.bluez.Manager"))
+        return Failure(std::string("the bluetoothd on the system bus is not one of BlueZ 4; "
+                                   "install that, ") +
+                       trySimulation);
     const char* advice = adviceFor(reason);
     std::string line = what;
     if (!reason.empty())

@@ -6,6 +6,7 @@
 #include "base/uuid.h"
 
 #include <sys/time.h>
+#include <unistd.h>
 
 #include <cerrno>
 #include <cstdio>
@@ -90,6 +91,11 @@ void printDocument(const Json& document) {
 void printEvent(const Json& event) {
     std::cout << event.dump(-1, ' ', false, Json::error_handler_t::replace) << '\n';
     flushOutput();
+}
+
+void printHint(const std::string& text) {
+    if (isatty(STDOUT_FILENO) != 0 && isatty(STDERR_FILENO) != 0)
+        std::cerr << text << '\n';
 }
 
 void flushOutput() {

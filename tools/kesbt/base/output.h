@@ -24,6 +24,8 @@ std::string field(const Json& properties, const char* name);
 void printDocument(const Json& document);
 /// Writes one event of a stream on a line of its own, at once.
 void printEvent(const Json& event);
+/// Tells a user at a terminal, on standard error, what is waited for; programs get nothing.
+void printHint(const std::string& text);
 /// Writes what is buffered. A Failure when it cannot be written.
 void flushOutput();
 

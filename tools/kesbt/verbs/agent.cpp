@@ -47,6 +47,19 @@ void registerAgent(const Options& options, Bluetooth::Adapter& adapter, const Sh
         printLine("Agent registered on " + name + ", waiting for requests (Ctrl-C ends it)");
 }
 
+void answerRequests(DBusConnection* connection) {
+    dbus_connection_read_write(connection, 0);
+    while (dbus_connection_dispatch(connection) == DBUS_DISPATCH_DATA_REMAINS) {
+    }
+}
+
+bool hasDaemonGone(BusFeed& daemon) {
+    bool hasGone = false;
+    for (Signal signal; daemon.next(signal);)
+        hasGone = hasGone || BusFeed::isDaemonGone(signal);
+    return hasGone;
+}
+
 /// Answers requests until the user interrupts. The library's receive thread does not run here: it
 /// would drop them.
 void serve(DBusConnection* connection, const ShownAgent& agent, BusFeed& daemon,
@@ -55,15 +68,18 @@ void serve(DBusConnection* connection, const ShownAgent& agent, BusFeed& daemon,
         int fd = -1;
         dbus_connection_get_unix_fd(connection, &fd);
         waitForInput({fd, daemon.fd(), interrupt.fd()});
-        dbus_connection_read_write(connection, 0);
-        while (dbus_connection_dispatch(connection) == DBUS_DISPATCH_DATA_REMAINS) {
-        }
-        for (Signal signal; daemon.next(signal);) {
-            if (BusFeed::isDaemonGone(signal))
-                throw daemonLost();
+        answerRequests(connection);
+        const bool hasGone = hasDaemonGone(daemon);
+        if (hasGone) {
+            // What it asked last comes on the other connection, and is there after any answer of
+            // the bus.
+            Bluetooth::BluezObject::hasBluetoothd();
+            answerRequests(connection);
         }
         if (agent.isReleased())
             throw Failure("bluetoothd has released the agent; register it again: kesbt agent");
+        if (hasGone)
+            throw daemonLost();
     }
 }
 

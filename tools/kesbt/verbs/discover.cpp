@@ -86,6 +86,7 @@ void discover(const Options& options, double seconds) {
     const auto deadline =
         seconds > 0 ? Clock::now() + std::chrono::milliseconds(static_cast<long>(seconds * 1000))
                     : Clock::time_point::max();
+    printHint("Searching on " + name + " (Ctrl-C ends it)");
     watch(options, *adapter, daemon, interrupt, deadline);
     ask(options, "cannot stop the discovery on " + name, *adapter, "StopDiscovery");
 }

@@ -95,6 +95,8 @@ void list(const Options& options) {
         printDocument(document);
         return;
     }
+    if (devices.empty())
+        printHint("The scan has found no new device yet; ask again in a few seconds");
     Table table({"ADDRESS", "RSSI", "CLASS", "NAME"});
     for (const auto& [address, properties] : devices)
         table.add({{address, Colour::Bold},
@@ -111,6 +113,7 @@ void watch(const Options& options) {
     Interrupt interrupt;
     const std::string adapter = adapterName(*openAdapter(options));
     std::string owner = serviceOwner();
+    printHint("Watching the shared scan on " + adapter + " (Ctrl-C ends it)");
     Scanner scanner;
     DeviceWatch watch(options.json);
     Clock::time_point complete = Clock::now();

@@ -29,7 +29,11 @@ void await(const Options& options, BusFeed& feed, const Bluetooth::Adapter& adap
     Interrupt interrupt;
     const auto deadline =
         options.limited ? Clock::now() + options.timeLimit() : Clock::time_point::max();
+    bool isTold = false;
     while (!goal.isReached()) {
+        if (!isTold)
+            printHint("Waiting until " + goal.subject + " is " + goal.name + " (Ctrl-C ends it)");
+        isTold = true;
         if (interrupt.came())
             throw Failure("interrupted before " + goal.subject + " was " + goal.name +
                           "; repeat the command to go on waiting");
