@@ -8,6 +8,7 @@
 
 #include <limits>
 #include <memory>
+#include <tuple>
 
 namespace Bluetooth::Test {
 
@@ -85,33 +86,26 @@ TEST(CodecTest, ValuesAreFoundByExactNameTheFirstFirst) {
 }
 
 TEST(CodecTest, EntriesAreSplitAtTheFirstColonAndTrimmed) {
-    const struct {
-        const char* item;
-        const char* name;
-        const char* value;
-    } cases[] = {{"k: v: w", "k", "v: w"},
-                 {":v", "", "v"},
-                 {"z:", "z", ""},
-                 {" \t\n\v\f\r a b \t: \v 1 2 \r\n", "a b", "1 2"},
-                 {":", "", ""},
-                 {"n: -60", "n", "-60"}};
-    for (const auto& given : cases) {
-        const std::unique_ptr<DictEntry> entry(stringToEntry(given.item));
-        ASSERT_TRUE(entry) << given.item;
-        EXPECT_EQ(entry->first, given.name);
+    const std::tuple<const char*, const char*, const char*> cases[] = {
+        {"k: v: w", "k", "v: w"},
+        {":v", "", "v"},
+        {"z:", "z", ""},
+        {" \t\n\v\f\r a b \t: \v 1 2 \r\n", "a b", "1 2"},
+        {":", "", ""},
+        {"n: -60", "n", "-60"}};
+    for (const auto& [item, name, value] : cases) {
+        const std::unique_ptr<DictEntry> entry(stringToEntry(item));
+        ASSERT_TRUE(entry) << item;
+        EXPECT_EQ(entry->first, name);
         ASSERT_EQ(entry->second.which(), 3);
-        EXPECT_EQ(boost::get<std::string>(entry->second), given.value);
+        EXPECT_EQ(boost::get<std::string>(entry->second), value);
     }
     EXPECT_EQ(stringToEntry("nocolon"), nullptr);
     EXPECT_EQ(stringToEntry(""), nullptr);
 }
 
 TEST(CodecTest, OnlyTerminatedItemsWithAColonAreParsed) {
-    const struct {
-        const char* input;
-        const char* separators;
-        const char* result;
-    } cases[] = {
+    const std::tuple<const char*, const char*, const char*> cases[] = {
         {"a: 1;b: 2", ";", "a=1;"},
         {"a: 1", ";", "null"},
         {";;", ";", "null"},
@@ -122,8 +116,8 @@ TEST(CodecTest, OnlyTerminatedItemsWithAColonAreParsed) {
         {"a: 1\nb: 2;c: 3|", ";\n", "a=1;b=2;"},
         {";a:1;;a:2;", ";", "a=1;a=2;"},
     };
-    for (const auto& given : cases)
-        EXPECT_EQ(parsed(given.input, given.separators), given.result) << given.input;
+    for (const auto& [input, separators, result] : cases)
+        EXPECT_EQ(parsed(input, separators), result) << input;
     const std::string withNul("a: \0x;", 6);
     EXPECT_EQ(parsed(withNul, ";"), std::string("a=\0x;", 5));
 }

@@ -54,10 +54,7 @@ TEST_F(HciVersionTest, AToolThatCannotBeStartedIsLoggedAndTheEntryIsMissing) {
 }
 
 TEST_F(HciVersionTest, TheFirstVersionLineCounts) {
-    const struct {
-        const char* script;
-        const char* version;
-    } cases[] = {
+    const std::pair<const char*, const char*> cases[] = {
         {"printf '%s:\\tType: Primary\\n\\tHCI Version: %s-of-%s-%s (0x4)  Revision: 0x1\\n' $1 "
          "2.1 $1 $2",
          "2.1-of-hci0--a"},
@@ -78,10 +75,9 @@ TEST_F(HciVersionTest, TheFirstVersionLineCounts) {
          "printf '\\tHCI Version: 5.6\\n'",
          "5.6"},
     };
-    for (const auto& given : cases) {
-        install(given.script);
-        EXPECT_EQ(properties(), std::string("Name: office;HCIVersion: ") + given.version + ";")
-            << given.script;
+    for (const auto& [script, version] : cases) {
+        install(script);
+        EXPECT_EQ(properties(), std::string("Name: office;HCIVersion: ") + version + ";") << script;
     }
     EXPECT_EQ(log.take(), Texts{});
 }

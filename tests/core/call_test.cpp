@@ -6,6 +6,7 @@
 #include <bluetooth/connection.h>
 
 #include <limits>
+#include <tuple>
 
 namespace Bluetooth::Test {
 
@@ -55,11 +56,7 @@ TEST_F(CallTest, ArraysAndSignedNumbersAreLeftOutOfTheCallWithSuccessAndAnError)
 TEST_F(CallTest, UnusableArgumentsAreRefusedAndTheCallCanStillBeMade) {
     peer.reply("Take");
     ASSERT_EQ(proxy.newMessage("Take"), 0);
-    const struct {
-        std::function<int()> append;
-        int number;
-        const char* text;
-    } cases[] = {
+    const std::tuple<std::function<int()>, int, const char*> cases[] = {
         {[&] { return proxy.newMessage(nullptr); }, 1, "Parameter is null"},
         {[&] { return proxy.append(static_cast<const char*>(nullptr)); }, 1, "Parameter is null"},
         {[&] { return proxy.append(notUtf8); }, 7, "Failed to append args to message"},
@@ -70,11 +67,11 @@ TEST_F(CallTest, UnusableArgumentsAreRefusedAndTheCallCanStillBeMade) {
          "Failed to append args = iterator"},
         {[&] { return proxy.setReplyMessage(nullptr); }, 2, "Reply message is null"},
     };
-    for (const auto& refused : cases) {
+    for (const auto& [append, number, text] : cases) {
         proxy.resetError();
-        EXPECT_EQ(refused.append(), -1) << refused.text;
-        EXPECT_EQ(proxy.getErrorNumber(), refused.number);
-        EXPECT_EQ(proxy.getErrorMessage(), refused.text);
+        EXPECT_EQ(append(), -1) << text;
+        EXPECT_EQ(proxy.getErrorNumber(), number);
+        EXPECT_EQ(proxy.getErrorMessage(), text);
     }
     // Errors stay until they are reset; the call that was begun is still there.
     EXPECT_EQ(proxy.append(1u), 0);

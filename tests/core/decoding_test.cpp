@@ -5,6 +5,7 @@
 #include <bluetooth/dict_codec.h>
 
 #include <limits>
+#include <tuple>
 
 namespace Bluetooth::Test {
 
@@ -115,11 +116,7 @@ TEST_F(DecodingTest, ATextWhereAPathWasAskedForIsTheServicesError) {
 }
 
 TEST_F(DecodingTest, ListsAreReadFromArraysOfTexts) {
-    const struct {
-        Writer::Build reply;
-        int result;
-        Texts list;
-    } cases[] = {
+    const std::tuple<Writer::Build, int, Texts> cases[] = {
         {[](Writer& w) { w.array("s", [](Writer& a) { a("a")("")("b"); }); }, 0, {"a", "", "b"}},
         {[](Writer& w) { w.array("o", [](Writer& a) { a(Path{"/a"})(Path{"/"}); }); },
          0,
@@ -134,16 +131,16 @@ TEST_F(DecodingTest, ListsAreReadFromArraysOfTexts) {
         {[](Writer& w) { w("a"); }, -1, {"before"}},
         {{}, -1, {"before"}},
     };
-    for (const auto& given : cases) {
+    for (const auto& [reply, result, list] : cases) {
         Texts texts{"before"};
-        hold(given.reply);
-        EXPECT_EQ(readOnce(texts), given.result);
-        EXPECT_EQ(texts, given.list);
-        EXPECT_EQ(readError, given.result == 0 ? noError : wrongType);
+        hold(reply);
+        EXPECT_EQ(readOnce(texts), result);
+        EXPECT_EQ(texts, list);
+        EXPECT_EQ(readError, result == 0 ? noError : wrongType);
         std::vector<ObjectPath> paths{ObjectPath("before")};
-        hold(given.reply);
-        EXPECT_EQ(readOnce(paths), given.result);
-        EXPECT_EQ(Texts(paths.begin(), paths.end()), given.list);
+        hold(reply);
+        EXPECT_EQ(readOnce(paths), result);
+        EXPECT_EQ(Texts(paths.begin(), paths.end()), list);
     }
 }
 

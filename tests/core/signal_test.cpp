@@ -7,6 +7,7 @@
 #include <map>
 #include <memory>
 #include <thread>
+#include <tuple>
 
 namespace Bluetooth::Test {
 
@@ -209,11 +210,7 @@ TEST_F(SignalTest, AProxysSubscriptionsEndWithItAndNoOthers) {
 }
 
 TEST_F(SignalTest, ARefusedSubscriptionIsLoggedAndNotRegistered) {
-    const struct {
-        const char* path;
-        const char* interface;
-        const char* member;
-    } cases[] = {
+    const std::tuple<const char*, const char*, const char*> cases[] = {
         {peerPath, peerInterface, "not a member"},
         {peerPath, peerInterface, ""},
         {peerPath, peerInterface, nullptr},
@@ -222,9 +219,9 @@ TEST_F(SignalTest, ARefusedSubscriptionIsLoggedAndNotRegistered) {
         {"/it's", peerInterface, "Changed"},
         {peerPath, "\xff", "Changed"},
     };
-    for (const auto& bad : cases) {
-        RemoteObject object(peerName, bad.path, bad.interface, busType);
-        EXPECT_EQ(object.setSignalHandlerString(bad.member, onString), -1);
+    for (const auto& [path, interface, member] : cases) {
+        RemoteObject object(peerName, path, interface, busType);
+        EXPECT_EQ(object.setSignalHandlerString(member, onString), -1);
         const Texts lines = log.take();
         ASSERT_EQ(lines.size(), 1u);
         EXPECT_EQ(lines[0].find("remote_object.cpp Match error ("), 0u) << lines[0];

@@ -9,6 +9,7 @@
 #include <limits>
 #include <locale>
 #include <memory>
+#include <tuple>
 
 namespace {
 
@@ -80,21 +81,17 @@ TEST_F(AutoConnectFileTest, MissingFileIsCreatedDisabledAndEmpty) {
 }
 
 TEST_F(AutoConnectFileTest, SetWritesFlagAndListAsGivenAndTellsTheDaemon) {
-    const struct {
-        bool enable;
-        const char* list;
-        const char* content;
-    } cases[] = {
+    const std::tuple<bool, const char*, const char*> cases[] = {
         {true, ",11:22:33:44:55:66,77:88:99:AA:BB:CC", "1,11:22:33:44:55:66,77:88:99:AA:BB:CC"},
         {false, ",11:22:33:44:55:66", "0,11:22:33:44:55:66"},
         {true, "", "1"},
         {true, "11:22", "111:22"}, // no comma is added
     };
-    for (const auto& testCase : cases) {
-        EXPECT_TRUE(config.set(adapter, testCase.enable, testCase.list));
-        EXPECT_EQ(content(), testCase.content);
+    for (const auto& [enable, list, written] : cases) {
+        EXPECT_TRUE(config.set(adapter, enable, list));
+        EXPECT_EQ(content(), written);
         EXPECT_EQ(pipe->take(), "1");
-        EXPECT_EQ(config.getEnable(adapter), testCase.enable);
+        EXPECT_EQ(config.getEnable(adapter), enable);
     }
     EXPECT_EQ(log.take(), Texts());
     pipe.reset(); // without a daemon it succeeds too
@@ -110,23 +107,20 @@ TEST_F(AutoConnectFileTest, EnableIsANumberOtherThanZero) {
         std::string do_grouping() const override { return "\3"; }
     };
     const std::locale before = std::locale::global(std::locale(std::locale(), new Grouping));
-    const struct {
-        std::string content;
-        bool enabled;
-    } cases[] = {{"1,112,A", true},
-                 {"1", true},
-                 {"0,A", false},
-                 {"111:22", true},
-                 {" \n1,A", true},
-                 {"-5,A", true},
-                 {"", false},
-                 {"yes,A", false},
-                 {",A", false},
-                 {"99999999999999,A", false},
-                 {std::string("\0001,A", 4), false}};
-    for (const auto& testCase : cases) {
-        write(testCase.content);
-        EXPECT_EQ(config.getEnable(adapter), testCase.enabled) << testCase.content;
+    const std::pair<std::string, bool> cases[] = {{"1,112,A", true},
+                                                  {"1", true},
+                                                  {"0,A", false},
+                                                  {"111:22", true},
+                                                  {" \n1,A", true},
+                                                  {"-5,A", true},
+                                                  {"", false},
+                                                  {"yes,A", false},
+                                                  {",A", false},
+                                                  {"99999999999999,A", false},
+                                                  {std::string("\0001,A", 4), false}};
+    for (const auto& [text, enabled] : cases) {
+        write(text);
+        EXPECT_EQ(config.getEnable(adapter), enabled) << text;
     }
     EXPECT_TRUE(config.set(adapter, true, ",A"));
     EXPECT_EQ(content(), "1,A");
@@ -135,10 +129,7 @@ TEST_F(AutoConnectFileTest, EnableIsANumberOtherThanZero) {
 }
 
 TEST_F(AutoConnectFileTest, RemoveDeviceDropsExactMatchesOfAnEnabledList) {
-    const struct {
-        std::string before;
-        std::string after;
-    } cases[] = {
+    const std::pair<std::string, std::string> cases[] = {
         {"1,A,B,A", "1,B"},
         {"1,A", "1"},
         {"1,B,a,AA", "1,B,a,AA"},
@@ -148,10 +139,10 @@ TEST_F(AutoConnectFileTest, RemoveDeviceDropsExactMatchesOfAnEnabledList) {
         {std::string("1,A,B\0C,D", 9), std::string("1,B\0C,D", 7)},
         {"1,A\n", "1,A\n"}, // a line end belongs to the last entry
     };
-    for (const auto& testCase : cases) {
-        write(testCase.before);
+    for (const auto& [before, after] : cases) {
+        write(before);
         EXPECT_TRUE(config.removeDevice(adapter, "A"));
-        EXPECT_EQ(content(), testCase.after) << testCase.before;
+        EXPECT_EQ(content(), after) << before;
         EXPECT_EQ(pipe->take(), "1");
     }
     // Disabled, or no flag at all: untouched.
@@ -190,7 +181,7 @@ TEST_F(AutoConnectFileTest, WhatIsNoUsableFileIsRefusedAndKept) {
     expectAllFail("Config '" + file + "' can not be open.");
 
     std::filesystem::remove(file);
-    std::filesystem::create_symlink(STANDIN_DAEMON, file); // on a read-only file system
+    std::filesystem::create_symlink("/real-bin/true", file); // on a read-only file system
     expectAllFail("Config '" + file + "' can not be write/read.");
 
     std::filesystem::remove_all(configFolder);

@@ -8,6 +8,7 @@
 
 #include <memory>
 #include <thread>
+#include <tuple>
 
 namespace Bluetooth::Test {
 
@@ -136,11 +137,7 @@ TEST_F(AutoConnectTest, EntriesThatAreNoAddressArePruned) {
 
 TEST_F(AutoConnectTest, OnlyWhatTheDaemonDeniesIsPruned) {
     const std::string content = "1,"s + headset + "," + carKit;
-    const struct {
-        const char* name;
-        const char* text;
-        bool isPruned;
-    } cases[] = {
+    const std::tuple<const char*, const char*, bool> cases[] = {
         {"org.freedesktop.DBus.Error.NoReply", "Did not receive a reply.", false},
         {"org.freedesktop.DBus.Error.ServiceUnknown",
          "The name org.bluez was not provided by any .service files", false},
@@ -150,13 +147,13 @@ TEST_F(AutoConnectTest, OnlyWhatTheDaemonDeniesIsPruned) {
         {"org.bluez.Error.InvalidArguments", "Invalid arguments in method call", true},
         {"org.bluez.Error.DoesNotExist", "Does Not Exist", true},
     };
-    for (const auto& given : cases) {
+    for (const auto& [name, text, isPruned] : cases) {
         setConfig(adapter0, content);
-        simulation.failNext("org.bluez.Adapter", "FindDevice", given.name, given.text);
-        EXPECT_EQ(listOf(adapter0), Texts{"hci0/02"}) << given.text;
-        EXPECT_EQ(config(adapter0), given.isPruned ? "1,"s + carKit : content) << given.text;
-        EXPECT_EQ(pipe->take(), given.isPruned ? "1" : "") << given.text;
-        EXPECT_EQ(log.take().size(), 1u) << given.text;
+        simulation.failNext("org.bluez.Adapter", "FindDevice", name, text);
+        EXPECT_EQ(listOf(adapter0), Texts{"hci0/02"}) << text;
+        EXPECT_EQ(config(adapter0), isPruned ? "1,"s + carKit : content) << text;
+        EXPECT_EQ(pipe->take(), isPruned ? "1" : "") << text;
+        EXPECT_EQ(log.take().size(), 1u) << text;
     }
 }
 

@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+#include <tuple>
+
 namespace autoconnectd::Test {
 
 namespace {
@@ -17,11 +19,7 @@ std::string feed(CommandSplitter& splitter, std::string_view bytes) {
 } // namespace
 
 TEST(CommandSplitterTest, TellsCommandsApartThatRunTogether) {
-    const struct {
-        std::string bytes;
-        const char* commands;
-        const char* unknown;
-    } cases[] = {
+    const std::tuple<std::string, const char*, const char*> cases[] = {
         {"1", "1", ""},
         {"1pause1", "1p1", ""},
         {"pauseresume11", "pr11", ""},
@@ -35,10 +33,10 @@ TEST(CommandSplitterTest, TellsCommandsApartThatRunTogether) {
         {"pa use1", "1", "pause"}, // a command has no space within
         {"", "", ""},
     };
-    for (const auto& testCase : cases) {
+    for (const auto& [bytes, commands, unknown] : cases) {
         CommandSplitter splitter;
-        EXPECT_EQ(feed(splitter, testCase.bytes), testCase.commands) << testCase.bytes;
-        EXPECT_EQ(splitter.takeUnknown(), testCase.unknown) << testCase.bytes;
+        EXPECT_EQ(feed(splitter, bytes), commands) << bytes;
+        EXPECT_EQ(splitter.takeUnknown(), unknown) << bytes;
         EXPECT_EQ(splitter.takeUnknown(), "");
     }
 }

@@ -82,17 +82,15 @@ TEST_F(FifoTest, FailedWritesAreLoggedAndRaiseNoSignal) {
 }
 
 TEST_F(FifoTest, FailuresToOpenHaveTheirOwnWords) {
-    const struct {
-        const char* path;
-        int error;
-    } cases[] = {{nullptr, EINVAL}, {"", ENOENT}, {"/nowhere/pipe", ENOENT}, {"/tmp", EISDIR}};
-    for (const auto& testCase : cases) {
+    const std::pair<const char*, int> cases[] = {
+        {nullptr, EINVAL}, {"", ENOENT}, {"/nowhere/pipe", ENOENT}, {"/tmp", EISDIR}};
+    for (const auto& [path, error] : cases) {
         errno = 0;
-        EXPECT_EQ(Fifo::getWriteFifo(testCase.path), nullptr);
-        EXPECT_EQ(errno, testCase.error);
-        const std::string shown = testCase.path ? testCase.path : "(null)";
+        EXPECT_EQ(Fifo::getWriteFifo(path), nullptr);
+        EXPECT_EQ(errno, error);
+        const std::string shown = path ? path : "(null)";
         EXPECT_EQ(log.take(), (Texts{"fifo.cpp Error opening the named file " + shown +
-                                         ", errno is " + std::to_string(testCase.error) + ".",
+                                         ", errno is " + std::to_string(error) + ".",
                                      "fifo.cpp Error opening the named file."}));
     }
     for (const char* bad : {static_cast<const char*>(nullptr), "/nowhere/pipe"}) {

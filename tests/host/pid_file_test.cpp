@@ -97,10 +97,7 @@ TEST_F(PidFileTest, AnotherProcessKeepsItsLockAndItsNumber) {
 TEST_F(PidFileTest, EachFailureHasItsOwnLineAndLeavesNothingOpen) {
     const int before = dup(0);
     close(before);
-    const struct {
-        const char* path;
-        std::string message;
-    } cases[] = {
+    const std::pair<const char*, std::string> cases[] = {
         {nullptr, "Could not open PID file (null)"},
         {"/tmp", "Could not open PID file /tmp"},
         {"/nowhere/x.pid", "Could not open PID file /nowhere/x.pid"},
@@ -109,9 +106,9 @@ TEST_F(PidFileTest, EachFailureHasItsOwnLineAndLeavesNothingOpen) {
     };
     writeFile("/small/x.pid", "");
     writeFile("/small/filler", std::string(100000, 'x'));
-    for (const auto& testCase : cases) {
-        EXPECT_EQ(createPidFile(testCase.path, closeOnExec, true), -1);
-        EXPECT_EQ(log.take(), Texts{line(testCase.message.c_str())});
+    for (const auto& [path, message] : cases) {
+        EXPECT_EQ(createPidFile(path, closeOnExec, true), -1);
+        EXPECT_EQ(log.take(), Texts{line(message.c_str())});
     }
     std::filesystem::remove("/small/filler");
     const int after = dup(0);
