@@ -15,8 +15,6 @@ TEST_F(DeviceVerbs, AKnownDeviceIsListedAndShown) {
                       "00:11:22:33:44:06  yes     yes      no         input-mouse  Desk Mouse\n",
                       ""}));
     const Json device = run({"device", mouse, "--json"}).json();
-    EXPECT_EQ(device["address"], mouse);
-    EXPECT_EQ(device["adapter"], "hci0");
     EXPECT_EQ(device["properties"]["Paired"], true);
     EXPECT_EQ(run({"devices", "--json"}).json(), Json::array({device}));
     EXPECT_EQ(run({"--adapter", "hci1", "devices", "--json"}).json(), Json::array());

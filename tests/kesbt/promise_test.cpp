@@ -181,7 +181,7 @@ TEST_F(Promises, JsonHasTheDocumentedMembers) {
     };
     const auto expectEvent = [&document](const std::string& verb, ChildProcess& stream,
                                          const std::string& event) {
-        const Json line = awaitEvent(stream, "event", event);
+        Json line = awaitEvent(stream, "event", event);
         document.expect({"`" + verb + "`", "`" + event + "`"}, line);
         return line;
     };

@@ -17,14 +17,11 @@ TEST_F(ScanVerbs, TwoProgramsShareOneScan) {
     EXPECT_EQ(run({"scan", "stop"}), (Result{0, "No scan is running on hci0\n", ""}));
     const auto watch = start({"scan", "watch", "--json"}); // the bus starts the service
     const Json found = awaitEvent(*watch, "address", gps);
-    EXPECT_EQ(found["event"], "found");
     EXPECT_EQ(found["properties"]["RSSI"], -70);
 
     const Json list = run({"scan", "list", "--json"}).json();
     ASSERT_FALSE(list.empty());
     EXPECT_EQ(list[0]["address"], headset);
-    EXPECT_EQ(list[0]["properties"]["Paired"], false);
-    EXPECT_TRUE(list[0]["properties"]["UUIDs"].is_array());
     EXPECT_NE(run({"scan", "list"}).out.find("00:11:22:33:44:04  -70 dBm  0x001f00  GPS Receiver"),
               std::string::npos);
     EXPECT_EQ(calls("StartDiscovery"), 1U);
@@ -36,8 +33,7 @@ TEST_F(ScanVerbs, TwoProgramsShareOneScan) {
     }
     watch->signal(SIGINT);
     EXPECT_EQ(finish(*watch).status, 0);
-    EXPECT_EQ(run({"scan", "stop", "--json"}).json(),
-              (Json{{"adapter", "hci0"}, {"stopped", true}}));
+    EXPECT_EQ(run({"scan", "stop"}).out, "Stopped the scan on hci0\n");
     awaitCall("StopDiscovery");
 }
 
