@@ -26,6 +26,7 @@ public:
     ~PrivateBus();
 
     const std::string& address() const { return m_address; }
+    pid_t pid() const { return m_pid; }
 
 private:
     std::string m_address;

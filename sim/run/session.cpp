@@ -7,6 +7,7 @@
 #include <glib-unix.h>
 #include <glib/gstdio.h>
 
+#include <algorithm>
 #include <csignal>
 #include <fstream>
 #include <memory>
@@ -95,16 +96,21 @@ public:
     DaemonProcess& operator=(const DaemonProcess&) = delete;
     ~DaemonProcess() { endProcess(m_pid); }
 
+    pid_t pid() const { return m_pid; }
+
 private:
     pid_t m_pid = 0;
 };
 
-/// What the command and the services that it has started left running.
-void endOrphans() {
+/// Ends what the command left running, and the services that the buses started.
+/// @param ours  helpers, which stay
+void endOrphans(const std::vector<pid_t>& ours) {
     std::ifstream children("/proc/self/task/" + std::to_string(getpid()) + "/children");
     pid_t child = 0;
-    while (children >> child)
-        endProcess(child);
+    while (children >> child) {
+        if (std::find(ours.begin(), ours.end(), child) == ours.end())
+            endProcess(child);
+    }
 }
 
 /// Passes the signals that ask us to stop on to the command, so that it ends first and we clean up.
@@ -230,8 +236,10 @@ int runSession(const Options& options) {
                                                  "DBUS_SESSION_BUS_ADDRESS=" + session.address(),
                                                  "DBUS_STARTER_ADDRESS", "DBUS_STARTER_BUS_TYPE"});
         status = runCommand(options.command, forCommand, relay);
+        // Before the buses, whose loss they would report.
+        endOrphans({system.pid(), session.pid(), daemon ? daemon->pid() : 0});
     }
-    endOrphans();
+    endOrphans({}); // started meanwhile
     return status;
 }
 
