@@ -52,7 +52,7 @@ int serveInForeground(const Options& options) {
     g_unix_signal_add(SIGINT, quit, loop);
 
     bool busLost = false;
-    {
+    try {
         Control control(world, systemBusAddress(), options.verbose);
         control.watchQuit([loop] { g_main_loop_quit(loop); });
         control.daemon().watchBus([&] {
@@ -64,6 +64,9 @@ int serveInForeground(const Options& options) {
         g_main_loop_run(loop);
         if (control.daemon().running() && !busLost)
             control.daemon().stop();
+    } catch (const std::exception& reason) { // most users do not want the machine's bus
+        throw std::runtime_error(std::string(reason.what()) +
+                                 "; or give it buses of its own: bluez4-sim -- COMMAND");
     }
     g_main_loop_unref(loop);
     if (busLost)
