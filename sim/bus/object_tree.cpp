@@ -1,7 +1,5 @@
 #include "bus/object_tree.h"
 
-#include <algorithm>
-
 namespace Bluetooth::Sim {
 
 namespace {
@@ -24,16 +22,6 @@ void ObjectTree::add(const std::string& path, const Interface& interface, void* 
 
 void ObjectTree::remove(const std::string& path) {
     m_objects.erase(path);
-}
-
-void ObjectTree::remove(const std::string& path, const Interface& interface) {
-    const auto object = m_objects.find(path);
-    if (object == m_objects.end())
-        return;
-    auto& served = object->second;
-    served.erase(std::remove_if(served.begin(), served.end(),
-                                [&](const Served& entry) { return entry.interface == &interface; }),
-                 served.end());
 }
 
 void ObjectTree::dispatch(const CallPtr& call) const {

@@ -21,7 +21,6 @@ public:
     /// An object that serves nothing: it exists, but has no methods.
     void add(const std::string& path) { m_objects[path]; }
     void remove(const std::string& path);
-    void remove(const std::string& path, const Interface& interface);
 
     void dispatch(const CallPtr& call) const;
 

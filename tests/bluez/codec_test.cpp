@@ -57,6 +57,7 @@ TEST(CodecTest, EveryAlternativeHasItsTextAndOnlyABooleanIsABoolean) {
         EXPECT_EQ(variantToString(value), written);
         EXPECT_EQ(variantToBool(value), value == Variant(true));
     }
+    EXPECT_EQ(stringArrayToString({"", "a, b"}), "[, a, b]");
 }
 
 TEST(CodecTest, DictionariesAreFormattedWithATerminatorAfterEachEntry) {

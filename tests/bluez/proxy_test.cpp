@@ -176,6 +176,7 @@ TEST_F(ProxyTest, UnusableArgumentsAreLoggedAndNothingIsSent) {
 }
 
 TEST_F(ProxyTest, DictionariesAreGivenWholeOrNotAtAll) {
+    const std::string longText(2000, 'x'); // is logged whole
     const struct {
         std::string place;
         std::string method;
@@ -207,13 +208,13 @@ TEST_F(ProxyTest, DictionariesAreGivenWholeOrNotAtAll) {
         EXPECT_EQ(ask(), nullptr);
         daemon.reply(method, [](Writer& w) { w("text"); });
         EXPECT_EQ(ask(), nullptr);
-        daemon.replyError(method, "org.bluez.Error.NotReady", "Resource Not Ready");
+        daemon.replyError(method, "org.bluez.Error.NotReady", longText.c_str());
         EXPECT_EQ(ask(), nullptr);
         EXPECT_EQ(log.take(), (Texts{place + "Invalid reply value", place + "Invalid reply format",
-                                     place + "Resource Not Ready"}));
+                                     place + longText}));
         daemon.forgetCalls();
     }
-    EXPECT_EQ(device.getErrorMessage(), "Resource Not Ready"); // left for the caller to read
+    EXPECT_EQ(device.getErrorMessage(), longText); // left for the caller to read
 }
 
 TEST_F(ProxyTest, AnIndexPastTheEndMeansTheDefaultAdapterButNoDevice) {

@@ -111,7 +111,8 @@ TEST_F(DecodingTest, ATextWhereAPathWasAskedForIsTheServicesError) {
     hold([](Writer& w) { w(true); });
     EXPECT_EQ(proxy.getReplyValue(path), -1);
     EXPECT_EQ(proxy.getErrorMessage(), "older text");
-    hold({}); // the proxy's destructor releases what is left
+    hold({});
+    hold({}); // takes the place of the one before; the proxy's destructor releases this
     EXPECT_EQ(proxy.newMessage("Unsent"), 0);
 }
 

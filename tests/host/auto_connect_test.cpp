@@ -92,6 +92,10 @@ TEST_F(AutoConnectTest, FailuresOfGetDeviceListAreLogged) {
     EXPECT_EQ(targets(), Texts());
     EXPECT_EQ(log.take(), Texts(2, line("Config '" + file + "' is too large.")));
 
+    simulation.failNext("org.bluez.Manager", "ListAdapters", "org.bluez.Error.Failed", "Broken");
+    EXPECT_EQ(targets(), Texts{"no list"});
+    EXPECT_EQ(log.take(), Texts{line("Failed to get adapter list")});
+
     simulation.control("DropName");
     EXPECT_EQ(listOf(adapter0), Texts{"no list"});
     EXPECT_EQ(targets(), Texts{"no list"});

@@ -34,6 +34,13 @@ class Daemon {
 public:
     explicit Daemon(const std::string& arguments = "--interval 1 --max-interval 1")
         : m_process(commandLine("--foreground " + arguments), ChildProcess::Output::Capture) {}
+    ~Daemon() {
+        if (!m_process.hasEnded()) {
+            EXPECT_EQ(stop(), 0);
+        }
+    }
+    Daemon(const Daemon&) = delete;
+    Daemon& operator=(const Daemon&) = delete;
 
     /// @return whether the line has come; lines before it are passed over
     bool waitFor(const std::string& text, Milliseconds limit = patience) {

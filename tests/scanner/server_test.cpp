@@ -84,6 +84,13 @@ TEST_F(ServerTest, FrameTellsAboutTheBus) {
     frame.startLoop(); // returns: it is no scanner server
     EXPECT_EQ(updateTimer(&frame), 1);
     EXPECT_TRUE(log.take().empty());
+    // libdbus would end the process on these.
+    for (const auto& [name, path] : {std::pair("no name", "/"), std::pair("com.example.X", "x")}) {
+        ServerObject unusable(name, path, DBUS_BUS_SESSION);
+        EXPECT_FALSE(unusable.prepareObjectInfo(G_TYPE_OBJECT, nullptr, nullptr));
+        EXPECT_EQ(log.take(), Texts{std::string("server_object.cpp Failed to acquire ") + name +
+                                    ", Invalid name or path"});
+    }
 }
 
 TEST_F(ServerTest, OnlyReachingZeroEndsTheLoop) {

@@ -38,6 +38,25 @@ TEST_F(ControlTest, CallsAreRecordedInOrder) {
               "('/', 'org.bluez.Manager', 'FindAdapter', [<'hci1'>])]");
 }
 
+TEST(ScenarioTest, WhatIsSetShowsInTheProperties) {
+    const Simulation simulation(
+        "[Adapter hci0]\nAddress=00:1A:7D:DA:71:10\nClass=256\nPowered=false\n"
+        "Pairable=false\nDiscoverableTimeout=7\nPairableTimeout=8\n"
+        "[Device 00:11:22:33:44:55]\nAdapter=hci0\nPaired=true\n"
+        "Trusted=true\nBlocked=true\nAlias=Mine\n");
+    SimClient client;
+    client.base();
+    const auto expectIn = [](const std::string& properties, const Texts& entries) {
+        for (const std::string& entry : entries)
+            EXPECT_NE(properties.find(entry), std::string::npos) << entry << ": " << properties;
+    };
+    expectIn(client.call("Device.GetProperties"),
+             {"'Paired': <true>", "'Trusted': <true>", "'Blocked': <true>", "'Alias': <'Mine'>"});
+    expectIn(client.call("Adapter.GetProperties"),
+             {"'Powered': <false>", "'Pairable': <false>", "'DiscoverableTimeout': <7>",
+              "'PairableTimeout': <8>"});
+}
+
 TEST_F(ControlTest, WrongSettingsChangeNothing) {
     const auto refused = [&](const std::string& settings) {
         return client->call("com.kestrine.bluetooth.Sim.AddDevice",

@@ -73,6 +73,10 @@ TEST_F(SimDaemonTest, DiscoverableTurnsTheAdapterOnAndEndsByItself) {
         client->trace("Adapter.SetProperty", "('Discoverable', <true>)", "hci0 Class=7209216"),
         lines("hci0 Powered=true", "hci0 Pairable=true", "hci0 Discoverable=true", "reply call",
               "hci0 Class=7217408", "hci0 Discoverable=false", "hci0 Class=7209216"));
+    set("Pairable", "false");
+    set("PairableTimeout", "uint32 2"); // so does Pairable
+    EXPECT_EQ(client->trace("Adapter.SetProperty", "('Pairable', <true>)", "hci0 Pairable=false"),
+              lines("hci0 Pairable=true", "reply call", "hci0 Pairable=false"));
 }
 
 TEST_F(SimDaemonTest, AnAdapterThatIsOffIsNotReadyForTheAir) {
@@ -151,6 +155,8 @@ TEST_F(SimDaemonTest, SessionsPowerTheAdapterWithTheAgentsConsent) {
     EXPECT_EQ(client->call("Adapter.RequestSession"),
               "error AgentNotAvailable: Agent Not Available");
     registerAgent();
+    EXPECT_EQ(client->call("Adapter.RequestSession"), "reply"); // it is on
+    EXPECT_EQ(client->call("Adapter.ReleaseSession"), "reply");
     set("Powered", "false");
     client->agentAnswers("ConfirmModeChange", "!org.bluez.Error.Rejected");
     EXPECT_EQ(client->call("Adapter.RequestSession"), "error Rejected: said no");

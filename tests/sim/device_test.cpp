@@ -122,6 +122,10 @@ TEST_F(DeviceTest, ASearchCanBeCancelledByItsCaller) {
     EXPECT_EQ(client->call("Device.DiscoverServices", "('',)"), "error InProgress: In Progress");
     EXPECT_EQ(client->trace("Device.CancelDiscovery"),
               lines("error search Failed: Operation canceled", "reply call"));
+    client->start("search", "Device.DiscoverServices", "('',)");
+    client->control("DropLink", onAdapter);
+    EXPECT_EQ(client->until("error search").back(),
+              "error search ConnectionAttemptFailed: Host is down");
     set("Powered", "false");
     EXPECT_EQ(client->call("Device.DiscoverServices", "('',)"), "error Failed: No route to host");
 }
@@ -139,11 +143,17 @@ TEST_F(DeviceTest, AudioConnectsWithAllItsInterfacesAndDisconnects) {
     client->control("SetPlaying", "('hci0', '00:11:22:33:44:55', true)");
     EXPECT_EQ(client->taken(),
               lines("phone Playing", "phone Playing=true", "phone State='playing'"));
+    EXPECT_EQ(client->call("AudioSink.IsConnected"), "reply true");
+    EXPECT_EQ(client->call("Control.IsConnected"), "reply true");
+    EXPECT_EQ(client->call("Control.GetProperties"), "reply {'Connected': <true>}");
     EXPECT_EQ(client->call("AudioSink.GetProperties"),
               "reply {'State': <'playing'>, 'Connected': <true>, 'Playing': <true>}");
     EXPECT_EQ(client->trace("Audio.Disconnect").front(), "phone Stopped");
     EXPECT_EQ(client->call("Audio.GetProperties"), "reply {'State': <'disconnected'>}");
     EXPECT_EQ(client->call("Audio.Disconnect"), "error NotConnected: Not Connected");
+    EXPECT_EQ(client->call("AudioSink.Disconnect"), "error NotConnected: Not Connected");
+    EXPECT_EQ(client->call("AudioSink.Connect"), "reply");
+    EXPECT_EQ(client->call("AudioSink.Disconnect"), "reply");
     client->control("SetDevice", "('00:11:22:33:44:55', {'Connectable': <false>})");
     EXPECT_EQ(client->call("Audio.Connect"), "error Failed: Connect Failed");
 }

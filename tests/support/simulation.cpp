@@ -3,6 +3,7 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <csignal>
 #include <fstream>
 
 namespace Bluetooth::Test {
@@ -35,6 +36,11 @@ Simulation::Simulation(const std::string& scenario)
     : m_process(command(scenario), ChildProcess::Output::Capture, {"G_SLICE=always-malloc"}) {
     if (m_process.readLine() != "ready")
         throw std::runtime_error("bluez4-sim does not start: " + m_process.readErrors());
+}
+
+Simulation::~Simulation() {
+    m_process.signal(SIGTERM);
+    m_process.wait();
 }
 
 MessagePtr Simulation::control(const std::string& method, const Build& arguments) {

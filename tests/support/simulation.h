@@ -17,6 +17,10 @@ public:
     /// Returns once the adapters are there.
     /// @param scenario the text of a scenario file; "" for the built-in scenario
     explicit Simulation(const std::string& scenario = "");
+    /// Ends the daemon as it is asked.
+    ~Simulation();
+    Simulation(const Simulation&) = delete;
+    Simulation& operator=(const Simulation&) = delete;
 
     /// Calls the control interface and waits. A failure fails the test.
     MessagePtr control(const std::string& method, const Build& arguments = {});
