@@ -20,6 +20,7 @@ rm -f "$folder"/*.deb
 need_packages debootstrap
 system=$folder/system
 rm -rf --one-file-system "$system"
+
 echo "Making a Debian system in ${system#"$root"/} ..."
 mirror=$(apt-get indextargets --format '$(REPO_URI)' 'Created-By: Packages' 'Codename: bookworm' | head -n 1)
 [ -n "$mirror" ] || die "apt knows no source of Debian 12"
@@ -44,3 +45,4 @@ unshare --mount --pid --fork bash -euc '
         PATH=/usr/local/sbin:/usr/local/bin:/usr/sbin:/usr/bin:/sbin:/bin /packages/user.sh
 ' bash "$system" </dev/null
 rm -rf --one-file-system "$system"
+echo "The packages install, work and go again"
