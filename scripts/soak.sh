@@ -20,7 +20,8 @@ tests=$root/build/tests/soak-tests
     case "$name" in
     *.) suite=$name ;;
     Running*) ;;
-    *) "$tests" --gtest_brief=1 --gtest_filter="$suite$name" </dev/null || exit 1
-        echo "$suite$name holds" ;;
+    *) output=$("$tests" --gtest_filter="$suite$name" 2>&1 </dev/null) ||
+            { printf '%s\n' "$output" >&2; die "$suite$name does not hold, see above"; }
+        echo "$suite$name holds $(grep '^descriptors' <<<"$output" || true)" ;;
     esac
 done

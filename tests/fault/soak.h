@@ -10,6 +10,7 @@
 #include <algorithm>
 #include <cstdlib>
 #include <filesystem>
+#include <iostream>
 #include <iterator>
 
 namespace Bluetooth::Test {
@@ -33,6 +34,8 @@ struct Holdings {
 /// keeps what was freed for a while.
 inline void expectNoGrowth(const Holdings& before) {
     const Holdings now;
+    std::cout << "descriptors " << before.descriptors << " -> " << now.descriptors << ", heap "
+              << before.bytes / 1024 << " -> " << now.bytes / 1024 << " KiB\n";
     EXPECT_EQ(now.descriptors, before.descriptors);
     if (!isSanitized) {
         EXPECT_LT(now.bytes - before.bytes, 256 * 1024);
