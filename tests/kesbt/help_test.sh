@@ -19,6 +19,7 @@ verbs() { sed -nE 's/^  ([a-z][a-z-]*)  +[A-Z].*/\1/p' | sort; }
 
 # What is offered behind these words, the last of which may be begun only.
 source "$completion"
+timeout() { "${@:2}"; } # a busy machine may take longer than a user would wait
 function_name=$(complete -p "$name" | sed -nE 's/.*-F ([^ ]+) .*/\1/p')
 offered() {
     COMP_LINE="$*" COMP_POINT=${#COMP_LINE} COMP_WORDS=("$@") COMP_CWORD=$(($# - 1))
