@@ -140,8 +140,9 @@ TEST_F(SimDaemonTest, SigtermReleasesTheAgentsAndASecondDaemonIsRefused) {
     ChildProcess second({BLUEZ4_SIM}, ChildProcess::Output::Capture);
     EXPECT_EQ(second.wait(), 1);
     EXPECT_EQ(second.readAll(), "");
-    EXPECT_EQ(second.readErrors(), "bluez4-sim: com.kestrine.bluetooth.Sim is already owned on "
-                                   "this bus; stop its owner first\n");
+    EXPECT_EQ(second.readErrors(),
+              "bluez4-sim: com.kestrine.bluetooth.Sim is already owned on this bus; stop its owner "
+              "first; or give it buses of its own: bluez4-sim -- COMMAND\n");
     registerAgent();
     client->taken();
     daemon.signal(SIGTERM);
