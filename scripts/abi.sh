@@ -5,7 +5,9 @@
 source "$(dirname "$0")/lib.sh"
 
 kept=$root/src/kesbluetooth.symbols
-need_packages "${build_packages[@]}" binutils castxml python3
+case "${1:-}" in '' | --update) ;; *) echo "usage: abi.sh [--update]" >&2; exit 2 ;; esac
+# The folder is shared with the tests, and configured for them unless it was otherwise before.
+need_packages "${build_packages[@]}" "${test_packages[@]}" binutils castxml python3
 echo "Building in build ..."
 build_target=kesbluetooth
 build "$root/build"

@@ -10,7 +10,7 @@ die() {
 build_packages=(g++ cmake ninja-build pkg-config dbus libdbus-1-dev libglib2.0-dev
     libdbus-glib-1-dev libbluetooth-dev libboost-dev libcli11-dev nlohmann-json3-dev scdoc)
 test_packages=(libgtest-dev bubblewrap mandoc make)
-lint_packages=(clang-format-14 clang-tidy-14)
+lint_packages=(git clang-format-14 clang-tidy-14)
 docs_packages=(doxygen scdoc)
 bench_packages=(libbenchmark-dev libsdbus-c++-dev python3 util-linux)
 

@@ -3,9 +3,11 @@
 # --layout checks the layout only.
 source "$(dirname "$0")/lib.sh"
 
+case "${1:-}" in '' | --fix | --layout) ;; *) echo "usage: lint.sh [--fix | --layout]" >&2; exit 2 ;; esac
 need_packages "${lint_packages[@]}"
 cd "$root"
 mapfile -t files < <(git ls-files '*.cpp' '*.h')
+[ ${#files[@]} -gt 0 ] || die "git lists no files here; run it in a clone that is yours"
 if [ "${1:-}" = --fix ]; then
     clang-format-14 -i "${files[@]}"
     exit
