@@ -121,4 +121,4 @@ if [ -n "${KES_TOUR_ISOLATED:-}" ]; then
     stop_all
 fi
 
-say "That was the tour; README.md and docs/ tell more"
+say "That was the tour; kesbt --help and the documentation tell more"
