@@ -69,6 +69,8 @@ public:
     /// enabled, in the daemon's order of adapters. Unknown entries are removed as in
     /// getDeviceList().
     /// @return a new list, possibly empty, deleted by the caller; null when the daemon is not there
+    ///
+    /// Blocks for some calls of the daemon for each adapter, and one for each entry.
     DeviceList* getAutoConnectDeviceList();
 
     /// Writes a command to the daemon's pipe, as it stands and without a line end. Never waits.

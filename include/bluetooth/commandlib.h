@@ -46,6 +46,7 @@ KESBLUETOOTH_API int restartBluetoothd();
 /// The address in a device's object path: what follows the first "dev_", with ":" for each "_".
 /// "/org/bluez/1234/hci0/dev_00_11_22_33_44_55" gives "00:11:22:33:44:55"; further components are
 /// kept.
+/// @param path may be null
 /// @return new text, released by the caller with free(); null when there is no "dev_"
 KESBLUETOOTH_API char* getAddressFromPath(const char* path);
 
@@ -55,7 +56,8 @@ KESBLUETOOTH_API char* getAddressFromPath(const char* path);
 /// @param name    receives the name, cut to fit and always terminated; untouched on failure
 /// @param size    size of `name` in bytes
 /// @param timeout how long to wait, in milliseconds
-/// @return 0, or -1
+/// @return 0; -1 when an argument is unusable, no adapter is on, or the device does not answer
+///         (nothing is logged)
 ///
 /// Blocks until the device answers or the time is over.
 KESBLUETOOTH_API int getNameFromAddr(const char* address, char* name, int size,
