@@ -247,7 +247,9 @@ The slowest of a hundred (99th percentile), on one processor:
 Calls a second that the other thread made meanwhile; raw libdbus has a second connection for them:
 
 {table(["signals"] + quick, rates)}
-Processor time of a thread that waits for signals while none comes, in milliseconds a minute:
+Processor time of a thread that waits for signals while none comes, in milliseconds a minute.
+kesbluetooth's looks ten times a second whether `stopLoop()` was called, which may happen in a signal
+handler and so sets a flag only:
 
 {table(["library", "ms"], idle)}
 ## Listing devices
