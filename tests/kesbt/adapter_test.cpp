@@ -35,8 +35,8 @@ TEST_F(AdapterVerbs, SetRefusesWhatCannotBeSet) {
               "adapter set --help\n");
     EXPECT_EQ(failure({"adapter", "set", "UUIDs", "x"}),
               "UUIDs cannot be set; see what can: kesbt adapter set --help\n");
-    EXPECT_EQ(failure({"adapter", "set", "Colour", "red"}).substr(0, 40),
-              "hci0 has no property \"Colour\"; it has: A");
+    EXPECT_EQ(failure({"adapter", "set", "Colour", "red"}),
+              "hci0 has no property \"Colour\"; see what can be set: kesbt adapter set --help\n");
     failure({"adapter", "set", "Powered", "perhaps"}, 2);
     failure({"adapter", "set", "PairableTimeout", "-1"}, 2);
     failure({"adapter", "set", "PairableTimeout", "4294967296"}, 2);

@@ -21,8 +21,9 @@ TEST_F(DeviceVerbs, AKnownDeviceIsListedAndShown) {
 }
 
 TEST_F(DeviceVerbs, CreateServicesAndRemove) {
-    EXPECT_EQ(failure({"device", headset}), "hci0 does not know 00:11:22:33:44:01; make it known "
-                                            "first: kesbt create 00:11:22:33:44:01\n");
+    EXPECT_EQ(failure({"device", headset}),
+              "hci0 does not know 00:11:22:33:44:01; see what it knows: kesbt devices, or make it "
+              "known: kesbt create 00:11:22:33:44:01\n");
     const Json created = run({"create", "00:11:22:33:44:01", "--json"}).json();
     EXPECT_EQ(created["properties"]["Name"], "Kestrine Headset");
     EXPECT_NE(failure({"create", headset}).find("Already Exists"), std::string::npos);

@@ -104,7 +104,7 @@ TEST_F(Streams, ForPeopleTheyAreReadable) {
     EXPECT_EQ(monitor->readLine().substr(12), "  bluetoothd              is on the bus");
     run({"adapter", "set", "Discoverable", "on"});
     EXPECT_EQ(monitor->readLine().substr(12),
-              "  hci0                    Adapter.PropertyChanged  Discoverable = yes");
+              "  hci0                    Adapter.PropertyChanged    Discoverable = yes");
     const Result result = run({"--adapter", "hci1", "discover", "--seconds", "1"});
     EXPECT_EQ(result.status, 0);
     EXPECT_NE(

@@ -34,8 +34,7 @@ std::string checkAdapter(const std::string& text) {
 void addOptions(CLI::App& program, Options& options) {
     program.add_option("--adapter", options.adapter, "The adapter: hci0, or its address")
         ->type_name("ADAPTER")
-        ->transform(
-            [](const std::string& text) { return isAddress(text) ? upperCase(text) : text; })
+        ->transform(addressInCapitals)
         ->check(checkAdapter);
     program.add_flag("--json", options.json,
                      "Results for programs: one document, or one line an event");

@@ -65,7 +65,8 @@ std::unique_ptr<Device> openDevice(Adapter& adapter, const std::string& address)
         return device;
     if (adapter.getErrorMessage() == "Does Not Exist")
         throw Failure(adapterName(adapter) + " does not know " + address +
-                      "; make it known first: kesbt create " + address);
+                      "; see what it knows: kesbt devices, or make it known: kesbt create " +
+                      address);
     throw refusal("cannot find " + address, adapter);
 }
 

@@ -36,6 +36,10 @@ std::string upperCase(std::string text) {
     return text;
 }
 
+std::string addressInCapitals(const std::string& text) {
+    return isAddress(text) ? upperCase(text) : text;
+}
+
 std::string quoted(const std::string& text) {
     return '"' + printable(text) + '"';
 }

@@ -7,6 +7,8 @@
 namespace Kesbt {
 
 std::string upperCase(std::string text);
+/// An address in capitals, as the daemon writes it; any other text as it is.
+std::string addressInCapitals(const std::string& text);
 /// In double quotes, printable.
 std::string quoted(const std::string& text);
 /// Control characters as escapes such as \n or \x1b: names come from strangers' devices.

@@ -11,7 +11,7 @@ std::shared_ptr<std::string> addAddress(CLI::App& command) {
     command.add_option("ADDRESS", *address, "The device, e.g. 00:11:22:33:44:55")
         ->required()
         ->type_name("")
-        ->transform([](const std::string& text) { return upperCase(text); })
+        ->transform(addressInCapitals)
         ->check([](const std::string& text) {
             return isAddress(text) ? std::string()
                                    : quoted(text) + " is no address such as 00:11:22:33:44:55";

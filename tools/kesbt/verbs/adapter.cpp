@@ -47,13 +47,12 @@ std::unique_ptr<Bluetooth::Dict> typedProperties(Bluetooth::Adapter& adapter) {
 
 const Bluetooth::DictEntry& findProperty(const Bluetooth::Dict& properties, const std::string& name,
                                          const std::string& adapter) {
-    std::string names;
     for (const auto& entry : properties) {
         if (upperCase(entry.first) == upperCase(name))
             return entry;
-        names += (names.empty() ? "" : ", ") + entry.first;
     }
-    throw Failure(adapter + " has no property " + quoted(name) + "; it has: " + names);
+    throw Failure(adapter + " has no property " + quoted(name) +
+                  "; see what can be set: kesbt adapter set --help");
 }
 
 bool parseBoolean(const std::string& text) {

@@ -34,9 +34,12 @@ std::string argumentText(const Signal& signal) {
 
 void printLine(const std::string& subject, const std::string& what, const std::string& arguments) {
     constexpr std::size_t subjectWidth = 22;
+    constexpr std::size_t signalWidth = 25; // of AudioSink.PropertyChanged
+    std::string signal = printable(what);
+    if (!arguments.empty())
+        signal = padded(signal, signalWidth) + "  ";
     std::cout << coloured(timeForPeople(), Colour::Dim) << "  "
-              << padded(printable(subject), subjectWidth) << "  "
-              << coloured(printable(what), Colour::Bold) << (arguments.empty() ? "" : "  ")
+              << padded(printable(subject), subjectWidth) << "  " << coloured(signal, Colour::Bold)
               << printable(arguments) << '\n';
     flushOutput();
 }
