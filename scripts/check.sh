@@ -19,3 +19,6 @@ echo "Building in ${folder#"$root"/} ..."
 build "$folder" "${options[@]}"
 echo "Testing ..."
 ctest --test-dir "$folder" --output-on-failure -j "$(nproc)" "$@"
+# A test that was tried again must not have been stopped by a sanitizer the first time.
+! grep -E '(Thread|Address|Leak)Sanitizer:|: runtime error: ' "$folder/Testing/Temporary/LastTest.log" ||
+    die "a sanitizer has found a fault, see above"

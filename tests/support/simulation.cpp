@@ -40,7 +40,12 @@ Simulation::Simulation(const std::string& scenario)
 
 Simulation::~Simulation() {
     m_process.signal(SIGTERM);
-    m_process.wait();
+    if (m_process.wait() == 0)
+        return;
+    // It may have been killed or have lost its bus, as the test wanted; a sanitizer ends it too.
+    m_process.readAll();
+    const std::string errors = m_process.readErrors();
+    EXPECT_EQ(errors.find("Sanitizer"), std::string::npos) << errors;
 }
 
 MessagePtr Simulation::control(const std::string& method, const Build& arguments) {
