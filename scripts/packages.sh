@@ -22,12 +22,15 @@ system=$folder/system
 rm -rf --one-file-system "$system"
 
 echo "Making a Debian system in ${system#"$root"/} ..."
+apt-get update -qq
 mirror=$(apt-get indextargets --format '$(REPO_URI)' 'Created-By: Packages' 'Codename: bookworm' | head -n 1)
 [ -n "$mirror" ] || die "apt knows no source of Debian 12"
-debootstrap --variant=minbase bookworm "$system" "$mirror" >"$folder/debootstrap.log" 2>&1 ||
+debootstrap --variant=minbase --include=ca-certificates bookworm "$system" "$mirror" >"$folder/debootstrap.log" 2>&1 ||
     { tail -n 20 "$folder/debootstrap.log" >&2; die "debootstrap failed"; }
 rm -f "$system/etc/apt/sources.list"
-cp -r /etc/apt/sources.list* /etc/apt/apt.conf.d "$system/etc/apt/"
+for settings in sources.list sources.list.d apt.conf.d auth.conf.d keyrings; do
+    [ ! -e "/etc/apt/$settings" ] || cp -r "/etc/apt/$settings" "$system/etc/apt/"
+done
 mkdir "$system/packages"
 cp "$folder"/*.deb "$root/tests/packages/user.sh" "$root/tests/examples/run.sh" \
     "$root/README.md" "$system/packages/"

@@ -59,6 +59,7 @@ sink_connected() {
         kesbt audio status "$headset" | grep -q 'Sink *State=connected' && return
         sleep 0.2
     done
+    return 1
 }
 scannerd_pid() {
     gdbus call --session --dest org.freedesktop.DBus --object-path /org/freedesktop/DBus \
@@ -86,7 +87,6 @@ run kesbt services "$headset"
 say "Its audio is connected; the signals are shown as they come"
 start kesbt monitor
 run kesbt audio connect "$headset"
-run kesbt audio status "$headset"
 run kesbt volume up "$headset"
 run kesbt audio disconnect "$headset"
 stop_all
