@@ -70,21 +70,21 @@ KES_REPLACES_LIBC void* malloc(std::size_t size) {
     return mayAllocate() ? counted(__libc_malloc(size)) : nullptr;
 }
 
-KES_REPLACES_LIBC void* calloc(std::size_t count, std::size_t size) {
-    return mayAllocate() ? counted(__libc_calloc(count, size)) : nullptr;
+KES_REPLACES_LIBC void* calloc(std::size_t nmemb, std::size_t size) {
+    return mayAllocate() ? counted(__libc_calloc(nmemb, size)) : nullptr;
 }
 
-KES_REPLACES_LIBC void* realloc(void* block, std::size_t size) {
+KES_REPLACES_LIBC void* realloc(void* ptr, std::size_t size) {
     if (!mayAllocate())
         return nullptr;
-    void* moved = __libc_realloc(block, size);
-    return block ? moved : counted(moved);
+    void* moved = __libc_realloc(ptr, size);
+    return ptr ? moved : counted(moved);
 }
 
-KES_REPLACES_LIBC void free(void* block) {
-    if (block)
+KES_REPLACES_LIBC void free(void* ptr) {
+    if (ptr)
         --liveBlocks;
-    __libc_free(block);
+    __libc_free(ptr);
 }
 }
 

@@ -41,7 +41,7 @@ SimClient::~SimClient() {
 }
 
 SimClient::Message SimClient::makeCall(const std::string& method, const std::string& arguments,
-                                       std::string path) {
+                                       const std::string& path) {
     const std::lock_guard<std::mutex> lock(m_mutex);
     const std::size_t dot = method.rfind('.');
     std::string interface = method.substr(0, dot);

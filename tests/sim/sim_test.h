@@ -72,7 +72,8 @@ private:
     std::string bodyOf(GDBusMessage* message);
     std::string answer(GDBusMessage* message, const std::string& label);
     std::string signalLine(GDBusMessage* message);
-    Message makeCall(const std::string& method, const std::string& arguments, std::string path);
+    Message makeCall(const std::string& method, const std::string& arguments,
+                     const std::string& path);
 
     GDBusConnection* m_connection;
     guint m_filter;
