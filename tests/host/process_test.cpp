@@ -39,32 +39,6 @@ unsigned long signals(const std::string& status, const char* name) {
                : std::stoul(status.substr(place + strlen(name)), nullptr, 16) & ~(3ul << 31);
 }
 
-void ignoreSignal(int /*number*/) {}
-
-/// Interrupts the test's system calls all the time.
-class Interruptions {
-public:
-    Interruptions() {
-        struct sigaction action {};
-        action.sa_handler = ignoreSignal;
-        sigaction(SIGALRM, &action, &m_before);
-        set(1000);
-    }
-    ~Interruptions() {
-        set(0);
-        sigaction(SIGALRM, &m_before, nullptr);
-    }
-    Interruptions(const Interruptions&) = delete;
-    Interruptions& operator=(const Interruptions&) = delete;
-
-private:
-    static void set(suseconds_t interval) {
-        const itimerval timer{{0, interval}, {0, interval}};
-        setitimer(ITIMER_REAL, &timer, nullptr);
-    }
-    struct sigaction m_before {};
-};
-
 } // namespace
 
 TEST(ProcessTest, ArgumentsReachTheProgramAsTheyAreWithoutAShell) {
@@ -88,11 +62,20 @@ TEST(ProcessTest, AProgramThatCannotBeStartedIsSeen) {
 }
 
 TEST(ProcessTest, TheStatusIsTheProgramsOwnDespiteInterruptions) {
-    const Interruptions interruptions;
+    // From now on system calls are interrupted all the time.
+    struct sigaction interrupting {};
+    struct sigaction before {};
+    interrupting.sa_handler = [](int) {};
+    sigaction(SIGALRM, &interrupting, &before);
+    const itimerval often{{0, 1000}, {0, 1000}};
+    const itimerval never{};
+    setitimer(ITIMER_REAL, &often, nullptr);
     const int exited = runProcess("/bin/sh", {"-c", "sleep 0.1; exit 7"});
     EXPECT_TRUE(WIFEXITED(exited) && WEXITSTATUS(exited) == 7) << exited;
     const int killed = runProcess("/bin/sh", {"-c", "kill -9 $$"});
     EXPECT_TRUE(WIFSIGNALED(killed) && WTERMSIG(killed) == SIGKILL) << killed;
+    setitimer(ITIMER_REAL, &never, nullptr);
+    sigaction(SIGALRM, &before, nullptr);
     EXPECT_TRUE(hasNoChild());
 }
 

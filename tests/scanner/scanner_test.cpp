@@ -7,25 +7,12 @@ namespace Bluetooth::Test {
 namespace {
 
 // Nothing is in reach until a test says so.
-constexpr const char* scenario = R"([Adapter hci0]
-Address=00:1A:7D:DA:71:10
-[Adapter hci1]
-Address=00:1A:7D:DA:71:11
-[Device 00:11:22:33:44:01]
-Name=Mouse
-Adapter=hci0
-Behaviour=AlreadyPaired
-Present=false
-[Device 00:11:22:33:44:02]
-Name=Phone
-Class=360
-RSSI=-60
-Present=false
-[Device 00:11:22:33:44:03]
-Name=Speaker
-Adapter=hci1
-Present=false
-)";
+constexpr const char* scenario =
+    "[Adapter hci0]\nAddress=00:1A:7D:DA:71:10\n[Adapter hci1]\nAddress=00:1A:7D:DA:71:11\n"
+    "[Device 00:11:22:33:44:01]\nName=Mouse\nAdapter=hci0\nBehaviour=AlreadyPaired\n"
+    "Present=false\n"
+    "[Device 00:11:22:33:44:02]\nName=Phone\nClass=360\nRSSI=-60\nPresent=false\n"
+    "[Device 00:11:22:33:44:03]\nName=Speaker\nAdapter=hci1\nPresent=false\n";
 
 std::string textOf(DBusMessage* reply) {
     if (!reply)

@@ -42,8 +42,9 @@ std::pair<std::string, std::string> run(const std::string& argument, int status)
 
 class ServiceTest : public ScannerTest {
 protected:
+    void SetUp() override { startService(); }
     void TearDown() override {
-        if (service && !service->hasEnded()) {
+        if (!service->hasEnded()) {
             EXPECT_EQ(stopService(), 0);
         }
     }
@@ -84,8 +85,10 @@ protected:
     std::unique_ptr<ChildProcess> service;
 };
 
+/// The client, with a service that the bus starts, or with one that stands in.
+using ScannerClientTest = ScannerTest;
+
 TEST_F(ServiceTest, DevicesAreListedWithTheirPropertiesFromTheSecondAnswerOn) {
-    startService();
     Scanner scanner;
     const DevicesPtr none = list(scanner, "hci0");
     ASSERT_TRUE(none);
@@ -120,7 +123,6 @@ TEST_F(ServiceTest, DevicesAreListedWithTheirPropertiesFromTheSecondAnswerOn) {
 }
 
 TEST_F(ServiceTest, DevicesThatTheDaemonKnowsAreLeftOut) {
-    startService();
     comeInReach(mouse); // is found before the phone in each round, and is known
     comeInReach(phone);
     EXPECT_FALSE(lists(askUntilListed("hci0", phone), mouse));
@@ -137,7 +139,6 @@ TEST_F(ServiceTest, DevicesThatTheDaemonKnowsAreLeftOut) {
 }
 
 TEST_F(ServiceTest, AdaptersHaveFindersOfTheirOwn) {
-    startService();
     ask("hci0");
     comeInReach(speaker);
     askUntilListed("hci1", speaker);
@@ -162,7 +163,6 @@ TEST_F(ServiceTest, AdaptersHaveFindersOfTheirOwn) {
 }
 
 TEST_F(ServiceTest, AnswersToWrongAndNeedlessCalls) {
-    startService();
     EXPECT_EQ(ask("hci9"), "ERROR Adapter hci9 not found");
     EXPECT_EQ(ask("/org/bluez/1/hci0"), "ERROR Adapter /org/bluez/1/hci0 not found");
     EXPECT_EQ(ask(""), "ERROR Adapter  not found");
@@ -181,7 +181,6 @@ TEST_F(ServiceTest, AnswersToWrongAndNeedlessCalls) {
 }
 
 TEST_F(ServiceTest, RoundsOfFindersLeaveRulesAndMemoryFlat) {
-    startService();
     const auto rounds = [this](int count) {
         for (int round = 0; round < count; ++round) {
             ASSERT_EQ(ask("hci0"), emptyAnswer);
@@ -202,6 +201,7 @@ TEST_F(ServiceTest, RoundsOfFindersLeaveRulesAndMemoryFlat) {
 }
 
 TEST_F(ServiceTest, DaemonMayComeLateGoAndComeBack) {
+    stopService();
     simulation.control("DropName");
     startService();
     EXPECT_EQ(ask("hci0"), "ERROR Adapter hci0 not found");
@@ -222,7 +222,6 @@ TEST_F(ServiceTest, DaemonMayComeLateGoAndComeBack) {
 }
 
 TEST_F(ServiceTest, GoesOnWhenAClientLeavesWithoutItsAnswer) {
-    startService();
     simulation.delayNext("org.bluez.Manager", "FindAdapter", 50);
     {
         RawPeer leaving(sessionBus.address());
@@ -236,18 +235,17 @@ TEST_F(ServiceTest, GoesOnWhenAClientLeavesWithoutItsAnswer) {
 
 TEST_F(ServiceTest, EndsWithDiscoveryStoppedEverywhere) {
     for (const int signal : {SIGTERM, SIGINT}) {
-        startService();
         ask("hci0");
         ask("hci1");
         EXPECT_EQ(stopService(signal), 0);
         EXPECT_EQ(service->readAll() + service->readErrors(), "");
+        startService();
     }
     EXPECT_EQ(stops("hci0"), 2u);
     EXPECT_EQ(stops("hci1"), 2u);
 }
 
 TEST_F(ServiceTest, RunsOnceInASessionAndTellsItsUsage) {
-    startService();
     const std::string said = run("", 1).second;
     EXPECT_EQ(said.find("kesbt-scannerd: already running in this session, as :1."), 0u) << said;
     EXPECT_EQ(said.find('\n'), said.size() - 1);
@@ -258,7 +256,6 @@ TEST_F(ServiceTest, RunsOnceInASessionAndTellsItsUsage) {
 }
 
 TEST_F(ServiceTest, EndsWithItsBuses) {
-    startService();
     ask("hci0");
     simulation.bus().kill();
     EXPECT_EQ(service->wait(), 1);
@@ -276,7 +273,7 @@ TEST_F(ServiceTest, EndsWithItsBuses) {
     EXPECT_EQ(run("", 1).second.find("kesbt-scannerd: cannot reach the session bus; "), 0u);
 }
 
-TEST_F(ServiceTest, ClientsWithoutServiceStartIt) {
+TEST_F(ScannerClientTest, StartsTheServiceThatIsMissing) {
     ASSERT_FALSE(session.hasOwner(serviceName));
     Scanner scanner;
     const DevicesPtr devices = list(scanner, "hci0");
@@ -287,7 +284,7 @@ TEST_F(ServiceTest, ClientsWithoutServiceStartIt) {
     askUntilListed("hci0", phone);
 }
 
-TEST_F(ServiceTest, ClientIsSilentAboutAdaptersThatAreNot) {
+TEST_F(ScannerClientTest, IsSilentAboutAdaptersThatAreNot) {
     Scanner scanner;
     EXPECT_FALSE(list(scanner, "hci9"));
     EXPECT_FALSE(list(scanner, nullptr));
@@ -302,7 +299,7 @@ TEST_F(ServiceTest, ClientIsSilentAboutAdaptersThatAreNot) {
                                  "manager.cpp No such adapter"}));
 }
 
-TEST_F(ServiceTest, ClientTellsWhatTheServiceRefuses) {
+TEST_F(ScannerClientTest, TellsWhatTheServiceRefuses) {
     RawPeer standIn(sessionBus.address(), serviceName);
     standIn.replyError("ListDevices", "com.example.Error", "Adapter hci0 not found");
     Scanner scanner;
@@ -318,7 +315,7 @@ TEST_F(ServiceTest, ClientTellsWhatTheServiceRefuses) {
     EXPECT_EQ(standIn.callTexts().back(), "RemoveFinder! s:hci0");
 }
 
-TEST_F(ServiceTest, ClientReadsAnyAnswer) {
+TEST_F(ScannerClientTest, ReadsAnyAnswer) {
     RawPeer standIn(sessionBus.address(), serviceName);
     Scanner scanner;
     standIn.reply("ListDevices", [](Writer& w) { w(std::int32_t{1}); });

@@ -201,14 +201,13 @@ std::vector<std::string> RawPeer::callTexts() const {
     return texts;
 }
 
-bool RawPeer::waitForCalls(const std::string& member, std::size_t expected,
-                           Milliseconds limit) const {
+bool RawPeer::waitForCalls(const std::string& member, std::size_t count, Milliseconds limit) const {
     return m_calls.waitUntil(
         [&](const std::vector<SeenCall>& seen) {
             return static_cast<std::size_t>(
                        std::count_if(seen.begin(), seen.end(), [&](const SeenCall& call) {
                            return call.member == member;
-                       })) >= expected;
+                       })) >= count;
         },
         limit);
 }
