@@ -7,8 +7,8 @@
 
 #include "bluez/factory.h"
 #include "bluez/hci_version.h"
-#include "bluez/method_call.h"
 #include "bluez/print.h"
+#include "core/method_call.h"
 
 #include <memory>
 #include <sstream>

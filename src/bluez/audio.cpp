@@ -1,7 +1,7 @@
 #include <bluetooth/audio.h>
 
 #include "bluez/factory.h"
-#include "bluez/method_call.h"
+#include "core/method_call.h"
 
 namespace Bluetooth {
 

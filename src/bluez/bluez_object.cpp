@@ -3,8 +3,8 @@
 #include <bluetooth/dbus_object.h>
 #include <bluetooth/dict_codec.h>
 
-#include "bluez/method_call.h"
 #include "bluez/print.h"
+#include "core/method_call.h"
 
 #include <algorithm>
 #include <memory>

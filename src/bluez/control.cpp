@@ -1,8 +1,8 @@
 #include <bluetooth/control.h>
 
 #include "bluez/factory.h"
-#include "bluez/method_call.h"
 #include "bluez/print.h"
+#include "core/method_call.h"
 
 namespace Bluetooth {
 

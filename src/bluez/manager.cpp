@@ -4,8 +4,8 @@
 #include <bluetooth/adapter_list.h>
 
 #include "bluez/factory.h"
-#include "bluez/method_call.h"
 #include "bluez/print.h"
+#include "core/method_call.h"
 
 namespace Bluetooth {
 

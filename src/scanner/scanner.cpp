@@ -4,7 +4,7 @@
 #include <bluetooth/dict_codec.h>
 #include <bluetooth/manager.h>
 
-#include "bluez/method_call.h"
+#include "core/method_call.h"
 #include "scanner/names.h"
 
 #include <memory>

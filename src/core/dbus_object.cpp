@@ -1,6 +1,6 @@
 #include <bluetooth/dbus_object.h>
 
-#include "bluez/method_call.h"
+#include "core/method_call.h"
 
 #include <memory>
 
