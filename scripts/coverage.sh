@@ -15,7 +15,7 @@ KESBLUETOOTH_BUILD_BIND=--bind ctest --test-dir "$folder" --output-on-failure -j
 
 # Branches that only an exception takes are not counted: nearly every call has one. CMake's own
 # trial programs, compiled with the same flags, are none of ours.
-gcovr --root "$root" --object-directory "$folder" --filter "$root/(include|src|tools|sim)/" \
+gcovr --root "$root" --object-directory "$folder" --filter "$root/(include|src|tools|serving|sim)/" \
     --exclude-throw-branches --exclude-unreachable-branches \
     --exclude-directories '.*/CMakeFiles/[0-9.]+/.*' \
     --json-summary "$folder/coverage.json" --txt "$folder/coverage.txt" "$folder"

@@ -1,6 +1,7 @@
 #include "options.h"
 
-#include "bus/glib_ptr.h"
+#include "serving.h"
+#include "serving/bus/glib_ptr.h"
 
 #include <stdexcept>
 

@@ -1,8 +1,9 @@
 #ifndef KESBLUETOOTH_SIM_CONTROL_CALL_LOG_H
 #define KESBLUETOOTH_SIM_CONTROL_CALL_LOG_H
 
-#include "bus/call.h"
-#include "bus/dict.h"
+#include "serving.h"
+#include "serving/bus/call.h"
+#include "serving/bus/dict_builder.h"
 
 #include <deque>
 

@@ -1,11 +1,11 @@
 #include "control/control.h"
 
-#include "bus/dict.h"
 #include "daemon/adapter.h"
 #include "daemon/agent.h"
 #include "daemon/audio_device.h"
 #include "daemon/device.h"
 #include "daemon/pairing.h"
+#include "serving/bus/dict_builder.h"
 #include "world/address.h"
 #include "world/settings.h"
 
@@ -320,7 +320,7 @@ void Control::callAgent(const CallPtr& call) {
         throw std::runtime_error("\"" + interface + "." + member + "\" cannot name a method");
     m_daemon.bus().call(agent->owner(), agent->path(), interface, member, bodyOf(call, 3),
                         static_cast<int>(m_world.times.agentTimeout), nullptr,
-                        [call](const Answer& answer) {
+                        [call](const CallResult& answer) {
                             call->reply(g_variant_new("(ss@av)", answer.error.name.c_str(),
                                                       answer.error.text.c_str(),
                                                       variantList(answer.results).get()));
@@ -373,7 +373,7 @@ void Control::setTimes(const CallPtr& call) {
 /// The bus learns of a closed connection in its own time: what follows comes after that.
 void Control::whenGone(std::function<void()> next) {
     m_bus.call(busName, busPath, busName, "NameHasOwner", tuple(textValue("org.bluez")), -1,
-               nullptr, [this, next = std::move(next)](const Answer& answer) {
+               nullptr, [this, next = std::move(next)](const CallResult& answer) {
                    gboolean owned = FALSE;
                    if (!answer.failed)
                        g_variant_get(answer.results.get(), "(b)", &owned);

@@ -1,11 +1,12 @@
 #ifndef KESBLUETOOTH_SIM_CONTROL_CONTROL_H
 #define KESBLUETOOTH_SIM_CONTROL_CONTROL_H
 
-#include "bus/bus_link.h"
-#include "bus/object_tree.h"
 #include "control/call_log.h"
 #include "control/faults.h"
 #include "daemon/daemon.h"
+#include "serving.h"
+#include "serving/bus/bus_connection.h"
+#include "serving/bus/object_tree.h"
 
 #include <functional>
 #include <memory>
@@ -78,7 +79,7 @@ private:
     CallLog m_calls;
     std::function<void()> m_quit;
     ObjectTree m_objects;
-    BusLink m_bus;
+    BusConnection m_bus;
 };
 
 } // namespace Bluetooth::Sim

@@ -1,8 +1,9 @@
 #ifndef KESBLUETOOTH_SIM_CONTROL_FAULTS_H
 #define KESBLUETOOTH_SIM_CONTROL_FAULTS_H
 
-#include "bus/call.h"
-#include "world/timer.h"
+#include "serving.h"
+#include "serving/bus/call.h"
+#include "serving/bus/one_shot_timer.h"
 
 #include <functional>
 #include <list>
@@ -34,7 +35,7 @@ private:
     };
     struct Waiting {
         CallPtr call;
-        Timer timer;
+        OneShotTimer timer;
     };
 
     Dispatch m_dispatch;

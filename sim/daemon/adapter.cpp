@@ -1,11 +1,11 @@
 #include "daemon/adapter.h"
 
-#include "bus/dict.h"
 #include "daemon/agent.h"
 #include "daemon/daemon.h"
 #include "daemon/device.h"
 #include "daemon/device_creation.h"
 #include "daemon/pairing.h"
+#include "serving/bus/dict_builder.h"
 #include "world/address.h"
 
 #include <algorithm>
@@ -203,7 +203,7 @@ Value Adapter::devicePaths() const {
 }
 
 void Adapter::getProperties(const CallPtr& call) {
-    Dict properties;
+    DictBuilder properties;
     properties.add("Address", textValue(m_hardware->address))
         .add("Name", textValue(m_hardware->name))
         .add("Class", g_variant_new_uint32(m_mode.deviceClass()))

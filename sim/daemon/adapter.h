@@ -1,9 +1,10 @@
 #ifndef KESBLUETOOTH_SIM_DAEMON_ADAPTER_H
 #define KESBLUETOOTH_SIM_DAEMON_ADAPTER_H
 
-#include "bus/interface.h"
 #include "daemon/adapter_mode.h"
 #include "daemon/discovery.h"
+#include "serving.h"
+#include "serving/bus/interface.h"
 #include "world/world.h"
 
 #include <memory>

@@ -1,9 +1,9 @@
 #include "daemon/adapter_mode.h"
 
-#include "bus/dict.h"
 #include "daemon/adapter.h"
 #include "daemon/agent.h"
 #include "daemon/daemon.h"
+#include "serving/bus/dict_builder.h"
 
 #include <algorithm>
 
@@ -185,7 +185,7 @@ void AdapterMode::requestSession(const CallPtr& call) {
         return call->fail(Errors::failed("Device or resource busy"));
     const char* mode = m_restoreDiscoverable ? "discoverable" : "connectable";
     agent->ask("ConfirmModeChange", tuple(textValue(mode)), "",
-               m_adapter.daemon().times().agentTimeout, [this, call](const Answer& answer) {
+               m_adapter.daemon().times().agentTimeout, [this, call](const CallResult& answer) {
                    if (answer.failed)
                        return call->fail(answer.error);
                    m_sessions.push_back(call->sender());

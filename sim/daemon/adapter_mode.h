@@ -1,8 +1,9 @@
 #ifndef KESBLUETOOTH_SIM_DAEMON_ADAPTER_MODE_H
 #define KESBLUETOOTH_SIM_DAEMON_ADAPTER_MODE_H
 
-#include "bus/call.h"
-#include "world/timer.h"
+#include "serving.h"
+#include "serving/bus/call.h"
+#include "serving/bus/one_shot_timer.h"
 
 #include <string>
 #include <vector>
@@ -50,8 +51,8 @@ private:
     bool m_discoverable = false;
     bool m_restoreDiscoverable = false; ///< what the next power-on brings back
     bool m_powerFromSession = false;
-    Timer m_discoverableTimer;
-    Timer m_pairableTimer;
+    OneShotTimer m_discoverableTimer;
+    OneShotTimer m_pairableTimer;
     std::vector<std::string> m_sessions; ///< owners, once for each session
 };
 

@@ -8,7 +8,7 @@ constexpr const char* agentInterface = "org.bluez.Agent";
 
 } // namespace
 
-Agent::Agent(BusLink& bus, std::string owner, std::string path, Capability capability)
+Agent::Agent(BusConnection& bus, std::string owner, std::string path, Capability capability)
     : m_bus(bus), m_owner(std::move(owner)), m_path(std::move(path)), m_capability(capability) {}
 
 Agent::~Agent() {
@@ -22,7 +22,7 @@ void Agent::ask(const char* member, const Value& arguments, const char* resultSi
     m_onAnswer = std::move(onAnswer);
     const std::string expected = std::string("(") + resultSignature + ")";
     m_bus.call(m_owner, m_path, agentInterface, member, arguments, static_cast<int>(timeout),
-               m_request, [this, expected](const Answer& answer) {
+               m_request, [this, expected](const CallResult& answer) {
                    const OnAnswer handler = std::move(m_onAnswer);
                    g_clear_object(&m_request);
                    if (answer.failed || answer.results.is(expected.c_str()))

@@ -1,7 +1,8 @@
 #ifndef KESBLUETOOTH_SIM_DAEMON_AGENT_H
 #define KESBLUETOOTH_SIM_DAEMON_AGENT_H
 
-#include "bus/bus_link.h"
+#include "serving.h"
+#include "serving/bus/bus_connection.h"
 #include "world/capability.h"
 
 #include <string>
@@ -11,9 +12,9 @@ namespace Bluetooth::Sim {
 /// An agent of a client, as the daemon sees it. It has at most one request open.
 class Agent {
 public:
-    using OnAnswer = BusLink::AnswerHandler;
+    using OnAnswer = BusConnection::AnswerHandler;
 
-    Agent(BusLink& bus, std::string owner, std::string path, Capability capability);
+    Agent(BusConnection& bus, std::string owner, std::string path, Capability capability);
     Agent(const Agent&) = delete;
     Agent& operator=(const Agent&) = delete;
     ~Agent();
@@ -39,7 +40,7 @@ public:
 private:
     void forgetRequest();
 
-    BusLink& m_bus;
+    BusConnection& m_bus;
     std::string m_owner;
     std::string m_path;
     Capability m_capability;

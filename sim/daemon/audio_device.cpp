@@ -1,10 +1,10 @@
 #include "daemon/audio_device.h"
 
-#include "bus/dict.h"
 #include "daemon/adapter.h"
 #include "daemon/agent.h"
 #include "daemon/daemon.h"
 #include "daemon/device.h"
+#include "serving/bus/dict_builder.h"
 #include "world/settings.h"
 
 #include <algorithm>
@@ -23,7 +23,7 @@ constexpr const char* headsetGateway = "1112";
 constexpr const char* handsFree = "111e";
 constexpr const char* handsFreeGateway = "111f";
 
-const Signal propertyChanged = {"PropertyChanged", {{"name", "s"}, {"value", "v"}}};
+const SignalEntry propertyChanged = {"PropertyChanged", {{"name", "s"}, {"value", "v"}}};
 
 } // namespace
 
@@ -200,7 +200,7 @@ void AudioDevice::authorize(const std::string& uuid) {
     const auto& times = m_device.adapter().daemon().times();
     const auto device = m_device.weak_from_this();
     agent->ask("Authorize", g_variant_new("(os)", m_device.path().c_str(), uuid.c_str()), "",
-               times.agentTimeout, [this, device](const Answer& answer) {
+               times.agentTimeout, [this, device](const CallResult& answer) {
                    const auto alive = device.lock();
                    if (!alive || m_sink == State::Connected ||
                        (m_audio != State::Connecting && m_sink != State::Connecting))
@@ -290,7 +290,7 @@ void AudioDevice::abandon() {
 }
 
 void AudioDevice::audioProperties(const CallPtr& call) {
-    call->reply(tuple(Dict().add("State", g_variant_new_string(text(m_audio))).end()));
+    call->reply(tuple(DictBuilder().add("State", g_variant_new_string(text(m_audio))).end()));
 }
 
 void AudioDevice::sinkIsConnected(const CallPtr& call) {
@@ -299,7 +299,7 @@ void AudioDevice::sinkIsConnected(const CallPtr& call) {
 
 void AudioDevice::sinkProperties(const CallPtr& call) {
     const bool connected = m_sink == State::Connected || m_sink == State::Playing;
-    call->reply(tuple(Dict()
+    call->reply(tuple(DictBuilder()
                           .add("State", g_variant_new_string(text(m_sink)))
                           .add("Connected", boolValue(connected))
                           .add("Playing", boolValue(m_sink == State::Playing))
@@ -311,7 +311,7 @@ void AudioDevice::controlIsConnected(const CallPtr& call) {
 }
 
 void AudioDevice::controlProperties(const CallPtr& call) {
-    call->reply(tuple(Dict().add("Connected", boolValue(m_control)).end()));
+    call->reply(tuple(DictBuilder().add("Connected", boolValue(m_control)).end()));
 }
 
 void AudioDevice::volume(const CallPtr& call) {

@@ -1,9 +1,10 @@
 #ifndef KESBLUETOOTH_SIM_DAEMON_AUDIO_DEVICE_H
 #define KESBLUETOOTH_SIM_DAEMON_AUDIO_DEVICE_H
 
-#include "bus/interface.h"
 #include "daemon/link.h"
-#include "world/timer.h"
+#include "serving.h"
+#include "serving/bus/interface.h"
+#include "serving/bus/one_shot_timer.h"
 
 #include <string>
 
@@ -69,8 +70,8 @@ private:
     Link::Hold m_hold;
     CallPtr m_audioCall; ///< Audio.Connect that waits
     CallPtr m_sinkCall;  ///< AudioSink.Connect that waits
-    Timer m_setUp;
-    Timer m_controlSetUp;
+    OneShotTimer m_setUp;
+    OneShotTimer m_controlSetUp;
 };
 
 } // namespace Bluetooth::Sim

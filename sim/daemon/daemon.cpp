@@ -17,7 +17,7 @@ Daemon::~Daemon() {
 
 void Daemon::start(int pid) {
     m_pid = pid;
-    auto bus = std::make_unique<BusLink>(m_busAddress, [this](const CallPtr& call) {
+    auto bus = std::make_unique<BusConnection>(m_busAddress, [this](const CallPtr& call) {
         if (!m_beforeCall(call))
             dispatch(call);
     });

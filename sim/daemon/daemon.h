@@ -1,8 +1,9 @@
 #ifndef KESBLUETOOTH_SIM_DAEMON_DAEMON_H
 #define KESBLUETOOTH_SIM_DAEMON_DAEMON_H
 
-#include "bus/bus_link.h"
-#include "bus/object_tree.h"
+#include "serving.h"
+#include "serving/bus/bus_connection.h"
+#include "serving/bus/object_tree.h"
 #include "world/world.h"
 
 #include <functional>
@@ -45,7 +46,7 @@ public:
 
     World& world() { return m_world; }
     const Times& times() const { return m_world.times; }
-    BusLink& bus() { return *m_bus; }
+    BusConnection& bus() { return *m_bus; }
     ObjectTree& objects() { return m_objects; }
     Manager& manager() { return *m_manager; }
     const std::vector<std::unique_ptr<Adapter>>& adapters() const { return m_adapters; }
@@ -67,7 +68,7 @@ private:
     guint m_burial = 0;
     std::vector<std::shared_ptr<void>> m_ended;
     ObjectTree m_objects;
-    std::unique_ptr<BusLink> m_bus;
+    std::unique_ptr<BusConnection> m_bus;
     std::unique_ptr<Manager> m_manager;
     std::vector<std::unique_ptr<Adapter>> m_adapters;
 };

@@ -1,12 +1,12 @@
 #include "daemon/device.h"
 
-#include "bus/dict.h"
 #include "daemon/adapter.h"
 #include "daemon/audio_device.h"
 #include "daemon/daemon.h"
 #include "daemon/device_creation.h"
 #include "daemon/pairing.h"
 #include "daemon/service_search.h"
+#include "serving/bus/dict_builder.h"
 #include "world/address.h"
 #include "world/icon.h"
 
@@ -94,7 +94,7 @@ std::string Device::alias() const {
 }
 
 void Device::getProperties(const CallPtr& call) {
-    Dict properties;
+    DictBuilder properties;
     properties.add("Address", textValue(m_address));
     properties.add("Name", textValue(m_name));
     properties.add("Alias", textValue(alias()));

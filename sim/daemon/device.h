@@ -1,8 +1,9 @@
 #ifndef KESBLUETOOTH_SIM_DAEMON_DEVICE_H
 #define KESBLUETOOTH_SIM_DAEMON_DEVICE_H
 
-#include "bus/interface.h"
 #include "daemon/link.h"
+#include "serving.h"
+#include "serving/bus/interface.h"
 #include "world/world.h"
 
 #include <memory>
@@ -90,7 +91,7 @@ private:
     bool m_retired = false;
     std::string m_name;
     Link m_link;
-    Timer m_reverseSearch;
+    OneShotTimer m_reverseSearch;
     std::shared_ptr<DeviceCreation> m_creation;
     std::shared_ptr<Pairing> m_pairing;
     std::shared_ptr<ServiceSearch> m_search;

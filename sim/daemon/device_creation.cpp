@@ -1,9 +1,9 @@
 #include "daemon/device_creation.h"
 
-#include "bus/dict.h"
 #include "daemon/adapter.h"
 #include "daemon/daemon.h"
 #include "daemon/device.h"
+#include "serving/bus/dict_builder.h"
 
 namespace Bluetooth::Sim {
 

@@ -1,9 +1,10 @@
 #ifndef KESBLUETOOTH_SIM_DAEMON_DEVICE_CREATION_H
 #define KESBLUETOOTH_SIM_DAEMON_DEVICE_CREATION_H
 
-#include "bus/call.h"
 #include "daemon/link.h"
-#include "world/timer.h"
+#include "serving.h"
+#include "serving/bus/call.h"
+#include "serving/bus/one_shot_timer.h"
 
 #include <string>
 
@@ -36,7 +37,7 @@ private:
     Device& m_device;
     CallPtr m_call;
     Link::Hold m_hold;
-    Timer m_timer;
+    OneShotTimer m_timer;
 };
 
 } // namespace Bluetooth::Sim

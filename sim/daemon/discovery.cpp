@@ -1,9 +1,9 @@
 #include "daemon/discovery.h"
 
-#include "bus/dict.h"
 #include "daemon/adapter.h"
 #include "daemon/daemon.h"
 #include "daemon/device.h"
+#include "serving/bus/dict_builder.h"
 #include "world/address.h"
 #include "world/icon.h"
 
@@ -183,7 +183,7 @@ void Discovery::see(Peer& peer) {
 
 void Discovery::report(const Peer& peer, gint16 rssi) {
     const StoredDevice& stored = m_adapter.hardware().storage[peer.address];
-    Dict values;
+    DictBuilder values;
     values.add("Address", textValue(peer.address));
     values.add("Class", g_variant_new_uint32(peer.deviceClass));
     if (const char* icon = iconOf(peer.deviceClass))

@@ -1,9 +1,10 @@
 #ifndef KESBLUETOOTH_SIM_DAEMON_DISCOVERY_H
 #define KESBLUETOOTH_SIM_DAEMON_DISCOVERY_H
 
-#include "bus/call.h"
+#include "serving.h"
+#include "serving/bus/call.h"
+#include "serving/bus/one_shot_timer.h"
 #include "world/peer.h"
-#include "world/timer.h"
 
 #include <deque>
 #include <map>
@@ -66,8 +67,8 @@ private:
     unsigned m_suspensions = 0;
     unsigned m_round = 0;
     gint64 m_began = 0;
-    Timer m_finder;
-    Timer m_roundEnd;
+    OneShotTimer m_finder;
+    OneShotTimer m_roundEnd;
 };
 
 } // namespace Bluetooth::Sim

@@ -1,10 +1,10 @@
 #include "daemon/link.h"
 
-#include "bus/dict.h"
 #include "daemon/adapter.h"
 #include "daemon/audio_device.h"
 #include "daemon/daemon.h"
 #include "daemon/device.h"
+#include "serving/bus/dict_builder.h"
 
 namespace Bluetooth::Sim {
 

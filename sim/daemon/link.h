@@ -1,8 +1,9 @@
 #ifndef KESBLUETOOTH_SIM_DAEMON_LINK_H
 #define KESBLUETOOTH_SIM_DAEMON_LINK_H
 
-#include "bus/call.h"
-#include "world/timer.h"
+#include "serving.h"
+#include "serving/bus/call.h"
+#include "serving/bus/one_shot_timer.h"
 
 #include <functional>
 #include <utility>
@@ -67,9 +68,9 @@ private:
     unsigned m_holds = 0;
     std::vector<OnPaged> m_waiting;
     std::vector<CallPtr> m_disconnects;
-    Timer m_pager;
-    Timer m_idle;
-    Timer m_disconnect;
+    OneShotTimer m_pager;
+    OneShotTimer m_idle;
+    OneShotTimer m_disconnect;
 };
 
 } // namespace Bluetooth::Sim

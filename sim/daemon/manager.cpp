@@ -1,8 +1,8 @@
 #include "daemon/manager.h"
 
-#include "bus/dict.h"
 #include "daemon/adapter.h"
 #include "daemon/daemon.h"
+#include "serving/bus/dict_builder.h"
 
 namespace Bluetooth::Sim {
 
@@ -29,7 +29,7 @@ Manager::~Manager() {
 }
 
 void Manager::getProperties(const CallPtr& call) {
-    call->reply(tuple(Dict().add("Adapters", adapterPaths()).end()));
+    call->reply(tuple(DictBuilder().add("Adapters", adapterPaths()).end()));
 }
 
 void Manager::defaultAdapter(const CallPtr& call) {

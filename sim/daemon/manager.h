@@ -1,7 +1,8 @@
 #ifndef KESBLUETOOTH_SIM_DAEMON_MANAGER_H
 #define KESBLUETOOTH_SIM_DAEMON_MANAGER_H
 
-#include "bus/interface.h"
+#include "serving.h"
+#include "serving/bus/interface.h"
 
 #include <string>
 

@@ -1,9 +1,9 @@
 #include "daemon/pairing.h"
 
-#include "bus/dict.h"
 #include "daemon/adapter.h"
 #include "daemon/daemon.h"
 #include "daemon/device.h"
+#include "serving/bus/dict_builder.h"
 
 namespace Bluetooth::Sim {
 
@@ -107,7 +107,7 @@ void Pairing::ask(const char* member, const Value& arguments, const char* result
         return answered(false);
     m_timeout.start(times.pairingTimeout, [this] { fail(authentication("Timeout")); });
     m_agent->ask(member, arguments, results, times.agentTimeout,
-                 [this, onAnswer = std::move(onAnswer)](const Answer& answer) {
+                 [this, onAnswer = std::move(onAnswer)](const CallResult& answer) {
                      m_timeout.stop();
                      if (!m_cancelled)
                          onAnswer(answer);
@@ -117,7 +117,7 @@ void Pairing::ask(const char* member, const Value& arguments, const char* result
 void Pairing::askForPin() {
     if (!m_agent)
         return answered(false);
-    ask("RequestPinCode", tuple(pathValue(m_device.path())), "s", [this](const Answer& answer) {
+    ask("RequestPinCode", tuple(pathValue(m_device.path())), "s", [this](const CallResult& answer) {
         const char* pin = "";
         if (!answer.failed)
             g_variant_get(answer.results.get(), "(&s)", &pin);
@@ -132,7 +132,7 @@ void Pairing::displayPin() {
     const GlibPtr<char> pin(g_strdup_printf("%06u", passkey()));
     m_displaying = true;
     ask("DisplayPinCode", g_variant_new("(os)", m_device.path().c_str(), pin.get()), "",
-        [this](const Answer& answer) {
+        [this](const CallResult& answer) {
             m_displaying = !answer.failed;
             if (!answer.failed)
                 return answered(true);
@@ -159,7 +159,7 @@ void Pairing::askByCapabilities() {
 
 void Pairing::confirm(guint32 passkey) {
     ask("RequestConfirmation", g_variant_new("(ou)", m_device.path().c_str(), passkey), "",
-        [this](const Answer& answer) {
+        [this](const CallResult& answer) {
             if (answer.failed)
                 return fail(authentication("Failed"));
             answered(true);
@@ -168,7 +168,7 @@ void Pairing::confirm(guint32 passkey) {
 
 void Pairing::enter(guint32 passkey, bool typedOnBothSides) {
     ask("RequestPasskey", tuple(pathValue(m_device.path())), "u",
-        [this, passkey, typedOnBothSides](const Answer& answer) {
+        [this, passkey, typedOnBothSides](const CallResult& answer) {
             if (answer.failed)
                 return fail(authentication("Failed"));
             guint32 entered = 0;

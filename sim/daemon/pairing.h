@@ -1,11 +1,12 @@
 #ifndef KESBLUETOOTH_SIM_DAEMON_PAIRING_H
 #define KESBLUETOOTH_SIM_DAEMON_PAIRING_H
 
-#include "bus/bus_link.h"
 #include "daemon/agent.h"
 #include "daemon/link.h"
+#include "serving.h"
+#include "serving/bus/bus_connection.h"
+#include "serving/bus/one_shot_timer.h"
 #include "world/peer.h"
-#include "world/timer.h"
 
 #include <memory>
 #include <string>
@@ -70,9 +71,9 @@ private:
     bool m_cancelled = false;
     bool m_done = false;
     Link::Hold m_hold;
-    Timer m_timer;
-    Timer m_timeout;
-    Timer m_loss;
+    OneShotTimer m_timer;
+    OneShotTimer m_timeout;
+    OneShotTimer m_loss;
 };
 
 } // namespace Bluetooth::Sim

@@ -1,7 +1,8 @@
 #ifndef KESBLUETOOTH_SIM_DAEMON_SERVICE_RECORDS_H
 #define KESBLUETOOTH_SIM_DAEMON_SERVICE_RECORDS_H
 
-#include "bus/glib_ptr.h"
+#include "serving.h"
+#include "serving/bus/glib_ptr.h"
 
 #include <string>
 #include <vector>

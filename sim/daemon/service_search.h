@@ -1,9 +1,10 @@
 #ifndef KESBLUETOOTH_SIM_DAEMON_SERVICE_SEARCH_H
 #define KESBLUETOOTH_SIM_DAEMON_SERVICE_SEARCH_H
 
-#include "bus/call.h"
 #include "daemon/link.h"
-#include "world/timer.h"
+#include "serving.h"
+#include "serving/bus/call.h"
+#include "serving/bus/one_shot_timer.h"
 
 #include <memory>
 #include <string>
@@ -38,7 +39,7 @@ private:
     CallPtr m_call;
     std::string m_uuid; ///< what is looked for; "" for everything
     Link::Hold m_hold;
-    Timer m_timer;
+    OneShotTimer m_timer;
 };
 
 } // namespace Bluetooth::Sim

@@ -1,7 +1,7 @@
 #include "run/foreground.h"
 
-#include "bus/glib_ptr.h"
 #include "control/control.h"
+#include "serving/bus/glib_ptr.h"
 #include "world/scenario.h"
 
 #include <glib-unix.h>

@@ -1,6 +1,7 @@
 #include "world/settings.h"
 
-#include "bus/glib_ptr.h"
+#include "serving.h"
+#include "serving/bus/glib_ptr.h"
 #include "world/address.h"
 #include "world/behaviour.h"
 

@@ -13,7 +13,7 @@ bool begins(const std::string& text, const std::string& beginning) {
     return text.compare(0, beginning.size(), beginning) == 0;
 }
 
-Sim::Value parse(const std::string& arguments) {
+Serving::Value parse(const std::string& arguments) {
     GVariant* value = g_variant_parse(nullptr, arguments.c_str(), nullptr, nullptr, nullptr);
     EXPECT_NE(value, nullptr) << arguments;
     return value;
@@ -22,7 +22,7 @@ Sim::Value parse(const std::string& arguments) {
 } // namespace
 
 SimClient::SimClient() {
-    Sim::ErrorOut error;
+    Serving::ErrorOut error;
     constexpr auto flags =
         static_cast<GDBusConnectionFlags>(G_DBUS_CONNECTION_FLAGS_AUTHENTICATION_CLIENT |
                                           G_DBUS_CONNECTION_FLAGS_MESSAGE_BUS_CONNECTION);
@@ -145,12 +145,12 @@ std::string SimClient::bodyOf(GDBusMessage* message) {
     GVariant* body = g_dbus_message_get_body(message);
     std::string text;
     for (gsize i = 0; body && i < g_variant_n_children(body); ++i)
-        text += " " + print(Sim::GlibPtr<GVariant>(g_variant_get_child_value(body, i)).get());
+        text += " " + print(Serving::GlibPtr<GVariant>(g_variant_get_child_value(body, i)).get());
     return text;
 }
 
 std::string SimClient::print(GVariant* value) {
-    return shorten(Sim::GlibPtr<char>(g_variant_print(value, FALSE)).get());
+    return shorten(Serving::GlibPtr<char>(g_variant_print(value, FALSE)).get());
 }
 
 std::string SimClient::answer(GDBusMessage* message, const std::string& label) {
@@ -173,7 +173,7 @@ std::string SimClient::signalLine(GDBusMessage* message) {
     const char* name = nullptr;
     GVariant* value = nullptr;
     g_variant_get(body, "(&sv)", &name, &value);
-    return sender + " " + name + "=" + print(Sim::GlibPtr<GVariant>(value).get());
+    return sender + " " + name + "=" + print(Serving::GlibPtr<GVariant>(value).get());
 }
 
 GDBusMessage* SimClient::onMessage(GDBusConnection*, GDBusMessage* message, gboolean incoming,

@@ -1,7 +1,7 @@
 #ifndef KESBLUETOOTH_TESTS_SIM_SIM_TEST_H
 #define KESBLUETOOTH_TESTS_SIM_SIM_TEST_H
 
-#include "bus/glib_ptr.h"
+#include "serving/bus/glib_ptr.h"
 #include "support/simulation.h"
 
 #include <gtest/gtest.h>
@@ -62,7 +62,7 @@ public:
     std::string uniqueName() const { return g_dbus_connection_get_unique_name(m_connection); }
 
 private:
-    using Message = Sim::ObjectPtr<GDBusMessage>;
+    using Message = Serving::ObjectPtr<GDBusMessage>;
 
     static GDBusMessage* onMessage(GDBusConnection* connection, GDBusMessage* message,
                                    gboolean incoming, gpointer data);

@@ -1,16 +1,16 @@
-#ifndef KESBLUETOOTH_SIM_BUS_BUS_LINK_H
-#define KESBLUETOOTH_SIM_BUS_BUS_LINK_H
+#ifndef KESBLUETOOTH_SERVING_BUS_BUS_CONNECTION_H
+#define KESBLUETOOTH_SERVING_BUS_BUS_CONNECTION_H
 
-#include "bus/call.h"
+#include "serving/bus/call.h"
 
 #include <functional>
 #include <memory>
 #include <string>
 
-namespace Bluetooth::Sim {
+namespace Bluetooth::Serving {
 
 /// What a method call of ours was answered: results, or an error.
-struct Answer {
+struct CallResult {
     Value results;
     BusError error;
     bool failed = false;
@@ -20,19 +20,19 @@ struct Answer {
 ///
 /// Threads: everything runs on the main loop. GDBus reads on a thread of its own; calls are handed
 /// over in the order in which they came. What is sent leaves in the order in which it was sent.
-class BusLink {
+class BusConnection {
 public:
     using CallHandler = std::function<void(const CallPtr&)>;
     using ClientGone = std::function<void(const std::string& uniqueName)>;
-    using AnswerHandler = std::function<void(const Answer&)>;
+    using AnswerHandler = std::function<void(const CallResult&)>;
 
     /// Connects and starts reading; no name is owned yet.
     /// @throw std::runtime_error  with a text for the user
-    BusLink(const std::string& address, CallHandler onCall);
-    BusLink(const BusLink&) = delete;
-    BusLink& operator=(const BusLink&) = delete;
+    BusConnection(const std::string& address, CallHandler onCall);
+    BusConnection(const BusConnection&) = delete;
+    BusConnection& operator=(const BusConnection&) = delete;
     /// Sends what is queued, then closes the connection.
-    ~BusLink();
+    ~BusConnection();
 
     /// Owns a name, or throws std::runtime_error when it is taken or refused.
     void own(const char* name);
@@ -70,6 +70,6 @@ private:
     std::function<void()> m_busEnded;
 };
 
-} // namespace Bluetooth::Sim
+} // namespace Bluetooth::Serving
 
 #endif

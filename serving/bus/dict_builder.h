@@ -1,22 +1,22 @@
-#ifndef KESBLUETOOTH_SIM_BUS_DICT_H
-#define KESBLUETOOTH_SIM_BUS_DICT_H
+#ifndef KESBLUETOOTH_SERVING_BUS_DICT_BUILDER_H
+#define KESBLUETOOTH_SERVING_BUS_DICT_BUILDER_H
 
-#include "bus/glib_ptr.h"
+#include "serving/bus/glib_ptr.h"
 
 #include <string>
 #include <vector>
 
-namespace Bluetooth::Sim {
+namespace Bluetooth::Serving {
 
 /// Builds an a{sv} whose entries keep their order.
-class Dict {
+class DictBuilder {
 public:
-    Dict() { g_variant_builder_init(&m_builder, G_VARIANT_TYPE("a{sv}")); }
-    Dict(const Dict&) = delete;
-    Dict& operator=(const Dict&) = delete;
-    ~Dict() { g_variant_builder_clear(&m_builder); }
+    DictBuilder() { g_variant_builder_init(&m_builder, G_VARIANT_TYPE("a{sv}")); }
+    DictBuilder(const DictBuilder&) = delete;
+    DictBuilder& operator=(const DictBuilder&) = delete;
+    ~DictBuilder() { g_variant_builder_clear(&m_builder); }
 
-    Dict& add(const char* name, const Value& value) {
+    DictBuilder& add(const char* name, const Value& value) {
         g_variant_builder_add(&m_builder, "{sv}", name, value.get());
         return *this;
     }
@@ -57,6 +57,6 @@ inline Value tuple(const Value& only) {
     return g_variant_new_tuple(&child, 1);
 }
 
-} // namespace Bluetooth::Sim
+} // namespace Bluetooth::Serving
 
 #endif

@@ -1,12 +1,12 @@
-#ifndef KESBLUETOOTH_SIM_BUS_GLIB_PTR_H
-#define KESBLUETOOTH_SIM_BUS_GLIB_PTR_H
+#ifndef KESBLUETOOTH_SERVING_BUS_GLIB_PTR_H
+#define KESBLUETOOTH_SERVING_BUS_GLIB_PTR_H
 
 #include <gio/gio.h>
 
 #include <memory>
 #include <string>
 
-namespace Bluetooth::Sim {
+namespace Bluetooth::Serving {
 
 struct GlibDeleter {
     void operator()(GVariant* variant) const { g_variant_unref(variant); }
@@ -76,6 +76,6 @@ private:
     GError* m_error = nullptr;
 };
 
-} // namespace Bluetooth::Sim
+} // namespace Bluetooth::Serving
 
 #endif

@@ -1,12 +1,12 @@
-#ifndef KESBLUETOOTH_SIM_BUS_INTERFACE_H
-#define KESBLUETOOTH_SIM_BUS_INTERFACE_H
+#ifndef KESBLUETOOTH_SERVING_BUS_INTERFACE_H
+#define KESBLUETOOTH_SERVING_BUS_INTERFACE_H
 
-#include "bus/call.h"
+#include "serving/bus/call.h"
 
 #include <string>
 #include <vector>
 
-namespace Bluetooth::Sim {
+namespace Bluetooth::Serving {
 
 struct Argument {
     const char* name;
@@ -18,7 +18,7 @@ using Arguments = std::vector<Argument>;
 /// Runs one method on the object that serves it.
 using Handler = void (*)(void* object, const CallPtr& call);
 
-struct Method {
+struct MethodEntry {
     const char* name;
     Arguments in;
     Arguments out;
@@ -28,7 +28,7 @@ struct Method {
     std::string inSignature() const;
 };
 
-struct Signal {
+struct SignalEntry {
     const char* name;
     Arguments arguments;
     bool deprecated = false;
@@ -37,11 +37,11 @@ struct Signal {
 /// One interface as a table: dispatch, argument checks and introspection all come from it.
 struct Interface {
     const char* name;
-    std::vector<Method> methods;
-    std::vector<Signal> signals;
+    std::vector<MethodEntry> methods;
+    std::vector<SignalEntry> signals;
 
     /// The method of that name and exactly that signature, or null.
-    const Method* find(const std::string& member, const std::string& signature) const;
+    const MethodEntry* find(const std::string& member, const std::string& signature) const;
     /// The `<interface>` element of the introspection data.
     std::string introspection() const;
 };
@@ -59,6 +59,6 @@ struct HandlerOf<Function> {
 template <auto Function>
 constexpr Handler handle = &HandlerOf<Function>::run;
 
-} // namespace Bluetooth::Sim
+} // namespace Bluetooth::Serving
 
 #endif

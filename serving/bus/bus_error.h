@@ -1,9 +1,9 @@
-#ifndef KESBLUETOOTH_SIM_BUS_BUS_ERROR_H
-#define KESBLUETOOTH_SIM_BUS_BUS_ERROR_H
+#ifndef KESBLUETOOTH_SERVING_BUS_BUS_ERROR_H
+#define KESBLUETOOTH_SERVING_BUS_BUS_ERROR_H
 
 #include <string>
 
-namespace Bluetooth::Sim {
+namespace Bluetooth::Serving {
 
 /// A D-Bus error reply: its name and its text.
 struct BusError {
@@ -56,6 +56,6 @@ inline BusError failed(const char* text) {
 }
 
 } // namespace Errors
-} // namespace Bluetooth::Sim
+} // namespace Bluetooth::Serving
 
 #endif

@@ -1,6 +1,6 @@
-#include "bus/call.h"
+#include "serving/bus/call.h"
 
-namespace Bluetooth::Sim {
+namespace Bluetooth::Serving {
 
 namespace {
 
@@ -84,4 +84,4 @@ void Call::send(GDBusMessage* reply) {
     g_object_unref(reply);
 }
 
-} // namespace Bluetooth::Sim
+} // namespace Bluetooth::Serving

@@ -1,8 +1,8 @@
-#include "bus/interface.h"
+#include "serving/bus/interface.h"
 
 #include <algorithm>
 
-namespace Bluetooth::Sim {
+namespace Bluetooth::Serving {
 
 namespace {
 
@@ -25,15 +25,15 @@ void close(std::string& xml, const char* element, bool deprecated) {
 
 } // namespace
 
-std::string Method::inSignature() const {
+std::string MethodEntry::inSignature() const {
     std::string signature;
     for (const Argument& argument : in)
         signature += argument.type;
     return signature;
 }
 
-const Method* Interface::find(const std::string& member, const std::string& signature) const {
-    const auto found = std::find_if(methods.begin(), methods.end(), [&](const Method& method) {
+const MethodEntry* Interface::find(const std::string& member, const std::string& signature) const {
+    const auto found = std::find_if(methods.begin(), methods.end(), [&](const MethodEntry& method) {
         return member == method.name && signature == method.inSignature();
     });
     return found == methods.end() ? nullptr : &*found;
@@ -41,13 +41,13 @@ const Method* Interface::find(const std::string& member, const std::string& sign
 
 std::string Interface::introspection() const {
     std::string xml = std::string("\t<interface name=\"") + name + "\">\n";
-    for (const Method& method : methods) {
+    for (const MethodEntry& method : methods) {
         open(xml, "method", method.name);
         describe(xml, method.in, "in");
         describe(xml, method.out, "out");
         close(xml, "method", method.deprecated);
     }
-    for (const Signal& signal : signals) {
+    for (const SignalEntry& signal : signals) {
         open(xml, "signal", signal.name);
         describe(xml, signal.arguments, "");
         close(xml, "signal", signal.deprecated);
@@ -55,4 +55,4 @@ std::string Interface::introspection() const {
     return xml + "\t</interface>\n";
 }
 
-} // namespace Bluetooth::Sim
+} // namespace Bluetooth::Serving

@@ -1,9 +1,9 @@
-#include "bus/bus_link.h"
+#include "serving/bus/bus_connection.h"
 
 #include <atomic>
 #include <stdexcept>
 
-namespace Bluetooth::Sim {
+namespace Bluetooth::Serving {
 
 namespace {
 
@@ -27,10 +27,10 @@ BusError fromGlib(const GError* error) {
 
 } // namespace
 
-/// Where the reading thread leaves calls. `link` is used on the main loop only, and null once the
-/// link is gone; calls that are still under way are dropped then.
-struct BusLink::Inbox {
-    BusLink* link;
+/// Where the reading thread leaves calls. `connection` is used on the main loop only, and null once
+/// the it is gone; calls that are still under way are dropped then.
+struct BusConnection::Inbox {
+    BusConnection* connection;
     CallHandler onCall;
 };
 
@@ -47,7 +47,7 @@ std::atomic<unsigned> handedOver{0};
 
 } // namespace
 
-BusLink::BusLink(const std::string& address, CallHandler onCall)
+BusConnection::BusConnection(const std::string& address, CallHandler onCall)
     : m_inbox(std::make_shared<Inbox>(Inbox{this, std::move(onCall)})) {
     ErrorOut error;
     const auto flags =
@@ -62,8 +62,8 @@ BusLink::BusLink(const std::string& address, CallHandler onCall)
         [](gpointer data) { delete static_cast<std::shared_ptr<Inbox>*>(data); });
 }
 
-BusLink::~BusLink() {
-    m_inbox->link = nullptr;
+BusConnection::~BusConnection() {
+    m_inbox->connection = nullptr;
     g_signal_handlers_disconnect_by_data(m_connection, this);
     if (m_clients)
         g_dbus_connection_signal_unsubscribe(m_connection, m_clients);
@@ -75,8 +75,8 @@ BusLink::~BusLink() {
     g_object_unref(m_connection);
 }
 
-GDBusMessage* BusLink::onMessage(GDBusConnection* connection, GDBusMessage* message,
-                                 gboolean incoming, gpointer data) {
+GDBusMessage* BusConnection::onMessage(GDBusConnection* connection, GDBusMessage* message,
+                                       gboolean incoming, gpointer data) {
     const char* interface = g_dbus_message_get_interface(message);
     // GDBus answers org.freedesktop.DBus.Peer on every path, as libdbus does.
     if (!incoming || g_dbus_message_get_message_type(message) != G_DBUS_MESSAGE_TYPE_METHOD_CALL ||
@@ -96,16 +96,16 @@ GDBusMessage* BusLink::onMessage(GDBusConnection* connection, GDBusMessage* mess
     return nullptr;
 }
 
-gboolean BusLink::deliver(gpointer data) {
+gboolean BusConnection::deliver(gpointer data) {
     handedOver.load(std::memory_order_acquire);
     const auto* delivery = static_cast<Delivery*>(data);
     const auto* inbox = static_cast<Inbox*>(delivery->inbox.get());
-    if (inbox->link)
+    if (inbox->connection)
         inbox->onCall(delivery->call);
     return G_SOURCE_REMOVE;
 }
 
-void BusLink::own(const char* name) {
+void BusConnection::own(const char* name) {
     constexpr guint32 doNotQueue = 4;
     constexpr guint32 owned = 1;
     ErrorOut error;
@@ -122,7 +122,7 @@ void BusLink::own(const char* name) {
                                  " is already owned on this bus; stop its owner first");
 }
 
-void BusLink::watchClients(ClientGone onGone) {
+void BusConnection::watchClients(ClientGone onGone) {
     m_clientGone = std::move(onGone);
     m_clients = g_dbus_connection_signal_subscribe(
         m_connection, busName, busName, "NameOwnerChanged", busPath, nullptr,
@@ -133,21 +133,21 @@ void BusLink::watchClients(ClientGone onGone) {
             const char* newOwner = nullptr;
             g_variant_get(arguments, "(&s&s&s)", &name, nullptr, &newOwner);
             if (*name == ':' && !*newOwner)
-                static_cast<BusLink*>(data)->m_clientGone(name);
+                static_cast<BusConnection*>(data)->m_clientGone(name);
         },
         this, nullptr);
 }
 
-void BusLink::watchBus(std::function<void()> onEnd) {
+void BusConnection::watchBus(std::function<void()> onEnd) {
     m_busEnded = std::move(onEnd);
     const auto closed = +[](GDBusConnection*, gboolean, GError*, gpointer data) {
-        static_cast<BusLink*>(data)->m_busEnded();
+        static_cast<BusConnection*>(data)->m_busEnded();
     };
     g_signal_connect(m_connection, "closed", G_CALLBACK(closed), this);
 }
 
-void BusLink::emit(const std::string& path, const std::string& interface, const std::string& member,
-                   const Value& arguments) {
+void BusConnection::emit(const std::string& path, const std::string& interface,
+                         const std::string& member, const Value& arguments) {
     GDBusMessage* message =
         g_dbus_message_new_signal(path.c_str(), interface.c_str(), member.c_str());
     if (arguments)
@@ -157,9 +157,10 @@ void BusLink::emit(const std::string& path, const std::string& interface, const 
     g_object_unref(message);
 }
 
-void BusLink::call(const std::string& destination, const std::string& path,
-                   const std::string& interface, const std::string& member, const Value& arguments,
-                   int timeout, GCancellable* cancellable, AnswerHandler answered) {
+void BusConnection::call(const std::string& destination, const std::string& path,
+                         const std::string& interface, const std::string& member,
+                         const Value& arguments, int timeout, GCancellable* cancellable,
+                         AnswerHandler answered) {
     const auto finished = [](GObject* source, GAsyncResult* result, gpointer data) {
         const std::unique_ptr<AnswerHandler> handler(static_cast<AnswerHandler*>(data));
         ErrorOut error;
@@ -176,17 +177,17 @@ void BusLink::call(const std::string& destination, const std::string& path,
                            new AnswerHandler(std::move(answered)));
 }
 
-void BusLink::send(const std::string& destination, const std::string& path,
-                   const std::string& interface, const std::string& member,
-                   const Value& arguments) {
+void BusConnection::send(const std::string& destination, const std::string& path,
+                         const std::string& interface, const std::string& member,
+                         const Value& arguments) {
     g_dbus_connection_call(m_connection, destination.c_str(), path.c_str(), interface.c_str(),
                            member.c_str(), arguments.get(), nullptr,
                            G_DBUS_CALL_FLAGS_NO_AUTO_START, -1, nullptr, nullptr, nullptr);
 }
 
-void BusLink::afterRoundTrip(std::function<void()> next) {
+void BusConnection::afterRoundTrip(std::function<void()> next) {
     call(busName, busPath, busName, "GetId", {}, -1, nullptr,
-         [next = std::move(next)](const Answer&) { next(); });
+         [next = std::move(next)](const CallResult&) { next(); });
 }
 
-} // namespace Bluetooth::Sim
+} // namespace Bluetooth::Serving

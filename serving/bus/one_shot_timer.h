@@ -1,19 +1,20 @@
-#ifndef KESBLUETOOTH_SIM_WORLD_TIMER_H
-#define KESBLUETOOTH_SIM_WORLD_TIMER_H
+#ifndef KESBLUETOOTH_SERVING_BUS_ONE_SHOT_TIMER_H
+#define KESBLUETOOTH_SERVING_BUS_ONE_SHOT_TIMER_H
 
 #include <glib.h>
 
 #include <functional>
+#include <utility>
 
-namespace Bluetooth::Sim {
+namespace Bluetooth::Serving {
 
 /// One thing that happens later on the main loop, unless the timer is stopped or destroyed before.
-class Timer {
+class OneShotTimer {
 public:
-    Timer() = default;
-    Timer(const Timer&) = delete;
-    Timer& operator=(const Timer&) = delete;
-    ~Timer() { stop(); }
+    OneShotTimer() = default;
+    OneShotTimer(const OneShotTimer&) = delete;
+    OneShotTimer& operator=(const OneShotTimer&) = delete;
+    ~OneShotTimer() { stop(); }
 
     /// Replaces what was set before.
     void start(guint milliseconds, std::function<void()> action) {
@@ -33,7 +34,7 @@ public:
 
 private:
     static gboolean fire(gpointer data) {
-        auto* timer = static_cast<Timer*>(data);
+        auto* timer = static_cast<OneShotTimer*>(data);
         timer->m_source = 0;
         // The action may start this timer again, or destroy it.
         const std::function<void()> action = std::move(timer->m_action);
@@ -46,6 +47,6 @@ private:
     std::function<void()> m_action;
 };
 
-} // namespace Bluetooth::Sim
+} // namespace Bluetooth::Serving
 
 #endif

@@ -1,13 +1,13 @@
-#ifndef KESBLUETOOTH_SIM_BUS_OBJECT_TREE_H
-#define KESBLUETOOTH_SIM_BUS_OBJECT_TREE_H
+#ifndef KESBLUETOOTH_SERVING_BUS_OBJECT_TREE_H
+#define KESBLUETOOTH_SERVING_BUS_OBJECT_TREE_H
 
-#include "bus/interface.h"
+#include "serving/bus/interface.h"
 
 #include <map>
 #include <string>
 #include <vector>
 
-namespace Bluetooth::Sim {
+namespace Bluetooth::Serving {
 
 /// Which object serves which interfaces at which path.
 ///
@@ -36,6 +36,6 @@ private:
     std::map<std::string, std::vector<Served>> m_objects;
 };
 
-} // namespace Bluetooth::Sim
+} // namespace Bluetooth::Serving
 
 #endif

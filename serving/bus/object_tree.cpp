@@ -1,6 +1,6 @@
-#include "bus/object_tree.h"
+#include "serving/bus/object_tree.h"
 
-namespace Bluetooth::Sim {
+namespace Bluetooth::Serving {
 
 namespace {
 
@@ -33,7 +33,7 @@ void ObjectTree::dispatch(const CallPtr& call) const {
     for (const Served& served : object->second) {
         if (call->interface() != served.interface->name)
             continue;
-        if (const Method* method = served.interface->find(call->member(), call->signature())) {
+        if (const MethodEntry* method = served.interface->find(call->member(), call->signature())) {
             // The handler may remove the object: nothing of the tree is used after it.
             const Handler handler = method->handler;
             return handler(served.object, call);
@@ -76,4 +76,4 @@ std::vector<std::string> ObjectTree::childrenOf(const std::string& path) const {
     return children;
 }
 
-} // namespace Bluetooth::Sim
+} // namespace Bluetooth::Serving

@@ -1,13 +1,13 @@
-#ifndef KESBLUETOOTH_SIM_BUS_CALL_H
-#define KESBLUETOOTH_SIM_BUS_CALL_H
+#ifndef KESBLUETOOTH_SERVING_BUS_CALL_H
+#define KESBLUETOOTH_SERVING_BUS_CALL_H
 
-#include "bus/bus_error.h"
-#include "bus/glib_ptr.h"
+#include "serving/bus/bus_error.h"
+#include "serving/bus/glib_ptr.h"
 
 #include <memory>
 #include <string>
 
-namespace Bluetooth::Sim {
+namespace Bluetooth::Serving {
 
 /// A method call that came in and is answered once, now or later.
 ///
@@ -49,6 +49,6 @@ private:
 
 using CallPtr = std::shared_ptr<Call>;
 
-} // namespace Bluetooth::Sim
+} // namespace Bluetooth::Serving
 
 #endif
