@@ -1,10 +1,10 @@
 // kesbt: works with Bluetooth from the command line, through BlueZ 4's bluetoothd.
 
-#include "base/answer_limit.h"
-#include "base/failure.h"
-#include "base/output.h"
-#include "base/text.h"
-#include "base/verb.h"
+#include "command/answer_limit.h"
+#include "command/verb.h"
+#include "show/failure.h"
+#include "show/output.h"
+#include "show/text.h"
 
 #include <dbus/dbus.h>
 #include <fcntl.h>

@@ -1,4 +1,4 @@
-#include "base/verb.h"
+#include "command/verb.h"
 
 /// All verbs, in the order of the program's help. Each is defined in the file of its name in
 /// verbs/ as NAMEVerb.

@@ -1,10 +1,10 @@
-#include "base/bluez.h"
-#include "base/bus_feed.h"
-#include "base/shown_agent.h"
-#include "base/style.h"
-#include "base/text.h"
-#include "base/verb.h"
-#include "base/waiting.h"
+#include "command/verb.h"
+#include "daemon/bluez.h"
+#include "daemon/bus_feed.h"
+#include "daemon/shown_agent.h"
+#include "show/style.h"
+#include "show/text.h"
+#include "wait/waiting.h"
 
 #include <iostream>
 

@@ -1,8 +1,8 @@
-#include "base/answer_limit.h"
-#include "base/autoconnect_file.h"
-#include "base/bluez.h"
-#include "base/text.h"
-#include "base/verb.h"
+#include "command/answer_limit.h"
+#include "command/verb.h"
+#include "daemon/autoconnect_file.h"
+#include "daemon/bluez.h"
+#include "show/text.h"
 
 #include <bluetooth/auto_connect.h>
 

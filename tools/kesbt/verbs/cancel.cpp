@@ -1,5 +1,5 @@
-#include "base/bluez.h"
-#include "base/verb.h"
+#include "command/verb.h"
+#include "daemon/bluez.h"
 
 #include <iostream>
 

@@ -1,6 +1,6 @@
-#include "base/bluez.h"
-#include "base/creation.h"
-#include "base/verb.h"
+#include "command/verb.h"
+#include "daemon/bluez.h"
+#include "daemon/creation.h"
 
 namespace Kesbt {
 

@@ -1,6 +1,6 @@
-#include "base/answer_limit.h"
-#include "base/bluez.h"
-#include "base/verb.h"
+#include "command/answer_limit.h"
+#include "command/verb.h"
+#include "daemon/bluez.h"
 
 namespace Kesbt {
 

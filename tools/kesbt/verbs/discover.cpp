@@ -1,9 +1,9 @@
-#include "base/bluez.h"
-#include "base/bus_feed.h"
-#include "base/device_watch.h"
-#include "base/receive_loop.h"
-#include "base/verb.h"
-#include "base/waiting.h"
+#include "command/verb.h"
+#include "daemon/bluez.h"
+#include "daemon/bus_feed.h"
+#include "daemon/receive_loop.h"
+#include "show/device_watch.h"
+#include "wait/waiting.h"
 
 namespace Kesbt {
 

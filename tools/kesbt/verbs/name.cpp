@@ -1,7 +1,7 @@
-#include "base/failure.h"
-#include "base/output.h"
-#include "base/text.h"
-#include "base/verb.h"
+#include "command/verb.h"
+#include "show/failure.h"
+#include "show/output.h"
+#include "show/text.h"
 
 #include <bluetooth/commandlib.h>
 

@@ -1,8 +1,8 @@
-#include "base/answer_limit.h"
-#include "base/failure.h"
-#include "base/output.h"
-#include "base/text.h"
-#include "base/verb.h"
+#include "command/answer_limit.h"
+#include "command/verb.h"
+#include "daemon/refusal.h"
+#include "show/output.h"
+#include "show/text.h"
 
 #include <bluetooth/dbus_object.h>
 

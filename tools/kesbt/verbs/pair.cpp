@@ -1,8 +1,8 @@
-#include "base/bluez.h"
-#include "base/creation.h"
-#include "base/shown_agent.h"
-#include "base/text.h"
-#include "base/verb.h"
+#include "command/verb.h"
+#include "daemon/bluez.h"
+#include "daemon/creation.h"
+#include "daemon/shown_agent.h"
+#include "show/text.h"
 
 #include <iostream>
 

@@ -1,7 +1,7 @@
-#include "base/answer_limit.h"
-#include "base/bluez.h"
-#include "base/verb.h"
-#include "base/waiting.h"
+#include "command/answer_limit.h"
+#include "command/verb.h"
+#include "daemon/bluez.h"
+#include "wait/waiting.h"
 
 #include <iostream>
 

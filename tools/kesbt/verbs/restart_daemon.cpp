@@ -1,7 +1,7 @@
-#include "base/failure.h"
-#include "base/output.h"
-#include "base/verb.h"
-#include "base/waiting.h"
+#include "command/verb.h"
+#include "show/failure.h"
+#include "show/output.h"
+#include "wait/waiting.h"
 
 #include <bluetooth/bluez_object.h>
 #include <bluetooth/commandlib.h>

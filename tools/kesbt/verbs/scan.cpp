@@ -1,9 +1,9 @@
-#include "base/answer_limit.h"
-#include "base/bluez.h"
-#include "base/device_watch.h"
-#include "base/table.h"
-#include "base/verb.h"
-#include "base/waiting.h"
+#include "command/answer_limit.h"
+#include "command/verb.h"
+#include "daemon/bluez.h"
+#include "show/device_watch.h"
+#include "show/table.h"
+#include "wait/waiting.h"
 
 #include <bluetooth/scanner.h>
 

@@ -1,9 +1,9 @@
-#include "base/bluez.h"
-#include "base/creation.h"
-#include "base/service_record.h"
-#include "base/table.h"
-#include "base/uuid.h"
-#include "base/verb.h"
+#include "command/verb.h"
+#include "daemon/bluez.h"
+#include "daemon/creation.h"
+#include "show/service_record.h"
+#include "show/table.h"
+#include "show/uuid.h"
 
 #include <cstdlib>
 

@@ -1,6 +1,6 @@
-#include "base/bluez.h"
-#include "base/verb.h"
-#include "base/waiting.h"
+#include "command/verb.h"
+#include "daemon/bluez.h"
+#include "wait/waiting.h"
 
 #include <bluetooth/audio.h>
 #include <bluetooth/control.h>

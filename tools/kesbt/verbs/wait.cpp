@@ -1,9 +1,9 @@
-#include "base/answer_limit.h"
-#include "base/bluez.h"
-#include "base/bus_feed.h"
-#include "base/text.h"
-#include "base/verb.h"
-#include "base/waiting.h"
+#include "command/answer_limit.h"
+#include "command/verb.h"
+#include "daemon/bluez.h"
+#include "daemon/bus_feed.h"
+#include "show/text.h"
+#include "wait/waiting.h"
 
 #include <iostream>
 

@@ -1,0 +1,37 @@
+#include "command/verb.h"
+
+#include "show/text.h"
+
+#include <cstdlib>
+
+namespace Kesbt {
+
+std::shared_ptr<std::string> addAddress(CLI::App& command) {
+    auto address = std::make_shared<std::string>();
+    command.add_option("ADDRESS", *address, "The device, e.g. 00:11:22:33:44:55")
+        ->required()
+        ->type_name("")
+        ->transform(addressInCapitals)
+        ->check([](const std::string& text) {
+            return isAddress(text) ? std::string()
+                                   : quoted(text) + " is no address such as 00:11:22:33:44:55";
+        });
+    return address;
+}
+
+std::shared_ptr<double> addSeconds(CLI::App& command, const std::string& name,
+                                   const std::string& description) {
+    auto seconds = std::make_shared<double>(0);
+    command.add_option(name, *seconds, description)->type_name("SECONDS")->check(checkSeconds);
+    return seconds;
+}
+
+std::string checkSeconds(const std::string& text) {
+    constexpr double longest = 1e6;
+    char* end = nullptr;
+    const double seconds = std::strtod(text.c_str(), &end);
+    const bool usable = end != text.c_str() && *end == '\0' && seconds > 0 && seconds <= longest;
+    return usable ? "" : quoted(text) + " is no time such as 10 or 0.5";
+}
+
+} // namespace Kesbt

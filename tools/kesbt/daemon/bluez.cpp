@@ -1,0 +1,152 @@
+#include "daemon/bluez.h"
+
+#include "command/answer_limit.h"
+#include "show/table.h"
+#include "show/text.h"
+
+#include <bluetooth/commandlib.h>
+
+#include <cstdlib>
+
+namespace Kesbt {
+
+using Bluetooth::Adapter;
+using Bluetooth::Device;
+using Bluetooth::Manager;
+
+namespace {
+
+std::string addressOf(const Device& device) {
+    const std::unique_ptr<char, decltype(&std::free)> address(
+        Bluetooth::getAddressFromPath(device.getPath()), std::free);
+    return address ? address.get() : "";
+}
+
+} // namespace
+
+std::unique_ptr<Manager> openManager() {
+    const AnswerLimit limit;
+    std::unique_ptr<Manager> manager(Manager::getManager());
+    if (!manager)
+        throw daemonAbsent();
+    return manager;
+}
+
+std::unique_ptr<Adapter> openAdapter(Manager& manager, const Options& options) {
+    const AnswerLimit limit;
+    const bool chosen = !options.adapter.empty();
+    std::unique_ptr<Adapter> adapter(chosen ? manager.findAdapter(options.adapter.c_str())
+                                            : manager.defaultAdapter());
+    if (adapter)
+        return adapter;
+    const std::string reason = manager.getErrorMessage();
+    if (reason == "No such adapter")
+        throw Failure(chosen
+                          ? "there is no adapter " + options.adapter +
+                                "; see which there are: kesbt adapters"
+                          : "there is no Bluetooth adapter; plug one in and see: kesbt adapters");
+    throw refusal("cannot find the adapter", manager);
+}
+
+std::unique_ptr<Adapter> openAdapter(const Options& options) {
+    return openAdapter(*openManager(), options);
+}
+
+std::string defaultAdapterPath(Manager& manager) {
+    const AnswerLimit limit;
+    const std::unique_ptr<Adapter> adapter(manager.defaultAdapter());
+    return adapter ? adapter->getPath() : "";
+}
+
+std::unique_ptr<Device> openDevice(Adapter& adapter, const std::string& address) {
+    const AnswerLimit limit;
+    std::unique_ptr<Device> device(adapter.findDevice(address.c_str(), false));
+    if (device)
+        return device;
+    if (adapter.getErrorMessage() == "Does Not Exist")
+        throw Failure(adapterName(adapter) + " does not know " + address +
+                      "; see what it knows: kesbt devices, or make it known: kesbt create " +
+                      address);
+    throw refusal("cannot find " + address, adapter);
+}
+
+std::unique_ptr<Device> openDevice(const Options& options, const std::string& address) {
+    return openDevice(*openAdapter(options), address);
+}
+
+std::string adapterName(const Bluetooth::RemoteObject& object) {
+    const std::string path = object.getPath();
+    const std::size_t device = path.find("/dev_");
+    return lastComponent(path.substr(0, device));
+}
+
+Json readProperties(Bluetooth::BluezObject& object) {
+    const AnswerLimit limit;
+    const std::unique_ptr<Bluetooth::Dict> properties(
+        object.Bluetooth::BluezObject::getProperties());
+    if (!properties)
+        throw refusal("cannot read the properties of " + lastComponent(object.getPath()), object);
+    return toJson(*properties);
+}
+
+Json readOptional(Bluetooth::BluezObject& object) {
+    const AnswerLimit limit;
+    const std::unique_ptr<Bluetooth::Dict> properties(object.getProperties());
+    if (properties)
+        return toJson(*properties);
+    const std::string reason = object.getErrorMessage();
+    if (reason.find("doesn't exist") == std::string::npos)
+        throw refusal("cannot read the properties of " + lastComponent(object.getPath()), object);
+    return nullptr;
+}
+
+Json describe(const Adapter& adapter, bool isDefault, Json properties) {
+    return {{"adapter", adapterName(adapter)},
+            {"path", adapter.getPath()},
+            {"default", isDefault},
+            {"properties", std::move(properties)}};
+}
+
+Json describe(const Device& device, Json properties) {
+    return {{"address", addressOf(device)},
+            {"adapter", adapterName(device)},
+            {"path", device.getPath()},
+            {"properties", std::move(properties)}};
+}
+
+void printDevices(const Options& options, const Bluetooth::DeviceList& devices) {
+    Json list = Json::array();
+    for (Device* device : devices) {
+        if (!device)
+            throw daemonLost();
+        list.push_back(describe(*device, readProperties(*device)));
+    }
+    if (options.json) {
+        printDocument(list);
+        return;
+    }
+    Table table({"ADDRESS", "PAIRED", "TRUSTED", "CONNECTED", "KIND", "NAME"});
+    for (const Json& device : list) {
+        const Json& properties = device["properties"];
+        table.add({{display(device["address"]), Colour::Bold},
+                   yesNo(field(properties, "Paired")),
+                   yesNo(field(properties, "Trusted")),
+                   yesNo(field(properties, "Connected")),
+                   field(properties, "Icon"),
+                   field(properties, "Alias")});
+    }
+    table.print();
+}
+
+void printDevice(const Options& options, Device& device) {
+    const Json document = describe(device, readProperties(device));
+    if (options.json) {
+        printDocument(document);
+        return;
+    }
+    Json lines = {{"Path", document["path"]}};
+    lines.update(document["properties"]);
+    printProperties(lines);
+}
+
+} // namespace Kesbt

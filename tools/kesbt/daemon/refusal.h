@@ -1,0 +1,30 @@
+#ifndef KESBT_DAEMON_REFUSAL_H
+#define KESBT_DAEMON_REFUSAL_H
+
+#include "show/failure.h"
+
+#include <string>
+
+namespace Bluetooth {
+class RemoteObject;
+}
+
+namespace Kesbt {
+
+/// The bus or the daemon is not there. Looks which of them is missing.
+Failure daemonAbsent();
+/// The daemon was there when the verb began.
+Failure daemonLost();
+
+/// What the daemon answered, with advice where there is any.
+/// @param what what was not possible, e.g. "cannot start a discovery on hci0"
+Failure refusal(const std::string& what, Bluetooth::RemoteObject& proxy);
+Failure refusal(const std::string& what, const std::string& reason);
+
+/// The adapter cannot go on.
+Failure adapterRemoved(const std::string& adapter);
+Failure adapterOff(const std::string& adapter);
+
+} // namespace Kesbt
+
+#endif

@@ -1,0 +1,15 @@
+#ifndef KESBT_SHOW_STYLE_H
+#define KESBT_SHOW_STYLE_H
+
+#include <string>
+
+namespace Kesbt {
+
+enum class Colour { Plain, Bold, Green, Yellow, Red, Dim };
+
+/// The text in a colour when standard output is a terminal and NO_COLOR is not set.
+std::string coloured(const std::string& text, Colour colour);
+
+} // namespace Kesbt
+
+#endif

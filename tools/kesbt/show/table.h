@@ -1,0 +1,40 @@
+#ifndef KESBT_SHOW_TABLE_H
+#define KESBT_SHOW_TABLE_H
+
+#include "show/style.h"
+
+#include <string>
+#include <vector>
+
+namespace Kesbt {
+
+struct Cell {
+    Cell(std::string content, Colour shade = Colour::Plain)
+        : text(std::move(content)), colour(shade) {}
+    Cell(const char* content) : text(content) {}
+
+    std::string text;
+    Colour colour = Colour::Plain;
+};
+
+/// "yes" in green, anything else plain.
+Cell yesNo(const std::string& text);
+
+/// Rows in aligned columns for people. Unprintable characters are shown as escapes.
+class Table {
+public:
+    /// A table without headings: name and value, one a line.
+    Table() = default;
+    explicit Table(const std::vector<std::string>& headings);
+
+    void add(std::vector<Cell> row);
+    /// Writes it to standard output.
+    void print() const;
+
+private:
+    std::vector<std::vector<Cell>> m_rows;
+};
+
+} // namespace Kesbt
+
+#endif

@@ -1,0 +1,108 @@
+#include "show/text.h"
+
+#include <algorithm>
+#include <cctype>
+#include <cstdio>
+#include <numeric>
+
+namespace Kesbt {
+
+namespace {
+
+/// How many characters have to be inserted, left out, replaced or swapped with their neighbour.
+std::size_t distance(const std::string& from, const std::string& to) {
+    std::vector<std::size_t> beforeLast(to.size() + 1);
+    std::vector<std::size_t> last(to.size() + 1);
+    std::iota(last.begin(), last.end(), 0U);
+    for (std::size_t i = 1; i <= from.size(); ++i) {
+        std::vector<std::size_t> row(to.size() + 1, i);
+        for (std::size_t j = 1; j <= to.size(); ++j) {
+            const std::size_t replaced = last[j - 1] + (from[i - 1] == to[j - 1] ? 0 : 1);
+            row[j] = std::min({last[j] + 1, row[j - 1] + 1, replaced});
+            if (i > 1 && j > 1 && from[i - 1] == to[j - 2] && from[i - 2] == to[j - 1])
+                row[j] = std::min(row[j], beforeLast[j - 2] + 1);
+        }
+        beforeLast = std::move(last);
+        last = std::move(row);
+    }
+    return last.back();
+}
+
+} // namespace
+
+std::string upperCase(std::string text) {
+    std::transform(text.begin(), text.end(), text.begin(),
+                   [](unsigned char c) { return static_cast<char>(std::toupper(c)); });
+    return text;
+}
+
+std::string addressInCapitals(const std::string& text) {
+    return isAddress(text) ? upperCase(text) : text;
+}
+
+std::string quoted(const std::string& text) {
+    return '"' + printable(text) + '"';
+}
+
+std::string printable(const std::string& text) {
+    std::string result;
+    for (std::size_t i = 0; i < text.size(); ++i) {
+        const auto byte = static_cast<unsigned char>(text[i]);
+        // U+0080 to U+009F are control characters too; in UTF-8 they begin with 0xc2.
+        const bool wide =
+            byte == 0xc2 && i + 1 < text.size() && static_cast<unsigned char>(text[i + 1]) < 0xa0;
+        if (byte == '\n') {
+            result += "\\n";
+        } else if (byte < 0x20 || byte == 0x7f || wide) {
+            char escape[8];
+            static_cast<void>(std::snprintf(escape, sizeof escape, "\\x%02x",
+                                            wide ? static_cast<unsigned char>(text[++i]) : byte));
+            result += escape;
+        } else {
+            result += text[i];
+        }
+    }
+    return result;
+}
+
+std::size_t columns(const std::string& text) {
+    return static_cast<std::size_t>(std::count_if(text.begin(), text.end(), [](char c) {
+        return (static_cast<unsigned char>(c) & 0xc0) != 0x80; // not inside a character
+    }));
+}
+
+std::string padded(const std::string& text, std::size_t width) {
+    const std::size_t length = columns(text);
+    return text + std::string(length < width ? width - length : 0, ' ');
+}
+
+bool isAddress(const std::string& text) {
+    constexpr std::size_t length = 17;
+    if (text.size() != length)
+        return false;
+    for (std::size_t i = 0; i < length; ++i) {
+        const auto c = static_cast<unsigned char>(text[i]);
+        if (i % 3 == 2 ? c != ':' : std::isxdigit(c) == 0)
+            return false;
+    }
+    return true;
+}
+
+std::string lastComponent(const std::string& path) {
+    return path.substr(path.rfind('/') + 1);
+}
+
+std::string nearest(const std::string& typed, const std::vector<std::string>& words) {
+    std::string best;
+    std::size_t least = 1 + std::max<std::size_t>(1, typed.size() / 3); // more is another word
+    for (const std::string& word : words) {
+        const std::size_t mistakes = distance(typed, word);
+        if (mistakes < least) {
+            least = mistakes;
+            best = word;
+        }
+    }
+    return best;
+}
+
+} // namespace Kesbt

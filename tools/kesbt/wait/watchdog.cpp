@@ -1,0 +1,84 @@
+#include "wait/watchdog.h"
+
+#include "show/failure.h"
+
+#include <unistd.h>
+
+#include <algorithm>
+#include <iostream>
+
+namespace Kesbt {
+
+namespace {
+
+/// How long the daemon may take to carry a cancellation out.
+constexpr std::chrono::seconds grace{5};
+constexpr std::chrono::seconds progressInterval{5};
+
+} // namespace
+
+Watchdog::Watchdog(Task task) : m_task(std::move(task)), m_thread([this] { watch(); }) {}
+
+Watchdog::~Watchdog() {
+    m_hasEnded = true;
+    m_ended.raise();
+    m_thread.join();
+}
+
+void Watchdog::throwIfCancelled() const {
+    if (m_reason != Reason::None)
+        throw Failure(message(m_reason));
+}
+
+void Watchdog::watch() {
+    const auto deadline =
+        m_task.limit.count() < 0 ? Clock::time_point::max() : m_begin + m_task.limit;
+    if (awaitEnd(deadline))
+        return;
+    m_task.cancel();
+    // A daemon that does not answer any more must not keep the user waiting: leaving the bus ends
+    // the call too.
+    const Reason reason = m_reason;
+    if (awaitEnd(Clock::now() + grace))
+        return;
+    std::cerr << message(reason) << '\n';
+    _exit(1);
+}
+
+/// @return whether the call has ended; false with the reason why it should be
+bool Watchdog::awaitEnd(Clock::time_point deadline) {
+    const bool cancelled = m_reason != Reason::None;
+    while (!m_hasEnded) {
+        const auto now = Clock::now();
+        if (m_interrupt.take()) {
+            m_reason = Reason::Interrupted;
+            return false;
+        }
+        if (now >= deadline) {
+            if (!cancelled)
+                m_reason = Reason::TimedOut;
+            return false;
+        }
+        auto next = deadline;
+        if (m_task.showsProgress && !cancelled)
+            next = std::min(next, now + progressInterval);
+        waitForInput({m_interrupt.fd(), m_ended.fd()}, next);
+        if (next < deadline && Clock::now() >= next)
+            showProgress();
+    }
+    return true;
+}
+
+void Watchdog::showProgress() const {
+    const auto seconds = std::chrono::duration_cast<std::chrono::seconds>(Clock::now() - m_begin);
+    std::cerr << "Still " << m_task.name << " (" << seconds.count() << " s)\n";
+}
+
+std::string Watchdog::message(Reason reason) const {
+    if (reason == Reason::Interrupted)
+        return "interrupted while " + m_task.name + "; repeat the command to try again";
+    return "time is over while " + m_task.name +
+           "; make sure that the device is on and within reach, or give a longer --timeout";
+}
+
+} // namespace Kesbt
