@@ -4,7 +4,6 @@
 #include <bluetooth/scanner_object.h>
 #include <bluetooth/server_object.h>
 
-#include <map>
 #include <memory>
 #include <mutex>
 #include <string>
@@ -12,8 +11,10 @@
 
 namespace Bluetooth {
 
-class Adapter;
+class Finders;
 class Manager;
+class ScannerState;
+struct StartedDiscovery;
 
 /// The scanner service: lets several programs share the discovery of Bluetooth devices. It serves
 /// com.kestrine.bluetooth.Scanner (see scanner_object.h for its methods, Scanner for the client)
@@ -79,35 +80,25 @@ public:
 
 private:
     friend class ServerObject; // startLoop() begins and ends the receiving
-    friend class Finders;
-
-    // A discovery that was started for a finder.
-    struct Discovery {
-        std::shared_ptr<Adapter> adapter;  // subscribed; destroying it ends the subscriptions
-        std::shared_ptr<AddressSet> found; // the finder's, or nobody's when there was a finder
-    };
+    friend class Finders;      // asks for the manager, as the server itself does
 
     Manager* fetchManager();
     void startReceiver();
     void startReceiving();
     void stopReceiving();
     void joinReceiver();
-    std::vector<Discovery> takeDiscoveries();
-
-    static constexpr int ticksToLive = 30;
+    std::vector<StartedDiscovery> takeDiscoveries();
 
     ScannerObject* m_scannerObject;
+    std::unique_ptr<ScannerState> m_state; // what the threads share; it locks for itself
+    std::unique_ptr<Finders> m_finders;
 
-    // Guards what follows and the scanner object's finders. Nothing is called while it is held: no
-    // bus, no GLib, no callback. No other lock is taken under it.
-    std::mutex m_mutex;
+    // Guards what follows. Nothing is called while it is held: no bus, no GLib, no callback. No
+    // other lock is taken under it.
+    std::mutex m_receiverMutex;
     std::unique_ptr<Manager> m_manager; // set once
     bool m_receives = false;            // startLoop() runs
     bool m_hasReceiver = false;         // the manager has a receive thread that nobody joined
-    std::vector<Discovery> m_discoveries;
-    AddressSet m_filterSet;
-    std::map<std::string, std::string> m_deviceInfo;
-    int m_idleCountdown = ticksToLive;
 };
 
 } // namespace Bluetooth

@@ -1,7 +1,7 @@
 #ifndef KESBLUETOOTH_SCANNER_FINDERS_H
 #define KESBLUETOOTH_SCANNER_FINDERS_H
 
-#include <bluetooth/scanner_object.h>
+#include "scanner/scanner_state.h"
 
 #include <memory>
 #include <string>
@@ -10,46 +10,48 @@
 
 namespace Bluetooth {
 
-class Adapter;
-class RemoteObject;
 class ScannerServer;
 
-/// The finders of a scanner object, whose other half (discoveries, texts, lock) is the server's.
-/// May be used on any thread.
+/// Makes, looks up and ends the finders of a server's scanner object, or of any other: what the
+/// Bluetooth daemon is asked for them, around what ScannerState keeps.
+///
+/// May be used on any thread. No lock is held while the daemon is asked, so two threads may make a
+/// finder for the same adapter at once: the first is kept.
 class Finders {
 public:
-    using Set = std::shared_ptr<AddressSet>;
+    using Set = ScannerState::Set;
 
-    Finders(ScannerServer& server, ScannerObject& object) : m_server(server), m_object(object) {}
+    Finders(ScannerServer& server, ScannerState& state, ScannerObject& served)
+        : m_server(server), m_state(state), m_served(served) {}
 
     /// @return null when there is no Bluetooth daemon or it does not know the adapter
-    static std::unique_ptr<Adapter> findAdapter(ScannerServer& server, const char* pattern);
+    std::unique_ptr<Adapter> findAdapter(const char* pattern);
 
     /// See ScannerObject::addFinder().
-    Set add(const std::string& adapterId);
+    Set add(ScannerObject& object, const std::string& adapterId);
     /// See ScannerObject::getListByName().
-    Set of(const std::string& path);
+    Set of(ScannerObject& object, const std::string& path);
     /// Ends the oldest discovery on an adapter, and its finder.
-    void remove(Adapter& adapter);
+    void remove(ScannerObject& object, Adapter& adapter);
 
-    /// @return address and properties of the devices in the set that the daemon does not know
+    /// Asks the daemon which devices it knows.
+    /// @return address and properties of the others in the set
     std::vector<std::pair<std::string, std::string>> unknownDevices(const AddressSet& set);
 
     /// Callbacks for the signals of an adapter.
-    static void deviceFound(ScannerServer& server, const RemoteObject* sender,
-                            const std::string& address, const std::string& text);
-    static void deviceDisappeared(ScannerServer& server, const RemoteObject* sender,
-                                  const std::string& address);
+    void deviceFound(const RemoteObject* sender, const std::string& address,
+                     const std::string& text);
+    void deviceDisappeared(const RemoteObject* sender, const std::string& address);
 
 private:
-    static bool isListening(ScannerServer& server, const RemoteObject* sender);
-
     ScannerServer& m_server;
-    ScannerObject& m_object;
+    ScannerState& m_state;
+    ScannerObject& m_served;
 };
 
-/// The server that handlers and callbacks go to; null before the first is complete.
-ScannerServer* currentServer();
+/// The finders of the current server, to which handlers and callbacks go; null before the first
+/// server is complete.
+Finders* currentFinders();
 
 } // namespace Bluetooth
 

@@ -1,7 +1,6 @@
 #include <bluetooth/scanner_object.h>
 
 #include <bluetooth/adapter.h>
-#include <bluetooth/scanner_server.h>
 
 #include "scanner/finders.h"
 #include "scanner/scanner_object_info.h"
@@ -58,35 +57,34 @@ const DBusGObjectInfo& scannerObjectInfo() {
 }
 
 AddressSet* ScannerObject::addFinder(const char* adapterId) {
-    ScannerServer* server = currentServer();
-    return server && adapterId ? Finders(*server, *this).add(adapterId).get() : nullptr;
+    Finders* current = currentFinders();
+    return current && adapterId ? current->add(*this, adapterId).get() : nullptr;
 }
 
 // NOLINTNEXTLINE(performance-unnecessary-value-param): callers were built with it
 AddressSet* ScannerObject::getListByName(std::string path) {
-    ScannerServer* server = currentServer();
-    return server ? Finders(*server, *this).of(path).get() : nullptr;
+    Finders* current = currentFinders();
+    return current ? current->of(*this, path).get() : nullptr;
 }
 
 gboolean scanner_object_list_devices(ScannerObject* object, const char* adapterId,
                                      GHashTable** devices, GError** error) try {
     if (!object)
         return notFound(error, "Object", adapterId);
-    ScannerServer* server = currentServer();
-    if (!server)
+    Finders* current = currentFinders();
+    if (!current)
         return notFound(error, "Server", adapterId);
-    const std::unique_ptr<Adapter> adapter = Finders::findAdapter(*server, adapterId);
+    const std::unique_ptr<Adapter> adapter = current->findAdapter(adapterId);
     if (!adapter)
         return notFound(error, "Adapter", adapterId);
-    Finders finders(*server, *object);
-    const Finders::Set set = finders.of(adapter->getPath());
+    const Finders::Set set = current->of(*object, adapter->getPath());
     if (!set)
         return notFound(error, "Set", adapterId);
-    server->updateFilterSet();
+    const auto unknown = current->unknownDevices(*set);
 
     // dbus-glib unrefs the table and leaves its texts to it.
     *devices = g_hash_table_new_full(g_str_hash, g_str_equal, g_free, g_free);
-    for (const auto& [address, text] : finders.unknownDevices(*set))
+    for (const auto& [address, text] : unknown)
         g_hash_table_insert(*devices, g_strdup(address.c_str()), g_strdup(text.c_str()));
     if (g_hash_table_size(*devices) == 0) // clients know an answer by its never being empty
         g_hash_table_insert(*devices, g_strdup(""), g_strdup(""));
@@ -101,12 +99,11 @@ gboolean scanner_object_remove_finder(ScannerObject* object, const char* adapter
         g_set_error_literal(error, errorDomain, errorCode, "Scanner or AdapterId is null");
         return FALSE;
     }
-    ScannerServer* server = currentServer();
-    const std::unique_ptr<Adapter> adapter =
-        server ? Finders::findAdapter(*server, adapterId) : nullptr;
+    Finders* current = currentFinders();
+    const std::unique_ptr<Adapter> adapter = current ? current->findAdapter(adapterId) : nullptr;
     if (!adapter)
         return FALSE; // on purpose without an error: clients remove finders of adapters long gone
-    Finders(*server, *object).remove(*adapter);
+    current->remove(*object, *adapter);
     return TRUE;
 } catch (const std::bad_alloc&) {
     return notFound(error, "Set", adapterId);

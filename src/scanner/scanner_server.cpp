@@ -13,6 +13,7 @@
 
 #include <algorithm>
 #include <atomic>
+#include <utility>
 
 namespace Bluetooth {
 
@@ -20,7 +21,7 @@ namespace {
 
 using Lock = std::lock_guard<std::mutex>;
 
-std::atomic<ScannerServer*> current{nullptr};
+std::atomic<Finders*> current{nullptr};
 
 /// @return "00:11:22:33:44:55" for ".../dev_00_11_22_33_44_55"; "" for any other path
 std::string addressOf(const std::string& devicePath) {
@@ -47,45 +48,44 @@ void addKnownDevices(Adapter& adapter, AddressSet& addresses) {
 
 } // namespace
 
-ScannerServer* currentServer() {
+Finders* currentFinders() {
     return current;
 }
 
 ScannerServer::ScannerServer()
     : ServerObject(scannerBusName, scannerPath, DBUS_BUS_SESSION),
       m_scannerObject(
-          static_cast<ScannerObject*>(g_object_new(scanner_object_get_type(), nullptr))) {
+          static_cast<ScannerObject*>(g_object_new(scanner_object_get_type(), nullptr))),
+      m_state(std::make_unique<ScannerState>()),
+      m_finders(std::make_unique<Finders>(*this, *m_state, *m_scannerObject)) {
     const Manager* manager = fetchManager();
     const bool prepared = prepareObjectInfo(scanner_object_get_type(), &scannerObjectInfo(),
                                             &m_scannerObject->parent);
     if (!manager || !prepared)
         logError(KES_HERE, "Failed to initial the ScannerServer");
     updateFilterSet();
-    current = this;
+    current = m_finders.get();
 }
 
 ScannerServer::~ScannerServer() {
     joinReceiver(); // its callbacks use what is destroyed here
-    ScannerServer* self = this;
-    current.compare_exchange_strong(self, nullptr); // a handler that comes later finds no server
+    Finders* own = m_finders.get();
+    current.compare_exchange_strong(own, nullptr); // a handler that comes later finds no server
     takeDiscoveries();
     g_object_unref(m_scannerObject);
 }
 
 int ScannerServer::callbackThreadHandler(void*) {
-    {
-        const Lock lock(m_mutex);
-        if (--m_idleCountdown != 0) // below 0 the loop runs on: only reaching 0 ends it
-            return 1;
-    }
+    if (!m_state->countDown())
+        return 1;
     quitLoop();
     return 0;
 }
 
 void ScannerServer::addAdapterFounder(const char* adapterId) {
-    const std::unique_ptr<Adapter> adapter = Finders::findAdapter(*this, adapterId);
+    const std::unique_ptr<Adapter> adapter = m_finders->findAdapter(adapterId);
     if (adapter)
-        Finders(*this, *m_scannerObject).add(adapter->getPath());
+        m_finders->add(*m_scannerObject, adapter->getPath());
 }
 
 void ScannerServer::updateFilterSet() {
@@ -102,53 +102,45 @@ void ScannerServer::updateFilterSet() {
                 addKnownDevices(*adapter, known);
         }
     }
-    const Lock lock(m_mutex);
-    m_filterSet.swap(known);
+    m_state->setFilter(std::move(known));
 }
 
 bool ScannerServer::isInFilterSet(const std::string& address) {
-    const Lock lock(m_mutex);
-    return m_filterSet.count(address) > 0;
+    return m_state->isInFilter(address);
 }
 
 void ScannerServer::putInfoToMap(const std::string& address, const std::string& text) {
-    const Lock lock(m_mutex);
-    m_deviceInfo[address] = text;
+    m_state->putText(address, text);
 }
 
 std::string ScannerServer::getInfoFromMap(const std::string& address) {
-    const Lock lock(m_mutex);
-    return m_deviceInfo[address];
+    return m_state->text(address);
 }
 
 void ScannerServer::stopDiscovery() {
     stopReceiving();
     joinReceiver();
-    for (const Discovery& discovery : takeDiscoveries())
+    for (const StartedDiscovery& discovery : takeDiscoveries())
         discovery.adapter->stopDiscovery();
 }
 
 /// Forgets all discoveries and finders. The caller destroys them, which waits for their callbacks.
-std::vector<ScannerServer::Discovery> ScannerServer::takeDiscoveries() {
-    std::vector<Discovery> discoveries;
-    const Lock lock(m_mutex);
-    discoveries.swap(m_discoveries);
-    m_scannerObject->finders.clear();
-    return discoveries;
+std::vector<StartedDiscovery> ScannerServer::takeDiscoveries() {
+    return m_state->takeAll(*m_scannerObject);
 }
 
 /// The manager, looked for again while there is none. It also runs the receive thread, which begins
 /// here when the daemon comes only after the loop.
 Manager* ScannerServer::fetchManager() {
     const auto held = [this] {
-        const Lock lock(m_mutex);
+        const Lock lock(m_receiverMutex);
         return m_manager.get();
     };
     if (!held()) {
         std::unique_ptr<Manager> manager(Manager::getManager());
         if (!manager)
             return nullptr;
-        const Lock lock(m_mutex);
+        const Lock lock(m_receiverMutex);
         if (!m_manager)
             m_manager.swap(manager);
     }
@@ -159,7 +151,7 @@ Manager* ScannerServer::fetchManager() {
 /// Starts the receive thread when it is wanted, possible and not done yet.
 void ScannerServer::startReceiver() {
     {
-        const Lock lock(m_mutex);
+        const Lock lock(m_receiverMutex);
         if (!m_receives || !m_manager || m_hasReceiver)
             return;
         m_hasReceiver = true;
@@ -167,14 +159,14 @@ void ScannerServer::startReceiver() {
     if (m_manager->startLoop() == 0)
         return;
     logError(KES_HERE, "Failed to start the receive thread");
-    const Lock lock(m_mutex);
+    const Lock lock(m_receiverMutex);
     m_hasReceiver = false;
 }
 
 void ScannerServer::startReceiving() {
     joinReceiver(); // of a loop before
     {
-        const Lock lock(m_mutex);
+        const Lock lock(m_receiverMutex);
         m_receives = true;
     }
     startReceiver();
@@ -183,7 +175,7 @@ void ScannerServer::startReceiving() {
 void ScannerServer::stopReceiving() {
     Manager* manager = nullptr;
     {
-        const Lock lock(m_mutex);
+        const Lock lock(m_receiverMutex);
         m_receives = false;
         manager = m_manager.get();
     }
@@ -193,7 +185,7 @@ void ScannerServer::stopReceiving() {
 
 void ScannerServer::joinReceiver() {
     {
-        const Lock lock(m_mutex);
+        const Lock lock(m_receiverMutex);
         if (!m_hasReceiver)
             return;
         m_hasReceiver = false;

@@ -1,0 +1,87 @@
+#ifndef KESBLUETOOTH_SCANNER_SCANNER_STATE_H
+#define KESBLUETOOTH_SCANNER_SCANNER_STATE_H
+
+#include <bluetooth/scanner_object.h>
+
+#include <map>
+#include <memory>
+#include <mutex>
+#include <string>
+#include <utility>
+#include <vector>
+
+namespace Bluetooth {
+
+class Adapter;
+class RemoteObject;
+
+/// A discovery that was started for a finder.
+struct StartedDiscovery {
+    std::shared_ptr<Adapter> adapter;  // subscribed; destroying it ends the subscriptions
+    std::shared_ptr<AddressSet> found; // the finder's, or nobody's when there was a finder
+};
+
+/// What the threads of the scanner service share: finders and the discoveries behind them, what is
+/// known of devices, and how long the service lives on.
+///
+/// LOCK. One lock, taken by each operation and by nobody else, guards all of it; the finders of a
+/// scanner object and their sets too, which are therefore read and changed here only. Any thread
+/// may call any operation at any time.
+///
+/// Under the lock nothing is called (no bus, no GLib, no callback), no other lock is taken, and no
+/// Adapter is destroyed: that waits for the adapter's callbacks, and they use this state. What is
+/// taken out is therefore returned, for the caller to destroy.
+class ScannerState {
+public:
+    /// Holding a set keeps it alive; what it holds is guarded all the same.
+    using Set = std::shared_ptr<AddressSet>;
+
+    /// Keeps a discovery, makes its set the adapter's finder where there is none, and lets the
+    /// service live on.
+    void addFinder(ScannerObject& object, const std::string& path,
+                   const StartedDiscovery& discovery);
+    /// @return null when the adapter has no finder
+    Set finder(const ScannerObject& object, const std::string& path) const;
+    void forgetFinder(ScannerObject& object, const std::string& path);
+
+    /// Takes the oldest discovery on an adapter. @return one without adapter when there is none
+    StartedDiscovery takeDiscovery(const std::string& path);
+    /// Takes all discoveries and forgets all finders.
+    std::vector<StartedDiscovery> takeAll(ScannerObject& object);
+    /// Whether a proxy that calls back belongs to a discovery, and so is an Adapter. One that was
+    /// taken may still call; it must not act any more, nor be looked at: it is being destroyed.
+    bool isListening(const RemoteObject* sender) const;
+
+    /// A device came into reach of a finder, or its properties changed.
+    /// @param set null when there is no finder: the properties are kept all the same
+    void addDevice(const Set& set, const std::string& address, const std::string& text);
+    /// A device left the reach of a finder. Its properties are kept.
+    void removeDevice(const Set& set, const std::string& address);
+    /// @return address and properties of the devices in the set that the daemon does not know
+    std::vector<std::pair<std::string, std::string>> unknownDevices(const AddressSet& set);
+
+    /// See ScannerServer::putInfoToMap() and getInfoFromMap().
+    void putText(const std::string& address, const std::string& text);
+    std::string text(const std::string& address);
+
+    /// Sets the devices that the daemon knows, which are left out of answers.
+    void setFilter(AddressSet known);
+    bool isInFilter(const std::string& address) const;
+
+    /// Counts one tick of the timer. @return whether the service is to end now; once below 0 it
+    /// never is, since only reaching 0 ends it
+    bool countDown();
+
+private:
+    static constexpr int ticksToLive = 30;
+
+    mutable std::mutex m_mutex; // guards what follows, and the finders of scanner objects
+    std::vector<StartedDiscovery> m_discoveries;
+    AddressSet m_filter;
+    std::map<std::string, std::string> m_texts; // by address
+    int m_idleCountdown = ticksToLive;
+};
+
+} // namespace Bluetooth
+
+#endif
