@@ -49,7 +49,7 @@ protected:
 };
 
 TEST_F(HandlerTest, EachSetterSubscribesToItsSignal) {
-    const ReceiveLoop running(loop);
+    const RunningLoop running(loop);
     const auto check = [&](auto& proxy, const std::string& member, auto setter, auto callback,
                            const Writer::Build& arguments, const std::string& reported,
                            const std::string& printed) {

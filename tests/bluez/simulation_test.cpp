@@ -1,6 +1,6 @@
 // The proxies with the simulated daemon, from its start to its end.
 
-#include "support/receive_loop.h"
+#include "support/running_loop.h"
 #include "support/simulation.h"
 #include "support/syslog_capture.h"
 
@@ -94,7 +94,7 @@ TEST_F(SimulationTest, DevicesAreFoundCreatedUsedAndRemoved) {
     ASSERT_EQ(adapter->setDeviceDisappearedHandler(onDisappeared), 0);
     ASSERT_EQ(adapter->setDeviceCreatedHandler(onCreated), 0);
     ASSERT_EQ(adapter->setDeviceRemovedHandler(onRemoved), 0);
-    const ReceiveLoop running(*manager);
+    const RunningLoop running(*manager);
     BluezObject plain(adapter->getPath(), "org.bluez.Adapter");
     const std::unique_ptr<Dict> properties(plain.getProperties());
     std::string types;
@@ -237,7 +237,7 @@ TEST_F(PairingTest, EveryKindOfDeviceIsPairedOrRefusedWhileAReceiveThreadRuns) {
         {keyboard, Agent::PSZ_DISPLAY_ONLY, "", false, "paired", 7}, // DisplayPasskey for each key
         {laptop, Agent::PSZ_DISPLAY_YES_NO, "", false, "Page Timeout", 0},
     };
-    const ReceiveLoop running(*manager);
+    const RunningLoop running(*manager);
     for (const auto& given : cases) {
         seen().clear();
         agent.setCapability(given.capability);
@@ -260,7 +260,7 @@ TEST_F(PairingTest, EveryKindOfDeviceIsPairedOrRefusedWhileAReceiveThreadRuns) {
 
 TEST_F(PairingTest, AnInterruptionEndsTheWaitAndThePairingCanBeCancelled) {
     simulation.setDevice(silent, "Behaviour", "NeverAnswers", "AddDevice");
-    const ReceiveLoop running(*manager);
+    const RunningLoop running(*manager);
     ASSERT_EQ(pair(headset), "paired"); // installs the handlers of the signals
     std::thread interrupter([&] {
         EXPECT_TRUE(wasSeen("created " + pathPart(silent)));
@@ -276,7 +276,7 @@ TEST_F(PairingTest, AnInterruptionEndsTheWaitAndThePairingCanBeCancelled) {
 
 TEST_F(PairingTest, AnotherThreadCanCancel) {
     simulation.setDevice(silent, "Behaviour", "NeverAnswers", "AddDevice");
-    const ReceiveLoop running(*manager);
+    const RunningLoop running(*manager);
     std::thread canceller([&] {
         EXPECT_TRUE(wasSeen("created " + pathPart(silent)));
         Adapter other(adapter->getPath());
@@ -291,7 +291,7 @@ TEST_F(PairingTest, AnotherThreadCanCancel) {
 
 TEST_F(PairingTest, TheLossOfTheDaemonOrOfTheBusEndsTheWait) {
     simulation.setDevice(silent, "Behaviour", "NeverAnswers", "AddDevice");
-    const ReceiveLoop running(*manager);
+    const RunningLoop running(*manager);
     for (const bool wholeBus : {false, true}) {
         seen().clear();
         std::thread dropper([&] {

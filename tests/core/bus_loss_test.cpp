@@ -98,7 +98,7 @@ TEST_F(BusLossTest, TheLoopNeitherSpinsNorHangsAndSubscriptionsCanBeMadeAnew) {
     RemoteObject renewed(peerName, peerPath, peerInterface, busType);
     ASSERT_EQ(renewed.setSignalHandlerString("Changed", onString), 0);
     {
-        const ReceiveLoop running(renewed); // a thread for the new connection, beside the old one
+        const RunningLoop running(renewed); // a thread for the new connection, beside the old one
         again->emit(peerPath, peerInterface, "Changed", [](Writer& w) { w("after"); });
         ASSERT_TRUE(seen().waitFor(2));
     }

@@ -88,7 +88,7 @@ TEST_F(ConcurrencyTest, NoReplyAndNoSignalIsLostWhenFourThreadsCallAndCallbacksC
     constexpr int signalsPerBurst = 10; // every 5 ms: 2,000 a second
     ASSERT_EQ(proxy.setSignalHandlerString("Number", onNumber), 0);
     RawPeer source(bus.address());
-    const ReceiveLoop running(loop);
+    const RunningLoop running(loop);
 
     Latch callsDone;
     int emitted = 0;
@@ -127,7 +127,7 @@ TEST_F(ConcurrencyTest, ASlowCallDelaysNeitherOtherCallsNorTheirTimeOuts) {
     for (const bool withLoop : {false, true}) {
         peer.reply("Slow", {}, std::chrono::seconds(3));
         peer.neverReply("Never");
-        const auto receiving = withLoop ? std::make_unique<ReceiveLoop>(loop) : nullptr;
+        const auto receiving = withLoop ? std::make_unique<RunningLoop>(loop) : nullptr;
         const int count = isSanitized ? 200 : 500;
         Clock::duration alone = callEchoes(count, "alone").median();
 

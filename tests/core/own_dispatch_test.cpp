@@ -65,7 +65,7 @@ TEST_F(OwnDispatchTest, CallsAndSignalsOfOtherThreadsAreNotLostToIt) {
     ASSERT_EQ(proxy.setSignalHandlerString(
                   "Changed", [](RemoteObject*, const char* text) { seen().add(text); }),
               0);
-    const ReceiveLoop running(loop);
+    const RunningLoop running(loop);
     constexpr int count = 300;
     std::atomic<bool> callsDone{false};
     std::thread caller([&] {

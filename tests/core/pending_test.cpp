@@ -91,7 +91,7 @@ TEST_F(PendingTest, TheReplyIsHeldWhateverItIs) {
 }
 
 TEST_F(PendingTest, RepliesThatComeBeforeTheNotificationIsSetAreSeen) {
-    const ReceiveLoop running(loop); // also reads the connection
+    const RunningLoop running(loop); // also reads the connection
     for (int i = 0; i < 500; ++i) {
         std::string text;
         ASSERT_EQ(callPending("Quick"), 0);
@@ -177,7 +177,7 @@ TEST_F(PendingTest, RequestsAreServedOnTheWaitingThreadWhileTheReceiveThreadDeli
     ASSERT_EQ(proxy.setSignalHandlerNoArgument(
                   "Changed", [](RemoteObject*) { delivered.add(std::this_thread::get_id()); }),
               0);
-    const ReceiveLoop running(loop);
+    const RunningLoop running(loop);
     MessagePtr request;
     peer.handle("Pair", [&](DBusMessage* pair) {
         request.reset(dbus_message_ref(pair));
@@ -203,7 +203,7 @@ TEST_F(PendingTest, RequestsAreServedOnTheWaitingThreadWhileTheReceiveThreadDeli
 
 TEST_F(PendingTest, ARequestThatComesAtOnceIsNotLeftToTheReceiveThread) {
     serveAgent();
-    const ReceiveLoop running(loop);
+    const RunningLoop running(loop);
     pairAsks(1);
     constexpr int rounds = 300;
     for (int i = 0; i < rounds; ++i)
@@ -225,7 +225,7 @@ TEST_F(PendingTest, AnInterruptionLeavesTheRequestsThatAreStillQueued) {
 
 TEST_F(PendingTest, RequestsThatTheReceiveThreadReadsStayUnanswered) {
     serveAgent();
-    const ReceiveLoop running(loop);
+    const RunningLoop running(loop);
     EXPECT_EQ(askAgent(Milliseconds(300)).get(), nullptr);
     EXPECT_EQ(served().count(), 0u);
 }

@@ -75,7 +75,7 @@ TEST_F(SignalTest, EachKindGetsItsArgumentsAndTheProxyThatSubscribed) {
     ASSERT_EQ(proxy.setSignalHandlerObjectPath("Path", onPath), 0);
     ASSERT_EQ(proxy.setSignalHandlerStringVariant("Property", onVariant), 0);
     ASSERT_EQ(proxy.setSignalHandlerStringDict("Found", onDict), 0);
-    const ReceiveLoop running(loop);
+    const RunningLoop running(loop);
     emit("Nothing", one); // its arguments are not read
     emit("Text", one);
     emit("Path", [](Writer& w) { w(Path{"/new"}); });
@@ -98,7 +98,7 @@ TEST_F(SignalTest, EverySubscribedProxyOfTheInterfaceIsToldTheLatestSubscriberFi
     for (RemoteObject* object : {&proxy, &other, &stranger})
         ASSERT_EQ(object->setSignalHandlerString("Changed", onString), 0);
     ASSERT_EQ(proxy.setSignalHandlerString("Changed", onString), 0); // once more: fires twice
-    const ReceiveLoop running(loop);
+    const RunningLoop running(loop);
     emit("Changed", [](Writer& w) { w("a"); });
     emit(
         "Changed", [](Writer& w) { w("b"); }, "/nobody"); // no rule: the bus does not send it
@@ -112,7 +112,7 @@ TEST_F(SignalTest, EverySubscribedProxyOfTheInterfaceIsToldTheLatestSubscriberFi
 
 TEST_F(SignalTest, TheKindsAreServedInAFixedOrder) {
     subscribeAll(proxy, "Changed");
-    const ReceiveLoop running(loop);
+    const RunningLoop running(loop);
     emit("Changed", [](Writer& w) { w("a")(Var{1u}); });
     emit("Changed", [](Writer& w) { w(Path{"/p"}); });
     settle();
@@ -241,7 +241,7 @@ TEST_F(SignalTest, SignalsThatComeBeforeTheLoopStartsAreDelivered) {
     ASSERT_EQ(call("Ask"), 0);
     emit("Changed", [](Writer& w) { w("still in the socket"); });
     peer.run([](DBusConnection* connection) { dbus_connection_flush(connection); });
-    const ReceiveLoop running(loop);
+    const RunningLoop running(loop);
     ASSERT_TRUE(seen().waitFor(2));
     EXPECT_EQ(seen().events(), (Texts{"string /com/example/peer read by a call",
                                       "string /com/example/peer still in the socket"}));
@@ -261,7 +261,7 @@ TEST_F(SignalTest, CallbacksMayCallAndSubscribe) {
                                                inner->setSignalHandlerString("Changed", onString);
                                            }),
               0);
-    const ReceiveLoop running(loop);
+    const RunningLoop running(loop);
     emit("Changed", [](Writer& w) { w("1"); });
     emit("Changed", [](Writer& w) { w("2"); });
     settle();
@@ -283,7 +283,7 @@ TEST_F(SignalTest, CallbacksMayDestroyProxiesTheirOwnToo) {
                                                 seen().add(text);
                                             }),
               0);
-    const ReceiveLoop running(loop);
+    const RunningLoop running(loop);
     for (const char* text : {"1", "2"})
         emit(
             "Changed", [text](Writer& w) { w(text); }, "/doomed");
@@ -303,7 +303,7 @@ TEST_F(SignalTest, DestroyingAProxyWaitsForItsCallbackInAnotherThread) {
                                                  seen().add(receiver->getPath());
                                              }),
               0);
-    const ReceiveLoop running(loop);
+    const RunningLoop running(loop);
     emit("Changed", [](Writer& w) { w("x"); });
     ASSERT_TRUE(entered.wait());
     Latch destroyed;
@@ -327,7 +327,7 @@ TEST_F(SignalTest, ProxiesComeAndGoInOtherThreadsWhileSignalsAreDelivered) {
     const auto count = [](RemoteObject* receiver, const char*) {
         calls += receiver->getPath()[0] == '/'; // is alive
     };
-    const ReceiveLoop running(loop);
+    const RunningLoop running(loop);
     std::vector<std::thread> threads;
     threads.reserve(3);
     for (int i = 0; i < 3; ++i) {

@@ -3,7 +3,7 @@
 
 #include "fault/soak.h"
 #include "support/callbacks.h"
-#include "support/receive_loop.h"
+#include "support/running_loop.h"
 #include "support/simulation.h"
 #include "support/syslog_capture.h"
 
@@ -131,7 +131,7 @@ TEST_F(DaemonLossTest, TheLossOfTheBusEndsAScanWithErrors) {
     const std::unique_ptr<Adapter> adapter(manager->findAdapter("hci0"));
     ASSERT_TRUE(adapter);
     ASSERT_EQ(adapter->setDeviceFoundHandler(onDict), 0);
-    const ReceiveLoop running(*manager);
+    const RunningLoop running(*manager);
     ASSERT_EQ(adapter->startDiscovery(), 0);
     ASSERT_TRUE(seen().waitFor(1));
     ASSERT_TRUE(scanUntilFound());

@@ -66,7 +66,7 @@ TEST_F(SoakTest, CallsLeaveMemoryAndDescriptorsFlat) {
 
 TEST_F(SoakTest, SignalsLeaveMemoryAndDescriptorsFlat) {
     ASSERT_EQ(proxy.setSignalHandlerStringDict("Found", onFound), 0);
-    const ReceiveLoop running(loop);
+    const RunningLoop running(loop);
     emitSignals(5 * batch);
     const Holdings before;
     emitSignals(soakCount(1'000'000));

@@ -1,7 +1,7 @@
 // The server inside the test's process, where its parts can be reached.
 
 #include "scanner/scanner_test.h"
-#include "support/receive_loop.h"
+#include "support/running_loop.h"
 #include "support/stdout_capture.h"
 
 #include <bluetooth/scanner_server.h>

@@ -3,7 +3,7 @@
 
 #include "support/private_bus.h"
 #include "support/raw_peer.h"
-#include "support/receive_loop.h"
+#include "support/running_loop.h"
 #include "support/syslog_capture.h"
 
 #include <gtest/gtest.h>

@@ -1,5 +1,5 @@
-#ifndef KESBLUETOOTH_TESTS_RECEIVE_LOOP_H
-#define KESBLUETOOTH_TESTS_RECEIVE_LOOP_H
+#ifndef KESBLUETOOTH_TESTS_RUNNING_LOOP_H
+#define KESBLUETOOTH_TESTS_RUNNING_LOOP_H
 
 #include <bluetooth/remote_object.h>
 
@@ -11,17 +11,17 @@ namespace Bluetooth::Test {
 
 /// Runs a proxy's receive thread. No other can run in this process afterwards: a fixture whose
 /// tests use one begins with KES_NEEDS_RECEIVE_LOOP().
-class ReceiveLoop {
+class RunningLoop {
 public:
-    explicit ReceiveLoop(RemoteObject& proxy) : m_proxy(proxy) {
+    explicit RunningLoop(RemoteObject& proxy) : m_proxy(proxy) {
         EXPECT_EQ(m_proxy.startLoop(), 0);
     }
-    ~ReceiveLoop() {
+    ~RunningLoop() {
         m_proxy.stopLoop();
         m_proxy.waitLoop();
     }
-    ReceiveLoop(const ReceiveLoop&) = delete;
-    ReceiveLoop& operator=(const ReceiveLoop&) = delete;
+    RunningLoop(const RunningLoop&) = delete;
+    RunningLoop& operator=(const RunningLoop&) = delete;
 
 private:
     RemoteObject& m_proxy;
