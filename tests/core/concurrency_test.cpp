@@ -51,33 +51,27 @@ Echoes callEchoes(int count, const std::string& name) {
 }
 
 /// What the callback of the numbered signals finds.
-struct Numbers {
+struct {
     std::atomic<int> next{0};
     std::atomic<int> outOfOrder{0};
     std::atomic<int> failedCalls{0};
-};
-
-Numbers& numbers() {
-    static Numbers state;
-    return state;
-}
+} numbers;
 
 void onNumber(RemoteObject*, const char* text) {
     static auto& caller =
         *new RemoteObject(peerName, peerPath, peerInterface, DBUS_BUS_SESSION); // outlives the test
-    if (std::stoi(text) != numbers().next)
-        ++numbers().outOfOrder;
+    if (std::stoi(text) != numbers.next)
+        ++numbers.outOfOrder;
     if (!callEcho(caller, text))
-        ++numbers().failedCalls;
-    ++numbers().next;
+        ++numbers.failedCalls;
+    ++numbers.next;
 }
 
 } // namespace
 
 class ConcurrencyTest : public LoopTest {
 protected:
-    void SetUp() override {
-        KES_NEEDS_RECEIVE_LOOP();
+    ConcurrencyTest() {
         peer.handle("Echo", echo);
         peer.stopRecording();
     }
@@ -116,11 +110,11 @@ TEST_F(ConcurrencyTest, NoReplyAndNoSignalIsLostWhenFourThreadsCallAndCallbacksC
         EXPECT_LT(result.longest(), std::chrono::seconds(1));
     }
     const auto deadline = Clock::now() + patience;
-    while (numbers().next < emitted && Clock::now() < deadline)
+    while (numbers.next < emitted && Clock::now() < deadline)
         callEchoes(1, "wait"); // passes the time usefully
-    EXPECT_EQ(numbers().next, emitted);
-    EXPECT_EQ(numbers().outOfOrder, 0);
-    EXPECT_EQ(numbers().failedCalls, 0);
+    EXPECT_EQ(numbers.next, emitted);
+    EXPECT_EQ(numbers.outOfOrder, 0);
+    EXPECT_EQ(numbers.failedCalls, 0);
 }
 
 TEST_F(ConcurrencyTest, ASlowCallDelaysNeitherOtherCallsNorTheirTimeOuts) {

@@ -1,10 +1,10 @@
 // How replies become values of the library.
 
+#include "core/message_text.h"
 #include "support/peer_test.h"
 
 #include <bluetooth/dict_codec.h>
 
-#include <limits>
 #include <tuple>
 
 namespace Bluetooth::Test {
@@ -20,254 +20,139 @@ std::string described(const Dict& dict) {
     return text;
 }
 
+constexpr const char* success = "0 0 ";
+constexpr const char* wrongType = "-1 4 Invalid reply value";
+
 } // namespace
 
 class DecodingTest : public CoreTest {
 protected:
-    /// Holds a reply with these arguments for the proxy.
-    void hold(const Writer::Build& arguments) {
-        MessagePtr reply(dbus_message_new(DBUS_MESSAGE_TYPE_METHOD_RETURN));
-        Writer(reply.get(), arguments);
-        ASSERT_EQ(proxy.setReplyMessage(reply.release()), 0);
-    }
-
-    /// Reads the held reply and then once more, when none may be left.
+    /// Reads a reply as a value, and then once more, when none may be left.
     template <class Value>
-    int readOnce(Value& value) {
-        proxy.resetError();
-        const int result = proxy.getReplyValue(value);
-        const int number = proxy.getErrorNumber();
-        const std::string text = proxy.getErrorMessage();
+    std::string read(const char* reply, Value& value) {
+        EXPECT_EQ(proxy.setReplyMessage(replyWith(reply).release()), 0);
+        std::string outcome = outcomeOf(proxy, proxy.getReplyValue(value));
         Value another{};
-        EXPECT_EQ(proxy.getReplyValue(another), -1);
-        EXPECT_EQ(proxy.getErrorNumber(), 2);
-        EXPECT_EQ(proxy.getErrorMessage(), "Reply message is null");
-        readError = {number, text};
-        return result;
-    }
-
-    std::pair<int, std::string> readError;
-    const std::pair<int, std::string> noError{0, ""};
-    const std::pair<int, std::string> wrongType{4, "Invalid reply value"};
-
-    int read(const Writer::Build& arguments, Dict& dict) {
-        hold(arguments);
-        return readOnce(dict);
+        EXPECT_EQ(outcomeOf(proxy, proxy.getReplyValue(another)), "-1 2 Reply message is null");
+        return outcome;
     }
 };
 
 TEST_F(DecodingTest, TextsAndBooleansAreReadFromTheirOwnTypeOnly) {
     std::string text;
-    hold([](Writer& w) { w("hello")(5u); }); // what follows the first argument is not looked at
-    EXPECT_EQ(readOnce(text), 0);
-    EXPECT_EQ(text, "hello");
-    EXPECT_EQ(readError, noError);
-    for (const bool value : {true, false}) {
-        bool read = !value;
-        hold([value](Writer& w) { w(value); });
-        EXPECT_EQ(readOnce(read), 0);
-        EXPECT_EQ(read, value);
-    }
-    bool flag = true;
-    const Writer::Build neither[] = {{},
-                                     [](Writer& w) { w(Path{"/"}); },
-                                     [](Writer& w) { w(1u); },
-                                     [](Writer& w) { w(Var{"text"}); },
-                                     [](Writer& w) { w.array("s"); }};
-    for (const auto& reply : neither) {
-        hold(reply);
-        EXPECT_EQ(readOnce(text), -1);
-        EXPECT_EQ(readError, wrongType);
-        hold(reply);
-        EXPECT_EQ(readOnce(flag), -1);
-        EXPECT_EQ(readError, wrongType);
+    EXPECT_EQ(read("('hello', uint32 5)", text), success); // only the first argument is looked at
+    bool no = true;
+    EXPECT_EQ(read("(false,)", no), success);
+    EXPECT_FALSE(no);
+    bool yes = false;
+    EXPECT_EQ(read("(true,)", yes), success);
+    for (const char* reply :
+         {"()", "(objectpath '/',)", "(uint32 1,)", "(<'text'>,)", "(@as [],)"}) {
+        EXPECT_EQ(read(reply, text), wrongType) << reply;
+        EXPECT_EQ(read(reply, yes), wrongType) << reply;
     }
     EXPECT_EQ(text, "hello");
-    EXPECT_TRUE(flag);
+    EXPECT_TRUE(yes);
 }
 
 TEST_F(DecodingTest, ATextWhereAPathWasAskedForIsTheServicesError) {
-    ObjectPath path;
-    hold([](Writer& w) { w(Path{"/org/bluez"}); });
-    EXPECT_EQ(readOnce(path), 0);
-    EXPECT_STREQ(path, "/org/bluez");
-    EXPECT_EQ(readError, noError);
-
-    hold([](Writer& w) { w("No such adapter"); });
-    EXPECT_EQ(readOnce(path), -2);
-    EXPECT_STREQ(path, "No such adapter");
-    EXPECT_EQ(readError, std::make_pair(11, std::string("No such adapter")));
-
-    // Of any other type: number 11 as well, and whatever text there was before stays.
-    for (const Writer::Build& reply : {Writer::Build(), Writer::Build([](Writer& w) { w(3u); })}) {
-        path = ObjectPath("/kept");
-        hold(reply);
-        EXPECT_EQ(readOnce(path), -1);
-        EXPECT_EQ(readError, std::make_pair(11, std::string()));
-        EXPECT_STREQ(path, "/kept");
+    const std::tuple<const char*, const char*, const char*> cases[] = {
+        {"(objectpath '/org/bluez',)", success, "/org/bluez"},
+        {"('No such adapter',)", "-2 11 No such adapter", "No such adapter"},
+        // Of any other type: number 11 as well, with whatever text there was before.
+        {"()", "-1 11 ", "/kept"},
+        {"(uint32 3,)", "-1 11 ", "/kept"},
+    };
+    for (const auto& [reply, outcome, value] : cases) {
+        ObjectPath path("/kept");
+        EXPECT_EQ(read(reply, path), outcome);
+        EXPECT_STREQ(path, value);
     }
-    hold([](Writer& w) { w("older text"); });
-    EXPECT_EQ(proxy.getReplyValue(path), -2);
-    hold([](Writer& w) { w(true); });
-    EXPECT_EQ(proxy.getReplyValue(path), -1);
-    EXPECT_EQ(proxy.getErrorMessage(), "older text");
-    hold({});
-    hold({}); // takes the place of the one before; the proxy's destructor releases this
+    ObjectPath path;
+    for (const char* reply : {"('older text',)", "(true,)"}) {
+        proxy.setReplyMessage(replyWith(reply).release());
+        EXPECT_LT(proxy.getReplyValue(path), 0);
+        EXPECT_EQ(proxy.getErrorMessage(), "older text");
+    }
+    // The second takes the place of the first; the proxy's destructor releases it.
+    proxy.setReplyMessage(replyWith("()").release());
+    proxy.setReplyMessage(replyWith("()").release());
     EXPECT_EQ(proxy.newMessage("Unsent"), 0);
 }
 
 TEST_F(DecodingTest, ListsAreReadFromArraysOfTexts) {
-    const std::tuple<Writer::Build, int, Texts> cases[] = {
-        {[](Writer& w) { w.array("s", [](Writer& a) { a("a")("")("b"); }); }, 0, {"a", "", "b"}},
-        {[](Writer& w) { w.array("o", [](Writer& a) { a(Path{"/a"})(Path{"/"}); }); },
-         0,
-         {"/a", "/"}},
-        {[](Writer& w) { w.array("s"); }, 0, {}},
-        {[](Writer& w) { w.array("u"); }, 0, {}}, // empty of whatever type
-        {[](Writer& w) { w.dict("sv"); }, 0, {}},
-        {[](Writer& w) { w.array("u", [](Writer& a) { a(1u); }); }, -1, {"before"}},
-        {[](Writer& w) { w.array("x", [](Writer& a) { a(std::int64_t{-1}); }); }, -1, {"before"}},
-        {[](Writer& w) { w.dict("sv", [](Writer& d) { d.entry("a", Var{1u}); }); }, -1, {"before"}},
-        {[](Writer& w) { w.array("as", [](Writer& a) { a.array("s"); }); }, -1, {"before"}},
-        {[](Writer& w) { w("a"); }, -1, {"before"}},
-        {{}, -1, {"before"}},
+    const std::tuple<const char*, const char*, Texts> cases[] = {
+        {"(['a', '', 'b'],)", success, {"a", "", "b"}},
+        {"([objectpath '/a', '/'],)", success, {"/a", "/"}},
+        {"(@as [],)", success, {}},
+        {"(@au [],)", success, {}}, // empty of whatever type
+        {"(@a{sv} {},)", success, {}},
+        {"([uint32 1],)", wrongType, {"before"}},
+        {"([int64 -1],)", wrongType, {"before"}},
+        {"({'a': <uint32 1>},)", wrongType, {"before"}},
+        {"([@as []],)", wrongType, {"before"}},
+        {"('a',)", wrongType, {"before"}},
+        {"()", wrongType, {"before"}},
     };
-    for (const auto& [reply, result, list] : cases) {
+    for (const auto& [reply, outcome, list] : cases) {
         Texts texts{"before"};
-        hold(reply);
-        EXPECT_EQ(readOnce(texts), result);
+        EXPECT_EQ(read(reply, texts), outcome) << reply;
         EXPECT_EQ(texts, list);
-        EXPECT_EQ(readError, result == 0 ? noError : wrongType);
         std::vector<ObjectPath> paths{ObjectPath("before")};
-        hold(reply);
-        EXPECT_EQ(readOnce(paths), result);
+        EXPECT_EQ(read(reply, paths), outcome) << reply;
         EXPECT_EQ(Texts(paths.begin(), paths.end()), list);
     }
 }
 
-TEST_F(DecodingTest, ValuesAreKeptInOrderWithTheirAlternatives) {
-    Dict dict{{"before", Variant(1u)}};
-    EXPECT_EQ(read(
-                  [](Writer& w) {
-                      w.dict("sv", [](Writer& d) {
-                          d.entry("Address", Var{"00:11"});
-                          d.entry("Adapter", Var{Path{"/hci0"}});
-                          d.entry("Class", Var{std::numeric_limits<std::uint32_t>::max()});
-                          d.entry("Vendor", Var{std::uint16_t{65535}});
-                          d.entry("RSSI", Var{std::int16_t{-60}});
-                          d.entry("Lowest", Var{std::numeric_limits<std::int16_t>::min()});
-                          d.entry("Paired", Var{true});
-                          d.entry("Paired", Var{false});
-                          d.entryWith("UUIDs", [](Writer& e) {
-                              e.variant("as", [](Writer& v) {
-                                  v.array("s", [](Writer& a) { a("a1")("b2"); });
-                              });
-                          });
-                          d.entryWith("Devices", [](Writer& e) {
-                              e.variant("ao", [](Writer& v) {
-                                  v.array("o", [](Writer& a) { a(Path{"/dev"}); });
-                              });
-                          });
-                          d.entryWith("Numbers", [](Writer& e) {
-                              e.variant("au", [](Writer& v) { v.array("u"); });
-                          });
-                      });
-                  },
-                  dict),
-              0);
-    EXPECT_EQ(readError, noError);
-    EXPECT_EQ(described(dict),
-              "Address=3:00:11;Adapter=3:/hci0;Class=0:4294967295;Vendor=1:65535;RSSI=5:-60;"
-              "Lowest=5:-32768;Paired=2:1;Paired=2:0;UUIDs=4:[a1, b2];Devices=4:[/dev];"
-              "Numbers=4:[];");
-    const std::pair<Writer::Build, const char*> others[] = {
-        {[](Writer& w) { w.dict("us", [](Writer& d) { d.entry(65536u, "<record/>"); }); },
-         "65536=3:<record/>;"},
-        {[](Writer& w) { w.dict("uv", [](Writer& d) { d.entry(7u, Var{true}); }); }, "7=2:1;"},
-        {[](Writer& w) { w.dict("sv"); }, ""},
+TEST_F(DecodingTest, DictionariesAreReadInOrderUpToTheFirstBadEntry) {
+    const char* const wrongFormat = "-1 5 Invalid reply format";
+    const std::tuple<std::string, const char*, const char*> cases[] = {
+        {"({'Address': <'00:11'>, 'Adapter': <objectpath '/hci0'>, 'Class': <uint32 4294967295>,"
+         "  'Vendor': <uint16 65535>, 'RSSI': <int16 -60>, 'Lowest': <int16 -32768>,"
+         "  'Paired': <true>, 'Paired': <false>, 'UUIDs': <['a1', 'b2']>,"
+         "  'Devices': <[objectpath '/dev']>, 'Numbers': <@au []>},)",
+         success,
+         "Address=3:00:11;Adapter=3:/hci0;Class=0:4294967295;Vendor=1:65535;RSSI=5:-60;"
+         "Lowest=5:-32768;Paired=2:1;Paired=2:0;UUIDs=4:[a1, b2];Devices=4:[/dev];Numbers=4:[];"},
+        {"({uint32 65536: '<record/>'},)", success, "65536=3:<record/>;"},
+        {"({uint32 7: <true>},)", success, "7=2:1;"},
+        {"(@a{sv} {},)", success, ""},
         // An empty name ends the dictionary, whatever follows.
-        {[](Writer& w) {
-             w.dict("sv", [](Writer& d) {
-                 d.entry("a", Var{1u}).entry("b", Var{2u});
-                 d.entry("", Var{std::int32_t{3}}).entry("c", Var{4.0});
-             });
-         },
-         "a=0:1;b=0:2;"}};
-    for (const auto& [reply, expected] : others) {
-        EXPECT_EQ(read(reply, dict), 0);
-        EXPECT_EQ(readError, noError);
-        EXPECT_EQ(described(dict), expected);
-    }
-}
-
-TEST_F(DecodingTest, DecodingStopsAtTheFirstBadEntryAndKeepsThoseBefore) {
-    const auto afterOne = [](const Writer::Build& bad) {
-        return [bad](Writer& w) {
-            w.dict("sv", [&](Writer& d) {
-                d.entry("good", Var{1u});
-                d.entryWith("bad", bad);
-                d.entry("never", Var{2u});
-            });
-        };
+        {"({'a': <uint32 1>, 'b': <uint32 2>, '': <int32 3>, 'c': <4.0>},)", success,
+         "a=0:1;b=0:2;"},
+        {"({objectpath '/a': <uint32 1>},)", wrongType, ""},
+        {"({int32 1: <uint32 1>},)", wrongType, ""},
+        {"({'a': uint32 1},)", wrongType, ""}, // not in a variant
+        // What is no dictionary leaves the old entries.
+        {"()", wrongFormat, "old=0:1;"},
+        {"('text',)", wrongFormat, "old=0:1;"},
+        {"(@as [],)", wrongFormat, "old=0:1;"},
+        {"(<uint32 1>,)", wrongFormat, "old=0:1;"},
     };
-    const Writer::Build values[] = {
-        [](Writer& e) { e(Var{std::int32_t{1}}); },
-        [](Writer& e) { e(Var{std::int64_t{1}}); },
-        [](Writer& e) { e(Var{std::uint64_t{1}}); },
-        [](Writer& e) { e(Var{1.5}); },
-        [](Writer& e) { e(Var{std::uint8_t{1}}); },
-        [](Writer& e) { e(Var<Var<const char*>>{{"nested"}}); },
-        [](Writer& e) {
-            e.variant("ay", [](Writer& v) { v.array("y", [](Writer& a) { a(std::uint8_t{1}); }); });
-        },
-        [](Writer& e) {
-            e.variant("a{sv}",
-                      [](Writer& v) { v.dict("sv", [](Writer& d) { d.entry("x", Var{1u}); }); });
-        },
-    };
-    Dict dict;
-    for (const auto& value : values) {
-        EXPECT_EQ(read(afterOne(value), dict), -1);
-        EXPECT_EQ(readError, wrongType);
-        EXPECT_EQ(described(dict), "good=0:1;");
-    }
-    const Writer::Build badNamesOrValues[] = {
-        [](Writer& w) { w.dict("ov", [](Writer& d) { d.entry(Path{"/a"}, Var{1u}); }); },
-        [](Writer& w) { w.dict("iv", [](Writer& d) { d.entry(std::int32_t{1}, Var{1u}); }); },
-        [](Writer& w) { w.dict("su", [](Writer& d) { d.entry("a", 1u); }); }, // not in a variant
-    };
-    for (const auto& reply : badNamesOrValues) {
-        EXPECT_EQ(read(reply, dict), -1);
-        EXPECT_EQ(readError, wrongType);
-        EXPECT_TRUE(dict.empty());
-    }
-}
-
-TEST_F(DecodingTest, WhatIsNoDictionaryLeavesTheOldEntries) {
-    const Writer::Build replies[] = {
-        {},
-        [](Writer& w) { w("text"); },
-        [](Writer& w) { w.array("s"); },
-        [](Writer& w) { w(Var{1u}); },
-    };
-    for (const auto& reply : replies) {
+    for (const auto& [reply, outcome, value] : cases) {
         Dict dict{{"old", Variant(1u)}};
-        EXPECT_EQ(read(reply, dict), -1);
-        EXPECT_EQ(readError, std::make_pair(5, std::string("Invalid reply format")));
-        EXPECT_EQ(described(dict), "old=0:1;");
+        EXPECT_EQ(read(reply.c_str(), dict), outcome) << reply;
+        EXPECT_EQ(described(dict), value) << reply;
+    }
+    for (const std::string bad : {"int32 1", "int64 1", "uint64 1", "1.5", "byte 1", "<'nested'>",
+                                  "[byte 1]", "{'x': <uint32 1>}"}) {
+        Dict dict;
+        EXPECT_EQ(
+            read(("({'good': <uint32 1>, 'bad': <" + bad + ">, 'never': <uint32 2>},)").c_str(),
+                 dict),
+            wrongType);
+        EXPECT_EQ(described(dict), "good=0:1;") << bad;
     }
 }
 
 TEST_F(DecodingTest, AFailedValueKeepsWhatTheEntryHeld) {
-    MessagePtr message(dbus_message_new_signal(peerPath, peerInterface, "Changed"));
-    Writer(message.get())(Path{"/name"})(Var{1.5})("text");
+    const MessagePtr message = replyWith("(objectpath '/name', <1.5>, 'text')");
     DBusMessageIter iter;
     ASSERT_TRUE(dbus_message_iter_init(message.get(), &iter));
     DictEntry entry{"old", Variant(std::string("value"))};
     EXPECT_EQ(proxy.parseEntryName(iter, entry), -1);
     dbus_message_iter_next(&iter);
-    EXPECT_EQ(proxy.parseEntryValue(iter, entry), -1);
-    EXPECT_EQ(proxy.getErrorMessage(), "Invalid reply value");
+    EXPECT_EQ(outcomeOf(proxy, proxy.parseEntryValue(iter, entry)), wrongType);
     EXPECT_EQ(described({entry}), "old=3:value;");
     dbus_message_iter_next(&iter);
     EXPECT_EQ(proxy.parseEntryValue(iter, entry), 0);

@@ -10,9 +10,7 @@ namespace Bluetooth::Test {
 
 class OwnDispatchTest : public LoopTest {
 protected:
-    void SetUp() override {
-        KES_NEEDS_RECEIVE_LOOP();
-        seen().clear();
+    OwnDispatchTest() {
         peer.reply("Ask", [](Writer& w) { w("answer"); });
         peer.reply("Take");
     }
@@ -31,8 +29,7 @@ TEST_F(OwnDispatchTest, HandlersOfTheProgramMayCall) {
     onRequest() = [this] {
         RemoteObject inner(peerName, peerPath, peerInterface, busType);
         std::string answer;
-        EXPECT_EQ(call(inner, "Ask"), 0);
-        EXPECT_EQ(inner.getReplyValue(answer), 0);
+        EXPECT_EQ(ask(inner, "Ask"), "answer");
         EXPECT_EQ(inner.newMessage("Take"), 0);
         EXPECT_EQ(inner.sendMessage(false, -1), 0);
         EXPECT_EQ(inner.newMessage("Ask"), 0);
@@ -71,20 +68,16 @@ TEST_F(OwnDispatchTest, CallsAndSignalsOfOtherThreadsAreNotLostToIt) {
     std::thread caller([&] {
         RemoteObject object(peerName, peerPath, peerInterface, busType);
         for (int i = 0; i < count; ++i) {
-            std::string answer;
-            EXPECT_EQ(call(object, "Ask", 5000), 0) << object.getErrorMessage();
-            EXPECT_EQ(object.getReplyValue(answer), 0);
+            EXPECT_EQ(ask(object, "Ask"), "answer");
             peer.emit(peerPath, peerInterface, "Changed", [i](Writer& w) { w(std::to_string(i)); });
         }
         callsDone = true;
     });
     mainLoop([&] { return callsDone && seen().count() == count; });
     caller.join();
-    std::vector<std::string> expected;
-    expected.reserve(count);
+    const Texts events = seen().events();
     for (int i = 0; i < count; ++i)
-        expected.push_back(std::to_string(i));
-    EXPECT_EQ(seen().events(), expected);
+        EXPECT_EQ(events[static_cast<std::size_t>(i)], std::to_string(i));
 }
 
 } // namespace Bluetooth::Test

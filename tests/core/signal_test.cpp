@@ -1,5 +1,6 @@
 // Subscriptions: who is told of which signal, in which order, and what bad signals do.
 
+#include "core/message_text.h"
 #include "support/callbacks.h"
 #include "support/peer_test.h"
 
@@ -22,9 +23,9 @@ std::string rule(const char* member, const char* path) {
 
 class SignalTest : public LoopTest {
 protected:
-    void emit(const char* member, const Writer::Build& arguments = {},
-              const char* path = peerPath) {
-        peer.emit(path, peerInterface, member, arguments);
+    /// @param arguments as signalWith() takes them
+    void emit(const char* member, const char* arguments, const char* path = peerPath) {
+        peer.send(signalWith(path, peerInterface, member, arguments));
     }
 
     static void subscribeAll(RemoteObject& object, const char* member) {
@@ -35,14 +36,9 @@ protected:
         ASSERT_EQ(object.setSignalHandlerObjectPath(member, onPath), 0);
     }
 
-    static MessagePtr signal(const Writer::Build& arguments) {
-        MessagePtr message(dbus_message_new_signal(peerPath, peerInterface, "Changed"));
-        Writer(message.get(), arguments);
-        return message;
-    }
-
     /// Offers a signal to all dispatchers as the receive thread of `loop` does.
-    static void dispatch(RemoteObject& loop, DBusMessage* message) {
+    void dispatch(const MessagePtr& signal) {
+        DBusMessage* const message = signal.get();
         loop.signalHandlerDispatcherObjectPath(message);
         loop.signalHandlerDispatcherStringVariant(message);
         loop.signalHandlerDispatcherString(message);
@@ -62,26 +58,18 @@ protected:
 };
 
 TEST_F(SignalTest, EachKindGetsItsArgumentsAndTheProxyThatSubscribed) {
-    const auto one = [](Writer& w) { w("hello")("more"); };
-    const auto pair = [](Writer& w) { w("RSSI")(Var{std::int16_t{-60}}); };
-    const auto found = [](Writer& w) {
-        w("00:11").dict("sv", [](Writer& d) {
-            d.entry("Name", Var{"x"}).entry("Class", Var{5u}).entry("", Var{1.5});
-            d.entry("Never", Var{1u});
-        });
-    };
     ASSERT_EQ(proxy.setSignalHandlerNoArgument("Nothing", onNothing), 0);
     ASSERT_EQ(proxy.setSignalHandlerString("Text", onString), 0);
     ASSERT_EQ(proxy.setSignalHandlerObjectPath("Path", onPath), 0);
     ASSERT_EQ(proxy.setSignalHandlerStringVariant("Property", onVariant), 0);
     ASSERT_EQ(proxy.setSignalHandlerStringDict("Found", onDict), 0);
     const RunningLoop running(loop);
-    emit("Nothing", one); // its arguments are not read
-    emit("Text", one);
-    emit("Path", [](Writer& w) { w(Path{"/new"}); });
-    emit("Property", pair);
-    emit("Property", [](Writer& w) { w("State")("bare"); });
-    emit("Found", found);
+    emit("Nothing", "('hello', 'more')"); // its arguments are not read
+    emit("Text", "('hello', 'more')");
+    emit("Path", "(objectpath '/new',)");
+    emit("Property", "('RSSI', <int16 -60>)");
+    emit("Property", "('State', 'bare')");
+    emit("Found", "('00:11', {'Name': <'x'>, 'Class': <uint32 5>, '': <1.5>, 'Never': <true>})");
     ASSERT_TRUE(seen().waitFor(6));
     // Without arguments it is, on purpose, the proxy that runs the loop.
     EXPECT_EQ(
@@ -99,11 +87,9 @@ TEST_F(SignalTest, EverySubscribedProxyOfTheInterfaceIsToldTheLatestSubscriberFi
         ASSERT_EQ(object->setSignalHandlerString("Changed", onString), 0);
     ASSERT_EQ(proxy.setSignalHandlerString("Changed", onString), 0); // once more: fires twice
     const RunningLoop running(loop);
-    emit("Changed", [](Writer& w) { w("a"); });
-    emit(
-        "Changed", [](Writer& w) { w("b"); }, "/nobody"); // no rule: the bus does not send it
-    emit(
-        "Changed", [](Writer& w) { w("c"); }, "/other");
+    emit("Changed", "('a',)");
+    emit("Changed", "('b',)", "/nobody"); // no rule: the bus does not send it
+    emit("Changed", "('c',)", "/other");
     settle();
     EXPECT_EQ(seen().events(), (Texts{"string /com/example/peer a", "string /other a",
                                       "string /com/example/peer a", "string /com/example/peer c",
@@ -113,8 +99,8 @@ TEST_F(SignalTest, EverySubscribedProxyOfTheInterfaceIsToldTheLatestSubscriberFi
 TEST_F(SignalTest, TheKindsAreServedInAFixedOrder) {
     subscribeAll(proxy, "Changed");
     const RunningLoop running(loop);
-    emit("Changed", [](Writer& w) { w("a")(Var{1u}); });
-    emit("Changed", [](Writer& w) { w(Path{"/p"}); });
+    emit("Changed", "('a', <uint32 1>)");
+    emit("Changed", "(objectpath '/p',)");
     settle();
     EXPECT_EQ(seen().events(),
               (Texts{"variant /com/example/peer a=1", "string /com/example/peer a", "nothing /loop",
@@ -132,49 +118,39 @@ TEST_F(SignalTest, ABadSignalIsLoggedOnceAndSkippedByItsKindOnly) {
     const auto by = [](auto setter, auto callback) -> Subscribe {
         return [=](RemoteObject& object) { return (object.*setter)("Changed", callback); };
     };
-    const Subscribe subscribeString = by(&RemoteObject::setSignalHandlerString, onString);
-    const Subscribe subscribePath = by(&RemoteObject::setSignalHandlerObjectPath, onPath);
-    const Subscribe subscribeVariant = by(&RemoteObject::setSignalHandlerStringVariant, onVariant);
-    const Subscribe subscribeDict = by(&RemoteObject::setSignalHandlerStringDict, onDict);
-    const auto dictOf = [](const char* types, const Writer::Build& entries) {
-        return [types, entries](Writer& w) { w("text").dict(types, entries); };
+    const Subscribe byString = by(&RemoteObject::setSignalHandlerString, onString);
+    const Subscribe byPath = by(&RemoteObject::setSignalHandlerObjectPath, onPath);
+    const Subscribe byVariant = by(&RemoteObject::setSignalHandlerStringVariant, onVariant);
+    const Subscribe byDict = by(&RemoteObject::setSignalHandlerStringDict, onDict);
+    constexpr int decodingError = 4;
+    const std::tuple<Subscribe, const char*, const char*, int> cases[] = {
+        {byString, "()", "Signal has no arguments", 0},
+        {byPath, "()", "Signal has no arguments", 0},
+        {byVariant, "()", "Signal has no arguments", 0},
+        {byDict, "()", "Signal has no arguments", 0},
+        {byString, "(objectpath '/',)", "Argument is not string", 0},
+        {byVariant, "(uint32 1, <uint32 1>)", "Argument is not string", 0},
+        {byDict, "(@a{sv} {},)", "Argument is not string", 0},
+        {byPath, "('/',)", "Argument is not object path", 0},
+        {byVariant, "('a',)", "Failed to parse variant in signal", decodingError},
+        {byVariant, "('a', <int32 1>)", "Failed to parse variant in signal", decodingError},
+        {byDict, "('a',)", "Argument is not dict", 0},
+        {byDict, "('a', @as [])", "Argument is not dict", 0},
+        {byDict, "('a', {objectpath '/': <true>})", "Failed to parse entry name", decodingError},
+        {byDict, "('a', {'a': <1.5>})", "Failed to parse entry value", decodingError},
     };
-    const struct {
-        Subscribe subscribe;
-        Writer::Build arguments;
-        const char* line;
-        bool decodingError;
-    } cases[] = {
-        {subscribeString, {}, "Signal has no arguments", false},
-        {subscribePath, {}, "Signal has no arguments", false},
-        {subscribeVariant, {}, "Signal has no arguments", false},
-        {subscribeDict, {}, "Signal has no arguments", false},
-        {subscribeString, [](Writer& w) { w(Path{"/"}); }, "Argument is not string", false},
-        {subscribeVariant, [](Writer& w) { w(1u)(Var{1u}); }, "Argument is not string", false},
-        {subscribeDict, [](Writer& w) { w.dict("sv"); }, "Argument is not string", false},
-        {subscribePath, [](Writer& w) { w("/"); }, "Argument is not object path", false},
-        {subscribeVariant, [](Writer& w) { w("a"); }, "Failed to parse variant in signal", true},
-        {subscribeVariant, [](Writer& w) { w("a")(Var{std::int32_t{1}}); },
-         "Failed to parse variant in signal", true},
-        {subscribeDict, [](Writer& w) { w("a"); }, "Argument is not dict", false},
-        {subscribeDict, [](Writer& w) { w("a").array("s"); }, "Argument is not dict", false},
-        {subscribeDict, dictOf("ov", [](Writer& d) { d.entry(Path{"/"}, Var{1u}); }),
-         "Failed to parse entry name", true},
-        {subscribeDict, dictOf("sv", [](Writer& d) { d.entry("a", Var{1.5}); }),
-         "Failed to parse entry value", true},
-    };
-    for (const auto& bad : cases) {
+    for (const auto& [subscribe, arguments, line, error] : cases) {
         seen().clear();
         loop.resetError();
         RemoteObject first(peerName, "/first", peerInterface, busType);
         RemoteObject second(peerName, "/second", peerInterface, busType);
-        ASSERT_EQ(bad.subscribe(second), 0);
-        ASSERT_EQ(bad.subscribe(first), 0);
-        dispatch(loop, signal(bad.arguments).get());
-        EXPECT_EQ(log.take(), Texts{std::string("remote_object.cpp ") + bad.line});
+        ASSERT_EQ(subscribe(second), 0);
+        ASSERT_EQ(subscribe(first), 0);
+        dispatch(signalWith(peerPath, peerInterface, "Changed", arguments));
+        EXPECT_EQ(log.take(), Texts{std::string("remote_object.cpp ") + line});
         EXPECT_EQ(seen().events(), (Texts{"nothing /loop", "nothing /loop"}));
         // It is the loop's proxy that remembers a decoding error, not the subscriber.
-        EXPECT_EQ(loop.getErrorNumber(), bad.decodingError ? 4 : 0) << bad.line;
+        EXPECT_EQ(loop.getErrorNumber(), error) << line;
         EXPECT_FALSE(first.hasError());
     }
 }
@@ -197,14 +173,12 @@ TEST_F(SignalTest, AProxysSubscriptionsEndWithItAndNoOthers) {
                                                    {"RemoveMatch " + rule("A", "/leaving"), 5},
                                                    {"RemoveMatch " + rule("B", "/leaving"), 1}}));
 
-    const MessagePtr text(dbus_message_new_signal(peerPath, peerInterface, "A"));
-    Writer(text.get())("x");
+    const MessagePtr text = signalWith(peerPath, peerInterface, "A", "('x',)");
     loop.signalHandlerDispatcherString(text.get());
     loop.signalHandlerDispatcherNoArgument(text.get());
-    const MessagePtr call(dbus_message_new_method_call(peerName, peerPath, peerInterface, "A"));
-    const MessagePtr other(dbus_message_new_signal(peerPath, "com.example.X", "A"));
-    for (DBusMessage* unmatched : {call.get(), other.get(), static_cast<DBusMessage*>(nullptr)})
-        dispatch(loop, unmatched);
+    dispatch(MessagePtr(dbus_message_new_method_call(peerName, peerPath, peerInterface, "A")));
+    dispatch(signalWith(peerPath, "com.example.X", "A", "()"));
+    dispatch(nullptr);
     EXPECT_EQ(seen().events(), (Texts{"string /com/example/peer x", "nothing /loop"}));
     EXPECT_EQ(log.take(), Texts{});
 }
@@ -227,7 +201,7 @@ TEST_F(SignalTest, ARefusedSubscriptionIsLoggedAndNotRegistered) {
         EXPECT_EQ(lines[0].find("remote_object.cpp Match error ("), 0u) << lines[0];
         EXPECT_EQ(lines[0].back(), ')');
         EXPECT_NE(lines[0], "remote_object.cpp Match error ()");
-        dispatch(loop, signal([](Writer& w) { w("x"); }).get());
+        dispatch(signalWith(peerPath, peerInterface, "Changed", "('x',)"));
         EXPECT_EQ(seen().count(), 0u);
     }
     EXPECT_EQ(proxy.setSignalHandlerString("Changed", nullptr), -1);
@@ -237,9 +211,9 @@ TEST_F(SignalTest, ARefusedSubscriptionIsLoggedAndNotRegistered) {
 TEST_F(SignalTest, SignalsThatComeBeforeTheLoopStartsAreDelivered) {
     peer.reply("Ask");
     ASSERT_EQ(proxy.setSignalHandlerString("Changed", onString), 0);
-    emit("Changed", [](Writer& w) { w("read by a call"); });
+    emit("Changed", "('read by a call',)");
     ASSERT_EQ(call("Ask"), 0);
-    emit("Changed", [](Writer& w) { w("still in the socket"); });
+    emit("Changed", "('still in the socket',)");
     peer.run([](DBusConnection* connection) { dbus_connection_flush(connection); });
     const RunningLoop running(loop);
     ASSERT_TRUE(seen().waitFor(2));
@@ -253,17 +227,13 @@ TEST_F(SignalTest, CallbacksMayCallAndSubscribe) {
     peer.reply("Ask", [](Writer& w) { w("answer"); });
     ASSERT_EQ(proxy.setSignalHandlerString("Changed",
                                            [](RemoteObject*, const char* text) {
-                                               std::string answer;
-                                               inner->newMessage("Ask");
-                                               inner->sendMessage(true, -1);
-                                               inner->getReplyValue(answer);
-                                               seen().add(text + (" " + answer));
+                                               seen().add(text + (" " + ask(*inner, "Ask")));
                                                inner->setSignalHandlerString("Changed", onString);
                                            }),
               0);
     const RunningLoop running(loop);
-    emit("Changed", [](Writer& w) { w("1"); });
-    emit("Changed", [](Writer& w) { w("2"); });
+    emit("Changed", "('1',)");
+    emit("Changed", "('2',)");
     settle();
     // The new record stands in front of the one being called, so it sees the next signal only.
     EXPECT_EQ(seen().events(), (Texts{"1 answer", "string /inner 2", "2 answer"}));
@@ -284,9 +254,8 @@ TEST_F(SignalTest, CallbacksMayDestroyProxiesTheirOwnToo) {
                                             }),
               0);
     const RunningLoop running(loop);
-    for (const char* text : {"1", "2"})
-        emit(
-            "Changed", [text](Writer& w) { w(text); }, "/doomed");
+    for (const char* text : {"('1',)", "('2',)"})
+        emit("Changed", text, "/doomed");
     settle();
     EXPECT_EQ(seen().events(), (Texts{"1", "string /doomed 1", "string /doomed 2"}));
     EXPECT_EQ(log.take(), Texts{});
@@ -304,7 +273,7 @@ TEST_F(SignalTest, DestroyingAProxyWaitsForItsCallbackInAnotherThread) {
                                              }),
               0);
     const RunningLoop running(loop);
-    emit("Changed", [](Writer& w) { w("x"); });
+    emit("Changed", "('x',)");
     ASSERT_TRUE(entered.wait());
     Latch destroyed;
     std::thread destroyer([&] {
@@ -316,7 +285,7 @@ TEST_F(SignalTest, DestroyingAProxyWaitsForItsCallbackInAnotherThread) {
     leave.open();
     EXPECT_TRUE(destroyed.wait());
     destroyer.join();
-    emit("Changed", [](Writer& w) { w("y"); });
+    emit("Changed", "('y',)");
     settle();
     EXPECT_EQ(seen().events(), Texts{peerPath});
 }
@@ -335,7 +304,7 @@ TEST_F(SignalTest, ProxiesComeAndGoInOtherThreadsWhileSignalsAreDelivered) {
             for (int round = 0; round < 50; ++round) {
                 RemoteObject object(peerName, peerPath, peerInterface, busType);
                 object.setSignalHandlerString("Changed", count);
-                emit("Changed", [](Writer& w) { w("x"); });
+                emit("Changed", "('x',)");
                 object.setSignalHandlerString("Changed", count);
             }
         });
@@ -355,8 +324,8 @@ TEST_F(SignalTest, StoppingLeavesTheRestUndeliveredForGood) {
                                                receiver->stopLoop();
                                            }),
               0);
-    for (const char* text : {"1", "2", "3"})
-        emit("Changed", [text](Writer& w) { w(text); });
+    for (const char* text : {"('1',)", "('2',)", "('3',)"})
+        emit("Changed", text);
     EXPECT_NE(loop.waitLoop(), 0); // never started
     ASSERT_EQ(loop.startLoop(), 0);
     EXPECT_EQ(loop.waitLoop(), 0);

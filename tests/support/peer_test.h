@@ -53,6 +53,21 @@ protected:
         const int result = object.newMessage(method);
         return result == 0 ? object.sendMessage(true, timeoutMs) : result;
     }
+    /// @return "RESULT NUMBER TEXT" of what an operation returned and recorded; "0 0 " for success.
+    ///         The error is forgotten
+    static std::string outcomeOf(RemoteObject& object, int result) {
+        std::string outcome = std::to_string(result) + ' ' +
+                              std::to_string(object.getErrorNumber()) + ' ' +
+                              object.getErrorMessage();
+        object.resetError();
+        return outcome;
+    }
+    /// @return the text that a method is answered with, or outcomeOf() what came instead
+    static std::string ask(RemoteObject& object, const char* method) {
+        std::string text;
+        const int result = call(object, method) == 0 ? object.getReplyValue(text) : -1;
+        return result == 0 ? text : outcomeOf(object, result);
+    }
 
     SyslogCapture log;
     PrivateBus bus{PrivateBus::Kind::Session};
