@@ -19,8 +19,7 @@ inline constexpr const char* stranger = "DE:AD:BE:EF:00:01"; // known to none
 /// The simulated daemon knows four devices; there are no lists of devices to connect yet.
 class AutoConnectFixture : public NamespaceTest {
 protected:
-    void SetUp() override {
-        NamespaceTest::SetUp();
+    AutoConnectFixture() {
         simulation.watchCalls();
         // Adapters ask it for their version; it is missing here, and not what is tested.
         writeProgram("/usr/bin/hciconfig", "");

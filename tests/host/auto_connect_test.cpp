@@ -8,17 +8,12 @@
 
 #include <memory>
 #include <thread>
-#include <tuple>
 
 namespace Bluetooth::Test {
 
 namespace {
 
 using namespace std::string_literals;
-
-std::string line(const std::string& message) {
-    return "auto_connect.cpp " + message;
-}
 
 const std::string unknownLine = "adapter.cpp Does Not Exist";
 const Texts both{"hci0/01", "hci0/02"};
@@ -40,11 +35,6 @@ Texts namesOf(DeviceList* list) {
 
 class AutoConnectTest : public AutoConnectFixture {
 protected:
-    void SetUp() override {
-        AutoConnectFixture::SetUp();
-        pipe = std::make_unique<PipeReader>(commandPipe);
-    }
-
     static void power(const char* adapter, bool on) {
         const std::unique_ptr<Manager> manager(Manager::getManager());
         const std::unique_ptr<Adapter> proxy(manager->findAdapter(adapter));
@@ -54,7 +44,7 @@ protected:
     Texts listOf(const char* adapter) { return namesOf(autoConnect.getDeviceList(adapter)); }
     Texts targets() { return namesOf(autoConnect.getAutoConnectDeviceList()); }
 
-    std::unique_ptr<PipeReader> pipe; ///< the end of the daemon that is told of changes
+    PipeReader pipe{commandPipe}; ///< the end of the daemon that is told of changes
 };
 
 TEST_F(AutoConnectTest, ListsKnownDevicesAndPrunesStaleEntriesOfAnEnabledList) {
@@ -62,7 +52,7 @@ TEST_F(AutoConnectTest, ListsKnownDevicesAndPrunesStaleEntriesOfAnEnabledList) {
               "1,"s + headset + "," + stranger + "," + carKit + ",," + speaker + "," + stranger);
     EXPECT_EQ(listOf(adapter0), both) << "in the file's order";
     EXPECT_EQ(config(adapter0), "1,"s + headset + "," + carKit);
-    EXPECT_EQ(pipe->take(), "1111") << "one for each stale entry";
+    EXPECT_EQ(pipe.take(), "1111") << "one for each stale entry";
     EXPECT_EQ(log.take(), Texts(4, unknownLine));
     EXPECT_EQ(listOf(adapter0), both);
 
@@ -73,33 +63,34 @@ TEST_F(AutoConnectTest, ListsKnownDevicesAndPrunesStaleEntriesOfAnEnabledList) {
     EXPECT_EQ(log.take(), Texts{unknownLine});
     EXPECT_EQ(listOf(adapter1), Texts()) << "a new file";
     EXPECT_EQ(config(adapter1), "0");
-    EXPECT_EQ(pipe->take(), "");
+    EXPECT_EQ(pipe.take(), "");
 }
 
 TEST_F(AutoConnectTest, FailuresOfGetDeviceListAreLogged) {
     EXPECT_EQ(listOf("00:00:00:00:00:00"), Texts{"no list"});
-    EXPECT_EQ(log.take(), (Texts{"manager.cpp No such adapter", line("Failed to get adapter.")}));
+    EXPECT_EQ(log.take(),
+              (Texts{"manager.cpp No such adapter", inAutoConnect("Failed to get adapter.")}));
 
     const std::string file = std::string(configFolder) + adapter0;
     std::filesystem::create_directories(file);
     EXPECT_EQ(listOf(adapter0), Texts{"no list"});
-    EXPECT_EQ(log.take(), Texts{line("Config '" + file + "' is not regular file.")});
+    EXPECT_EQ(log.take(), Texts{inAutoConnect("Config '" + file + "' is not regular file.")});
 
     std::filesystem::remove(file);
     setConfig(adapter0, "1");
     std::filesystem::resize_file(file, 2 << 20);
     EXPECT_EQ(listOf(adapter0), Texts()) << "as a file that holds no entries";
     EXPECT_EQ(targets(), Texts());
-    EXPECT_EQ(log.take(), Texts(2, line("Config '" + file + "' is too large.")));
+    EXPECT_EQ(log.take(), Texts(2, inAutoConnect("Config '" + file + "' is too large.")));
 
     simulation.failNext("org.bluez.Manager", "ListAdapters", "org.bluez.Error.Failed", "Broken");
     EXPECT_EQ(targets(), Texts{"no list"});
-    EXPECT_EQ(log.take(), Texts{line("Failed to get adapter list")});
+    EXPECT_EQ(log.take(), Texts{inAutoConnect("Failed to get adapter list")});
 
     simulation.control("DropName");
     EXPECT_EQ(listOf(adapter0), Texts{"no list"});
     EXPECT_EQ(targets(), Texts{"no list"});
-    EXPECT_EQ(log.take(), Texts(2, line("Failed to get manager.")));
+    EXPECT_EQ(log.take(), Texts(2, inAutoConnect("Failed to get manager.")));
 }
 
 TEST_F(AutoConnectTest, TargetsAreThoseOfPoweredAndEnabledAdapters) {
@@ -107,7 +98,7 @@ TEST_F(AutoConnectTest, TargetsAreThoseOfPoweredAndEnabledAdapters) {
     setConfig(adapter1, "1,"s + speaker);
     EXPECT_EQ(targets(), (Texts{"hci0/01", "hci1/04"}));
     EXPECT_EQ(config(adapter0), "1,"s + headset);
-    EXPECT_EQ(pipe->take(), "1");
+    EXPECT_EQ(pipe.take(), "1");
     EXPECT_EQ(log.take(), Texts{unknownLine});
 
     for (const char* noFlag : {"0,", "2,", "x,", ""}) {
@@ -123,7 +114,7 @@ TEST_F(AutoConnectTest, TargetsAreThoseOfPoweredAndEnabledAdapters) {
     EXPECT_EQ(targets(), Texts{"hci0/01"});
     power(adapter0, false);
     EXPECT_EQ(targets(), Texts()) << "an empty list, not null";
-    EXPECT_EQ(pipe->take(), "");
+    EXPECT_EQ(pipe.take(), "");
     EXPECT_EQ(log.take(), Texts());
 }
 
@@ -135,29 +126,23 @@ TEST_F(AutoConnectTest, EntriesThatAreNoAddressArePruned) {
     EXPECT_EQ(listOf(adapter0), Texts{"hci0/01"});
     EXPECT_EQ(config(adapter0), "1,"s + headset);
     EXPECT_EQ(log.take(),
-              (Texts{line("An entry of the config file holds a NUL byte."),
+              (Texts{inAutoConnect("An entry of the config file holds a NUL byte."),
                      "adapter.cpp Failed to append args to message", unknownLine, unknownLine}));
 }
 
 TEST_F(AutoConnectTest, OnlyWhatTheDaemonDeniesIsPruned) {
     const std::string content = "1,"s + headset + "," + carKit;
-    const std::tuple<const char*, const char*, bool> cases[] = {
-        {"org.freedesktop.DBus.Error.NoReply", "Did not receive a reply.", false},
-        {"org.freedesktop.DBus.Error.ServiceUnknown",
-         "The name org.bluez was not provided by any .service files", false},
-        {"org.freedesktop.DBus.Error.UnknownObject", "Method \"FindDevice\" doesn't exist\n",
-         false},
-        {"org.freedesktop.DBus.Error.Disconnected", "Connection is closed", false},
-        {"org.bluez.Error.InvalidArguments", "Invalid arguments in method call", true},
-        {"org.bluez.Error.DoesNotExist", "Does Not Exist", true},
-    };
-    for (const auto& [name, text, isPruned] : cases) {
+    for (const auto& [text, isPruned] :
+         {std::pair("Did not receive a reply.", false), std::pair("Connection is closed", false),
+          std::pair("The name org.bluez was not provided by any .service files", false),
+          std::pair("Method \"FindDevice\" doesn't exist\n", false),
+          std::pair("Invalid arguments in method call", true), std::pair("Does Not Exist", true)}) {
         setConfig(adapter0, content);
-        simulation.failNext("org.bluez.Adapter", "FindDevice", name, text);
+        simulation.failNext("org.bluez.Adapter", "FindDevice", "org.bluez.Error.Any", text);
         EXPECT_EQ(listOf(adapter0), Texts{"hci0/02"}) << text;
         EXPECT_EQ(config(adapter0), isPruned ? "1,"s + carKit : content) << text;
-        EXPECT_EQ(pipe->take(), isPruned ? "1" : "") << text;
-        EXPECT_EQ(log.take().size(), 1u) << text;
+        EXPECT_EQ(pipe.take(), isPruned ? "1" : "") << text;
+        EXPECT_EQ(log.take(), Texts{"adapter.cpp "s + text});
     }
 }
 
@@ -172,7 +157,7 @@ TEST_F(AutoConnectTest, ADaemonThatRestartsMeanwhileCostsNoEntry) {
     EXPECT_EQ(listOf(adapter0), Texts());
     restart.join();
     EXPECT_EQ(config(adapter0), content);
-    EXPECT_EQ(pipe->take(), "");
+    EXPECT_EQ(pipe.take(), "");
     EXPECT_EQ(listOf(adapter0), both);
 }
 

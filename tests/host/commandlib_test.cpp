@@ -18,24 +18,17 @@ namespace {
 constexpr const char* daemonProgram = "/usr/sbin/bluetoothd";
 constexpr const char* marker = "/tmp/bluetooth.info_0";
 
-void install(const char* place) {
-    std::filesystem::copy_file(STANDIN_DAEMON, place,
-                               std::filesystem::copy_options::overwrite_existing);
+std::string inProc(int pid, const char* file) {
+    return "/proc/" + std::to_string(pid) + "/" + file;
 }
 
-/// Starts the stand-in as its own child, which has put itself into the background on return.
-void startDaemon(const char* program) {
-    ChildProcess starter({program});
-    ASSERT_EQ(starter.wait(), 0);
-}
-
-void killAll(const char* name) {
-    for (int pid = getPidFromName(name); pid > 0; pid = getPidFromName(name)) {
-        kill(pid, SIGKILL);
-        // Gone when its executable is: it is not a child of this process.
-        while (std::filesystem::exists("/proc/" + std::to_string(pid) + "/exe"))
-            usleep(1000);
-    }
+/// Installs the stand-in and starts it as its own child, which is in the background on return.
+/// @return the first daemon found
+int startDaemon(const char* place = daemonProgram) {
+    std::filesystem::copy_file(STANDIN_DAEMON, place, std::filesystem::copy_options::skip_existing);
+    ChildProcess starter({place});
+    EXPECT_EQ(starter.wait(), 0);
+    return getPidFromName("bluetoothd");
 }
 
 } // namespace
@@ -43,56 +36,47 @@ void killAll(const char* name) {
 class ProcessLookupTest : public NamespaceTest {
 protected:
     void SetUp() override {
-        NamespaceTest::SetUp();
         ASSERT_EQ(getPidFromName("bluetoothd"), -1) << "the build folder's path may not contain it";
     }
     void TearDown() override {
-        killAll("bluetoothd");
+        for (int pid; (pid = getPidFromName("bluetoothd")) > 0;) {
+            kill(pid, SIGKILL);
+            // Gone when its executable is: it is not a child of this process.
+            while (std::filesystem::exists(inProc(pid, "exe")))
+                usleep(1000);
+        }
         std::filesystem::remove(daemonProgram);
     }
 };
 
 TEST_F(ProcessLookupTest, MatchesAnyPartOfTheExecutablesPath) {
-    install("/tmp/bluetoothd-tool");
-    ChildProcess starter({"/tmp/bluetoothd-tool"});
-    ASSERT_EQ(starter.wait(), 0);
-    const int pid = getPidFromName("bluetoothd");
+    const int pid = startDaemon("/tmp/bluetoothd-tool");
     ASSERT_GT(pid, 0);
-    EXPECT_EQ(std::filesystem::read_symlink("/proc/" + std::to_string(pid) + "/exe"),
-              "/tmp/bluetoothd-tool");
+    EXPECT_EQ(std::filesystem::read_symlink(inProc(pid, "exe")), "/tmp/bluetoothd-tool");
     EXPECT_EQ(getPidFromName("/tmp/blue"), pid);
     EXPECT_EQ(getPidFromName("toothd-tools"), -1);
     EXPECT_EQ(log.take(), Texts());
 }
 
 TEST_F(ProcessLookupTest, FirstIsTheFirstAsTextNotAsNumber) {
-    install(daemonProgram);
     const auto lastPid = [] {
-        const pid_t child = fork();
-        if (child == 0)
-            _exit(0);
-        waitpid(child, nullptr, 0);
-        return child;
+        ChildProcess child({"true"});
+        return child.pid();
     };
     // Numbers of a new namespace begin at 1: one with two digits is near.
     while (lastPid() < 90) {
     }
     ASSERT_LT(lastPid(), 97) << "run this test alone: the numbers below 100 are used up";
-    startDaemon(daemonProgram);
-    const int twoDigits = getPidFromName("bluetoothd");
-    ASSERT_LT(twoDigits, 100);
+    ASSERT_LT(startDaemon(), 100);
     while (lastPid() < 100) {
     }
-    startDaemon(daemonProgram);
-    EXPECT_GE(getPidFromName("bluetoothd"), 100);
+    EXPECT_GE(startDaemon(), 100);
 }
 
-class RestartTest : public ProcessLookupTest {};
+using RestartTest = ProcessLookupTest;
 
 TEST_F(RestartTest, WithoutAnAdapterTheRunningDaemonIsLeftAlone) {
-    install(daemonProgram);
-    startDaemon(daemonProgram);
-    const int running = getPidFromName("bluetoothd");
+    const int running = startDaemon();
     EXPECT_EQ(restartBluetoothd(), -1);
     EXPECT_EQ(log.take(), Texts{"commandlib.cpp No dongle. Stop restarting bluetoothd..."});
     EXPECT_EQ(getPidFromName("bluetoothd"), running);
@@ -100,9 +84,7 @@ TEST_F(RestartTest, WithoutAnAdapterTheRunningDaemonIsLeftAlone) {
 
 TEST_F(RestartTest, KillsTheRunningDaemonAndStartsANewOneThatInheritsNothing) {
     writeFile(marker, "");
-    install(daemonProgram);
-    startDaemon(daemonProgram);
-    const int old = getPidFromName("bluetoothd");
+    const int old = startDaemon();
     const int pidFile = createPidFile("/tmp/test.pid", 0, true);
     EXPECT_EQ(restartBluetoothd(), 0);
     const int now = getPidFromName("bluetoothd");
@@ -110,8 +92,7 @@ TEST_F(RestartTest, KillsTheRunningDaemonAndStartsANewOneThatInheritsNothing) {
     EXPECT_NE(now, old);
     EXPECT_EQ(log.take(), Texts());
 
-    const std::filesystem::directory_iterator inherited("/proc/" + std::to_string(now) + "/fd");
-    EXPECT_EQ(std::distance(begin(inherited), end(inherited)), 3) << "no PID lock, no socket";
+    EXPECT_EQ(countOpenDescriptors(inProc(now, "fd")), 3) << "no PID lock, no socket";
     EXPECT_EQ(waitpid(-1, nullptr, WNOHANG), -1) << "no zombie is left";
     EXPECT_EQ(errno, ECHILD);
     close(pidFile);
@@ -120,8 +101,7 @@ TEST_F(RestartTest, KillsTheRunningDaemonAndStartsANewOneThatInheritsNothing) {
 TEST_F(RestartTest, ADaemonThatDoesNotStartIsAFailureWhateverItReturns) {
     writeFile(marker, "");
     EXPECT_EQ(restartBluetoothd(), -1) << "there is no such program";
-    writeFile(daemonProgram, "#!/bin/sh\nexit 0\n");
-    std::filesystem::permissions(daemonProgram, std::filesystem::perms::all);
+    writeProgram(daemonProgram, "exit 0");
     EXPECT_EQ(restartBluetoothd(), -1) << "it ends with success and leaves no process";
     EXPECT_EQ(log.take(), Texts(2, "commandlib.cpp Failed to start bluetoothd"));
 }

@@ -13,6 +13,7 @@
 #include <filesystem>
 #include <fstream>
 #include <sstream>
+#include <stdexcept>
 #include <string>
 
 namespace Bluetooth::Test {
@@ -35,8 +36,13 @@ inline void writeProgram(const std::string& path, const std::string& script) {
     std::filesystem::permissions(path, std::filesystem::perms(0755));
 }
 
-inline auto countOpenDescriptors() {
-    return std::distance(std::filesystem::directory_iterator("/proc/self/fd"), {});
+inline auto countOpenDescriptors(const std::string& folder = "/proc/self/fd") {
+    return std::distance(std::filesystem::directory_iterator(folder), {});
+}
+
+/// How lines of the auto-connect files, and of the PID file, are logged.
+inline std::string inAutoConnect(const std::string& message) {
+    return "auto_connect.cpp " + message;
 }
 
 /// A daemon's end of a pipe, which does not wait for a writer.
@@ -65,15 +71,14 @@ private:
 /// tests/host/in_namespace.sh. Begins with an empty /etc/bluetooth.
 class NamespaceTest : public ::testing::Test {
 protected:
-    void SetUp() override {
-        ASSERT_NE(getenv("KESBLUETOOTH_TEST_NAMESPACE"), nullptr)
-            << "this would change the machine's own files: run it with ctest, or through "
-               "tests/host/in_namespace.sh BUILD_FOLDER";
-        std::filesystem::remove_all("/etc/bluetooth");
+    NamespaceTest() {
+        if (!getenv("KESBLUETOOTH_TEST_NAMESPACE"))
+            throw std::logic_error("this would change the machine's own files: run it with ctest, "
+                                   "or through tests/host/in_namespace.sh BUILD_FOLDER");
+        for (const char* left : {"/etc/bluetooth", commandPipe, "/tmp/test_pipe", "/tmp/test.pid",
+                                 "/tmp/bluetooth.info_0", "/tmp/bluetoothd-tool", "/small/x"})
+            std::filesystem::remove_all(left);
         std::filesystem::create_directory("/etc/bluetooth");
-        for (const char* left : {commandPipe, "/tmp/test_pipe", "/tmp/test.pid",
-                                 "/tmp/bluetooth.info_0", "/tmp/bluetoothd-tool"})
-            std::filesystem::remove(left);
     }
 
     SyslogCapture log;

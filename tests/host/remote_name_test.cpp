@@ -7,8 +7,7 @@
 
 #include "support/latch.h"
 
-#include <string>
-#include <vector>
+#include <tuple>
 
 namespace {
 
@@ -63,63 +62,52 @@ namespace Bluetooth::Test {
 
 namespace {
 
-constexpr const char* address = "00:11:22:aa:BB:CC";
-
-/// @return the buffer after a look-up, which held only "x" before
-std::string lookUp(int size, int expected) {
-    std::string buffer(300, 'x');
-    EXPECT_EQ(getNameFromAddr(address, buffer.data(), size, GET_NAME_TIMEOUT_SHORT), expected);
-    return buffer;
+/// @return the buffer after a look-up, which held 300 times x before; "" when it failed
+std::string lookUp(int size, const char* address = "00:11:22:aa:BB:CC") {
+    const std::string before(300, 'x');
+    std::string buffer = before;
+    const int result =
+        getNameFromAddr(address, buffer.data(), size, static_cast<GetNameTimeout>(1234));
+    if (result == 0)
+        return buffer;
+    EXPECT_EQ(result, -1);
+    EXPECT_EQ(buffer, before);
+    return "";
 }
 
 } // namespace
 
-class RemoteNameTest : public ::testing::Test {
-protected:
-    RemoteNameTest() { controller = {}; }
-};
-
-TEST_F(RemoteNameTest, AsksTheRoutingAdapterAndCutsTheName) {
+TEST(RemoteNameTest, AsksTheRoutingAdapterAndCutsTheName) {
     controller.name = "Headset";
-    char name[32];
-    EXPECT_EQ(getNameFromAddr(address, name, sizeof name, static_cast<GetNameTimeout>(1234)), 0);
-    EXPECT_STREQ(name, "Headset");
+    EXPECT_STREQ(lookUp(32).c_str(), "Headset");
     EXPECT_EQ(controller.calls, (Texts{"route 00:11:22:AA:BB:CC", "open 3",
                                        "name 55 00:11:22:AA:BB:CC 248 1234", "close 55"}));
+    // A name of the full length has no terminator of its own.
     controller.name = std::string(500, 'n');
-    const std::string untouched(300, 'x');
-    EXPECT_EQ(lookUp(1, 0), '\0' + untouched.substr(1));
-    EXPECT_EQ(lookUp(4, 0), std::string("nnn\0", 4) + untouched.substr(4));
-    EXPECT_EQ(lookUp(248, 0), std::string(247, 'n') + '\0' + untouched.substr(248));
-    EXPECT_EQ(lookUp(300, 0), std::string(248, 'n') + '\0' + untouched.substr(249))
-        << "a name of the full length has no terminator of its own";
+    for (const auto& [size, length] :
+         {std::pair(1, 0u), std::pair(4, 3u), std::pair(248, 247u), std::pair(300, 248u)})
+        EXPECT_EQ(lookUp(size), std::string(length, 'n') + '\0' + std::string(299 - length, 'x'));
 }
 
-TEST_F(RemoteNameTest, FailureLeavesTheBufferAndClosesWhatWasOpened) {
-    controller.name = "half a name";
-    const auto failsAfter = [](const std::string& lastCall) {
-        controller.calls.clear();
-        EXPECT_EQ(lookUp(300, -1), std::string(300, 'x'));
+TEST(RemoteNameTest, FailureClosesWhatWasOpened) {
+    for (const auto& [route, device, lastCall] :
+         {std::tuple(3, 55, "close 55"), std::tuple(3, -1, "open 3"),
+          std::tuple(-1, 55, "route 00:11:22:AA:BB:CC")}) {
+        controller = {route, device, -1, "half a name", {}};
+        EXPECT_EQ(lookUp(300), "");
         EXPECT_EQ(controller.calls.back(), lastCall);
-    };
-    controller.result = -1;
-    failsAfter("close 55");
-    controller.device = -1;
-    failsAfter("open 3");
-    controller.route = -1;
-    failsAfter("route 00:11:22:AA:BB:CC");
+    }
 }
 
-TEST_F(RemoteNameTest, UnusableArgumentsReachNoController) {
-    char name[8] = "x";
-    EXPECT_EQ(getNameFromAddr(nullptr, name, 8, GET_NAME_TIMEOUT_DEFAULT), -1);
-    EXPECT_EQ(getNameFromAddr(address, nullptr, 8, GET_NAME_TIMEOUT_DEFAULT), -1);
+TEST(RemoteNameTest, UnusableArgumentsReachNoController) {
+    controller = {};
+    EXPECT_EQ(getNameFromAddr("00:11:22:aa:BB:CC", nullptr, 8, GET_NAME_TIMEOUT_DEFAULT), -1);
     for (const int size : {0, -1})
-        EXPECT_EQ(getNameFromAddr(address, name, size, GET_NAME_TIMEOUT_DEFAULT), -1);
-    for (const char* bad : {"", "00:11:22", "00:11:22:33:44:5G", "00-11-22-33-44-55"})
-        EXPECT_EQ(getNameFromAddr(bad, name, 8, GET_NAME_TIMEOUT_DEFAULT), -1);
-    EXPECT_STREQ(name, "x");
-    EXPECT_TRUE(controller.calls.empty());
+        EXPECT_EQ(lookUp(size), "");
+    for (const char* bad : {static_cast<const char*>(nullptr), "", "00:11:22", "00:11:22:33:44:5G",
+                            "00-11-22-33-44-55"})
+        EXPECT_EQ(lookUp(8, bad), "");
+    EXPECT_EQ(controller.calls, Texts());
 }
 
 } // namespace Bluetooth::Test
