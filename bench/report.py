@@ -1,10 +1,11 @@
 #!/usr/bin/env python3
-"""Makes performance.md, performance.svg and performance.json of what the benchmarks printed.
+"""Makes FOLDER/performance.md and performance.svg from the figures in FOLDER/performance.json.
 
-    bench/report.py RESULTS-FOLDER OUTPUT-FOLDER
+    bench/report.py FOLDER [RESULTS-FOLDER]
 
-A file of results is named PROCESSORS.PROGRAM.ROUND.json. A benchmark is named CASE/LIBRARY, and a
-case's first part is its group. A figure is the median of all repetitions of all rounds.
+With the folder of what the benchmarks printed, it makes performance.json from that first. A file
+there is named PROCESSORS.PROGRAM.ROUND.json. A benchmark is named CASE/LIBRARY, and a case's first
+part is its group. A figure is the median of all repetitions of all rounds.
 """
 
 import collections
@@ -24,32 +25,15 @@ SECONDS = {"s": 1, "ms": 1e-3, "us": 1e-6, "ns": 1e-9}
 
 
 class Figures:
-    """All repetitions: {(processors, case, library): {quantity: [value]}}, times in seconds."""
+    """The figures of performance.json: {(processors, case, library): {quantity: statistics}}."""
 
-    def __init__(self, folder):
-        self.values = collections.defaultdict(lambda: collections.defaultdict(list))
-        for file in sorted(folder.glob("*.*.*.json")):
-            processors = file.name.split(".")[0]
-            for run in json.loads(file.read_text())["benchmarks"]:
-                if run.get("run_type") != "aggregate":
-                    self.add(processors, run)
-
-    def add(self, processors, run):
-        parts = [part for part in run["name"].split("/")
-                 if part not in ("real_time", "manual_time") and not part.startswith("iterations:")]
-        values = self.values[processors, "/".join(parts[:-1]), parts[-1]]
-        # What happens inside one thread is measured in its processor time.
-        waits = run["name"].endswith("_time")
-        values["time"].append(run["real_time" if waits else "cpu_time"]
-                              * SECONDS[run["time_unit"]])
-        for name in ("p99_us", "calls_per_second", "ns_per_entry", "ns_per_record",
-                     "bytes_per_second"):
-            if name in run:
-                values[name].append(run[name])
+    def __init__(self, measured):
+        self.values = {(row["processors"], row["case"], row["library"]): row
+                       for row in measured["results"]}
 
     def median(self, processors, case, library, quantity="time"):
-        values = self.values.get((processors, case, library), {}).get(quantity)
-        return statistics.median(values) if values else None
+        row = self.values.get((processors, case, library), {})
+        return row[quantity]["median"] if quantity in row else None
 
     def ratio(self, processors, case, library, base, quantity="time"):
         value = self.median(processors, case, library, quantity)
@@ -59,27 +43,15 @@ class Figures:
     def overlap(self, processors, case, library, other):
         """Whether the middle halves of two libraries' times overlap."""
         first, second = (self.values[processors, case, name]["time"] for name in (library, other))
-        if min(len(first), len(second)) < 2:
+        if "lower_quartile" not in first or "lower_quartile" not in second:
             return True
-        first, second = statistics.quantiles(first, n=4), statistics.quantiles(second, n=4)
-        return first[0] <= second[2] and second[0] <= first[2]
+        return (first["lower_quartile"] <= second["upper_quartile"]
+                and second["lower_quartile"] <= first["upper_quartile"])
 
     def cases(self, processors, group):
         found = {case for where, case, _ in self.values if where == processors
                  and case.split("/")[0] == group}
         return sorted(found, key=lambda case: int(case.split("/")[1]))
-
-    def as_json(self):
-        rows = []
-        for (processors, case, library), quantities in self.values.items():
-            row = {"processors": processors, "case": case, "library": library}
-            for name, values in quantities.items():
-                row[name] = {"median": statistics.median(values), "repetitions": len(values)}
-                if len(values) > 1:
-                    quarters = statistics.quantiles(values, n=4)
-                    row[name].update(lower_quartile=quarters[0], upper_quartile=quarters[2])
-            rows.append(row)
-        return rows
 
 
 def microseconds(value):
@@ -145,22 +117,6 @@ def goals(figures):
     return table(["goal", "time", "wanted", ""], rows)
 
 
-def version(package):
-    done = subprocess.run(["dpkg-query", "-W", "-f", "${Version}", package],
-                          capture_output=True, text=True)
-    return done.stdout or "not installed"
-
-
-def machine():
-    model = next((line.split(":")[1].strip() for line in open("/proc/cpuinfo")
-                  if line.startswith("model name")), platform.machine())
-    memory = next(int(line.split()[1]) for line in open("/proc/meminfo")
-                  if line.startswith("MemTotal"))
-    processors = subprocess.run(["nproc"], capture_output=True, text=True).stdout.strip()
-    return (f"{model}, {processors} processors, {memory / 2**20:.0f} GiB, "
-            f"Linux {platform.release()}")
-
-
 def numbered(figures, group, quantity, unit, scale):
     """Rows of the groups that only we are measured in."""
     rows = []
@@ -172,12 +128,10 @@ def numbered(figures, group, quantity, unit, scale):
     return rows
 
 
-def scanner(folder):
-    """What the load of the scanner service printed, a quantity and its value in each line."""
-    file = folder / "scanner.txt"
-    if not file.exists():
+def scanner(rows):
+    """What the load of the scanner service printed, a quantity and its value in each row."""
+    if not rows:
         return ""
-    rows = [line.split(None, 1) for line in file.read_text().splitlines() if line.strip()]
     return f"""## The scanner service under load
 
 8 client programs ask on 2 adapters without pause, while 1,000 devices are found again and again.
@@ -187,7 +141,7 @@ All processors.
 """
 
 
-def document(figures, folder):
+def document(figures, measured):
     one, every = "one", "all"
     sizes = [(case, f"{int(case.split('/')[1]):,}") for case in figures.cases(one, "decode")]
     lists = [(case, f"{int(case.split('/')[1]):,}") for case in figures.cases(one, "list")]
@@ -200,13 +154,12 @@ def document(figures, folder):
     text += numbered(figures, "parse", "bytes_per_second", "MB/s", 1e-6)
     dispatch = numbered(figures, "dispatch-to-all", "ns_per_record", "ns", 1)
     dispatch += numbered(figures, "dispatch-to-none", "ns_per_record", "ns", 1)
-    versions = [[package, version(package)] for package in PACKAGES]
     return f"""# Performance
 
-Written by `scripts/bench.sh` on {datetime.date.today()}; do not edit. Every repetition counts in
-[performance.json](performance.json).
+Measured by `scripts/bench.sh` on {measured["date"]}. `bench/report.py docs` makes this page and its
+chart from the figures in [performance.json](performance.json): do not edit.
 
-Machine: {machine()}.
+Machine: {measured["machine"]}.
 
 All libraries talk to the same peer, a small process that uses raw libdbus, over one private bus in
 one run, their repetitions mixed in random order. Times are medians in microseconds; (× 0.90) says
@@ -271,9 +224,9 @@ From a received message to all names and values as objects of the program; raw l
 One signal offered to as many subscriptions of its kind, all or none of which it is for.
 
 {table(["subscriptions", "time", "each"], dispatch)}
-{scanner(folder)}## Versions
+{scanner(measured["scanner"])}## Versions
 
-{table(["package", "version"], versions)}"""
+{table(["package", "version"], measured["versions"].items())}"""
 
 
 COLOURS = {OURS: "#1f6feb", LIMIT: "#8b949e", "sdbus-c++": "#d29922", "GDBus": "#bf4b8a",
@@ -316,17 +269,78 @@ def chart(figures):
             "\n</svg>\n")
 
 
+def repetitions(folder):
+    """All repetitions of all rounds: {(processors, case, library): {quantity: [value]}}."""
+    found = collections.defaultdict(lambda: collections.defaultdict(list))
+    for file in sorted(folder.glob("*.*.*.json")):
+        for run in json.loads(file.read_text())["benchmarks"]:
+            if run.get("run_type") == "aggregate":
+                continue
+            parts = [part for part in run["name"].split("/")
+                     if part not in ("real_time", "manual_time")
+                     and not part.startswith("iterations:")]
+            values = found[file.name.split(".")[0], "/".join(parts[:-1]), parts[-1]]
+            # What happens inside one thread is measured in its processor time.
+            waits = run["name"].endswith("_time")
+            values["time"].append(run["real_time" if waits else "cpu_time"]
+                                  * SECONDS[run["time_unit"]])
+            for name in ("p99_us", "calls_per_second", "ns_per_entry", "ns_per_record",
+                         "bytes_per_second"):
+                if name in run:
+                    values[name].append(run[name])
+    return found
+
+
+def statistic(values):
+    result = {"median": statistics.median(values), "repetitions": len(values)}
+    if len(values) > 1:
+        quarters = statistics.quantiles(values, n=4)
+        result.update(lower_quartile=quarters[0], upper_quartile=quarters[2])
+    return result
+
+
+def version(package):
+    done = subprocess.run(["dpkg-query", "-W", "-f", "${Version}", package],
+                          capture_output=True, text=True)
+    return done.stdout or "not installed"
+
+
+def machine():
+    model = next((line.split(":")[1].strip() for line in open("/proc/cpuinfo")
+                  if line.startswith("model name")), platform.machine())
+    memory = next(int(line.split()[1]) for line in open("/proc/meminfo")
+                  if line.startswith("MemTotal"))
+    processors = subprocess.run(["nproc"], capture_output=True, text=True).stdout.strip()
+    return (f"{model}, {processors} processors, {memory / 2**20:.0f} GiB, "
+            f"Linux {platform.release()}")
+
+
+def collect(folder):
+    """Performance.json of what the benchmarks printed, a result in each line."""
+    scanner_file = folder / "scanner.txt"
+    lines = scanner_file.read_text().splitlines() if scanner_file.exists() else []
+    facts = {"date": str(datetime.date.today()), "machine": machine(),
+             "versions": {package: version(package) for package in PACKAGES},
+             "scanner": [line.split(None, 1) for line in lines if line.strip()],
+             "times": "seconds"}
+    rows = [{"processors": processors, "case": case, "library": library}
+            | {name: statistic(values) for name, values in quantities.items()}
+            for (processors, case, library), quantities in repetitions(folder).items()]
+    return ("{" + ",\n".join(f'"{name}": {json.dumps(value)}' for name, value in facts.items())
+            + ',\n"results": [\n' + ",\n".join(map(json.dumps, rows)) + "\n]}\n")
+
+
 def main():
-    if len(sys.argv) != 3:
-        sys.exit("usage: report.py RESULTS-FOLDER OUTPUT-FOLDER")
+    if len(sys.argv) not in (2, 3):
+        print("usage: report.py FOLDER [RESULTS-FOLDER]", file=sys.stderr)
+        sys.exit(2)
     folder = pathlib.Path(sys.argv[1])
-    figures = Figures(folder)
-    output = pathlib.Path(sys.argv[2])
-    (output / "performance.md").write_text(document(figures, folder))
-    (output / "performance.svg").write_text(chart(figures))
-    rows = ",\n".join(json.dumps(row) for row in figures.as_json())
-    (output / "performance.json").write_text(
-        f'{{"machine": {json.dumps(machine())}, "times": "seconds", "results": [\n{rows}\n]}}\n')
+    if len(sys.argv) == 3:
+        (folder / "performance.json").write_text(collect(pathlib.Path(sys.argv[2])))
+    measured = json.loads((folder / "performance.json").read_text())
+    figures = Figures(measured)
+    (folder / "performance.md").write_text(document(figures, measured))
+    (folder / "performance.svg").write_text(chart(figures))
 
 
 if __name__ == "__main__":

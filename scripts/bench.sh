@@ -66,5 +66,5 @@ if [ -x "$bench-scanner" ]; then
     "$bench-scanner" "$scanner" >"$raw/scanner.txt" || die "the scanner's load failed"
 fi
 
-"$root/bench/report.py" "$raw" "$results"
+"$root/bench/report.py" "$results" "$raw"
 echo "Written: ${results#"$root"/}/performance.md, performance.svg and performance.json"
