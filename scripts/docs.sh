@@ -1,6 +1,7 @@
 #!/usr/bin/env bash
-# Writes the documentation of the classes and the pages to build/docs/html. Any warning is a failure.
-# Installs the Debian package that is missing.
+# Writes the documentation of the classes and the pages to build/docs/html. Any warning is a failure,
+# and so is an operation that does not name its D-Bus method or signal. Installs the Debian package
+# that is missing.
 source "$(dirname "$0")/lib.sh"
 
 need_packages doxygen
@@ -13,4 +14,13 @@ rm -rf "$KESBLUETOOTH_DOCS"/{html,examples}
 mkdir -p "$KESBLUETOOTH_DOCS"
 doxygen docs/Doxyfile
 cp -r examples "$KESBLUETOOTH_DOCS/" # the pages link to them
+
+for header in include/bluetooth/*.h; do
+    source=$(echo src/*/"$(basename "$header" .h).cpp")
+    [ -e "$source" ] || continue
+    for name in $(tr -s '\n ' ' ' <"$source" |
+        grep -oE '(\*this, |setSignalHandler[A-Za-z]*\( ?)"[A-Z][A-Za-z]*"' | cut -d'"' -f2); do
+        grep -qE "@dbus .*\b$name\(" "$header" || die "$header lacks '@dbus $name(...)'"
+    done
+done
 echo "Written: build/docs/html/index.html"

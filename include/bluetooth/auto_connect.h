@@ -6,48 +6,48 @@
 
 namespace Bluetooth {
 
-/// Which devices are to be connected automatically, adapter by adapter.
+/// The lists of devices to connect automatically, one for each adapter.
 ///
 /// Each adapter has a file /etc/bluetooth/autoconnect/ADDRESS, named by the adapter's address as
 /// the caller writes it (case matters; the daemon reports upper case). It holds a flag and the
-/// devices' addresses, without line breaks:
+/// devices' addresses, without a line end:
 /// @code
 ///     1,AA:BB:CC:DD:EE:FF,11:22:33:44:55:66
 /// @endcode
-/// "1" is enabled, "0" disabled. A missing file is created disabled and empty by every operation
-/// that looks at it. A file beyond 1 MiB is not read: it counts as disabled and empty, and only
-/// set() changes it.
+/// "1" is enabled, "0" disabled. Every operation that reads a missing file creates it, disabled and
+/// empty. A file beyond 1 MiB is not read: it counts as disabled and empty, and only set() changes
+/// it.
 ///
 /// The auto-connect daemon reads the same files and takes commands from the pipe
 /// /tmp/kes_bluetooth_autoconnect.
 ///
-/// ERRORS. Failures are told by the result and a log line.
-/// THREADS. There is no state; any thread may call. Nothing is locked: two processes that change
-/// one file at the same moment may lose one of the changes.
+/// ERRORS. A failure is returned and logged.
+/// THREADS. There is no state; any thread may call. Nothing is locked: of two processes that change
+/// one file at the same moment, one may lose its change.
 class KESBLUETOOTH_API AutoConnect {
 public:
-    /// Whether a file can be used as a configuration file; creates it when it is missing (and the
-    /// folder /etc/bluetooth/autoconnect/ with it).
+    /// Whether a file can be used as a list. Creates a missing file, and a missing folder
+    /// /etc/bluetooth/autoconnect/.
     /// @param path the file's full path
     /// @return true for a regular file that may be read and written
     bool checkConfigFile(const char* path) const;
 
-    /// Tells whether an adapter's devices are to be connected.
+    /// Whether an adapter's devices are to be connected.
     /// @param adapter address of the adapter, e.g. "AA:BB:CC:DD:EE:FF"
     /// @return the flag: true when the number at the beginning of the file is not 0; false also
     ///         when it cannot be read
     bool getEnable(const char* adapter) const;
 
-    /// Rewrites the file and tells the daemon (reload(); that there may be none is no failure).
+    /// Rewrites the file and calls reload(), whose result does not count.
     /// @param adapter    address of the adapter
     /// @param enable     the flag
-    /// @param deviceList written after the flag as it stands, so each address needs a comma before
-    ///                   it: ",AA:BB:CC:DD:EE:FF". Without the first comma the text is written
-    ///                   all the same, and readers miss its first character.
+    /// @param deviceList written after the flag as it is, so each address needs a comma before it:
+    ///                   ",AA:BB:CC:DD:EE:FF". Without the first comma it is written all the same,
+    ///                   and readers miss its first character.
     /// @return true when the file was rewritten
     bool set(const char* adapter, bool enable, const char* deviceList);
 
-    /// Drops every entry equal to `device` (case matters), rewrites the file and tells the daemon.
+    /// Removes every entry equal to `device` (case matters), rewrites the file and calls reload().
     /// The list of an adapter whose flag is not "1" is left as it is.
     /// @param adapter address of the adapter
     /// @param device  address of the device, as it is in the file
@@ -55,9 +55,11 @@ public:
     ///         it is beyond 1 MiB or cannot be read to its end, which leaves it as it is
     bool removeDevice(const char* adapter, const char* device);
 
-    /// The devices of one adapter's list, enabled or not. Entries that the adapter does not know
-    /// are removed from an enabled file, one after the other (removeDevice()). Entries that the
-    /// daemon gave no answer about (it hangs or restarts, the adapter was pulled out) are kept.
+    /// Returns the devices of one adapter's list, enabled or not. Entries that the adapter does not
+    /// know are removed from an enabled file, one after the other (removeDevice()). Entries for
+    /// which the daemon did not reply (it hangs or restarts, the adapter was removed) are kept.
+    /// @dbus org.bluez.Manager.FindAdapter(s pattern) -> o, and for each entry
+    ///       org.bluez.Adapter.FindDevice(s address) -> o
     /// @param adapter address of the adapter
     /// @return a new list, possibly empty, deleted by the caller; null when the daemon or the
     ///         adapter is not there, or the file cannot be opened
@@ -65,23 +67,25 @@ public:
     /// Blocks for one call of the daemon for each entry.
     DeviceList* getDeviceList(const char* adapter);
 
-    /// The devices that are to be connected: the lists of all adapters that are powered and
-    /// enabled, in the daemon's order of adapters. Unknown entries are removed as in
-    /// getDeviceList().
+    /// Returns the devices to connect: those of the enabled lists of all powered adapters, in the
+    /// daemon's order of adapters. Unknown entries are removed as in getDeviceList().
+    /// @dbus org.bluez.Manager.ListAdapters() -> ao, org.bluez.Adapter.GetProperties() -> a{sv},
+    ///       and for each entry FindDevice(s address) -> o
     /// @return a new list, possibly empty, deleted by the caller; null when the daemon is not there
     ///
     /// Blocks for some calls of the daemon for each adapter, and one for each entry.
     DeviceList* getAutoConnectDeviceList();
 
-    /// Writes a command to the daemon's pipe, as it stands and without a line end. Never waits.
+    /// Writes a command to the auto-connect daemon's pipe, as it is, without a line end. Never
+    /// waits.
     /// @param command e.g. "pause"
     /// @return true when all of it was written; false also when no daemon reads the pipe
     bool sendCommand(const char* command) const;
-    /// Tells the daemon to read the files again ("1").
+    /// Makes the auto-connect daemon read the files again: sends "1". @return as sendCommand()
     bool reload() const;
-    /// Tells the daemon to connect nothing until resume() ("pause").
+    /// Makes it connect nothing until resume(): sends "pause". @return as sendCommand()
     bool pause() const;
-    /// Ends pause() ("resume").
+    /// Ends pause(): sends "resume". @return as sendCommand()
     bool resume() const;
 };
 

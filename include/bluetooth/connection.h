@@ -7,23 +7,23 @@
 
 namespace Bluetooth {
 
-/// Gives the process's connection to a bus: libdbus's shared one, the same for every proxy.
+/// The process's connection to a bus: libdbus's shared one, the same for every proxy.
 ///
 /// The process does not end when the bus goes away (libdbus's exit-on-disconnect is turned off);
 /// calls then fail, and a later get() connects anew.
 ///
-/// Programs may use this connection themselves. What they should know:
-/// - dbus_connection_send_with_reply_and_block() loses nothing, but a slow call of theirs holds up
-///   every call of the library meanwhile;
-/// - where they dispatch the connection (a GLib main loop, dbus_connection_read_write_dispatch()),
-///   their handlers may call methods; calls of other threads on that bus may wait until a handler
-///   returns, so a handler must not wait for such a thread;
-/// - a dispatch status function of theirs must not call the library.
+/// A program may use this connection itself:
+/// - dbus_connection_send_with_reply_and_block() loses nothing, but a slow call delays every call
+///   of the library meanwhile;
+/// - where the program dispatches the connection (a GLib main loop,
+///   dbus_connection_read_write_dispatch()), its handlers may call methods; calls of other threads
+///   on that bus may wait until a handler returns, so a handler must not wait for such a thread;
+/// - its dispatch status function must not call the library.
 class KESBLUETOOTH_API Connection {
 public:
     Connection() = delete;
 
-    /// Gives the connection, which is opened when the process has none to that bus.
+    /// Returns the connection, and opens it when the process has none to that bus.
     /// @param type DBUS_BUS_SYSTEM or DBUS_BUS_SESSION
     /// @return the shared connection with one more reference, or null when the bus cannot be
     ///         reached (logged)

@@ -11,30 +11,35 @@ namespace Bluetooth {
 /// Lifetime: created by getDevice() or an Adapter and deleted by the caller.
 class KESBLUETOOTH_API Device : public BluezObject {
 public:
-    /// Prefer getDevice(), which tells when the daemon is absent.
+    /// Prefer getDevice(), which reports an absent daemon.
+    /// @param path see getDevice()
     explicit Device(const char* path);
     ~Device() override;
 
-    /// Makes the proxy of a device when the daemon is there (ListNames of the bus).
-    /// @param path e.g. "/org/bluez/1234/hci0/dev_00_11_22_33_44_55"; not checked
+    /// Makes the proxy of a device when the daemon is on the bus.
+    /// @dbus org.freedesktop.DBus.ListNames() -> as
+    /// @param path object path, e.g. "/org/bluez/1234/hci0/dev_00_11_22_33_44_55"; not checked
     /// @return a new Device, deleted by the caller; null when the daemon is not on the bus
     static Device* getDevice(const char* path);
 
-    /// Reads the device's service records over the air (DiscoverServices).
+    /// Reads the device's service records from the device itself.
+    /// @dbus DiscoverServices(s pattern) -> a{us}
     /// @param pattern which services: a UUID, a short one such as "0x110b", or "" for all
     /// @return a new dictionary, deleted by the caller, of record handle (in decimal) and record
-    ///         (XML text); null on any failure, never a part of it
+    ///         (an XML string); null on any failure, never a part of it
     ///
-    /// Blocks until the daemon answers, at most 25 s.
+    /// Blocks until the daemon replies, at most 25 s.
     Dict* discoverServices(const char* pattern);
 
-    /// Ends a discoverServices() that is under way in another thread (CancelDiscovery).
+    /// Ends a discoverServices() that is under way in another thread.
+    /// @dbus CancelDiscovery()
     /// @return 0 when the call was handed to the bus, otherwise -1
     int cancelDiscovery();
 
     /// Subscribes to DisconnectRequested: the daemon is about to close the device's connection.
-    /// @param callback gets the proxy that runs the loop, which need not be this one; null selects
-    ///                 disconnectRequestedHandler()
+    /// @dbus signal DisconnectRequested()
+    /// @param callback called on the receive thread with the proxy that runs it, which need not be
+    ///                 this one; null selects disconnectRequestedHandler()
     /// @return 0, or -1 when the bus refuses (logged)
     int setDisconnectRequestedHandler(NoArgumentCallback callback);
 

@@ -7,32 +7,32 @@
 
 namespace Bluetooth {
 
-/// A D-Bus object path held as text, such as "/org/bluez/1234/hci0".
+/// A D-Bus object path, such as "/org/bluez/1234/hci0".
 ///
-/// The text is not checked here: an ObjectPath may hold any text, and only appending it to a
-/// message (RemoteObject::append) rejects one that is not a path.
+/// It is not checked here: an ObjectPath may hold any string, and only appending it to a message
+/// (RemoteObject::append) rejects an invalid path.
 class KESBLUETOOTH_API ObjectPath {
 public:
-    /// The empty text.
+    /// The empty string.
     ObjectPath() = default;
-    /// Copies the text. @param text must not be null
+    /// Copies the string. @param text must not be null
     ObjectPath(const char* text);
-    /// Copies the text.
+    /// Copies the string.
     ObjectPath(const std::string& text);
 
-    /// Copies the text.
+    /// Copies the string.
     ObjectPath(const ObjectPath&) = default;
-    /// Copies the text.
+    /// Copies the string.
     ObjectPath& operator=(const ObjectPath& other) = default;
 
-    /// The held text, never null; valid while the object lives and is not changed.
+    /// The string, never null; valid while the object lives and is not changed.
     const char* c_str() const { return m_path.c_str(); }
-    /// The held text, as c_str() gives it.
+    /// The string, as c_str() returns it.
     operator const char*() const { return m_path.c_str(); }
 
-    /// A copy of the held text.
+    /// A copy of the string.
     std::string str() const { return m_path; }
-    /// A copy of the held text.
+    /// A copy of the string.
     operator std::string() const { return m_path; }
 
 private:

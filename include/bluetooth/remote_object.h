@@ -15,7 +15,7 @@
 #include <vector>
 
 /// @file
-/// The proxy that all others are made of, and the body of its receive thread.
+/// The base of all proxies, and the body of its receive thread.
 
 namespace Bluetooth {
 
@@ -31,15 +31,15 @@ namespace Bluetooth {
 ///         std::cerr << bus.getErrorMessage() << '\n';
 /// @endcode
 ///
-/// ERRORS. Operations that return int give 0 for success and -1 for failure, and record a number
-/// and a text in the proxy. An error stays until resetError(): no success clears it.
+/// ERRORS. Operations that return int return 0 for success and -1 for failure, and record an error
+/// number and message in the proxy. An error stays until resetError(): no success clears it.
 ///
 /// THREADS. One thread at a time may use a proxy; different proxies may be used by different
 /// threads at once. A call waits only for its own reply, never for another thread's.
 ///
-/// SIGNALS. A subscription lasts until its proxy is destroyed. Signals are delivered by the
-/// receive thread that one proxy of the process starts; until then they are kept in memory.
-/// Subscribe before startLoop() where no signal may be missed.
+/// SIGNALS. A subscription lasts until its proxy is destroyed. The receive thread, which one proxy
+/// of each bus starts, delivers the signals; until then they are kept in memory. Subscribe before
+/// startLoop() where no signal may be missed.
 class KESBLUETOOTH_API RemoteObject {
 public:
     /// Makes a proxy of any object.
@@ -48,38 +48,41 @@ public:
     /// @param interface   interface name, e.g. "org.bluez.Adapter"
     /// @param busType     the service's bus: DBUS_BUS_SYSTEM or DBUS_BUS_SESSION
     ///
-    /// The texts are copied and must not be null. They are not checked here: a call through a
-    /// proxy with an unusable name fails. Connects to the bus when the process has not yet; when
-    /// that fails, calls fail too.
+    /// The names are copied. Null or invalid names are not reported here: calls through the proxy
+    /// fail. Connects to the bus when the process has not yet; when that fails, calls fail too.
     RemoteObject(const char* destination, const char* path, const char* interface,
                  DBusBusType busType);
 
     RemoteObject(const RemoteObject&) = delete;
     RemoteObject& operator=(const RemoteObject&) = delete;
 
-    /// Ends the proxy's subscriptions and drops its messages. The reference to the shared
+    /// Ends the proxy's subscriptions and frees its messages. The reference to the shared
     /// connection is kept on purpose: Connection::unref() is for programs that want to drop it.
-    /// Waits while another thread runs one of this proxy's callbacks; so not to be destroyed in a
+    /// @dbus org.freedesktop.DBus.RemoveMatch(s rule), for each subscription
+    ///
+    /// Waits while another thread runs one of this proxy's callbacks: do not destroy it in a
     /// handler of requests while its callbacks make calls on the same bus.
     virtual ~RemoteObject();
 
-    /// The shared connection of the bus; null when it could not be reached. Not to be released.
+    /// The shared connection of the bus, not to be unreferenced; null when the bus could not be
+    /// reached.
     DBusConnection* getConnection() const { return m_connection; }
     /// This process's unique name on the bus, e.g. ":1.42"; "" without a connection.
     const char* getConnectionName() const;
-    /// The service's bus name as the constructor was given it; valid while the proxy lives.
+    /// The service's bus name as given to the constructor; valid while the proxy lives.
     const char* getDestination() const { return m_destination.c_str(); }
-    /// The object path, in the same way.
+    /// The object path, likewise.
     const char* getPath() const { return m_path.c_str(); }
-    /// The interface name, in the same way.
+    /// The interface name, likewise.
     const char* getInterface() const { return m_interface.c_str(); }
 
-    /// Begins a method call and forgets the one begun before.
+    /// Begins a method call, in place of one begun before.
     /// @param method the method's name, e.g. "GetProperties"
-    /// @return 0; -1 with error 1 for a null name (the call begun before is kept) or error 6
+    /// @return 0; -1 with error 1 for null (the call begun before is kept), error 6 for an invalid
+    ///         name of the method or the proxy
     int newMessage(const char* method);
 
-    /// Appends one argument to the call begun by newMessage(): D-Bus type b.
+    /// Appends one argument, of D-Bus type b, to the call begun by newMessage().
     /// @return 0; -1 with error 1 for null, 3 for a path that does not begin with "/", else 7
     int append(bool value);
     /// Appends one argument of D-Bus type s. @return as append(bool)
@@ -92,66 +95,66 @@ public:
     int append(unsigned short value);
 
     /// Appends one argument of D-Bus type v.
-    /// @return 0; -1 with error 8 or 9. A text array or a signed integer cannot be sent: nothing
-    ///         is appended and error 8 is recorded, yet the result is 0. Callers rely on such a
-    ///         call still going out; hasError() tells.
+    /// @return 0; -1 with error 8 or 9. An array of strings or a signed integer cannot be sent:
+    ///         nothing is appended and error 8 is recorded, yet the result is 0. Callers rely on
+    ///         such a call still going out; hasError() reports it.
     int append(const Variant& value);
 
     /// Sends the call.
-    /// @param wantReply true: blocks until the reply is there, which is then held for
-    ///                  getReplyValue(); false: returns once the call is handed to the bus, and no
-    ///                  reply will come
+    /// @param wantReply true: blocks until the reply arrives, and holds it for getReplyValue();
+    ///                  false: returns once the call is handed to the bus, and no reply will come
     /// @param timeoutMs how long to wait for the reply, in milliseconds; -1 for libdbus's default
     ///                  of 25 s; unused without a reply
     /// @return 0; -1 with error 10 (wantReply false) or error 11 and the service's or the bus's own
-    ///         error text
+    ///         error message
     int sendMessage(bool wantReply, int timeoutMs);
 
-    /// Sends the call and waits for its reply without a time limit, while messages that come in,
-    /// requests to objects that this process serves among them, are handled on this thread.
-    /// Returns early when SIGTERM or SIGINT comes: a handler for both is installed and stays.
-    /// @return 0 when the call was sent, also when no reply came (getReplyValue() then gives error
-    ///         2); -1 with error 11. A reply that is a D-Bus error counts as a reply: reading a
-    ///         path from it gives its text.
+    /// Sends the call and waits for its reply without a time limit, while this thread handles the
+    /// messages that arrive, among them requests to objects that this process serves. Returns early
+    /// when SIGTERM or SIGINT comes: a handler for both is installed and stays.
+    /// @return 0 when the call was sent, also when no reply came (getReplyValue() then records
+    ///         error 2); -1 with error 11. A reply that is a D-Bus error counts as a reply: reading
+    ///         an object path from it gives its message.
     ///
     /// One thread of the process at a time may wait here.
     int sendMessagePending();
 
-    /// Holds a reply as if it had come for this proxy's call.
+    /// Holds a reply as if it had arrived for this proxy's call.
     /// @param reply owned by the proxy afterwards; null is error 2
     int setReplyMessage(DBusMessage* reply);
 
-    /// Reads the held reply's first argument, a text, and lets go of the reply.
+    /// Reads the held reply's first argument, a string, and frees the reply.
     /// @return 0; -1 with error 2 when no reply is held, 4 for an argument of another type
     int getReplyValue(std::string& text);
-    /// Reads a boolean. Otherwise as the one for a text.
+    /// Reads a boolean. Otherwise as the one for a string.
     int getReplyValue(bool& value);
-    /// Reads an array of texts; an empty array of any type is an empty list. Otherwise as the one
-    /// for a text.
+    /// Reads an array of strings; an empty array of any type is an empty list. Otherwise as the one
+    /// for a string.
     int getReplyValue(std::vector<std::string>& texts);
-    /// Reads an array of paths; an empty array of any type is an empty list. Otherwise as the one
-    /// for a text.
+    /// Reads an array of object paths; an empty array of any type is an empty list. Otherwise as
+    /// the one for a string.
     int getReplyValue(std::vector<ObjectPath>& paths);
 
-    /// Reads a path. Services answer with a text where something went wrong: such a text is stored
-    /// in `path` too and becomes the error text (error 11), and the result is -2. Any other type is
-    /// error 11, result -1.
+    /// Reads an object path. A string in its place is the service's error message: it is stored in
+    /// `path` too and recorded as error 11, and the result is -2. Any other type is error 11,
+    /// result -1; no held reply is error 2, result -1.
     int getReplyValue(ObjectPath& path);
 
-    /// Reads a dictionary (keys s or u, values as Variant tells). Stops with success at an entry
-    /// whose name is "". On failure `dict` holds the entries before the bad one.
-    /// @return 0; -1 with error 2, 5 for a reply that is no dictionary, 4 for a bad entry
+    /// Reads a dictionary (keys s or u, values as in Variant). Stops with success at an entry whose
+    /// name is "". On failure `dict` holds the entries before the invalid one.
+    /// @return 0; -1 with error 2 when no reply is held, 5 when it is not a dictionary, 4 for an
+    ///         invalid entry
     int getReplyValue(Dict& dict);
 
-    /// Forgets the error.
+    /// Clears the error.
     void resetError();
     /// Whether an operation failed since resetError().
     bool hasError() const { return m_errorNumber != 0; }
-    /// 0 for none; see getErrorMessage().
+    /// The error number, 0 for none; see getErrorMessage().
     int getErrorNumber() const { return m_errorNumber; }
-    /// The error as text: "" for none, otherwise by getErrorNumber():
+    /// The error message: "" for none, otherwise by getErrorNumber():
     ///
-    /// | number | text                               |
+    /// | number | message                            |
     /// |--------|------------------------------------|
     /// | 1      | "Parameter is null"                |
     /// | 2      | "Reply message is null"            |
@@ -163,62 +166,64 @@ public:
     /// | 8      | "Failed to append args = iterator" |
     /// | 9      | "Failed to open container"         |
     /// | 10     | "Failed to send message"           |
-    /// | 11     | the D-Bus error's own text         |
+    /// | 11     | the D-Bus error's own message      |
     std::string getErrorMessage();
 
-    /// Three lines that tell the destination, the path and the interface.
+    /// The destination, the object path and the interface, in three lines.
     std::string getInfo() const;
     /// Writes getInfo() to standard output.
     void printInfo() const;
 
-    /// Subscribes to a signal of this proxy's interface and path. A signal fires for every proxy of
-    /// its interface that subscribed to it, whichever object sent it. Subscribing twice fires
-    /// twice. This operation is for signals without arguments, the others for their kinds.
+    /// Subscribes to a signal of this proxy's interface and object path. A signal that arrives
+    /// calls back every proxy that subscribed to a signal of its interface and name, whichever
+    /// object sent it. Subscribing twice calls back twice. This operation is for signals without
+    /// arguments, the others are for their kinds.
+    /// @dbus org.freedesktop.DBus.AddMatch(s rule)
     /// @param member   the signal's name, e.g. "PropertyChanged"
     /// @param callback must not be null; called on the receive thread, here with the proxy that
     ///                 runs the loop, in all other kinds with this proxy
-    /// @return 0; -1 when the bus refuses or cannot be reached, or an argument is null or no
-    ///         signal name (logged; nothing is subscribed)
+    /// @return 0; -1 when the bus refuses or cannot be reached, or an argument is null or invalid
+    ///         (logged; nothing is subscribed)
     ///
-    /// Blocks until the bus has answered.
+    /// Blocks until the bus has replied.
     int setSignalHandlerNoArgument(const char* member, NoArgumentCallback callback);
-    /// For signals with a text. Otherwise as setSignalHandlerNoArgument().
+    /// For signals with a string. Otherwise as setSignalHandlerNoArgument().
     int setSignalHandlerString(const char* member, StringCallback callback);
-    /// For signals with a path. Otherwise as setSignalHandlerNoArgument().
+    /// For signals with an object path. Otherwise as setSignalHandlerNoArgument().
     int setSignalHandlerObjectPath(const char* member, ObjectPathCallback callback);
     /// For signals with a name and a value. Otherwise as setSignalHandlerNoArgument().
     int setSignalHandlerStringVariant(const char* member, StringVariantCallback callback);
-    /// For signals with a text and properties. Otherwise as setSignalHandlerNoArgument().
+    /// For signals with a string and properties. Otherwise as setSignalHandlerNoArgument().
     int setSignalHandlerStringDict(const char* member, StringDictCallback callback);
 
-    /// Starts the receive thread of this proxy's bus. One for each bus is enough for all proxies.
+    /// Starts the receive thread of this proxy's bus. One for each bus serves all its proxies.
     /// The proxy must outlive the thread: stopLoop() and waitLoop() come before its destruction.
     /// @return 0, or pthread_create's error number
     int startLoop();
-    /// Asks every receive thread of the process to end, for good: none can run afterwards. They end
-    /// after the callback they are in, within 100 ms when idle; what has not been delivered by then
-    /// stays undelivered. Safe in a signal handler.
+    /// Makes every receive thread of the process end, for good: none can run afterwards. A thread
+    /// ends after the callback that it runs, within 100 ms when idle; signals not delivered by then
+    /// stay undelivered. Safe in a signal handler.
     void stopLoop();
     /// Waits for this proxy's receive thread to end.
     /// @return 0, or pthread_join's error number (ESRCH when startLoop() was not called)
     int waitLoop();
 
-    /// Offers one message to the subscriptions without arguments. The receive thread calls this and
-    /// the four that follow.
+    /// Dispatches one signal to the subscriptions without arguments. The receive thread calls this
+    /// and the four that follow, for each signal.
     void signalHandlerDispatcherNoArgument(DBusMessage* message);
-    /// Offers it to those with a text.
+    /// Dispatches it to those with a string.
     void signalHandlerDispatcherString(DBusMessage* message);
-    /// Offers it to those with a path.
+    /// Dispatches it to those with an object path.
     void signalHandlerDispatcherObjectPath(DBusMessage* message);
-    /// Offers it to those with a name and a value.
+    /// Dispatches it to those with a name and a value.
     void signalHandlerDispatcherStringVariant(DBusMessage* message);
-    /// Offers it to those with a text and properties.
+    /// Dispatches it to those with a string and properties.
     void signalHandlerDispatcherStringDict(DBusMessage* message);
 
     /// Decodes the name of a dictionary entry, or of a (name, value) pair of arguments.
-    /// @return 0; -1 with error 4, and the half keeps what it held
+    /// @return 0; -1 with error 4, which leaves that half of `entry` unchanged
     int parseEntryName(DBusMessageIter& iter, DictEntry& entry);
-    /// Decodes the value of it. @return as parseEntryName()
+    /// Decodes its value. @return as parseEntryName()
     int parseEntryValue(DBusMessageIter& iter, DictEntry& entry);
 
 private:

@@ -21,37 +21,39 @@ namespace Bluetooth {
 ///     scanner.removeFinder("hci0");
 /// @endcode
 ///
-/// The first question about an adapter starts discovery there, and the service itself where the
-/// session bus can activate it; devices appear in the answers that follow. The service ends about
-/// 30 s after discovery began on some adapter for the last time, and discovery with it; the next
-/// question starts it anew.
+/// The first call for an adapter starts discovery there, and the service itself where the session
+/// bus can activate it; later calls return the devices found. The service ends about 30 s after it
+/// last began a discovery, and its discoveries with it; the next call starts it anew.
 ///
-/// Errors: see RemoteObject; each operation first forgets the error before.
+/// Errors: see RemoteObject; each operation first resets the error.
 /// Threads: one thread at a time may use a Scanner.
 class KESBLUETOOTH_API Scanner : public RemoteObject {
 public:
     Scanner();
     ~Scanner() override;
 
-    /// Asks for the devices that are in reach of an adapter and not yet known to the Bluetooth
-    /// daemon (ListDevices).
+    /// Returns the devices in range of an adapter that the Bluetooth daemon does not know yet.
+    /// @dbus com.kestrine.bluetooth.Scanner.ListDevices(s adapter) -> a{ss}; before it
+    ///       org.bluez.Manager.FindAdapter(s pattern) -> o
     /// @param adapterId the adapter's name, e.g. "hci0", or its address
-    /// @param logErrors whether a failure of the service is written to the log; getErrorMessage()
-    ///                  tells it either way. What the Bluetooth daemon refuses is always logged.
+    /// @param logErrors whether a failure of the service is logged; getErrorMessage() returns it
+    ///                  either way. A failure of the Bluetooth daemon is always logged.
     /// @return a new list of (address, properties), deleted by the caller together with each Dict
     ///         in it; empty when no device was found yet. Null on failure; the service is not
-    ///         asked when the Bluetooth daemon is absent or does not know the adapter.
+    ///         called when the Bluetooth daemon is absent or does not know the adapter.
     ///
-    /// A Dict holds what the daemon tells of a found device (Address, Class, Icon, RSSI, Name,
-    /// ...), in its order, every value as text: RSSI is "-60", Paired "0".
+    /// A Dict holds the properties that the daemon reported for the device (Address, Class, Icon,
+    /// RSSI, Name, ...), in its order, every value as a string: RSSI is "-60", Paired "0".
     ///
-    /// Blocks until the service answers, at most 25 s each for the daemon and the service.
+    /// Blocks until the service replies, at most 25 s each for the daemon and the service.
     std::vector<std::pair<std::string, Dict*>>* listDevices(const char* adapterId, bool logErrors);
 
-    /// Ends the service's discovery on an adapter (RemoveFinder), for all its clients: the next
-    /// listDevices() of any of them starts it again.
+    /// Ends the service's discovery on an adapter, for all its clients: the next listDevices() of
+    /// any of them starts it again.
+    /// @dbus com.kestrine.bluetooth.Scanner.RemoveFinder(s adapter); before it
+    ///       org.bluez.Manager.FindAdapter(s pattern) -> o
     /// @param adapterId see listDevices()
-    /// @return whether the call was handed to the bus, which is all that is known; false also when
+    /// @return whether the call was handed to the bus; its reply is not awaited. False also when
     ///         the Bluetooth daemon is absent or does not know the adapter. A failure is logged.
     bool removeFinder(const char* adapterId);
 };

@@ -26,56 +26,64 @@ struct StartedDiscovery;
 /// @endcode
 /// kesbt-scannerd is this program with what a daemon needs around it.
 ///
-/// LIFE. The loop ends 30 s after the last finder was made, even while clients keep asking about
+/// LIFE. The loop ends 30 s after the last finder was made, even while clients keep calling for
 /// adapters that have one. Only reaching exactly 0 ends it: a startLoop() after that, without a new
 /// finder, counts on below 0 and does not end by itself.
 ///
-/// DAEMON. Without the Bluetooth daemon the service runs all the same: ListDevices answers that
-/// the adapter is not found, and each call looks for the daemon again. After the daemon's restart
-/// its adapters have other paths, and so other finders; those of the old paths stay, without
+/// DAEMON. Without the Bluetooth daemon the service runs all the same: ListDevices replies that the
+/// adapter is not found, and each call looks for the daemon again. After a restart of the daemon
+/// its adapters have other object paths, and so other finders; those of the old paths stay, without
 /// effect, until the service ends.
 ///
-/// MEMORY. The properties of each device ever found are kept, as text, until the service ends:
-/// about 0.5 KiB a device.
+/// MEMORY. The properties of each device ever found are kept until the service ends: about 0.5 KiB
+/// a device.
 ///
-/// TWO ADAPTERS. Signals of one adapter are told to the finders of all: a device that one adapter
-/// found is in the others' answers too.
+/// TWO ADAPTERS. The signals of one adapter reach the finders of all: a device that one adapter
+/// found is returned for the others too.
 ///
-/// THREADS. One ScannerServer at a time is the current one, to which handlers and callbacks go: the
-/// one made last. Handlers and timer run on the thread that is in startLoop(), the callbacks for
-/// found devices on the receive thread. The operations below may be called from any thread, but
-/// the constructor, the destructor and stopDiscovery().
+/// THREADS. The ScannerServer made last is the current one: handlers and callbacks use it. Handlers
+/// and timer run on the thread in startLoop(), the callbacks for found devices on the receive
+/// thread. Any thread may call the operations below, except the constructor, the destructor and
+/// stopDiscovery().
 class KESBLUETOOTH_API ScannerServer : public ServerObject {
 public:
-    /// Serves the object and becomes the current server. When something of that fails, or the
+    /// Serves the object and becomes the current server. When a part of that fails, or the
     /// Bluetooth daemon is absent, this is logged and the rest works.
-    /// Blocks until the bus and the daemon have answered.
+    /// @dbus org.freedesktop.DBus.RequestName(s name, u flags) -> u on the session bus; those of
+    ///       updateFilterSet()
+    ///
+    /// Blocks until the bus and the daemon have replied.
     ScannerServer();
-    /// Discoveries end with the process's bus connection, or before by stopDiscovery().
+    /// Leaves the discoveries running: stopDiscovery() ends them, or the end of the process's bus
+    /// connection.
     ~ScannerServer() override;
 
     /// Counts down to the end of the loop. @return 0 when it ends, otherwise 1
     int callbackThreadHandler(void* data) override;
 
-    /// Makes a finder for an adapter before anybody asks for it (ScannerObject::addFinder).
-    /// @param adapterId the adapter's name or address; nothing happens when there is no such
+    /// Makes a finder for an adapter before a client calls for it (ScannerObject::addFinder).
+    /// @param adapterId the adapter's name or address; nothing happens when the daemon does not
+    ///                  know it
     void addAdapterFounder(const char* adapterId);
 
-    /// Reads from the daemon which devices it knows: they are left out of all answers. Done for
-    /// each ListDevices. Without the daemon this is logged and none is left out.
+    /// Reads which devices the daemon knows: they are left out of all replies. Each ListDevices
+    /// does this. Without the daemon none is left out; that it never was there is logged.
+    /// @dbus org.bluez.Manager.ListAdapters() -> ao, org.bluez.Adapter.ListDevices() -> ao
     void updateFilterSet();
-    /// Tells which devices are left out of answers.
+    /// Whether a device is left out of replies.
     /// @return whether the daemon knew the device when updateFilterSet() was called last
     bool isInFilterSet(const std::string& address);
 
-    /// Keeps the properties of a found device, in place of those before.
+    /// Keeps the formatted properties of a found device, in place of earlier ones.
     void putInfoToMap(const std::string& address, const std::string& text);
-    /// The properties of a found device.
-    /// @return the text kept; "" for an unknown address, for which an empty entry is kept from then
+    /// Returns the formatted properties of a found device.
+    /// @return the string kept; "" for an unknown address, for which an empty entry is kept from
+    ///         then on
     std::string getInfoFromMap(const std::string& address);
 
-    /// Ends all discoveries that were started for finders, and what receives for them: for the end
-    /// of the program. Stops the receive thread of the process (see RemoteObject::stopLoop()).
+    /// Ends all discoveries that finders started, and the receiving for them: for the end of the
+    /// program. Stops the receive threads of the process (see RemoteObject::stopLoop()).
+    /// @dbus org.bluez.Adapter.StopDiscovery()
     void stopDiscovery();
 
 private:

@@ -21,63 +21,65 @@ namespace Bluetooth {
 /// ScannerServer, and startLoop() runs for no other.
 ///
 /// THREADS. The thread in startLoop() runs the default GLib main context: method calls to the
-/// served object and callbackThreadHandler() come on it. quitLoop() may be called from any thread,
-/// everything else from one at a time.
+/// served object and callbackThreadHandler() run on it. Any thread may call quitLoop(); one at a
+/// time may call everything else.
 class KESBLUETOOTH_API ServerObject {
 public:
-    /// Connects to the bus. Nothing is requested or registered yet, and nothing is reported: when
-    /// the bus cannot be reached, prepareObjectInfo() fails. The process does not end when the bus
-    /// goes away later.
+    /// Connects to the bus. Nothing is requested or registered yet, and no failure is reported:
+    /// when the bus cannot be reached, prepareObjectInfo() fails. The process does not end when the
+    /// bus goes away later.
     /// @param busName well-known name to request, e.g. "com.kestrine.bluetooth"
     /// @param path    object path to serve at, e.g. "/"
     /// @param type    the bus: DBUS_BUS_SYSTEM or DBUS_BUS_SESSION
     ///
-    /// The texts are borrowed: they must outlive the object.
+    /// The strings are not copied: they must outlive the object.
     ServerObject(const char* busName, const char* path, DBusBusType type);
     ServerObject(const ServerObject&) = delete;
     ServerObject& operator=(const ServerObject&) = delete;
 
-    /// The served object stays registered and the name owned: they end with the GObject and with
-    /// the connection.
+    /// The object stays served until the GObject is destroyed, and the name owned until the
+    /// connection is closed.
     virtual ~ServerObject();
 
     /// Called every second while the loop runs.
     /// @param data this object
-    /// @return whether to be called again; the base says yes and does nothing
+    /// @return whether to be called again; the base does nothing and returns 1
     virtual int callbackThreadHandler(void* data);
 
     /// Connects to the bus if that has not succeeded yet. A failure is not reported.
     void getConnection();
 
     /// Requests the bus name and serves an object at the path.
+    /// @dbus org.freedesktop.DBus.RequestName(s name, u flags) -> u
     /// @param type   the object's type, to which the method table is attached
     /// @param info   method table as dbus-binding-tool makes it; must live as long as the type
     /// @param object not owned; served until it is destroyed
-    /// @return false, logged, when the bus did not take the request, the path is taken, or the bus
-    ///         name or the path given to the constructor is none. Whether
-    ///         the name came to be owned, or this process only waits for it, is not looked at.
+    /// @return false (logged) when the bus refuses, another object is at the path, or the bus name
+    ///         or the path given to the constructor is invalid. Whether this process owns the name,
+    ///         or waits for it, is not checked.
     ///
-    /// Blocks until the bus answers.
+    /// Blocks until the bus replies.
     bool prepareObjectInfo(GType type, const DBusGObjectInfo* info, GObject* object);
 
-    /// Runs the main loop on this thread until quitLoop(), while BlueZ's signals are received on a
-    /// thread of their own. Returns at once when the loop runs already or this is no ScannerServer.
+    /// Runs the main loop on this thread until quitLoop(), while a receive thread delivers BlueZ's
+    /// signals. Returns at once when the loop runs already or this is not a ScannerServer.
     ///
-    /// The receive thread is asked to stop when the loop has ended. That is for good (see
+    /// When the loop has ended the receive thread is stopped, for good (see
     /// RemoteObject::stopLoop()): a second startLoop() of the process runs the main loop only.
     void startLoop();
 
     /// Ends startLoop(); does nothing when it does not run. Any thread.
     void quitLoop();
 
-    /// Writes three lines that tell what the three getters below give.
+    /// Writes to standard output, in three lines, what getBusName(), getPath() and getInterface()
+    /// return.
     void printInfo() const;
 
     /// This process's unique name on the bus, e.g. ":1.42"; "" without a connection.
     const char* getConnectionName() const;
 
-    /// "org.freedesktop.DBus": on purpose this and the next two tell about the bus itself, whatever
-    /// name and path are served. "" without a connection.
+    /// "org.freedesktop.DBus": on purpose this and the next two are the bus's own, whatever name
+    /// and path are served. "" without a connection.
     const char* getBusName() const;
     /// "/org/freedesktop/DBus"; "" without a connection.
     const char* getPath() const;
