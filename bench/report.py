@@ -83,9 +83,9 @@ def compared(figures, processors, cases, libraries, label, quantity="time", scal
     return table([label] + libraries, rows)
 
 
-CALLS = [("call/nothing", "no data"), ("call/text", "a text"),
+CALLS = [("call/nothing", "no data"), ("call/text", "a string"),
          ("call/properties", "15 properties, decoded"),
-         ("call/text-beside-receive-thread", "a text, beside an idle receive thread")]
+         ("call/text-beside-receive-thread", "a string, beside an idle receive thread")]
 SIGNALS = [("signal/idle", "200 a second"), ("signal/2000-per-second", "2,000 a second"),
            ("signal/idle-while-calling", "200 a second, another thread calls"),
            ("signal/2000-per-second-while-calling", "2,000 a second, another thread calls")]
@@ -176,7 +176,7 @@ scheduler puts whom and on what else the machine does.
 "Level" means that the middle halves of both libraries' repetitions overlap.
 
 In small calls sdbus-c++ is ahead of raw libdbus, and so of kesbluetooth: libdbus reads and checks a
-text reply with 17,000 instructions, and sdbus-c++ makes the whole call with 13,000. It is 34,000
+string reply with 17,000 instructions, and sdbus-c++ makes the whole call with 13,000. It is 34,000
 with kesbluetooth and 59,000 with raw libdbus (counted by callgrind).
 
 ## Blocking calls

@@ -1,5 +1,5 @@
 // Puts a device on the default adapter's auto-connect list: kesbt-autoconnectd then connects it
-// whenever it is within reach. Needs the right to write below /etc/bluetooth.
+// whenever it is in range. Needs permission to write below /etc/bluetooth.
 //   auto_connect ADDRESS
 #include <bluetooth/adapter.h>
 #include <bluetooth/auto_connect.h>

@@ -1,4 +1,4 @@
-// Shows the devices within reach as they come and go, for a time or until Ctrl-C.
+// Shows the devices in range as they come and go, for a time or until Ctrl-C.
 //   find_devices [SECONDS]     10 by default
 #include <bluetooth/adapter.h>
 #include <bluetooth/dict_codec.h>
@@ -13,7 +13,7 @@
 
 using namespace Bluetooth;
 
-Manager* receiver = nullptr; // whose receive thread a signal ends
+Manager* receiver = nullptr; // runs the receive thread, which a signal ends
 
 int fail(const std::string& text, int status = 1) {
     std::cerr << text << '\n';
@@ -42,7 +42,7 @@ int main(int argc, char** argv) {
     if (adapter->setDeviceFoundHandler(found) != 0 ||
         adapter->setDeviceDisappearedHandler(disappeared) != 0)
         return fail("cannot watch the adapter; see the system log");
-    // startDiscovery() would not wait for the daemon's verdict.
+    // In steps: startDiscovery() would not wait for the daemon's reply.
     if (adapter->newMessage("StartDiscovery") != 0 || adapter->sendMessage(true, -1) != 0)
         return fail("cannot search: " + adapter->getErrorMessage() + "; switch the adapter on");
 

@@ -25,7 +25,8 @@ int main() {
     if (adapters->empty())
         return fail("there is no adapter; plug one in and try again");
     for (Adapter* adapter : *adapters) {
-        // Null when bluetoothd left while the list was made; the properties when it did so later.
+        // The adapter is null when bluetoothd left while the list was made, the properties when it
+        // left later.
         const std::unique_ptr<Dict> properties(adapter ? adapter->getProperties() : nullptr);
         if (!properties)
             return fail("bluetoothd has gone; start it and try again");

@@ -1,5 +1,5 @@
-// Pairs with a device. A PIN code or a passkey is given from the command line; a passkey that both
-// sides show is confirmed.
+// Pairs with a device. The command line may have the PIN code or passkey; a passkey that both sides
+// show is confirmed.
 //   pair ADDRESS [PIN]
 #include <bluetooth/adapter.h>
 #include <bluetooth/agent.h>
@@ -29,12 +29,12 @@ int main(int argc, char** argv) {
     if (!adapter)
         return fail("there is no adapter; plug one in and try again");
 
-    Agent agent; // set up first: from registerPath() on it answers
+    Agent agent; // set up first: it serves requests from registerPath() on
     if (argc == 3)
         agent.setPasskeyValue(argv[2]);
     if (agent.registerPath() != 0)
         return fail("cannot serve the agent; see the system log");
-    // Takes as long as the other side's user takes. Ctrl-C ends the wait, though not the pairing.
+    // Takes as long as the other side's user takes. Ctrl-C ends the wait, but not the pairing.
     const std::unique_ptr<Device> device(adapter->createPairedDevice(address.c_str(), agent));
     const int error = adapter->getErrorNumber();
     const std::string text = adapter->getErrorMessage();

@@ -1,5 +1,5 @@
-// Shows the devices that the shared scan finds. Any number of programs may ask at once: the adapter
-// searches only once for all of them.
+// Shows the devices that the shared scan finds. Any number of programs may run at once: the adapter
+// runs one discovery for all of them.
 //   share_scan [SECONDS]     10 by default
 #include <bluetooth/bluez_object.h>
 #include <bluetooth/dict_codec.h>
@@ -29,7 +29,7 @@ int main(int argc, char** argv) {
     Scanner scanner;
     std::set<std::string> shown;
     for (long second = 0; second < seconds; ++second) {
-        // The first question starts the service and its search: normally no device is there yet.
+        // The first call starts the service and its discovery: normally it returns no device yet.
         const std::unique_ptr<std::vector<std::pair<std::string, Dict*>>> devices(
             scanner.listDevices("hci0", false));
         if (!devices)
@@ -37,12 +37,12 @@ int main(int argc, char** argv) {
                             ? "is kesbt-scannerd installed? " + scanner.getErrorMessage()
                             : "there is no adapter hci0; plug one in and try again");
         for (const auto& [address, dict] : *devices) {
-            const std::unique_ptr<Dict> properties(dict); // ours, as the list is
+            const std::unique_ptr<Dict> properties(dict); // ours to delete, as the list is
             if (shown.insert(address).second)
                 std::cout << address << "  " << find(properties.get(), "RSSI") << " dBm  "
                           << find(properties.get(), "Name") << std::endl;
         }
         sleep(1);
     }
-    return 0; // removeFinder() would end the search for everybody; the service ends by itself
+    return 0; // removeFinder() would end discovery for all programs; the service ends by itself
 }

@@ -1,4 +1,4 @@
-// Connects a headset and shows what changes of its audio until Ctrl-C, which disconnects it.
+// Connects a headset and shows the changes of its audio until Ctrl-C, which disconnects it.
 //   watch_headset ADDRESS
 #include <bluetooth/adapter.h>
 #include <bluetooth/audio.h>
@@ -14,7 +14,7 @@
 
 using namespace Bluetooth;
 
-Manager* receiver = nullptr; // whose receive thread a signal ends
+Manager* receiver = nullptr; // runs the receive thread, which a signal ends
 
 int fail(const std::string& text, int status = 1) {
     std::cerr << text << '\n';
@@ -44,7 +44,7 @@ int main(int argc, char** argv) {
     if (audio.setPropertyChangedHandler(changed) != 0 ||
         sink.setPropertyChangedHandler(changed) != 0 || manager->startLoop() != 0)
         return fail("cannot watch the headset; see the system log");
-    // connect() would not wait for the daemon's verdict. What changes meanwhile is shown.
+    // In steps: connect() would not wait for the daemon's reply. Changes are shown meanwhile.
     const bool connected = (audio.newMessage("Connect") == 0 && audio.sendMessage(true, -1) == 0) ||
                            audio.getErrorMessage() == "Already Connected";
     receiver = manager.get();
