@@ -8,7 +8,16 @@ set(CPACK_STRIP_FILES ON)
 set(CPACK_DEB_COMPONENT_INSTALL ON)
 set(CPACK_COMPONENTS_ALL runtime dev doc sim kesbt scannerd autoconnectd)
 set(CPACK_DEBIAN_FILE_NAME DEB-DEFAULT)
-set(CPACK_DEBIAN_PACKAGE_RELEASE 1)
+# The changelog says what release of the package this is.
+set(debianFiles ${PROJECT_SOURCE_DIR}/packaging/debian)
+set_property(DIRECTORY APPEND PROPERTY CMAKE_CONFIGURE_DEPENDS
+    ${debianFiles}/changelog ${PROJECT_SOURCE_DIR}/CHANGELOG.md)
+file(STRINGS ${debianFiles}/changelog newest LIMIT_COUNT 1)
+if(NOT newest MATCHES "^([a-z]+) \\(([0-9.]+)-([0-9]+)\\)" OR NOT CMAKE_MATCH_2 STREQUAL PROJECT_VERSION)
+    message(FATAL_ERROR "packaging/debian/changelog does not begin with version ${PROJECT_VERSION}")
+endif()
+set(CPACK_DEBIAN_PACKAGE_SOURCE ${CMAKE_MATCH_1})
+set(CPACK_DEBIAN_PACKAGE_RELEASE ${CMAKE_MATCH_3})
 set(CPACK_DEBIAN_PACKAGE_CONTROL_STRICT_PERMISSION ON)
 set(CPACK_DEBIAN_PACKAGE_SHLIBDEPS ON)
 set(CPACK_DEBIAN_PACKAGE_GENERATE_SHLIBS ON)
@@ -60,7 +69,7 @@ kesbluetooth_package(autoconnectd kesbt-autoconnectd utils "${library} (>= ${PRO
     "Connects listed Bluetooth devices whenever they are in reach"
 "Headsets of the auto-connect lists are connected as they appear. The service is
 not enabled by the installation.")
-set(maintainer ${PROJECT_SOURCE_DIR}/packaging/debian/autoconnectd)
+set(maintainer ${debianFiles}/autoconnectd)
 set(CPACK_DEBIAN_AUTOCONNECTD_PACKAGE_CONTROL_EXTRA
     ${maintainer}/postinst ${maintainer}/prerm ${maintainer}/postrm)
 
@@ -70,9 +79,21 @@ kesbluetooth_package(sim bluez4-sim devel "dbus-daemon | dbus, libglib2.0-bin"
 what to do, so that Bluetooth programs can be tried and tested without hardware.")
 set(CPACK_DEBIAN_SIM_PACKAGE_RECOMMENDS "kesbt, kesbt-scannerd, kesbt-autoconnectd")
 
-# The library makes the last folder of its lists, not those above.
+# What only packages have.
 if(CMAKE_INSTALL_PREFIX STREQUAL /usr)
+    # The library makes the last folder of its lists, not those above.
     install(DIRECTORY DESTINATION /etc/bluetooth COMPONENT runtime)
+    # Compressed without name and time: the same file gives the same bytes.
+    execute_process(COMMAND gzip -9nc ${debianFiles}/changelog
+        OUTPUT_FILE ${PROJECT_BINARY_DIR}/changelog.Debian.gz COMMAND_ERROR_IS_FATAL ANY)
+    execute_process(COMMAND gzip -9nc ${PROJECT_SOURCE_DIR}/CHANGELOG.md
+        OUTPUT_FILE ${PROJECT_BINARY_DIR}/changelog.gz COMMAND_ERROR_IS_FATAL ANY)
+    foreach(component IN LISTS CPACK_COMPONENTS_ALL)
+        string(TOUPPER ${component} upper)
+        install(FILES ${debianFiles}/copyright
+            ${PROJECT_BINARY_DIR}/changelog.Debian.gz ${PROJECT_BINARY_DIR}/changelog.gz
+            DESTINATION share/doc/${CPACK_DEBIAN_${upper}_PACKAGE_NAME} COMPONENT ${component})
+    endforeach()
 endif()
 
 include(CPack)
