@@ -231,20 +231,8 @@ private:
     template <class Callback>
     using Registry = std::list<SignalHandler<Callback>>;
 
-    enum ErrorNumber {
-        errorNullParameter = 1,
-        errorNullReply,
-        errorInvalidPath,
-        errorReplyValue,
-        errorReplyFormat,
-        errorCreateMessage,
-        errorAppendArgs,
-        errorAppendIterator,
-        errorOpenContainer,
-        errorSend,
-        errorDBus
-    };
-    enum class DictResult { Read, NoDict, BadName, BadValue };
+    enum ErrorNumber : int;
+    enum class DictResult;
 
     int recordError(ErrorNumber number);
     int recordError(ErrorNumber number, const char* text);

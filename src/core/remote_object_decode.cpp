@@ -1,8 +1,7 @@
 // How replies, signals and variants become values of the library, and back.
 
-#include <bluetooth/remote_object.h>
-
 #include "core/dbus_ptr.h"
+#include "core/remote_object_private.h"
 
 #include <cstring>
 
