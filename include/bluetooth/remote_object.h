@@ -238,10 +238,9 @@ private:
     int recordError(ErrorNumber number, const char* text);
     int appendBasic(int type, const void* value);
     DictResult parseDictionary(DBusMessageIter& iter, Dict& dict);
-    template <class Wire, class Value>
-    KESBLUETOOTH_LOCAL int readBasic(int type, Value& value);
-    template <class Text>
-    KESBLUETOOTH_LOCAL int readTexts(std::vector<Text>& texts);
+    KESBLUETOOTH_LOCAL DBusMessage* takeReply(DBusMessageIter& first);
+    template <class Value>
+    KESBLUETOOTH_LOCAL int readReply(Value& value);
 
     template <class Callback>
     KESBLUETOOTH_LOCAL int subscribe(Registry<Callback>& registry, const char* member,

@@ -38,6 +38,32 @@ void readTextArray(DBusMessageIter& array, std::vector<Text>& texts) {
     while (dbus_message_iter_next(&element));
 }
 
+bool readValue(DBusMessageIter& iter, std::string& text) {
+    const bool valid = dbus_message_iter_get_arg_type(&iter) == DBUS_TYPE_STRING;
+    if (valid)
+        text = basicAt<const char*>(iter);
+    return valid;
+}
+
+bool readValue(DBusMessageIter& iter, bool& value) {
+    const bool valid = dbus_message_iter_get_arg_type(&iter) == DBUS_TYPE_BOOLEAN;
+    if (valid)
+        value = basicAt<dbus_bool_t>(iter) != 0;
+    return valid;
+}
+
+template <class Text>
+bool readValue(DBusMessageIter& iter, std::vector<Text>& texts) {
+    if (dbus_message_iter_get_arg_type(&iter) != DBUS_TYPE_ARRAY)
+        return false;
+    const int element = dbus_message_iter_get_element_type(&iter);
+    if (!isText(element) && element != DBUS_TYPE_SIGNATURE && !isEmptyArray(iter))
+        return false;
+    texts.clear();
+    readTextArray(iter, texts);
+    return true;
+}
+
 bool isDictionary(DBusMessageIter& iter) {
     return dbus_message_iter_get_arg_type(&iter) == DBUS_TYPE_ARRAY &&
            dbus_message_iter_get_element_type(&iter) == DBUS_TYPE_DICT_ENTRY;
@@ -194,35 +220,47 @@ int RemoteObject::append(const Variant& value) {
     return 0;
 }
 
-template <class Wire, class Value>
-int RemoteObject::readBasic(int type, Value& value) {
-    if (!m_reply)
-        return recordError(errorNullReply);
-    const MessagePtr reply(std::exchange(m_reply, nullptr));
+/// Lets go of the held reply. @return it, the caller's; null, recorded, when none is held
+/// @param first its first argument, of type DBUS_TYPE_INVALID when it has none
+DBusMessage* RemoteObject::takeReply(DBusMessageIter& first) {
+    if (m_reply)
+        dbus_message_iter_init(m_reply, &first);
+    else
+        recordError(errorNullReply);
+    return std::exchange(m_reply, nullptr);
+}
+
+template <class Value>
+int RemoteObject::readReply(Value& value) {
     DBusMessageIter iter;
-    if (!dbus_message_iter_init(reply.get(), &iter) ||
-        dbus_message_iter_get_arg_type(&iter) != type)
-        return recordError(errorReplyValue);
-    value = static_cast<Value>(basicAt<Wire>(iter));
-    return 0;
+    const MessagePtr reply(takeReply(iter));
+    if (!reply)
+        return -1;
+    return readValue(iter, value) ? 0 : recordError(errorReplyValue);
 }
 
 int RemoteObject::getReplyValue(std::string& text) {
-    return readBasic<const char*>(DBUS_TYPE_STRING, text);
+    return readReply(text);
 }
 
 int RemoteObject::getReplyValue(bool& value) {
-    return readBasic<dbus_bool_t>(DBUS_TYPE_BOOLEAN, value);
+    return readReply(value);
+}
+
+int RemoteObject::getReplyValue(std::vector<std::string>& texts) {
+    return readReply(texts);
+}
+
+int RemoteObject::getReplyValue(std::vector<ObjectPath>& paths) {
+    return readReply(paths);
 }
 
 int RemoteObject::getReplyValue(ObjectPath& path) {
-    if (!m_reply)
-        return recordError(errorNullReply);
-    const MessagePtr reply(std::exchange(m_reply, nullptr));
     DBusMessageIter iter;
-    const int type = dbus_message_iter_init(reply.get(), &iter)
-                         ? dbus_message_iter_get_arg_type(&iter)
-                         : DBUS_TYPE_INVALID;
+    const MessagePtr reply(takeReply(iter));
+    if (!reply)
+        return -1;
+    const int type = dbus_message_iter_get_arg_type(&iter);
     if (!isText(type))
         return recordError(errorDBus); // on purpose not the error of the other overloads
     const char* text = basicAt<const char*>(iter);
@@ -234,37 +272,11 @@ int RemoteObject::getReplyValue(ObjectPath& path) {
     return -2;
 }
 
-template <class Text>
-int RemoteObject::readTexts(std::vector<Text>& texts) {
-    if (!m_reply)
-        return recordError(errorNullReply);
-    const MessagePtr reply(std::exchange(m_reply, nullptr));
-    DBusMessageIter iter;
-    if (!dbus_message_iter_init(reply.get(), &iter) ||
-        dbus_message_iter_get_arg_type(&iter) != DBUS_TYPE_ARRAY)
-        return recordError(errorReplyValue);
-    const int element = dbus_message_iter_get_element_type(&iter);
-    if (!isText(element) && element != DBUS_TYPE_SIGNATURE && !isEmptyArray(iter))
-        return recordError(errorReplyValue);
-    texts.clear();
-    readTextArray(iter, texts);
-    return 0;
-}
-
-int RemoteObject::getReplyValue(std::vector<std::string>& texts) {
-    return readTexts(texts);
-}
-
-int RemoteObject::getReplyValue(std::vector<ObjectPath>& paths) {
-    return readTexts(paths);
-}
-
 int RemoteObject::getReplyValue(Dict& dict) {
-    if (!m_reply)
-        return recordError(errorNullReply);
-    const MessagePtr reply(std::exchange(m_reply, nullptr));
     DBusMessageIter iter;
-    dbus_message_iter_init(reply.get(), &iter); // of a reply without arguments: type 0
+    const MessagePtr reply(takeReply(iter));
+    if (!reply)
+        return -1;
     const DictResult result = parseDictionary(iter, dict);
     if (result == DictResult::NoDict)
         return recordError(errorReplyFormat);
