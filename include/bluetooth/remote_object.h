@@ -228,8 +228,6 @@ public:
 
 private:
     friend void* receiveSignal(void* proxy);
-    template <class Callback>
-    using Registry = std::list<SignalHandler<Callback>>;
 
     enum ErrorNumber : int;
     enum class DictResult;
@@ -243,11 +241,7 @@ private:
     KESBLUETOOTH_LOCAL int readReply(Value& value);
 
     template <class Callback>
-    KESBLUETOOTH_LOCAL int subscribe(Registry<Callback>& registry, const char* member,
-                                     Callback callback);
-    template <class Callback>
-    KESBLUETOOTH_LOCAL void takeMembers(Registry<Callback>& registry,
-                                        std::vector<std::string>& members);
+    KESBLUETOOTH_LOCAL int subscribe(const char* member, Callback callback);
     void unsubscribeAll();
     std::string matchRule(const std::string& member) const;
     static void dispatch(void* proxy, DBusMessage* message);
@@ -264,12 +258,12 @@ private:
     std::string m_errorText;
     bool m_usable; // destination, path and interface are valid names
 
-    // Shared by all proxies; never destroyed, since a receive thread may outlive main().
-    static Registry<NoArgumentCallback>& signalHandlerVectorNoArgument;
-    static Registry<StringCallback>& signalHandlerVectorString;
-    static Registry<ObjectPathCallback>& signalHandlerVectorObjectPath;
-    static Registry<StringVariantCallback>& signalHandlerVectorStringVariant;
-    static Registry<StringDictCallback>& signalHandlerVectorStringDict;
+    // The subscriptions of all proxies, by kind.
+    static std::list<SignalHandler<NoArgumentCallback>>& signalHandlerVectorNoArgument;
+    static std::list<SignalHandler<StringCallback>>& signalHandlerVectorString;
+    static std::list<SignalHandler<ObjectPathCallback>>& signalHandlerVectorObjectPath;
+    static std::list<SignalHandler<StringVariantCallback>>& signalHandlerVectorStringVariant;
+    static std::list<SignalHandler<StringDictCallback>>& signalHandlerVectorStringDict;
 };
 
 /// Body of the receive thread: delivers signals on behalf of `proxy` (a RemoteObject*) until

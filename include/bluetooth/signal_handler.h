@@ -45,7 +45,7 @@ public:
         : object(subscriber), member(std::move(signalName)), callback(function) {}
     virtual ~SignalHandler() = default;
 
-    RemoteObject* object; ///< not owned; null once the proxy was destroyed
+    RemoteObject* object; ///< not owned
     std::string member;   ///< the signal's name
     Callback callback;    ///< the callback
 };

@@ -28,6 +28,9 @@ public:
     DBusError& get() { return m_error; }
     operator DBusError*() { return &m_error; }
     bool isSet() const { return dbus_error_is_set(&m_error); }
+    void setNoMemory() {
+        dbus_set_error_const(&m_error, DBUS_ERROR_NO_MEMORY, "Not enough memory");
+    }
     /// The message, "" when none is set.
     const char* message() const { return m_error.message ? m_error.message : ""; }
 

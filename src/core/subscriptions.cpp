@@ -1,0 +1,109 @@
+#include "core/subscriptions.h"
+
+#include <bluetooth/remote_object.h>
+
+namespace Bluetooth {
+
+Subscriptions::Subscriptions() = default;
+
+Subscriptions& Subscriptions::all() {
+    static auto& instance = *new Subscriptions;
+    return instance;
+}
+
+Subscriptions::RecordsOfAllKinds Subscriptions::remove(const RemoteObject* proxy) {
+    RecordsOfAllKinds taken;
+    std::unique_lock<std::mutex> lock(m_mutex);
+    std::apply([&](auto&... kinds) { (take(kinds, proxy, taken), ...); }, m_kinds);
+    m_callbackDone.wait(lock, [&] { return !isCalling(proxy); });
+    return taken;
+}
+
+template <class Callback>
+void Subscriptions::take(Kind<Callback>& kind, const RemoteObject* proxy,
+                         RecordsOfAllKinds& taken) {
+    for (Walk<Callback>* walk = kind.walks; walk; walk = walk->m_other) {
+        if (walk->m_proxy == proxy && walk->m_thread == std::this_thread::get_id())
+            walk->m_proxy = nullptr; // its callback is what destroys it: not waited for
+    }
+    auto& takenOfKind = std::get<Records<Callback>>(taken);
+    for (auto record = kind.records.begin(); record != kind.records.end();) {
+        const auto current = record++;
+        if (current->object != proxy)
+            continue;
+        for (Walk<Callback>* walk = kind.walks; walk; walk = walk->m_other) {
+            if (walk->m_next == current)
+                ++walk->m_next;
+        }
+        takenOfKind.splice(takenOfKind.end(), kind.records, current);
+    }
+}
+
+bool Subscriptions::isCalling(const RemoteObject* proxy) const {
+    const auto isCalledInKind = [proxy](const auto& kind) {
+        auto* walk = kind.walks;
+        while (walk && walk->m_proxy != proxy)
+            walk = walk->m_other;
+        return walk != nullptr;
+    };
+    return std::apply([&](const auto&... kinds) { return (isCalledInKind(kinds) || ...); },
+                      m_kinds);
+}
+
+template <class Callback>
+Subscriptions::Walk<Callback>::Walk(DBusMessage* signal)
+    : m_lock(all().m_mutex),
+      m_kind(all().of<Callback>()),
+      m_signal(signal),
+      m_next(m_kind.records.begin()),
+      m_other(m_kind.walks) {
+    m_kind.walks = this;
+}
+
+template <class Callback>
+Subscriptions::Walk<Callback>::~Walk() {
+    endCall();
+    Walk** link = &m_kind.walks;
+    while (*link != this)
+        link = &(*link)->m_other;
+    *link = m_other;
+}
+
+template <class Callback>
+bool Subscriptions::Walk<Callback>::next() {
+    endCall();
+    while (m_next != m_kind.records.end()) {
+        const SignalHandler<Callback>& record = *m_next++;
+        if (!matches(record))
+            continue;
+        m_proxy = record.object;
+        m_callback = record.callback;
+        m_lock.unlock();
+        return true;
+    }
+    return false;
+}
+
+template <class Callback>
+bool Subscriptions::Walk<Callback>::matches(const SignalHandler<Callback>& record) const {
+    return m_signal &&
+           dbus_message_is_signal(m_signal, record.object->getInterface(), record.member.c_str());
+}
+
+/// Afterwards the mutex is held.
+template <class Callback>
+void Subscriptions::Walk<Callback>::endCall() {
+    if (m_lock.owns_lock())
+        return;
+    m_lock.lock();
+    m_proxy = nullptr;
+    all().m_callbackDone.notify_all();
+}
+
+template class Subscriptions::Walk<NoArgumentCallback>;
+template class Subscriptions::Walk<StringCallback>;
+template class Subscriptions::Walk<ObjectPathCallback>;
+template class Subscriptions::Walk<StringVariantCallback>;
+template class Subscriptions::Walk<StringDictCallback>;
+
+} // namespace Bluetooth
