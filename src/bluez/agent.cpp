@@ -37,7 +37,8 @@ constexpr int path = DBUS_TYPE_OBJECT_PATH;
 constexpr int number = DBUS_TYPE_UINT32;
 constexpr int text = DBUS_TYPE_STRING;
 
-enum { PinCode, Passkey, Confirmation, Authorize, Cancel, Release };
+/// The rows of `requests`.
+enum { pinCodeRow, passkeyRow, confirmationRow, authorizeRow, cancelRow, releaseRow };
 
 // clang-format off
 constexpr Request requests[] = {
@@ -78,8 +79,9 @@ bool appendValue(DBusMessage* reply, Value value, const char* passkey) {
     return dbus_message_append_args(reply, DBUS_TYPE_UINT32, &asNumber, DBUS_TYPE_INVALID);
 }
 
-DBusHandlerResult answer(DBusConnection* connection, DBusMessage* message, const Agent* agent,
+DBusHandlerResult answer(DBusConnection* connection, DBusMessage* message, const void* data,
                          const Request& request) {
+    const auto* agent = static_cast<const Agent*>(data);
     if (!agent || !readArguments(message, request)) {
         logError(KES_HERE, "Failed to get argument from %s message.", request.name);
         return request.badArguments;
@@ -186,7 +188,7 @@ DBusHandlerResult Agent::handlerDispatcher(DBusConnection* connection, DBusMessa
                                            void* agent) {
     for (const Request& request : requests) {
         if (message && dbus_message_is_method_call(message, agentInterface, request.method))
-            return answer(connection, message, static_cast<const Agent*>(agent), request);
+            return answer(connection, message, agent, request);
     }
     logError(KES_HERE, "Registered agent does not provide a handler for the incoming message.");
     return notYetHandled;
@@ -196,29 +198,29 @@ void Agent::handlerUnregisterDispatcher(DBusConnection* /*connection*/, void* /*
 
 DBusHandlerResult Agent::requestPinCode(DBusConnection* connection, DBusMessage* message,
                                         void* agent) {
-    return answer(connection, message, static_cast<const Agent*>(agent), requests[PinCode]);
+    return answer(connection, message, agent, requests[pinCodeRow]);
 }
 
 DBusHandlerResult Agent::requestPasskey(DBusConnection* connection, DBusMessage* message,
                                         void* agent) {
-    return answer(connection, message, static_cast<const Agent*>(agent), requests[Passkey]);
+    return answer(connection, message, agent, requests[passkeyRow]);
 }
 
 DBusHandlerResult Agent::requestConfirmation(DBusConnection* connection, DBusMessage* message,
                                              void* agent) {
-    return answer(connection, message, static_cast<const Agent*>(agent), requests[Confirmation]);
+    return answer(connection, message, agent, requests[confirmationRow]);
 }
 
 DBusHandlerResult Agent::authorize(DBusConnection* connection, DBusMessage* message, void* agent) {
-    return answer(connection, message, static_cast<const Agent*>(agent), requests[Authorize]);
+    return answer(connection, message, agent, requests[authorizeRow]);
 }
 
 DBusHandlerResult Agent::cancel(DBusConnection* connection, DBusMessage* message, void* agent) {
-    return answer(connection, message, static_cast<const Agent*>(agent), requests[Cancel]);
+    return answer(connection, message, agent, requests[cancelRow]);
 }
 
 DBusHandlerResult Agent::release(DBusConnection* connection, DBusMessage* message, void* agent) {
-    return answer(connection, message, static_cast<const Agent*>(agent), requests[Release]);
+    return answer(connection, message, agent, requests[releaseRow]);
 }
 
 DBusHandlerResult Agent::displayPasskey(DBusConnection* /*connection*/, DBusMessage* /*message*/,

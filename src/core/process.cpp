@@ -52,11 +52,11 @@ private:
     posix_spawnattr_t m_attributes{};
 };
 
-struct Descriptor {
-    explicit Descriptor(int owned) : number(owned) {}
-    Descriptor(const Descriptor&) = delete;
-    Descriptor& operator=(const Descriptor&) = delete;
-    ~Descriptor() { close(number); }
+struct PipeEnd {
+    explicit PipeEnd(int owned) : number(owned) {}
+    PipeEnd(const PipeEnd&) = delete;
+    PipeEnd& operator=(const PipeEnd&) = delete;
+    ~PipeEnd() { close(number); }
 
     const int number;
 };
@@ -101,7 +101,7 @@ std::unique_ptr<ProcessReader> ProcessReader::open(const char* program,
     int ends[2];
     if (pipe2(ends, O_CLOEXEC) != 0)
         return nullptr;
-    const Descriptor output(ends[1]);
+    const PipeEnd output(ends[1]);
     reader->m_stream = fdopen(ends[0], "r");
     if (reader->m_stream)
         reader->m_pid = start(program, arguments, output.number);
