@@ -35,7 +35,8 @@ namespace Bluetooth {
 /// number and message in the proxy. An error stays until resetError(): no success clears it.
 ///
 /// THREADS. One thread at a time may use a proxy; different proxies may be used by different
-/// threads at once. A call waits only for its own reply, never for another thread's.
+/// threads at once. A call waits only for its own reply, never for another thread's. A debug
+/// build of the library ends a program in which two threads use a proxy at once.
 ///
 /// SIGNALS. A subscription lasts until its proxy is destroyed. The receive thread, which one proxy
 /// of each bus starts, delivers the signals; until then they are kept in memory. Subscribe before

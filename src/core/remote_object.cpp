@@ -6,6 +6,7 @@
 #include "core/dbus_ptr.h"
 #include "core/log.h"
 #include "core/match_rule.h"
+#include "core/proxy_use.h"
 #include "core/remote_object_private.h"
 #include "core/subscriptions.h"
 
@@ -70,6 +71,7 @@ RemoteObject::RemoteObject(const char* destination, const char* path, const char
 
 RemoteObject::~RemoteObject() {
     unsubscribeAll();
+    ProxyUse::checkNone(*this); // its callbacks may have used it until now
     if (m_message)
         dbus_message_unref(m_message);
     if (m_reply)
@@ -96,6 +98,7 @@ std::string RemoteObject::matchRule(const std::string& member) const {
 
 template <class Callback>
 int RemoteObject::subscribe(const char* member, Callback callback) {
+    const ProxyUse use(*this);
     ScopedError error;
     if (member && callback && dbus_validate_member(member, error)) {
         // Before AddMatch: without memory for the record the bus must not be left with a rule, and

@@ -3,6 +3,7 @@
 #include "core/bus_link.h"
 #include "core/dbus_ptr.h"
 #include "core/method_call_message.h"
+#include "core/proxy_use.h"
 #include "core/remote_object_private.h"
 
 #include <signal.h>
@@ -44,6 +45,7 @@ constexpr const char* errorTexts[] = {
 } // namespace
 
 int RemoteObject::newMessage(const char* method) {
+    const ProxyUse use(*this);
     if (!method)
         return recordError(errorNullParameter);
     if (m_message)
@@ -86,12 +88,14 @@ int RemoteObject::append(const ObjectPath& path) {
 }
 
 int RemoteObject::appendBasic(int type, const void* value) {
+    const ProxyUse use(*this);
     if (!m_message || !dbus_message_append_args(m_message, type, value, DBUS_TYPE_INVALID))
         return recordError(errorAppendArgs);
     return 0;
 }
 
 int RemoteObject::sendMessage(bool wantReply, int timeoutMs) {
+    const ProxyUse use(*this);
     const MessagePtr message(std::exchange(m_message, nullptr));
     MessagePtr(std::exchange(m_reply, nullptr)).reset();
     BusLink* link = BusLink::of(m_connection);
@@ -114,6 +118,7 @@ int RemoteObject::sendMessage(bool wantReply, int timeoutMs) {
 }
 
 int RemoteObject::sendMessagePending() {
+    const ProxyUse use(*this);
     const MessagePtr message(std::exchange(m_message, nullptr));
     MessagePtr(std::exchange(m_reply, nullptr)).reset();
     BusLink* link = BusLink::of(m_connection);
@@ -128,6 +133,7 @@ int RemoteObject::sendMessagePending() {
 }
 
 int RemoteObject::setReplyMessage(DBusMessage* reply) {
+    const ProxyUse use(*this);
     if (!reply)
         return recordError(errorNullReply);
     if (m_reply)
@@ -137,11 +143,13 @@ int RemoteObject::setReplyMessage(DBusMessage* reply) {
 }
 
 void RemoteObject::resetError() {
+    const ProxyUse use(*this);
     m_errorNumber = 0;
     m_errorText.clear();
 }
 
 std::string RemoteObject::getErrorMessage() {
+    const ProxyUse use(*this);
     const int number = m_errorNumber;
     if (number >= errorNullParameter && number <= errorSend)
         m_errorText = errorTexts[number - 1];

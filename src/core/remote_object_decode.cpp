@@ -1,6 +1,7 @@
 // How replies, signals and variants become values of the library, and back.
 
 #include "core/dbus_ptr.h"
+#include "core/proxy_use.h"
 #include "core/remote_object_private.h"
 
 #include <cstring>
@@ -197,6 +198,7 @@ RemoteObject::DictResult RemoteObject::parseDictionary(DBusMessageIter& iter, Di
 }
 
 int RemoteObject::append(const Variant& value) {
+    const ProxyUse use(*this);
     Outgoing outgoing;
     const bool valid = boost::apply_visitor(outgoing, value);
     if (!m_message || !valid)
@@ -223,6 +225,7 @@ int RemoteObject::append(const Variant& value) {
 /// Lets go of the held reply. @return it, the caller's; null, recorded, when none is held
 /// @param first its first argument, of type DBUS_TYPE_INVALID when it has none
 DBusMessage* RemoteObject::takeReply(DBusMessageIter& first) {
+    const ProxyUse use(*this);
     if (m_reply)
         dbus_message_iter_init(m_reply, &first);
     else

@@ -150,4 +150,18 @@ TEST_F(ConcurrencyTest, ASlowCallDelaysNeitherOtherCallsNorTheirTimeOuts) {
     }
 }
 
+#ifndef NDEBUG
+TEST_F(ConcurrencyTest, ADebugBuildEndsAProgramInWhichTwoThreadsUseAProxyAtOnce) {
+    GTEST_FLAG_SET(death_test_style, "threadsafe");
+    peer.neverReply("Never");
+    EXPECT_DEATH(
+        {
+            std::thread other([this] { call("Never"); });
+            call("Never");
+            other.join();
+        },
+        "two threads use a proxy at once: /com/example/peer");
+}
+#endif
+
 } // namespace Bluetooth::Test
