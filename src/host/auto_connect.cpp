@@ -1,21 +1,18 @@
 #include <bluetooth/auto_connect.h>
 
-#include "core/log.h"
-#include "host/auto_connect_file.h"
-
 #include <bluetooth/adapter.h>
 #include <bluetooth/adapter_list.h>
-#include <bluetooth/device.h>
 #include <bluetooth/dict_codec.h>
-#include <bluetooth/fifo.h>
 #include <bluetooth/manager.h>
 
-#include <dbus/dbus.h>
+#include "core/log.h"
+#include "host/auto_connect_file.h"
+#include "host/device_lookup.h"
+
 #include <sys/stat.h>
 #include <unistd.h>
 
 #include <cerrno>
-#include <cstring>
 #include <memory>
 #include <string>
 #include <vector>
@@ -24,12 +21,18 @@ namespace Bluetooth {
 
 namespace {
 
-constexpr const char* COMMAND_PIPE = "/tmp/kes_bluetooth_autoconnect";
-constexpr mode_t FOLDER_MODE = 0755;
+constexpr mode_t folderMode = 0755;
+
+/// @return false, logged for the caller, when an argument is null
+bool isGiven(LogPlace place, const char* argument, const char* name) {
+    if (!argument)
+        logError(place, "%s is null.", name);
+    return argument;
+}
 
 bool createConfigFile(const char* path) {
-    if (mkdir(AUTO_CONNECT_FOLDER, FOLDER_MODE) != 0 && errno != EEXIST) {
-        logError(KES_HERE, "Can not create config path '%s'", AUTO_CONNECT_FOLDER);
+    if (mkdir(autoConnectFolder, folderMode) != 0 && errno != EEXIST) {
+        logError(KES_HERE, "Can not create config path '%s'", autoConnectFolder);
         return false;
     }
     std::ofstream file(path, std::ios::binary);
@@ -70,12 +73,16 @@ bool isReadable(AutoConnectFile& file, const std::string& path) {
     return true;
 }
 
-/// Opens an adapter's file. @return null (logged) when that cannot be done
-std::unique_ptr<AutoConnectFile> openFile(const std::string& path, std::ios::openmode mode) {
+/// Opens an adapter's file, creating it where it is missing.
+/// @return null when that cannot be done (logged, the opening for the caller)
+std::unique_ptr<AutoConnectFile> openFile(LogPlace place, const AutoConnect& config,
+                                          const std::string& path, std::ios::openmode mode) {
+    if (!config.checkConfigFile(path.c_str()))
+        return nullptr;
     auto file = std::make_unique<AutoConnectFile>(path, mode);
     if (file->isOpen())
         return file;
-    logError(KES_HERE, "Cannot open config file '%s'", path.c_str());
+    logError(place, "Cannot open config file '%s'", path.c_str());
     return nullptr;
 }
 
@@ -89,9 +96,7 @@ std::vector<std::string> readEntries(AutoConnectFile& file, const std::string& p
 /// AutoConnect::removeDevice() for an entry that may hold any byte.
 bool removeEntry(const AutoConnect& config, const char* adapter, const std::string& device) {
     const std::string path = autoConnectPath(adapter);
-    if (!config.checkConfigFile(path.c_str()))
-        return false;
-    const auto file = openFile(path, std::ios::in | std::ios::out);
+    const auto file = openFile(KES_HERE, config, path, std::ios::in | std::ios::out);
     if (!file || !isReadable(*file, path))
         return false;
     // The list of a disabled adapter is left alone on purpose.
@@ -100,58 +105,23 @@ bool removeEntry(const AutoConnect& config, const char* adapter, const std::stri
     const std::vector<std::string> entries = readEntries(*file, path);
     if (!file->isComplete())
         return false;
-    std::string kept;
-    for (const std::string& entry : entries) {
-        if (entry != device)
-            kept += ',' + entry;
-    }
     // Callers learn that the file was processed, not whether it could be rewritten.
-    rewrite(config, adapter, true, kept);
+    rewrite(config, adapter, true, listWithout(entries, device));
     return true;
 }
 
-enum class Lookup { Found, Unknown, NotAnswered };
-
-/// Only what the daemon itself said of the text counts: an adapter that was pulled out, or a daemon
-/// that hangs or restarts, must not cost the user's list.
-bool isDeniedByDaemon(const std::string& error) {
-    return error == "Does Not Exist" || error == "Invalid arguments in method call";
-}
-
-/// Appends the device of an entry.
-Lookup appendDevice(Adapter& adapter, const std::string& entry, DeviceList& devices) {
-    if (entry.find('\0') != std::string::npos) {
-        logError(KES_HERE, "An entry of the config file holds a NUL byte.");
-        return Lookup::Unknown;
-    }
-    std::unique_ptr<Device> device(adapter.findDevice(entry.c_str(), true));
-    if (device) {
-        devices.push_back(device.get());
-        static_cast<void>(device.release());
-        return Lookup::Found;
-    }
-    const bool canBeSent = dbus_validate_utf8(entry.c_str(), nullptr);
-    return !canBeSent || isDeniedByDaemon(adapter.getErrorMessage()) ? Lookup::Unknown
-                                                                     : Lookup::NotAnswered;
-}
-
-/// Appends the devices that the adapter knows, in the file's order.
-/// @return the entries that it does not know
-std::vector<std::string> appendKnown(Adapter& adapter, const std::vector<std::string>& entries,
-                                     DeviceList& devices) {
+/// Appends the devices of a file's entries, in the file's order, and removes the entries that the
+/// adapter does not know from the file.
+void appendAndPrune(const AutoConnect& config, const char* address, Adapter& adapter,
+                    const std::vector<std::string>& entries, DeviceList& devices) {
     std::vector<std::string> unknown;
     for (const std::string& entry : entries) {
+        if (entry.find('\0') != std::string::npos)
+            logError(KES_HERE, "An entry of the config file holds a NUL byte.");
         if (appendDevice(adapter, entry, devices) == Lookup::Unknown)
             unknown.push_back(entry);
     }
-    return unknown;
-}
-
-/// Appends the devices of a file's entries, and removes the entries that the adapter does not know
-/// from the file.
-void appendAndPrune(const AutoConnect& config, const char* address, Adapter& adapter,
-                    const std::vector<std::string>& entries, DeviceList& devices) {
-    for (const std::string& entry : appendKnown(adapter, entries, devices))
+    for (const std::string& entry : unknown)
         removeEntry(config, address, entry);
 }
 
@@ -162,9 +132,7 @@ void appendTargets(const AutoConnect& config, Adapter& adapter, DeviceList& devi
     if (find(properties.get(), "Powered") != "1")
         return;
     const std::string path = autoConnectPath(address.c_str());
-    if (!config.checkConfigFile(path.c_str()))
-        return;
-    auto file = openFile(path, std::ios::in);
+    auto file = openFile(KES_HERE, config, path, std::ios::in);
     if (!file || !isReadable(*file, path) || !file->readsEnabled())
         return;
     const std::vector<std::string> entries = readEntries(*file, path);
@@ -194,10 +162,8 @@ bool AutoConnect::checkConfigFile(const char* path) const {
 }
 
 bool AutoConnect::getEnable(const char* adapter) const {
-    if (!adapter) {
-        logError(KES_HERE, "Adapter address is null.");
+    if (!isGiven(KES_HERE, adapter, "Adapter address"))
         return false;
-    }
     const std::string path = autoConnectPath(adapter);
     if (!checkConfigFile(path.c_str()))
         return false;
@@ -206,34 +172,22 @@ bool AutoConnect::getEnable(const char* adapter) const {
 }
 
 bool AutoConnect::set(const char* adapter, bool enable, const char* deviceList) {
-    if (!adapter) {
-        logError(KES_HERE, "Adapter address is null.");
+    if (!isGiven(KES_HERE, adapter, "Adapter address") ||
+        !isGiven(KES_HERE, deviceList, "Device address list"))
         return false;
-    }
-    if (!deviceList) {
-        logError(KES_HERE, "Device address list is null.");
-        return false;
-    }
     return rewrite(*this, adapter, enable, deviceList);
 }
 
 bool AutoConnect::removeDevice(const char* adapter, const char* device) {
-    if (!adapter) {
-        logError(KES_HERE, "Adapter address is null.");
+    if (!isGiven(KES_HERE, adapter, "Adapter address") ||
+        !isGiven(KES_HERE, device, "Device address"))
         return false;
-    }
-    if (!device) {
-        logError(KES_HERE, "Device address is null.");
-        return false;
-    }
     return removeEntry(*this, adapter, device);
 }
 
 DeviceList* AutoConnect::getDeviceList(const char* adapter) {
-    if (!adapter) {
-        logError(KES_HERE, "Adapter address is null.");
+    if (!isGiven(KES_HERE, adapter, "Adapter address"))
         return nullptr;
-    }
     const std::unique_ptr<Manager> manager(Manager::getManager());
     if (!manager) {
         logError(KES_HERE, "Failed to get manager.");
@@ -245,9 +199,7 @@ DeviceList* AutoConnect::getDeviceList(const char* adapter) {
         return nullptr;
     }
     const std::string path = autoConnectPath(adapter);
-    if (!checkConfigFile(path.c_str()))
-        return nullptr;
-    auto file = openFile(path, std::ios::in);
+    auto file = openFile(KES_HERE, *this, path, std::ios::in);
     if (!file)
         return nullptr;
     auto devices = std::make_unique<DeviceList>();
@@ -276,23 +228,6 @@ DeviceList* AutoConnect::getAutoConnectDeviceList() {
             appendTargets(*this, *adapter, *devices);
     }
     return devices.release();
-}
-
-bool AutoConnect::sendCommand(const char* command) const {
-    const std::unique_ptr<Fifo> pipe(Fifo::getWriteFifo(COMMAND_PIPE));
-    return pipe && command && pipe->writeData(command, static_cast<int>(strlen(command))) == 0;
-}
-
-bool AutoConnect::reload() const {
-    return sendCommand("1");
-}
-
-bool AutoConnect::pause() const {
-    return sendCommand("pause");
-}
-
-bool AutoConnect::resume() const {
-    return sendCommand("resume");
 }
 
 } // namespace Bluetooth

@@ -6,14 +6,14 @@ namespace Bluetooth {
 
 namespace {
 
-constexpr std::streamoff MAX_SIZE = 1 << 20;
-constexpr std::streamoff FIRST_ENTRY = 2; // after the flag and one comma, whatever they are
-constexpr char SEPARATOR = ',';
+constexpr std::streamoff maxSize = 1 << 20;
+constexpr std::streamoff firstEntry = 2; // after the flag and one comma, whatever they are
+constexpr char separator = ',';
 
 } // namespace
 
 std::string autoConnectPath(const char* adapter) {
-    return std::string(AUTO_CONNECT_FOLDER) + adapter;
+    return std::string(autoConnectFolder) + adapter;
 }
 
 AutoConnectFile::AutoConnectFile(const std::string& path, std::ios::openmode mode)
@@ -25,7 +25,7 @@ AutoConnectFile::AutoConnectFile(const std::string& path, std::ios::openmode mod
 bool AutoConnectFile::isTooLarge() {
     m_file.clear();
     m_file.seekg(0, std::ios::end);
-    const bool tooLarge = m_file.tellg() > MAX_SIZE;
+    const bool tooLarge = m_file.tellg() > maxSize;
     m_file.seekg(0);
     return tooLarge;
 }
@@ -52,10 +52,10 @@ std::vector<std::string> AutoConnectFile::readEntries() {
         // Without this the stream keeps a lack of memory to itself, and a list that is cut short
         // would be written back so.
         m_file.exceptions(std::ios::badbit);
-        m_file.seekg(FIRST_ENTRY);
+        m_file.seekg(firstEntry);
         while (m_file.peek() != std::fstream::traits_type::eof()) {
             std::string entry;
-            std::getline(m_file, entry, SEPARATOR);
+            std::getline(m_file, entry, separator);
             entries.push_back(std::move(entry));
         }
         m_complete = true;
@@ -64,6 +64,15 @@ std::vector<std::string> AutoConnectFile::readEntries() {
     }
     m_file.exceptions(std::ios::goodbit);
     return entries;
+}
+
+std::string listWithout(const std::vector<std::string>& entries, const std::string& device) {
+    std::string list;
+    for (const std::string& entry : entries) {
+        if (entry != device)
+            list += separator + entry;
+    }
+    return list;
 }
 
 bool writeAutoConnectFile(std::ofstream& file, const std::string& content) {

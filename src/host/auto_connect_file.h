@@ -8,7 +8,7 @@
 namespace Bluetooth {
 
 /// The folder of the configuration files, with its slash.
-constexpr const char* AUTO_CONNECT_FOLDER = "/etc/bluetooth/autoconnect/";
+constexpr const char* autoConnectFolder = "/etc/bluetooth/autoconnect/";
 
 /// The configuration file of an adapter.
 std::string autoConnectPath(const char* adapter);
@@ -37,6 +37,9 @@ private:
     std::fstream m_file;
     bool m_complete = false;
 };
+
+/// The list of entries without those equal to `device`, as it stands behind the flag.
+std::string listWithout(const std::vector<std::string>& entries, const std::string& device);
 
 /// Overwrites a file with `content`.
 /// @return false, with nothing of the file certain, on a full disk for example

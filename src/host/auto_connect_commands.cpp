@@ -1,0 +1,27 @@
+#include <bluetooth/auto_connect.h>
+
+#include <bluetooth/fifo.h>
+
+#include <cstring>
+#include <memory>
+
+namespace Bluetooth {
+
+bool AutoConnect::sendCommand(const char* command) const {
+    const std::unique_ptr<Fifo> pipe(Fifo::getWriteFifo("/tmp/kes_bluetooth_autoconnect"));
+    return pipe && command && pipe->writeData(command, static_cast<int>(strlen(command))) == 0;
+}
+
+bool AutoConnect::reload() const {
+    return sendCommand("1");
+}
+
+bool AutoConnect::pause() const {
+    return sendCommand("pause");
+}
+
+bool AutoConnect::resume() const {
+    return sendCommand("resume");
+}
+
+} // namespace Bluetooth
