@@ -2,12 +2,14 @@
 
 #include <bluetooth/adapter.h>
 #include <bluetooth/adapter_list.h>
+#include <bluetooth/commandlib.h>
 #include <bluetooth/dict_codec.h>
 #include <bluetooth/manager.h>
 
 #include "core/log.h"
 #include "host/auto_connect_file.h"
 #include "host/device_lookup.h"
+#include "host/pid_file.h"
 
 #include <sys/stat.h>
 #include <unistd.h>
@@ -140,6 +142,34 @@ void appendTargets(const AutoConnect& config, Adapter& adapter, DeviceList& devi
     appendAndPrune(config, address.c_str(), adapter, entries, devices);
 }
 
+void logFailure(PidFileFailure failure, const char* path, bool reportLocked) {
+    switch (failure) {
+    case PidFileFailure::Open:
+        logError(KES_HERE, "Could not open PID file %s", path);
+        break;
+    case PidFileFailure::GetFlags:
+        logError(KES_HERE, "Can not get flags for PID file %s", path);
+        break;
+    case PidFileFailure::SetFlags:
+        logError(KES_HERE, "Could not set flags for PID file '%s'", path);
+        break;
+    case PidFileFailure::LockedByOther:
+        if (reportLocked)
+            logError(KES_HERE, "PID file '%s' is locked; Daemon is already running", path);
+        break;
+    case PidFileFailure::Lock:
+        logError(KES_HERE, "Unable to lock PID file '%s'", path);
+        break;
+    case PidFileFailure::Truncate:
+        logError(KES_HERE, "Could not truncate PID file '%s'", path);
+        break;
+    case PidFileFailure::Write:
+        // Reads like a note of progress; it is the failure's message, and is kept as it is.
+        logError(KES_HERE, "Writing to PID file '%s'", path);
+        break;
+    }
+}
+
 } // namespace
 
 bool AutoConnect::checkConfigFile(const char* path) const {
@@ -228,6 +258,18 @@ DeviceList* AutoConnect::getAutoConnectDeviceList() {
             appendTargets(*this, *adapter, *devices);
     }
     return devices.release();
+}
+
+// Readers of the log know the lines of this function under this file's name.
+int createPidFile(const char* path, int flags, bool reportLocked) {
+    PidFileFailure failure{};
+    const int descriptor = lockPidFile(path, flags, failure);
+    if (descriptor >= 0)
+        return descriptor;
+    const int error = errno;
+    logFailure(failure, path ? path : "(null)", reportLocked);
+    errno = error;
+    return -1;
 }
 
 } // namespace Bluetooth

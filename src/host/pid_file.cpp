@@ -1,6 +1,4 @@
-#include <bluetooth/commandlib.h>
-
-#include "core/log.h"
+#include "host/pid_file.h"
 
 #include <fcntl.h>
 #include <unistd.h>
@@ -12,67 +10,52 @@ namespace Bluetooth {
 
 namespace {
 
-// Readers of the log know these lines under this name.
-constexpr const char* LOG_FILE = "auto_connect.cpp";
-constexpr int FLAG_CLOSE_ON_EXEC = 1;
-constexpr mode_t PID_FILE_MODE = 0600;
+constexpr int closeOnExecFlag = 1;
+constexpr mode_t pidFileMode = 0600;
 
-bool setCloseOnExec(int descriptor, const char* path) {
+bool setCloseOnExec(int descriptor, PidFileFailure& failure) {
+    failure = PidFileFailure::GetFlags;
     const int flags = fcntl(descriptor, F_GETFD);
-    if (flags < 0) {
-        logError({LOG_FILE, __LINE__}, "Can not get flags for PID file %s", path);
+    if (flags < 0)
         return false;
-    }
-    if (fcntl(descriptor, F_SETFD, flags | FD_CLOEXEC) < 0) {
-        logError({LOG_FILE, __LINE__}, "Could not set flags for PID file '%s'", path);
-        return false;
-    }
-    return true;
+    failure = PidFileFailure::SetFlags;
+    return fcntl(descriptor, F_SETFD, flags | FD_CLOEXEC) == 0;
 }
 
-bool lockWhole(int descriptor, const char* path, bool reportLocked) {
+bool lockWhole(int descriptor, PidFileFailure& failure) {
     struct flock lock {};
     lock.l_type = F_WRLCK;
     lock.l_whence = SEEK_SET;
     if (fcntl(descriptor, F_SETLK, &lock) == 0)
         return true;
-
-    const int error = errno;
-    if (error != EAGAIN && error != EACCES)
-        logError({LOG_FILE, __LINE__}, "Unable to lock PID file '%s'", path);
-    else if (reportLocked)
-        logError({LOG_FILE, __LINE__}, "PID file '%s' is locked; Daemon is already running", path);
-    errno = error;
+    const bool byOther = errno == EAGAIN || errno == EACCES;
+    failure = byOther ? PidFileFailure::LockedByOther : PidFileFailure::Lock;
     return false;
 }
 
-bool writePid(int descriptor, const char* path) {
-    if (ftruncate(descriptor, 0) != 0) {
-        logError({LOG_FILE, __LINE__}, "Could not truncate PID file '%s'", path);
+bool writePid(int descriptor, PidFileFailure& failure) {
+    failure = PidFileFailure::Truncate;
+    if (ftruncate(descriptor, 0) != 0)
         return false;
-    }
+    failure = PidFileFailure::Write;
     const std::string text = std::to_string(getpid()) + '\n';
-    if (write(descriptor, text.data(), text.size()) != static_cast<ssize_t>(text.size())) {
-        // Reads like a note of progress; it is the failure's message, and is kept as it is.
-        logError({LOG_FILE, __LINE__}, "Writing to PID file '%s'", path);
-        return false;
-    }
-    return true;
+    return write(descriptor, text.data(), text.size()) == static_cast<ssize_t>(text.size());
 }
 
 } // namespace
 
-int createPidFile(const char* path, int flags, bool reportLocked) {
-    const int descriptor = path ? open(path, O_RDWR | O_CREAT, PID_FILE_MODE) : -1;
-    if (descriptor < 0) {
-        const int error = path ? errno : EINVAL;
-        logError({LOG_FILE, __LINE__}, "Could not open PID file %s", path ? path : "(null)");
-        errno = error;
+int lockPidFile(const char* path, int flags, PidFileFailure& failure) {
+    failure = PidFileFailure::Open;
+    if (!path) {
+        errno = EINVAL;
         return -1;
     }
-    const bool closeOnExec = (flags & FLAG_CLOSE_ON_EXEC) != 0;
-    if ((!closeOnExec || setCloseOnExec(descriptor, path)) &&
-        lockWhole(descriptor, path, reportLocked) && writePid(descriptor, path))
+    const int descriptor = open(path, O_RDWR | O_CREAT, pidFileMode);
+    if (descriptor < 0)
+        return -1;
+    const bool closeOnExec = (flags & closeOnExecFlag) != 0;
+    if ((!closeOnExec || setCloseOnExec(descriptor, failure)) && lockWhole(descriptor, failure) &&
+        writePid(descriptor, failure))
         return descriptor;
 
     const int error = errno;
