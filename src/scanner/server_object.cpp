@@ -19,18 +19,18 @@ const char* textOf(const char* text) {
 }
 
 /// Calls updateTimer() on the default main context, at most as long as this lives.
-class Timer {
+class LoopTimer {
 public:
-    explicit Timer(ServerObject* object) : m_source(g_timeout_source_new(timerInterval)) {
+    explicit LoopTimer(ServerObject* object) : m_source(g_timeout_source_new(timerInterval)) {
         g_source_set_callback(m_source, updateTimer, object, nullptr);
         g_source_attach(m_source, nullptr);
     }
-    ~Timer() {
+    ~LoopTimer() {
         g_source_destroy(m_source);
         g_source_unref(m_source);
     }
-    Timer(const Timer&) = delete;
-    Timer& operator=(const Timer&) = delete;
+    LoopTimer(const LoopTimer&) = delete;
+    LoopTimer& operator=(const LoopTimer&) = delete;
 
 private:
     GSource* m_source;
@@ -116,7 +116,7 @@ void ServerObject::startLoop() {
     scanner->startReceiving();
     dbus_g_thread_init();
     {
-        const Timer timer(this);
+        const LoopTimer timer(this);
         g_main_loop_run(loop.get());
     }
     {
