@@ -14,7 +14,7 @@ namespace Bluetooth {
 
 namespace {
 
-constexpr mode_t PIPE_MODE = 0666;
+constexpr mode_t pipeMode = 0666;
 
 /// @return the descriptor, or -1 with errno set
 int openPipe(const char* path, int flags) {
@@ -22,7 +22,7 @@ int openPipe(const char* path, int flags) {
         errno = EINVAL;
         return -1;
     }
-    if (mkfifo(path, PIPE_MODE) != 0 && errno != EEXIST)
+    if (mkfifo(path, pipeMode) != 0 && errno != EEXIST)
         return -1;
     return open(path, flags | O_CLOEXEC);
 }
