@@ -4,7 +4,7 @@
 
 #include <tuple>
 
-namespace autoconnectd::Test {
+namespace AutoConnectd::Test {
 
 namespace {
 
@@ -52,4 +52,4 @@ TEST(CommandSplitterTest, MemoryIsBoundedByWhatIsNotTaken) {
     EXPECT_EQ(feed(splitter, "ause"), "p");
 }
 
-} // namespace autoconnectd::Test
+} // namespace AutoConnectd::Test

@@ -14,19 +14,19 @@
 #include <string>
 #include <utility>
 
-namespace autoconnectd {
+namespace AutoConnectd {
 
 namespace {
 
 void onAdapterAddedOrRemoved(Bluetooth::RemoteObject* /*sender*/,
                              const Bluetooth::ObjectPath* /*adapter*/) {
-    wakeup::requestReload();
+    requestReload();
 }
 
 void onAdapterChanged(Bluetooth::RemoteObject* /*sender*/, const char* name,
                       const Bluetooth::Variant* /*value*/) {
     if (strcmp(name, "Powered") == 0)
-        wakeup::requestReload();
+        requestReload();
 }
 
 } // namespace
@@ -166,4 +166,4 @@ Clock::time_point AutoConnector::nextDue() const {
     return due;
 }
 
-} // namespace autoconnectd
+} // namespace AutoConnectd

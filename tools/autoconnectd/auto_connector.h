@@ -11,7 +11,7 @@
 #include <memory>
 #include <vector>
 
-namespace autoconnectd {
+namespace AutoConnectd {
 
 /// Keeps the devices of the auto-connect files connected.
 ///
@@ -55,6 +55,6 @@ private:
     std::vector<std::unique_ptr<Target>> m_targets;
 };
 
-} // namespace autoconnectd
+} // namespace AutoConnectd
 
 #endif

@@ -6,7 +6,7 @@
 #include <cerrno>
 #include <cstdlib>
 
-namespace autoconnectd {
+namespace AutoConnectd {
 
 namespace {
 
@@ -53,4 +53,4 @@ void Background::ready() {
     m_starter = -1;
 }
 
-} // namespace autoconnectd
+} // namespace AutoConnectd

@@ -1,7 +1,7 @@
 #ifndef KESBT_AUTOCONNECTD_BACKGROUND_H
 #define KESBT_AUTOCONNECTD_BACKGROUND_H
 
-namespace autoconnectd {
+namespace AutoConnectd {
 
 /// Goes into the background in a way that the one who started the program learns how the start
 /// went: the foreground process waits for ready() and then exits with 0; it exits with 1 when the
@@ -22,6 +22,6 @@ private:
     int m_starter = -1;
 };
 
-} // namespace autoconnectd
+} // namespace AutoConnectd
 
 #endif

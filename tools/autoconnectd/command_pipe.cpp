@@ -9,12 +9,12 @@
 #include <cerrno>
 #include <cstring>
 
-namespace autoconnectd {
+namespace AutoConnectd {
 
 namespace {
 
-constexpr mode_t PIPE_MODE = 0666;
-constexpr std::size_t READ_SIZE = 512;
+constexpr mode_t pipeMode = 0666;
+constexpr std::size_t readSize = 512;
 
 bool isPipe(int descriptor) {
     struct stat status {};
@@ -25,7 +25,7 @@ bool isPipe(int descriptor) {
 
 std::unique_ptr<CommandPipe> CommandPipe::open(const std::string& path, std::string& problem) {
     problem.clear();
-    if (mkfifo(path.c_str(), PIPE_MODE) != 0 && errno != EEXIST) {
+    if (mkfifo(path.c_str(), pipeMode) != 0 && errno != EEXIST) {
         problem = "cannot create the pipe " + path + ": " + strerror(errno);
         return nullptr;
     }
@@ -57,7 +57,7 @@ bool CommandPipe::isCurrent() const {
 
 std::vector<Command> CommandPipe::read() {
     // Cleared, since the number of bytes read is not told.
-    std::string bytes(READ_SIZE, '\0');
+    std::string bytes(readSize, '\0');
     if (m_fifo->readData(bytes.data(), static_cast<int>(bytes.size())) != 0)
         return {};
     bytes.erase(bytes.find_last_not_of('\0') + 1);
@@ -73,4 +73,4 @@ std::vector<Command> CommandPipe::read() {
     return commands;
 }
 
-} // namespace autoconnectd
+} // namespace AutoConnectd

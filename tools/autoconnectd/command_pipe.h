@@ -9,7 +9,7 @@
 #include <string>
 #include <vector>
 
-namespace autoconnectd {
+namespace AutoConnectd {
 
 /// The reading end of the command pipe.
 ///
@@ -43,6 +43,6 @@ private:
     CommandSplitter m_splitter;
 };
 
-} // namespace autoconnectd
+} // namespace AutoConnectd
 
 #endif

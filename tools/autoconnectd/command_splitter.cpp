@@ -2,7 +2,7 @@
 
 #include <utility>
 
-namespace autoconnectd {
+namespace AutoConnectd {
 
 namespace {
 
@@ -11,7 +11,7 @@ struct Word {
     Command command;
 };
 
-constexpr Word WORDS[] = {
+constexpr Word words[] = {
     {"1", Command::Reload}, {"pause", Command::Pause}, {"resume", Command::Resume}};
 
 bool isBetween(char byte) {
@@ -20,7 +20,7 @@ bool isBetween(char byte) {
 
 /// Whether some command begins with this text.
 bool mayBecomeCommand(std::string_view text) {
-    for (const Word& word : WORDS) {
+    for (const Word& word : words) {
         if (word.text.substr(0, text.size()) == text)
             return true;
     }
@@ -41,7 +41,7 @@ std::vector<Command> CommandSplitter::feed(std::string_view bytes) {
             m_unknown += m_pending.front();
             m_pending.erase(0, 1);
         }
-        for (const Word& word : WORDS) {
+        for (const Word& word : words) {
             if (m_pending == word.text) {
                 commands.push_back(word.command);
                 m_pending.clear();
@@ -55,4 +55,4 @@ std::string CommandSplitter::takeUnknown() {
     return std::exchange(m_unknown, "");
 }
 
-} // namespace autoconnectd
+} // namespace AutoConnectd

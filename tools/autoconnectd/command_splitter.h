@@ -5,7 +5,7 @@
 #include <string_view>
 #include <vector>
 
-namespace autoconnectd {
+namespace AutoConnectd {
 
 enum class Command { Reload, Pause, Resume };
 
@@ -24,6 +24,6 @@ private:
     std::string m_unknown;
 };
 
-} // namespace autoconnectd
+} // namespace AutoConnectd
 
 #endif

@@ -20,18 +20,17 @@
 
 namespace {
 
-using autoconnectd::AutoConnector;
-using autoconnectd::Background;
-using autoconnectd::Clock;
-using autoconnectd::Command;
-using autoconnectd::CommandPipe;
-namespace wakeup = autoconnectd::wakeup;
+using AutoConnectd::AutoConnector;
+using AutoConnectd::Background;
+using AutoConnectd::Clock;
+using AutoConnectd::Command;
+using AutoConnectd::CommandPipe;
 
-constexpr const char* PROGRAM = "kesbt-autoconnectd";
-constexpr const char* PIPE = "/tmp/kes_bluetooth_autoconnect";
-constexpr int PID_FILE_CLOSE_ON_EXEC = 1;
-constexpr int WRONG_USAGE = 2;
-constexpr int DAY = 24 * 60 * 60;
+constexpr const char* program = "kesbt-autoconnectd";
+constexpr const char* pipePath = "/tmp/kes_bluetooth_autoconnect";
+constexpr int closeOnExec = 1;
+constexpr int wrongUsage = 2;
+constexpr int day = 24 * 60 * 60;
 
 struct Options {
     bool foreground = false;
@@ -41,7 +40,7 @@ struct Options {
 };
 
 int fail(const std::string& problem) {
-    std::cerr << PROGRAM << ": " << problem << std::endl;
+    std::cerr << program << ": " << problem << std::endl;
     syslog(LOG_ERR, "%s", problem.c_str());
     return EXIT_FAILURE;
 }
@@ -50,8 +49,8 @@ int fail(const std::string& problem) {
 int parse(int argc, char** argv, Options& options) {
     CLI::App app("Connects the Bluetooth devices of the auto-connect files\n"
                  "(/etc/bluetooth/autoconnect/) and keeps them connected.",
-                 PROGRAM);
-    app.set_version_flag("--version", std::string(PROGRAM) + ' ' + KESBLUETOOTH_VERSION);
+                 program);
+    app.set_version_flag("--version", std::string(program) + ' ' + KESBLUETOOTH_VERSION);
     app.add_flag("-f,--foreground", options.foreground,
                  "Stay in the foreground, log to standard error too");
     app.add_option("--pid-file", options.pidFile, "PID file and lock of the only instance")
@@ -59,17 +58,17 @@ int parse(int argc, char** argv, Options& options) {
     app.add_option("--interval", options.interval,
                    "Seconds to the second attempt at a device that is\naway; doubles each time")
         ->capture_default_str()
-        ->check(CLI::Range(1, DAY));
+        ->check(CLI::Range(1, day));
     app.add_option("--max-interval", options.maxInterval, "Longest time between two attempts")
         ->capture_default_str()
-        ->check(CLI::Range(1, DAY));
+        ->check(CLI::Range(1, day));
     try {
         app.parse(argc, argv);
     } catch (const CLI::ParseError& problem) {
         if (problem.get_exit_code() == 0) // --help, --version
             return app.exit(problem);
-        std::cerr << PROGRAM << ": " << problem.what() << "; see " << PROGRAM << " --help\n";
-        return WRONG_USAGE;
+        std::cerr << program << ": " << problem.what() << "; see " << program << " --help\n";
+        return wrongUsage;
     }
     // The background's current folder is another one.
     std::error_code error;
@@ -91,7 +90,7 @@ std::string pidFileProblem(const std::string& path, int error) {
 /// The pipe was removed from its folder: commands come through a new one now.
 void renewPipe(std::unique_ptr<CommandPipe>& pipe) {
     std::string problem;
-    auto next = CommandPipe::open(PIPE, problem);
+    auto next = CommandPipe::open(pipePath, problem);
     if (next)
         pipe = std::move(next);
     else
@@ -101,7 +100,8 @@ void renewPipe(std::unique_ptr<CommandPipe>& pipe) {
 /// Waits for a command, for news, or until an attempt is due.
 /// @return whether there are commands to read
 bool wait(const CommandPipe& pipe, Clock::time_point until) {
-    pollfd watched[] = {{pipe.descriptor(), POLLIN, 0}, {wakeup::descriptor(), POLLIN, 0}};
+    pollfd watched[] = {{pipe.descriptor(), POLLIN, 0},
+                        {AutoConnectd::wakeupDescriptor(), POLLIN, 0}};
     const auto left = std::chrono::ceil<std::chrono::milliseconds>(until - Clock::now()).count();
     const int ready = poll(watched, 2, static_cast<int>(std::max<std::int64_t>(left, 0)));
     return ready > 0 && (watched[0].revents & POLLIN) != 0;
@@ -109,13 +109,13 @@ bool wait(const CommandPipe& pipe, Clock::time_point until) {
 
 int run(AutoConnector& connector, std::unique_ptr<CommandPipe>& pipe) {
     connector.reload();
-    while (!wakeup::stopRequested()) {
+    while (!AutoConnectd::stopRequested()) {
         connector.work();
         if (wait(*pipe, connector.nextDue())) {
             for (const Command command : pipe->read())
                 connector.handle(command);
         }
-        if (wakeup::takeReload())
+        if (AutoConnectd::takeReload())
             connector.reload();
         if (!pipe->isCurrent())
             renewPipe(pipe);
@@ -133,15 +133,15 @@ int start(const Options& options) {
     Background background;
     if (!options.foreground && !background.enter())
         return fail(std::string("cannot go into the background: ") + strerror(errno));
-    if (Bluetooth::createPidFile(options.pidFile.c_str(), PID_FILE_CLOSE_ON_EXEC, true) < 0)
+    if (Bluetooth::createPidFile(options.pidFile.c_str(), closeOnExec, true) < 0)
         return fail(pidFileProblem(options.pidFile, errno));
     std::string problem;
-    auto pipe = CommandPipe::open(PIPE, problem);
+    auto pipe = CommandPipe::open(pipePath, problem);
     if (!pipe)
         return fail(problem);
-    if (!wakeup::open())
+    if (!AutoConnectd::openWakeup())
         return fail(std::string("cannot make an event descriptor: ") + strerror(errno));
-    wakeup::handleSignals();
+    AutoConnectd::stopOnSignals();
     AutoConnector connector(
         {std::chrono::seconds(options.interval), std::chrono::seconds(options.maxInterval)});
     if (!connector.start())
@@ -149,7 +149,7 @@ int start(const Options& options) {
                     "DBUS_SYSTEM_BUS_ADDRESS");
     background.ready();
     if (options.foreground) // not before: a failed start is told in one line
-        openlog(PROGRAM, LOG_PID | LOG_PERROR, LOG_DAEMON);
+        openlog(program, LOG_PID | LOG_PERROR, LOG_DAEMON);
     syslog(LOG_NOTICE, "started");
     return run(connector, pipe);
 }
@@ -161,6 +161,6 @@ int main(int argc, char** argv) {
     const int status = parse(argc, argv, options);
     if (status >= 0)
         return status;
-    openlog(PROGRAM, LOG_PID, LOG_DAEMON);
+    openlog(program, LOG_PID, LOG_DAEMON);
     return start(options);
 }

@@ -14,13 +14,13 @@
 #include <cstdlib>
 #include <utility>
 
-namespace autoconnectd {
+namespace AutoConnectd {
 
 namespace {
 
 using Bluetooth::Dict;
 
-constexpr const char* AUDIO_SINK_UUID = "0000110b-0000-1000-8000-00805f9b34fb";
+constexpr const char* audioSinkUuid = "0000110b-0000-1000-8000-00805f9b34fb";
 
 std::string addressOf(const char* path) {
     const std::unique_ptr<char, decltype(&free)> address(Bluetooth::getAddressFromPath(path),
@@ -30,16 +30,16 @@ std::string addressOf(const char* path) {
 
 bool hasSink(Bluetooth::Device& device) {
     const std::unique_ptr<Dict> properties(device.getProperties());
-    return Bluetooth::find(properties.get(), "UUIDs").find(AUDIO_SINK_UUID) != std::string::npos;
+    return Bluetooth::find(properties.get(), "UUIDs").find(audioSinkUuid) != std::string::npos;
 }
 
 void onSinkChanged(Bluetooth::RemoteObject* /*sender*/) {
-    wakeup::requestCheck();
+    requestCheck();
 }
 
 void onAudioChanged(Bluetooth::RemoteObject* /*sender*/, const char* /*name*/,
                     const Bluetooth::Variant* /*value*/) {
-    wakeup::requestCheck();
+    requestCheck();
 }
 
 } // namespace
@@ -109,4 +109,4 @@ void Target::hurry() {
     m_due = {};
 }
 
-} // namespace autoconnectd
+} // namespace AutoConnectd

@@ -11,7 +11,7 @@ class AudioSink;
 class Device;
 } // namespace Bluetooth
 
-namespace autoconnectd {
+namespace AutoConnectd {
 
 using Clock = std::chrono::steady_clock;
 
@@ -61,6 +61,6 @@ private:
     std::chrono::seconds m_delay;
 };
 
-} // namespace autoconnectd
+} // namespace AutoConnectd
 
 #endif

@@ -8,7 +8,7 @@
 #include <cerrno>
 #include <cstdint>
 
-namespace autoconnectd::wakeup {
+namespace AutoConnectd {
 
 namespace {
 
@@ -31,12 +31,12 @@ void stopHandler(int /*signal*/) {
 
 } // namespace
 
-bool open() {
+bool openWakeup() {
     eventDescriptor = eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK);
     return eventDescriptor >= 0;
 }
 
-void handleSignals() {
+void stopOnSignals() {
     struct sigaction action {};
     action.sa_handler = stopHandler;
     sigemptyset(&action.sa_mask);
@@ -45,7 +45,7 @@ void handleSignals() {
     sigaction(SIGINT, &action, nullptr);
 }
 
-int descriptor() {
+int wakeupDescriptor() {
     return eventDescriptor;
 }
 
@@ -73,4 +73,4 @@ bool takeReload() {
     return reloadWanted.exchange(false);
 }
 
-} // namespace autoconnectd::wakeup
+} // namespace AutoConnectd

@@ -1,20 +1,20 @@
 #ifndef KESBT_AUTOCONNECTD_WAKEUP_H
 #define KESBT_AUTOCONNECTD_WAKEUP_H
 
-namespace autoconnectd {
-
+/// @file
 /// What wakes the main loop besides commands: a signal to end, and news from the Bluetooth daemon.
 /// There is one for the process, because neither signal handlers nor the library's callbacks carry
 /// a pointer of ours. The request functions may be called from any thread; requestStop() in a
 /// signal handler too.
-namespace wakeup {
 
-/// @return false with errno set
-bool open();
+namespace AutoConnectd {
+
+/// To be called before all others. @return false with errno set
+bool openWakeup();
 /// Lets SIGTERM and SIGINT request the stop.
-void handleSignals();
+void stopOnSignals();
 /// To be watched for input.
-int descriptor();
+int wakeupDescriptor();
 
 void requestStop();
 /// The adapters changed: the files are to be read again.
@@ -26,8 +26,6 @@ bool stopRequested();
 /// Forgets what woke the loop. @return whether a reload was requested since the last call
 bool takeReload();
 
-} // namespace wakeup
-
-} // namespace autoconnectd
+} // namespace AutoConnectd
 
 #endif

@@ -16,13 +16,13 @@
 namespace {
 
 using Bluetooth::ScannerServer;
-using scannerd::ServiceName;
+using Scannerd::ServiceName;
 
-constexpr const char* PROGRAM = "kesbt-scannerd";
-constexpr int WRONG_USAGE = 2;
+constexpr const char* program = "kesbt-scannerd";
+constexpr int wrongUsage = 2;
 
 int fail(const std::string& problem) {
-    std::cerr << PROGRAM << ": " << problem << std::endl;
+    std::cerr << program << ": " << problem << std::endl;
     syslog(LOG_ERR, "%s", problem.c_str());
     return EXIT_FAILURE;
 }
@@ -32,15 +32,15 @@ int parse(int argc, char** argv) {
     CLI::App app("Lets the programs of a session share the discovery of Bluetooth devices\n"
                  "(com.kestrine.bluetooth on the session bus). The bus starts it when a program\n"
                  "asks for devices; it ends by itself 30 seconds after the last discovery began.",
-                 PROGRAM);
-    app.set_version_flag("--version", std::string(PROGRAM) + ' ' + KESBLUETOOTH_VERSION);
+                 program);
+    app.set_version_flag("--version", std::string(program) + ' ' + KESBLUETOOTH_VERSION);
     try {
         app.parse(argc, argv);
     } catch (const CLI::ParseError& problem) {
         if (problem.get_exit_code() == 0) // --help, --version
             return app.exit(problem);
-        std::cerr << PROGRAM << ": " << problem.what() << "; see " << PROGRAM << " --help\n";
-        return WRONG_USAGE;
+        std::cerr << program << ": " << problem.what() << "; see " << program << " --help\n";
+        return wrongUsage;
     }
     return -1;
 }
@@ -127,6 +127,6 @@ int main(int argc, char** argv) {
     const int status = parse(argc, argv);
     if (status >= 0)
         return status;
-    openlog(PROGRAM, LOG_PID, LOG_DAEMON);
+    openlog(program, LOG_PID, LOG_DAEMON);
     return start();
 }

@@ -1,10 +1,12 @@
 #include "service_name.h"
 
-namespace scannerd {
+namespace Scannerd {
 
 namespace {
-constexpr const char* NAME = "com.kestrine.bluetooth";
-}
+
+constexpr const char* serviceName = "com.kestrine.bluetooth";
+
+} // namespace
 
 ServiceName::ServiceName()
     : RemoteObject(DBUS_SERVICE_DBUS, DBUS_PATH_DBUS, DBUS_INTERFACE_DBUS, DBUS_BUS_SESSION) {}
@@ -12,15 +14,15 @@ ServiceName::ServiceName()
 std::string ServiceName::owner() {
     std::string owner;
     resetError();
-    if (newMessage("GetNameOwner") == 0 && append(NAME) == 0 && sendMessage(true, -1) == 0)
+    if (newMessage("GetNameOwner") == 0 && append(serviceName) == 0 && sendMessage(true, -1) == 0)
         getReplyValue(owner);
     return owner;
 }
 
 void ServiceName::release() {
     resetError();
-    if (newMessage("ReleaseName") == 0 && append(NAME) == 0)
+    if (newMessage("ReleaseName") == 0 && append(serviceName) == 0)
         sendMessage(true, -1);
 }
 
-} // namespace scannerd
+} // namespace Scannerd

@@ -5,7 +5,7 @@
 
 #include <string>
 
-namespace scannerd {
+namespace Scannerd {
 
 /// The service's name on the session bus, and who owns it.
 class ServiceName : public Bluetooth::RemoteObject {
@@ -18,6 +18,6 @@ public:
     void release();
 };
 
-} // namespace scannerd
+} // namespace Scannerd
 
 #endif
