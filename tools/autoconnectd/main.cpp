@@ -3,9 +3,10 @@
 #include "command_pipe.h"
 #include "wakeup.h"
 
+#include "common/daemon_program.h"
+
 #include <bluetooth/commandlib.h>
 
-#include <CLI/CLI.hpp>
 #include <poll.h>
 #include <syslog.h>
 
@@ -14,69 +15,49 @@
 #include <cstdlib>
 #include <cstring>
 #include <filesystem>
-#include <iostream>
 #include <memory>
 #include <string>
 
+namespace AutoConnectd {
+
 namespace {
 
-using AutoConnectd::AutoConnector;
-using AutoConnectd::Background;
-using AutoConnectd::Clock;
-using AutoConnectd::Command;
-using AutoConnectd::CommandPipe;
+using Tools::DaemonProgram;
 
-constexpr const char* program = "kesbt-autoconnectd";
 constexpr const char* pipePath = "/tmp/kes_bluetooth_autoconnect";
-constexpr int closeOnExec = 1;
-constexpr int wrongUsage = 2;
-constexpr int day = 24 * 60 * 60;
+constexpr int closeOnExec = 1;    // of createPidFile()
+constexpr int day = 24 * 60 * 60; // s
 
-struct Options {
+struct StartOptions {
     bool foreground = false;
     std::string pidFile = "/run/kesbt-autoconnectd.pid";
-    int interval = 10;
-    int maxInterval = 120;
+    int interval = 10;     // s
+    int maxInterval = 120; // s
 };
 
-int fail(const std::string& problem) {
-    std::cerr << program << ": " << problem << std::endl;
-    syslog(LOG_ERR, "%s", problem.c_str());
-    return EXIT_FAILURE;
+void addOptions(CLI::App& commandLine, StartOptions& options) {
+    commandLine.add_flag("-f,--foreground", options.foreground,
+                         "Stay in the foreground, log to standard error too");
+    commandLine.add_option("--pid-file", options.pidFile, "PID file and lock of the only instance")
+        ->capture_default_str();
+    commandLine
+        .add_option("--interval", options.interval,
+                    "Seconds to the second attempt at a device that is\naway; doubles each time")
+        ->capture_default_str()
+        ->check(CLI::Range(1, day));
+    commandLine
+        .add_option("--max-interval", options.maxInterval, "Longest time between two attempts")
+        ->capture_default_str()
+        ->check(CLI::Range(1, day));
 }
 
-/// @return -1 to go on, otherwise the exit status
-int parse(int argc, char** argv, Options& options) {
-    CLI::App app("Connects the Bluetooth devices of the auto-connect files\n"
-                 "(/etc/bluetooth/autoconnect/) and keeps them connected.",
-                 program);
-    app.set_version_flag("--version", std::string(program) + ' ' + KESBLUETOOTH_VERSION);
-    app.add_flag("-f,--foreground", options.foreground,
-                 "Stay in the foreground, log to standard error too");
-    app.add_option("--pid-file", options.pidFile, "PID file and lock of the only instance")
-        ->capture_default_str();
-    app.add_option("--interval", options.interval,
-                   "Seconds to the second attempt at a device that is\naway; doubles each time")
-        ->capture_default_str()
-        ->check(CLI::Range(1, day));
-    app.add_option("--max-interval", options.maxInterval, "Longest time between two attempts")
-        ->capture_default_str()
-        ->check(CLI::Range(1, day));
-    try {
-        app.parse(argc, argv);
-    } catch (const CLI::ParseError& problem) {
-        if (problem.get_exit_code() == 0) // --help, --version
-            return app.exit(problem);
-        std::cerr << program << ": " << problem.what() << "; see " << program << " --help\n";
-        return wrongUsage;
-    }
+void settle(StartOptions& options) {
     // The background's current folder is another one.
     std::error_code error;
     const auto absolute = std::filesystem::absolute(options.pidFile, error);
     if (!options.pidFile.empty() && !error)
         options.pidFile = absolute;
     options.maxInterval = std::max(options.maxInterval, options.interval);
-    return -1;
 }
 
 std::string pidFileProblem(const std::string& path, int error) {
@@ -100,8 +81,7 @@ void renewPipe(std::unique_ptr<CommandPipe>& pipe) {
 /// Waits for a command, for news, or until an attempt is due.
 /// @return whether there are commands to read
 bool wait(const CommandPipe& pipe, Clock::time_point until) {
-    pollfd watched[] = {{pipe.descriptor(), POLLIN, 0},
-                        {AutoConnectd::wakeupDescriptor(), POLLIN, 0}};
+    pollfd watched[] = {{pipe.descriptor(), POLLIN, 0}, {wakeupDescriptor(), POLLIN, 0}};
     const auto left = std::chrono::ceil<std::chrono::milliseconds>(until - Clock::now()).count();
     const int ready = poll(watched, 2, static_cast<int>(std::max<std::int64_t>(left, 0)));
     return ready > 0 && (watched[0].revents & POLLIN) != 0;
@@ -109,18 +89,18 @@ bool wait(const CommandPipe& pipe, Clock::time_point until) {
 
 int run(AutoConnector& connector, std::unique_ptr<CommandPipe>& pipe) {
     connector.reload();
-    while (!AutoConnectd::stopRequested()) {
+    while (!stopRequested()) {
         connector.work();
         if (wait(*pipe, connector.nextDue())) {
             for (const Command command : pipe->read())
                 connector.handle(command);
         }
-        if (AutoConnectd::takeReload())
+        if (takeReload())
             connector.reload();
         if (!pipe->isCurrent())
             renewPipe(pipe);
         if (!connector.hasBus()) {
-            // Not fail(): in the foreground the log itself goes to standard error by now.
+            // Not program.fail(): in the foreground the log itself goes to standard error by now.
             syslog(LOG_ERR, "the system bus has gone; start again when it is back");
             return EXIT_FAILURE;
         }
@@ -129,38 +109,43 @@ int run(AutoConnector& connector, std::unique_ptr<CommandPipe>& pipe) {
     return EXIT_SUCCESS;
 }
 
-int start(const Options& options) {
+int work(const DaemonProgram& program, const StartOptions& options) {
     Background background;
     if (!options.foreground && !background.enter())
-        return fail(std::string("cannot go into the background: ") + strerror(errno));
+        return program.fail(std::string("cannot go into the background: ") + strerror(errno));
     if (Bluetooth::createPidFile(options.pidFile.c_str(), closeOnExec, true) < 0)
-        return fail(pidFileProblem(options.pidFile, errno));
+        return program.fail(pidFileProblem(options.pidFile, errno));
     std::string problem;
     auto pipe = CommandPipe::open(pipePath, problem);
     if (!pipe)
-        return fail(problem);
-    if (!AutoConnectd::openWakeup())
-        return fail(std::string("cannot make an event descriptor: ") + strerror(errno));
-    AutoConnectd::stopOnSignals();
+        return program.fail(problem);
+    if (!openWakeup())
+        return program.fail(std::string("cannot make an event descriptor: ") + strerror(errno));
+    stopOnSignals();
     AutoConnector connector(
         {std::chrono::seconds(options.interval), std::chrono::seconds(options.maxInterval)});
     if (!connector.start())
-        return fail("cannot reach the system bus; start dbus-daemon, or set "
-                    "DBUS_SYSTEM_BUS_ADDRESS");
+        return program.fail("cannot reach the system bus; start dbus-daemon, or set "
+                            "DBUS_SYSTEM_BUS_ADDRESS");
     background.ready();
     if (options.foreground) // not before: a failed start is told in one line
-        openlog(program, LOG_PID | LOG_PERROR, LOG_DAEMON);
+        openlog(program.name(), LOG_PID | LOG_PERROR, LOG_DAEMON);
     syslog(LOG_NOTICE, "started");
     return run(connector, pipe);
 }
 
 } // namespace
 
+} // namespace AutoConnectd
+
 int main(int argc, char** argv) {
-    Options options;
-    const int status = parse(argc, argv, options);
-    if (status >= 0)
-        return status;
-    openlog(program, LOG_PID, LOG_DAEMON);
-    return start(options);
+    Tools::DaemonProgram program("kesbt-autoconnectd",
+                                 "Connects the Bluetooth devices of the auto-connect files\n"
+                                 "(/etc/bluetooth/autoconnect/) and keeps them connected.");
+    AutoConnectd::StartOptions options;
+    AutoConnectd::addOptions(program.commandLine(), options);
+    if (const auto status = program.start(argc, argv))
+        return *status;
+    AutoConnectd::settle(options);
+    return AutoConnectd::work(program, options);
 }

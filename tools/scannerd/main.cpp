@@ -1,49 +1,23 @@
 #include "service_name.h"
 
+#include "common/daemon_program.h"
+
 #include <bluetooth/connection.h>
 #include <bluetooth/scanner_server.h>
 
-#include <CLI/CLI.hpp>
 #include <glib-unix.h>
-#include <syslog.h>
 
 #include <csignal>
 #include <cstdlib>
-#include <iostream>
 #include <memory>
 #include <string>
+
+namespace Scannerd {
 
 namespace {
 
 using Bluetooth::ScannerServer;
-using Scannerd::ServiceName;
-
-constexpr const char* program = "kesbt-scannerd";
-constexpr int wrongUsage = 2;
-
-int fail(const std::string& problem) {
-    std::cerr << program << ": " << problem << std::endl;
-    syslog(LOG_ERR, "%s", problem.c_str());
-    return EXIT_FAILURE;
-}
-
-/// @return -1 to go on, otherwise the exit status
-int parse(int argc, char** argv) {
-    CLI::App app("Lets the programs of a session share the discovery of Bluetooth devices\n"
-                 "(com.kestrine.bluetooth on the session bus). The bus starts it when a program\n"
-                 "asks for devices; it ends by itself 30 seconds after the last discovery began.",
-                 program);
-    app.set_version_flag("--version", std::string(program) + ' ' + KESBLUETOOTH_VERSION);
-    try {
-        app.parse(argc, argv);
-    } catch (const CLI::ParseError& problem) {
-        if (problem.get_exit_code() == 0) // --help, --version
-            return app.exit(problem);
-        std::cerr << program << ": " << problem.what() << "; see " << program << " --help\n";
-        return wrongUsage;
-    }
-    return -1;
-}
+using Tools::DaemonProgram;
 
 /// Runs in the loop, so there is one to quit, and a server.
 gboolean quit(void* server) {
@@ -80,7 +54,7 @@ private:
     std::unique_ptr<ScannerServer>& m_server;
 };
 
-int serve(ServiceName& name, DBusConnection* systemBus) {
+int serve(const DaemonProgram& program, ServiceName& name, DBusConnection* systemBus) {
     // Before the name is requested: from then on calls may be answered and discoveries begun.
     std::unique_ptr<ScannerServer> server;
     const BusWatch session(name.getConnection(), server);
@@ -92,7 +66,8 @@ int serve(ServiceName& name, DBusConnection* systemBus) {
     if (name.owner() == server->getConnectionName())
         server->startLoop();
     else if (!session.isLost())
-        return fail("the session bus did not give it its name; only one can run in a session");
+        return program.fail(
+            "the session bus did not give it its name; only one can run in a session");
 
     // Calls that came before the name was given up are answered, the others go to the next daemon.
     name.release();
@@ -100,33 +75,40 @@ int serve(ServiceName& name, DBusConnection* systemBus) {
     }
     server->stopDiscovery();
     if (session.isLost())
-        return fail("the session bus has gone; start again when it is back");
+        return program.fail("the session bus has gone; start again when it is back");
     if (system.isLost())
-        return fail("the system bus has gone; start again when it is back");
+        return program.fail("the system bus has gone; start again when it is back");
     return EXIT_SUCCESS;
 }
 
-int start() {
+int work(const DaemonProgram& program) {
     ServiceName name;
     if (!name.getConnection())
-        return fail("cannot reach the session bus; run it in a session that has one, or through "
-                    "dbus-run-session");
+        return program.fail(
+            "cannot reach the session bus; run it in a session that has one, or through "
+            "dbus-run-session");
     DBusConnection* systemBus = Bluetooth::Connection::get(DBUS_BUS_SYSTEM);
     if (!systemBus)
-        return fail("cannot reach the system bus; start dbus-daemon, or set "
-                    "DBUS_SYSTEM_BUS_ADDRESS");
+        return program.fail("cannot reach the system bus; start dbus-daemon, or set "
+                            "DBUS_SYSTEM_BUS_ADDRESS");
     const std::string owner = name.owner();
     if (!owner.empty())
-        return fail("already running in this session, as " + owner + "; one serves all programs");
-    return serve(name, systemBus);
+        return program.fail("already running in this session, as " + owner +
+                            "; one serves all programs");
+    return serve(program, name, systemBus);
 }
 
 } // namespace
 
+} // namespace Scannerd
+
 int main(int argc, char** argv) {
-    const int status = parse(argc, argv);
-    if (status >= 0)
-        return status;
-    openlog(program, LOG_PID, LOG_DAEMON);
-    return start();
+    Tools::DaemonProgram program(
+        "kesbt-scannerd",
+        "Lets the programs of a session share the discovery of Bluetooth devices\n"
+        "(com.kestrine.bluetooth on the session bus). The bus starts it when a program\n"
+        "asks for devices; it ends by itself 30 seconds after the last discovery began.");
+    if (const auto status = program.start(argc, argv))
+        return *status;
+    return Scannerd::work(program);
 }
