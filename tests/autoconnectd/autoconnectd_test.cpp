@@ -170,7 +170,8 @@ TEST_F(AutoConnectDaemonTest, FollowsTheBluetoothDaemonAndItsAdapters) {
 TEST_F(AutoConnectDaemonTest, GoesIntoTheBackgroundOnceItIsReady) {
     // The file is taken from the folder it is started in, not from the one it goes to.
     EXPECT_EQ(
-        outputOf({"sh", "-c", "cd /tmp && exec " KESBT_AUTOCONNECTD " --pid-file test.pid"}, 0), "")
+        outputOf({"sh", "-c", "cd /tmp && exec " KESBT_AUTOCONNECTD " --pid-file test.pid <&-"}, 0),
+        "")
         << "the output is let go of";
     const int pid = std::stoi(readFile(pidFile));
     EXPECT_TRUE(autoConnect.reload()) << "it listens";

@@ -1,5 +1,7 @@
 #include "common/daemon_program.h"
 
+#include "common/standard_descriptors.h"
+
 #include <syslog.h>
 
 #include <cstdlib>
@@ -13,6 +15,7 @@ DaemonProgram::DaemonProgram(const char* name, const char* description)
 }
 
 std::optional<int> DaemonProgram::start(int argc, char** argv) {
+    openStandardDescriptors(); // a daemon that nobody hears works all the same
     try {
         m_commandLine.parse(argc, argv);
     } catch (const CLI::ParseError& problem) {

@@ -19,7 +19,7 @@ public:
     /// To add options to; --help and --version are there.
     CLI::App& commandLine() { return m_commandLine; }
 
-    /// Reads the command line and opens the log.
+    /// Reads the command line and opens the log. Standard descriptors are open afterwards.
     /// @return what to exit with, when there is no more to be done: 0 after --help and --version,
     ///         2 after wrong usage, told in one line on standard error
     std::optional<int> start(int argc, char** argv);
