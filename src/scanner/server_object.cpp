@@ -18,6 +18,23 @@ const char* textOf(const char* text) {
     return text ? text : "";
 }
 
+/// libdbus ends the process on an invalid name or path.
+bool areValid(const char* busName, const char* path) {
+    return busName && path && dbus_validate_utf8(busName, nullptr) &&
+           dbus_validate_utf8(path, nullptr) && dbus_validate_bus_name(busName, nullptr) &&
+           dbus_validate_path(path, nullptr);
+}
+
+/// Whether something else than the object is served at a path. dbus-glib ends the process on a
+/// second one.
+bool isTaken(DBusGConnection* connection, const char* path, const GObject* object) {
+    void* served = nullptr;
+    return dbus_g_connection_lookup_g_object(connection, path) != object &&
+           dbus_connection_get_object_path_data(dbus_g_connection_get_connection(connection), path,
+                                                &served) &&
+           served;
+}
+
 /// Calls updateTimer() on the default main context, at most as long as this lives.
 class LoopTimer {
 public:
@@ -61,10 +78,7 @@ void ServerObject::getConnection() {
 }
 
 bool ServerObject::prepareObjectInfo(GType type, const DBusGObjectInfo* info, GObject* object) {
-    // libdbus ends the process on a name or a path that is none.
-    if (!m_busName || !m_path || !dbus_validate_utf8(m_busName, nullptr) ||
-        !dbus_validate_utf8(m_path, nullptr) || !dbus_validate_bus_name(m_busName, nullptr) ||
-        !dbus_validate_path(m_path, nullptr)) {
+    if (!areValid(m_busName, m_path)) {
         logError(KES_HERE, "Failed to acquire %s, %s", m_busName ? m_busName : "(null)",
                  "Invalid name or path");
         return false;
@@ -83,11 +97,7 @@ bool ServerObject::prepareObjectInfo(GType type, const DBusGObjectInfo* info, GO
         return false;
     }
 
-    // dbus-glib ends the process when something else is served at the path already.
-    void* served = nullptr;
-    DBusConnection* connection = dbus_g_connection_get_connection(m_connection);
-    if (dbus_g_connection_lookup_g_object(m_connection, m_path) != object &&
-        dbus_connection_get_object_path_data(connection, m_path, &served) && served) {
+    if (isTaken(m_connection, m_path, object)) {
         logError(KES_HERE, "Failed to serve %s, another object is there", m_path);
         return false;
     }
