@@ -1,5 +1,6 @@
 #include <bluetooth/commandlib.h>
 
+#include "bluez/device_address.h"
 #include "core/log.h"
 #include "core/process.h"
 #include "host/process_lookup.h"
@@ -8,10 +9,10 @@
 #include <signal.h>
 #include <unistd.h>
 
-#include <algorithm>
 #include <charconv>
 #include <cstdlib>
 #include <cstring>
+#include <optional>
 
 namespace Bluetooth {
 
@@ -96,12 +97,8 @@ int restartBluetoothd() {
 }
 
 char* getAddressFromPath(const char* path) {
-    static constexpr char prefix[] = "dev_";
-    const char* const device = path ? strstr(path, prefix) : nullptr;
-    char* const address = device ? strdup(device + sizeof(prefix) - 1) : nullptr;
-    if (address)
-        std::replace(address, address + strlen(address), '_', ':');
-    return address;
+    const auto address = path ? addressInPath(path) : std::nullopt;
+    return address ? strdup(address->c_str()) : nullptr;
 }
 
 } // namespace Bluetooth

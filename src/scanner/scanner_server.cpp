@@ -6,13 +6,14 @@
 #include <bluetooth/device_list.h>
 #include <bluetooth/manager.h>
 
+#include "bluez/device_address.h"
 #include "core/log.h"
 #include "scanner/finders.h"
 #include "scanner/names.h"
 #include "scanner/scanner_object_info.h"
 
-#include <algorithm>
 #include <atomic>
+#include <optional>
 #include <utility>
 
 namespace Bluetooth {
@@ -23,26 +24,15 @@ using Lock = std::lock_guard<std::mutex>;
 
 std::atomic<Finders*> current{nullptr};
 
-/// @return "00:11:22:33:44:55" for ".../dev_00_11_22_33_44_55"; "" for any other path
-std::string addressOf(const std::string& devicePath) {
-    const std::string prefix = "dev_";
-    const std::size_t place = devicePath.find(prefix);
-    if (place == std::string::npos)
-        return "";
-    std::string address = devicePath.substr(place + prefix.size());
-    std::replace(address.begin(), address.end(), '_', ':');
-    return address;
-}
-
 /// Adds the addresses of the devices that the daemon knows on an adapter.
 void addKnownDevices(Adapter& adapter, AddressSet& addresses) {
     const std::unique_ptr<DeviceList> devices(adapter.listDevices());
     if (!devices)
         return;
     for (const Device* device : *devices) {
-        std::string address = device ? addressOf(device->getPath()) : "";
-        if (!address.empty())
-            addresses.insert(std::move(address));
+        const auto address = device ? addressInPath(device->getPath()) : std::nullopt;
+        if (address && !address->empty())
+            addresses.insert(*address);
     }
 }
 
