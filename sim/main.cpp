@@ -1,6 +1,6 @@
 #include "options.h"
+#include "run/command.h"
 #include "run/foreground.h"
-#include "run/session.h"
 #include "world/behaviour.h"
 #include "world/scenario.h"
 
@@ -28,7 +28,7 @@ int run(const Options& options) {
             g_print("%-22s%s\n", behaviour.name, behaviour.description);
         return 0;
     }
-    return options.command.empty() ? serveInForeground(options) : runSession(options);
+    return options.command.empty() ? serveInForeground(options) : runCommand(options);
 }
 
 } // namespace

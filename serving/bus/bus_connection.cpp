@@ -27,6 +27,15 @@ BusError fromGlib(const GError* error) {
 
 } // namespace
 
+std::string systemBusAddress() {
+    ErrorOut error;
+    const GlibPtr<char> address(
+        g_dbus_address_get_for_bus_sync(G_BUS_TYPE_SYSTEM, nullptr, error.out()));
+    if (!address)
+        throw std::runtime_error(std::string("no system bus: ") + error->message);
+    return address.get();
+}
+
 /// Where the reading thread leaves calls. `connection` is used on the main loop only, and null once
 /// the it is gone; calls that are still under way are dropped then.
 struct BusConnection::Inbox {

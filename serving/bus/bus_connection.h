@@ -16,6 +16,10 @@ struct CallResult {
     bool failed = false;
 };
 
+/// The address of the system bus: DBUS_SYSTEM_BUS_ADDRESS, or else the machine's.
+/// @throw std::runtime_error  with a text for the user
+std::string systemBusAddress();
+
 /// One connection to a bus under a well-known name.
 ///
 /// Threads: everything runs on the main loop. GDBus reads on a thread of its own; calls are handed
