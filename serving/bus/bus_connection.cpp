@@ -118,10 +118,9 @@ void BusConnection::own(const char* name) {
     constexpr guint32 doNotQueue = 4;
     constexpr guint32 owned = 1;
     ErrorOut error;
-    const GlibPtr<GVariant> reply(
-        g_dbus_connection_call_sync(m_connection, busName, busPath, busName, "RequestName",
-                                    g_variant_new("(su)", name, doNotQueue), G_VARIANT_TYPE("(u)"),
-                                    G_DBUS_CALL_FLAGS_NONE, -1, nullptr, error.out()));
+    const GlibPtr<GVariant> reply(g_dbus_connection_call_sync(
+        m_connection, busName, busPath, busName, "RequestName", tuple(name, doNotQueue).get(),
+        G_VARIANT_TYPE("(u)"), G_DBUS_CALL_FLAGS_NONE, -1, nullptr, error.out()));
     if (!reply)
         raise(std::string("cannot own ") + name, error);
     guint32 result = 0;

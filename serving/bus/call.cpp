@@ -44,19 +44,13 @@ Value Call::arguments() const {
     return body ? Value(body) : Value(g_variant_new_tuple(nullptr, 0));
 }
 
-std::string Call::text(gsize index) const {
+Value Call::argument(gsize index) const {
     const GlibPtr<GVariant> child(g_variant_get_child_value(arguments().get(), index));
-    return g_variant_get_string(child.get(), nullptr);
-}
-
-guint32 Call::number(gsize index) const {
-    const GlibPtr<GVariant> child(g_variant_get_child_value(arguments().get(), index));
-    return g_variant_get_uint32(child.get());
+    return child.get();
 }
 
 Value Call::content(gsize index) const {
-    const GlibPtr<GVariant> child(g_variant_get_child_value(arguments().get(), index));
-    const GlibPtr<GVariant> inner(g_variant_get_variant(child.get()));
+    const GlibPtr<GVariant> inner(g_variant_get_variant(argument(index).get()));
     return inner.get();
 }
 

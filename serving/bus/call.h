@@ -2,7 +2,7 @@
 #define KESBLUETOOTH_SERVING_BUS_CALL_H
 
 #include "serving/bus/bus_error.h"
-#include "serving/bus/glib_ptr.h"
+#include "serving/bus/value.h"
 
 #include <memory>
 #include <string>
@@ -29,8 +29,10 @@ public:
 
     /// The arguments as one tuple; "()" when there are none.
     Value arguments() const;
-    std::string text(gsize index) const;
-    guint32 number(gsize index) const;
+    /// One of the arguments.
+    Value argument(gsize index) const;
+    std::string text(gsize index) const { return argument(index).text(); }
+    guint32 number(gsize index) const { return argument(index).number(); }
     /// The content of a variant argument.
     Value content(gsize index) const;
 

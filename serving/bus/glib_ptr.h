@@ -4,7 +4,6 @@
 #include <gio/gio.h>
 
 #include <memory>
-#include <string>
 
 namespace Bluetooth::Serving {
 
@@ -26,38 +25,6 @@ struct ObjectDeleter {
 
 template <class T>
 using ObjectPtr = std::unique_ptr<T, ObjectDeleter>;
-
-/// A variant that takes a floating reference over, or shares a full one.
-class Value {
-public:
-    Value() = default;
-    // Implicit: a Value stands wherever GLib's constructors hand over a new variant.
-    Value(GVariant* variant) : m_variant(variant ? g_variant_ref_sink(variant) : nullptr) {}
-    Value(const Value& other) : m_variant(other ? g_variant_ref(other.get()) : nullptr) {}
-    Value(Value&& other) noexcept = default;
-    Value& operator=(Value other) noexcept {
-        m_variant.swap(other.m_variant);
-        return *this;
-    }
-    ~Value() = default;
-
-    GVariant* get() const { return m_variant.get(); }
-    explicit operator bool() const { return m_variant != nullptr; }
-    bool is(const char* type) const {
-        return m_variant && g_variant_is_of_type(m_variant.get(), G_VARIANT_TYPE(type));
-    }
-
-private:
-    GlibPtr<GVariant> m_variant;
-};
-
-inline Value textValue(const std::string& text) {
-    return g_variant_new_string(text.c_str());
-}
-
-inline Value boolValue(bool value) {
-    return g_variant_new_boolean(value ? TRUE : FALSE);
-}
 
 /// A GError out parameter: `someCall(..., error.out())`, then `if (error)`.
 class ErrorOut {

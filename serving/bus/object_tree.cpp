@@ -59,7 +59,7 @@ void ObjectTree::introspect(const CallPtr& call) const {
             xml += served.interface->introspection();
     for (const std::string& child : children)
         xml += "\t<node name=\"" + child + "\"/>\n";
-    call->reply(g_variant_new("(s)", (xml + "</node>\n").c_str()));
+    call->reply(tuple(xml + "</node>\n"));
 }
 
 std::vector<std::string> ObjectTree::childrenOf(const std::string& path) const {

@@ -5,8 +5,8 @@
 #include "daemon/audio_device.h"
 #include "daemon/device.h"
 #include "daemon/pairing.h"
+#include "serving/bluez4/address.h"
 #include "serving/bus/dict_builder.h"
-#include "world/address.h"
 #include "world/settings.h"
 
 #include <algorithm>
@@ -140,8 +140,7 @@ bool Control::beforeCall(const CallPtr& call) {
                    GlibPtr<char>(g_variant_print(call->arguments().get(), FALSE)).get());
     m_calls.add(call);
     m_bus.emit(controlPath, controlName, "CallReceived",
-               g_variant_new("(osss)", call->path().c_str(), call->interface().c_str(),
-                             call->member().c_str(), call->sender().c_str()));
+               tuple(pathValue(call->path()), call->interface(), call->member(), call->sender()));
     return m_faults.take(call);
 }
 
@@ -211,7 +210,7 @@ void Control::addAdapter(const CallPtr& call) {
     m_world.adapters.push_back(hardware);
     if (m_daemon.running())
         m_daemon.plugIn(hardware);
-    done(call, tuple(textValue(hardware->id())));
+    done(call, tuple(hardware->id()));
 }
 
 void Control::removeAdapter(const CallPtr& call) {
@@ -266,7 +265,7 @@ void Control::comeIn(const CallPtr& call, bool pairing) {
     if (known && known->busy())
         throw std::runtime_error("the device is busy");
     if (!known)
-        known = to.createDevice(from->address);
+        known = to.addDevice(from->address);
     known->comeIn(pairing);
     done(call);
 }
@@ -293,8 +292,7 @@ void Control::dropLink(const CallPtr& call) {
 }
 
 void Control::setPlaying(const CallPtr& call) {
-    const GlibPtr<GVariant> playing(g_variant_get_child_value(call->arguments().get(), 2));
-    device(call)->audio().setPlaying(g_variant_get_boolean(playing.get()) != FALSE);
+    device(call)->audio().setPlaying(call->argument(2).flag());
     done(call);
 }
 
@@ -314,17 +312,15 @@ void Control::callAgent(const CallPtr& call) {
     const Agent* agent = of.currentAgent();
     if (!agent)
         throw std::runtime_error("the adapter has no agent");
-    const std::string interface = call->text(1).empty() ? "org.bluez.Agent" : call->text(1);
+    const std::string interface = call->text(1).empty() ? Interfaces::agent : call->text(1);
     const std::string member = call->text(2);
     if (!g_dbus_is_interface_name(interface.c_str()) || !g_dbus_is_member_name(member.c_str()))
         throw std::runtime_error("\"" + interface + "." + member + "\" cannot name a method");
-    m_daemon.bus().call(agent->owner(), agent->path(), interface, member, bodyOf(call, 3),
-                        static_cast<int>(m_world.times.agentTimeout), nullptr,
-                        [call](const CallResult& answer) {
-                            call->reply(g_variant_new("(ss@av)", answer.error.name.c_str(),
-                                                      answer.error.text.c_str(),
-                                                      variantList(answer.results).get()));
-                        });
+    m_daemon.bus().call(
+        agent->owner(), agent->path(), interface, member, bodyOf(call, 3),
+        static_cast<int>(m_world.times.agentTimeout), nullptr, [call](const CallResult& answer) {
+            call->reply(tuple(answer.error.name, answer.error.text, variantList(answer.results)));
+        });
 }
 
 void Control::failNext(const CallPtr& call) {
@@ -372,8 +368,8 @@ void Control::setTimes(const CallPtr& call) {
 
 /// The bus learns of a closed connection in its own time: what follows comes after that.
 void Control::whenGone(std::function<void()> next) {
-    m_bus.call(busName, busPath, busName, "NameHasOwner", tuple(textValue("org.bluez")), -1,
-               nullptr, [this, next = std::move(next)](const CallResult& answer) {
+    m_bus.call(busName, busPath, busName, "NameHasOwner", tuple("org.bluez"), -1, nullptr,
+               [this, next = std::move(next)](const CallResult& answer) {
                    gboolean owned = FALSE;
                    if (!answer.failed)
                        g_variant_get(answer.results.get(), "(b)", &owned);
@@ -401,7 +397,7 @@ void Control::restart(const CallPtr& call) {
     whenGone([this, call, pid] {
         carryOut(call, [&] {
             m_daemon.start(pid);
-            done(call, tuple(g_variant_new_uint32(static_cast<guint32>(pid))));
+            done(call, tuple(static_cast<guint32>(pid)));
         });
     });
 }

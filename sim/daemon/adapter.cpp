@@ -5,8 +5,10 @@
 #include "daemon/device.h"
 #include "daemon/device_creation.h"
 #include "daemon/pairing.h"
+#include "serving/bluez4/address.h"
+#include "serving/bluez4/errors.h"
+#include "serving/bluez4/properties.h"
 #include "serving/bus/dict_builder.h"
-#include "world/address.h"
 
 #include <algorithm>
 
@@ -28,47 +30,13 @@ std::string cut(const std::string& name) {
 
 } // namespace
 
-const Interface& Adapter::table() {
-    static const Interface table = {
-        "org.bluez.Adapter",
-        {{"GetProperties", {}, {{"properties", "a{sv}"}}, handle<&Adapter::getProperties>},
-         {"SetProperty", {{"name", "s"}, {"value", "v"}}, {}, handle<&Adapter::setProperty>},
-         {"RequestSession", {}, {}, handle<&Adapter::requestSession>},
-         {"ReleaseSession", {}, {}, handle<&Adapter::releaseSession>},
-         {"StartDiscovery", {}, {}, handle<&Adapter::startDiscovery>},
-         {"StopDiscovery", {}, {}, handle<&Adapter::stopDiscovery>},
-         {"ListDevices", {}, {{"devices", "ao"}}, handle<&Adapter::listDevices>, true},
-         {"CreateDevice",
-          {{"address", "s"}},
-          {{"device", "o"}},
-          handle<&Adapter::createDeviceCalled>},
-         {"CreatePairedDevice",
-          {{"address", "s"}, {"agent", "o"}, {"capability", "s"}},
-          {{"device", "o"}},
-          handle<&Adapter::createPairedDevice>},
-         {"CancelDeviceCreation", {{"address", "s"}}, {}, handle<&Adapter::cancelDeviceCreation>},
-         {"RemoveDevice", {{"device", "o"}}, {}, handle<&Adapter::removeDeviceCalled>},
-         {"FindDevice", {{"address", "s"}}, {{"device", "o"}}, handle<&Adapter::findDevice>},
-         {"RegisterAgent",
-          {{"agent", "o"}, {"capability", "s"}},
-          {},
-          handle<&Adapter::registerAgent>},
-         {"UnregisterAgent", {{"agent", "o"}}, {}, handle<&Adapter::unregisterAgent>}},
-        {{"PropertyChanged", {{"name", "s"}, {"value", "v"}}},
-         {"DeviceCreated", {{"device", "o"}}},
-         {"DeviceRemoved", {{"device", "o"}}},
-         {"DeviceFound", {{"address", "s"}, {"values", "a{sv}"}}},
-         {"DeviceDisappeared", {{"address", "s"}}}}};
-    return table;
-}
-
 Adapter::Adapter(Daemon& daemon, std::shared_ptr<AdapterHardware> hardware)
     : m_daemon(daemon),
       m_hardware(std::move(hardware)),
       m_path(daemon.basePath() + "/" + m_hardware->id()),
       m_mode(*this),
       m_discovery(*this) {
-    m_daemon.objects().add(m_path, table(), this);
+    m_daemon.objects().add(m_path, adapterInterface<Adapter>(), this);
     for (auto& [address, stored] : m_hardware->storage) {
         if (!stored.known)
             continue;
@@ -85,7 +53,7 @@ Adapter::~Adapter() {
 void Adapter::announce() {
     for (const auto& device : m_devices)
         if (device->stored().paired)
-            device->changed("Paired", boolValue(true));
+            device->changed("Paired", true);
 }
 
 void Adapter::comeUp() {
@@ -153,7 +121,7 @@ std::shared_ptr<Device> Adapter::find(const std::string& address) const {
     return found == m_devices.end() ? nullptr : *found;
 }
 
-std::shared_ptr<Device> Adapter::createDevice(const std::string& address) {
+std::shared_ptr<Device> Adapter::addDevice(const std::string& address) {
     auto device = std::make_shared<Device>(*this, address);
     m_devices.push_back(device);
     emit("DeviceCreated", tuple(pathValue(device->path())));
@@ -161,7 +129,7 @@ std::shared_ptr<Device> Adapter::createDevice(const std::string& address) {
     return device;
 }
 
-void Adapter::removeDevice(const std::shared_ptr<Device>& device) {
+void Adapter::forgetDevice(const std::shared_ptr<Device>& device) {
     const auto found = std::find(m_devices.begin(), m_devices.end(), device);
     if (found == m_devices.end())
         return;
@@ -180,11 +148,11 @@ void Adapter::removeDevice(const std::shared_ptr<Device>& device) {
 }
 
 void Adapter::emit(const char* member, const Value& arguments) {
-    m_daemon.bus().emit(m_path, table().name, member, arguments);
+    m_daemon.bus().emit(m_path, Interfaces::adapter, member, arguments);
 }
 
 void Adapter::changed(const char* property, const Value& value) {
-    emit("PropertyChanged", g_variant_new("(sv)", property, value.get()));
+    emit("PropertyChanged", propertyChange(property, value));
 }
 
 void Adapter::uuidsChanged() {
@@ -204,45 +172,40 @@ Value Adapter::devicePaths() const {
 
 void Adapter::getProperties(const CallPtr& call) {
     DictBuilder properties;
-    properties.add("Address", textValue(m_hardware->address))
-        .add("Name", textValue(m_hardware->name))
-        .add("Class", g_variant_new_uint32(m_mode.deviceClass()))
-        .add("Powered", boolValue(m_mode.powered()))
-        .add("Discoverable", boolValue(m_mode.discoverable()))
-        .add("Pairable", boolValue(m_mode.pairable()))
-        .add("DiscoverableTimeout", g_variant_new_uint32(m_hardware->discoverableTimeout))
-        .add("PairableTimeout", g_variant_new_uint32(m_hardware->pairableTimeout))
-        .add("Discovering", boolValue(m_discovery.active()))
+    properties.add("Address", m_hardware->address)
+        .add("Name", m_hardware->name)
+        .add("Class", m_mode.deviceClass())
+        .add("Powered", m_mode.powered())
+        .add("Discoverable", m_mode.discoverable())
+        .add("Pairable", m_mode.pairable())
+        .add("DiscoverableTimeout", m_hardware->discoverableTimeout)
+        .add("PairableTimeout", m_hardware->pairableTimeout)
+        .add("Discovering", m_discovery.active())
         .add("Devices", devicePaths())
         .add("UUIDs", listValue("s", m_hardware->uuids));
     call->reply(tuple(properties.end()));
 }
 
 void Adapter::setProperty(const CallPtr& call) {
-    const std::string name = call->text(0);
-    const Value value = call->content(1);
-    if (name == "Name" && value.is("s"))
-        return setName(call, value);
-    if (name == "Powered" && value.is("b"))
-        return m_mode.setPowered(call, value);
-    if (name == "Discoverable" && value.is("b"))
-        return m_mode.setDiscoverable(call, value);
-    if (name == "Pairable" && value.is("b"))
-        return m_mode.setPairable(call, value);
-    if (name == "DiscoverableTimeout" && value.is("u"))
-        return m_mode.setDiscoverableTimeout(call, value);
-    if (name == "PairableTimeout" && value.is("u"))
-        return m_mode.setPairableTimeout(call, value);
-    call->fail(Errors::invalidArguments());
+    const bool answered =
+        setOneOf({{"Name", "s", &Adapter::setName}}, *this, call) ||
+        setOneOf({{"Powered", "b", &AdapterMode::setPowered},
+                  {"Discoverable", "b", &AdapterMode::setDiscoverable},
+                  {"Pairable", "b", &AdapterMode::setPairable},
+                  {"DiscoverableTimeout", "u", &AdapterMode::setDiscoverableTimeout},
+                  {"PairableTimeout", "u", &AdapterMode::setPairableTimeout}},
+                 m_mode, call);
+    if (!answered)
+        call->fail(Errors::invalidArguments);
 }
 
 void Adapter::setName(const CallPtr& call, const Value& value) {
-    const std::string name = cut(g_variant_get_string(value.get(), nullptr));
+    const std::string name = cut(value.text());
     call->reply();
     if (name == m_hardware->name)
         return;
     m_hardware->name = name;
-    changed("Name", textValue(name));
+    changed("Name", name);
 }
 
 void Adapter::requestSession(const CallPtr& call) {
@@ -255,13 +218,13 @@ void Adapter::releaseSession(const CallPtr& call) {
 
 void Adapter::startDiscovery(const CallPtr& call) {
     if (!m_mode.powered())
-        return call->fail(Errors::notReady());
+        return call->fail(Errors::notReady);
     m_discovery.startSession(call);
 }
 
 void Adapter::stopDiscovery(const CallPtr& call) {
     if (!m_mode.powered())
-        return call->fail(Errors::notReady());
+        return call->fail(Errors::notReady);
     m_discovery.stopSession(call);
 }
 
@@ -269,65 +232,65 @@ void Adapter::listDevices(const CallPtr& call) {
     call->reply(tuple(devicePaths()));
 }
 
-void Adapter::createDeviceCalled(const CallPtr& call) {
+void Adapter::createDevice(const CallPtr& call) {
     const std::string address = call->text(0);
     if (!isAddress(address))
-        return call->fail(Errors::invalidArguments());
+        return call->fail(Errors::invalidArguments);
     if (!m_mode.powered())
-        return call->fail(Errors::notReady());
+        return call->fail(Errors::notReady);
     if (find(upperCase(address)))
-        return call->fail(Errors::alreadyExists());
-    createDevice(upperCase(address))->create(call);
+        return call->fail(Errors::alreadyExists);
+    addDevice(upperCase(address))->create(call);
 }
 
 void Adapter::createPairedDevice(const CallPtr& call) {
     const std::string address = call->text(0);
     if (!isAddress(address))
-        return call->fail(Errors::invalidArguments());
+        return call->fail(Errors::invalidArguments);
     if (!m_mode.powered())
-        return call->fail(Errors::notReady());
+        return call->fail(Errors::notReady);
     const bool isOurAgent =
         m_agent && m_agent->owner() == call->sender() && m_agent->path() == call->text(1);
     if (isOurAgent || !parseCapability(call->text(2)))
-        return call->fail(Errors::invalidArguments());
+        return call->fail(Errors::invalidArguments);
     auto device = find(upperCase(address));
     if (device && device->busy())
-        return call->fail(Errors::inProgress());
+        return call->fail(Errors::inProgress);
     if (device && device->stored().paired)
-        return call->fail(Errors::alreadyExists());
+        return call->fail(Errors::alreadyExists);
     if (!device)
-        device = createDevice(upperCase(address));
+        device = addDevice(upperCase(address));
     device->pair(call);
 }
 
 void Adapter::cancelDeviceCreation(const CallPtr& call) {
     const std::string address = call->text(0);
     if (!isAddress(address))
-        return call->fail(Errors::invalidArguments());
+        return call->fail(Errors::invalidArguments);
     const auto device = find(upperCase(address));
     if (!device || !(device->creation() || device->pairing()))
-        return call->fail(Errors::doesNotExist());
+        return call->fail(Errors::doesNotExist);
     const std::string owner =
         device->creation() ? device->creation()->owner() : device->pairing()->owner();
     if (owner != call->sender())
-        return call->fail(Errors::notAuthorized());
+        return call->fail(Errors::notAuthorized);
     if (device->creation())
         device->creation()->cancel(call);
     else
         device->pairing()->cancel(call);
 }
 
-void Adapter::removeDeviceCalled(const CallPtr& call) {
+void Adapter::removeDevice(const CallPtr& call) {
     const std::string path = call->text(0);
     const auto found = std::find_if(m_devices.begin(), m_devices.end(),
                                     [&](const auto& device) { return device->path() == path; });
     if (found == m_devices.end())
-        return call->fail(Errors::doesNotExist());
+        return call->fail(Errors::doesNotExist);
     const auto device = *found;
     if (device->temporary() || device->busy())
-        return call->fail(Errors::bluez("DoesNotExist", "Device creation in progress"));
+        return call->fail(BluezError{"DoesNotExist", "Device creation in progress"});
     if (!device->link().up()) {
-        removeDevice(device);
+        forgetDevice(device);
         return call->reply();
     }
     device->setTemporary(true);
@@ -337,23 +300,23 @@ void Adapter::removeDeviceCalled(const CallPtr& call) {
 void Adapter::findDevice(const CallPtr& call) {
     const auto device = find(upperCase(call->text(0)));
     if (!device)
-        return call->fail(Errors::doesNotExist());
+        return call->fail(Errors::doesNotExist);
     call->reply(tuple(pathValue(device->path())));
 }
 
 void Adapter::registerAgent(const CallPtr& call) {
     if (m_agent)
-        return call->fail(Errors::alreadyExists());
+        return call->fail(Errors::alreadyExists);
     const auto capability = parseCapability(call->text(1));
     if (!capability)
-        return call->fail(Errors::invalidArguments());
+        return call->fail(Errors::invalidArguments);
     m_agent = std::make_shared<Agent>(m_daemon.bus(), call->sender(), call->text(0), *capability);
     call->reply();
 }
 
 void Adapter::unregisterAgent(const CallPtr& call) {
     if (!m_agent || m_agent->owner() != call->sender() || m_agent->path() != call->text(0))
-        return call->fail(Errors::doesNotExist());
+        return call->fail(Errors::doesNotExist);
     const auto agent = std::move(m_agent);
     agent->release();
     call->reply();

@@ -4,7 +4,7 @@
 #include "daemon/adapter_mode.h"
 #include "daemon/discovery.h"
 #include "serving.h"
-#include "serving/bus/interface.h"
+#include "serving/bluez4/interfaces.h"
 #include "world/world.h"
 
 #include <memory>
@@ -51,16 +51,17 @@ public:
     std::shared_ptr<Peer> peerAt(const std::string& address) const;
     std::shared_ptr<Device> find(const std::string& address) const;
     /// Makes the object of a device and announces it.
-    std::shared_ptr<Device> createDevice(const std::string& address);
+    std::shared_ptr<Device> addDevice(const std::string& address);
     /// Takes a device off the bus and out of storage, and announces that.
-    void removeDevice(const std::shared_ptr<Device>& device);
+    void forgetDevice(const std::shared_ptr<Device>& device);
 
     void emit(const char* member, const Value& arguments);
     void changed(const char* property, const Value& value);
     void uuidsChanged();
 
 private:
-    static const Interface& table();
+    template <class Served>
+    friend const Interface& Serving::adapterInterface();
 
     void getProperties(const CallPtr& call);
     void setProperty(const CallPtr& call);
@@ -69,10 +70,10 @@ private:
     void startDiscovery(const CallPtr& call);
     void stopDiscovery(const CallPtr& call);
     void listDevices(const CallPtr& call);
-    void createDeviceCalled(const CallPtr& call);
+    void createDevice(const CallPtr& call);
     void createPairedDevice(const CallPtr& call);
     void cancelDeviceCreation(const CallPtr& call);
-    void removeDeviceCalled(const CallPtr& call);
+    void removeDevice(const CallPtr& call);
     void findDevice(const CallPtr& call);
     void registerAgent(const CallPtr& call);
     void unregisterAgent(const CallPtr& call);

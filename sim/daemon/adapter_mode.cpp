@@ -3,7 +3,7 @@
 #include "daemon/adapter.h"
 #include "daemon/agent.h"
 #include "daemon/daemon.h"
-#include "serving/bus/dict_builder.h"
+#include "serving/bluez4/errors.h"
 
 #include <algorithm>
 
@@ -12,14 +12,6 @@ namespace Bluetooth::Sim {
 namespace {
 
 constexpr guint32 limitedDiscoverable = 0x2000;
-
-guint32 number(const Value& value) {
-    return g_variant_get_uint32(value.get());
-}
-
-bool flag(const Value& value) {
-    return g_variant_get_boolean(value.get()) != FALSE;
-}
 
 } // namespace
 
@@ -41,13 +33,13 @@ void AdapterMode::comeUp() {
     if (!m_adapter.hardware().powered)
         return;
     m_powered = true;
-    m_adapter.changed("Powered", boolValue(true));
-    m_adapter.changed("Pairable", boolValue(pairable()));
-    m_adapter.changed("Class", g_variant_new_uint32(deviceClass()));
-    m_adapter.changed("Name", textValue(m_adapter.hardware().name));
-    m_adapter.changed("Pairable", boolValue(pairable()));
+    m_adapter.changed("Powered", true);
+    m_adapter.changed("Pairable", pairable());
+    m_adapter.changed("Class", deviceClass());
+    m_adapter.changed("Name", m_adapter.hardware().name);
+    m_adapter.changed("Pairable", pairable());
     m_discoverable = m_adapter.hardware().discoverable;
-    m_adapter.changed("Discoverable", boolValue(m_discoverable));
+    m_adapter.changed("Discoverable", m_discoverable);
     startDiscoverableTimeout();
 }
 
@@ -60,8 +52,8 @@ void AdapterMode::goDown() {
 void AdapterMode::powerOn() {
     m_powered = true;
     m_adapter.hardware().powered = true;
-    m_adapter.changed("Powered", boolValue(true));
-    m_adapter.changed("Pairable", boolValue(pairable()));
+    m_adapter.changed("Powered", true);
+    m_adapter.changed("Pairable", pairable());
 }
 
 void AdapterMode::powerOff() {
@@ -72,17 +64,17 @@ void AdapterMode::powerOff() {
     m_pairableTimer.stop();
     if (m_discoverable) {
         m_discoverable = false;
-        m_adapter.changed("Discoverable", boolValue(false));
+        m_adapter.changed("Discoverable", false);
     }
     // Only the signal says so: GetProperties keeps the value that the next power-on brings back.
-    m_adapter.changed("Pairable", boolValue(false));
+    m_adapter.changed("Pairable", false);
     m_adapter.discovery().stop();
-    m_adapter.changed("Powered", boolValue(false));
+    m_adapter.changed("Powered", false);
     m_powerFromSession = false;
 }
 
 void AdapterMode::setPowered(const CallPtr& call, const Value& value) {
-    if (flag(value) == m_powered)
+    if (value.flag() == m_powered)
         return call->reply();
     if (m_powered) {
         powerOff();
@@ -90,17 +82,17 @@ void AdapterMode::setPowered(const CallPtr& call, const Value& value) {
         m_sessions.clear();
     } else {
         powerOn();
-        m_adapter.changed("Class", g_variant_new_uint32(deviceClass()));
-        m_adapter.changed("Pairable", boolValue(pairable()));
+        m_adapter.changed("Class", deviceClass());
+        m_adapter.changed("Pairable", pairable());
         m_discoverable = m_restoreDiscoverable;
-        m_adapter.changed("Discoverable", boolValue(m_discoverable));
+        m_adapter.changed("Discoverable", m_discoverable);
         startDiscoverableTimeout();
     }
     call->reply();
 }
 
 void AdapterMode::setDiscoverable(const CallPtr& call, const Value& value) {
-    const bool wanted = flag(value);
+    const bool wanted = value.flag();
     if (wanted == m_discoverable)
         return call->reply();
     if (wanted && !m_powered)
@@ -108,26 +100,26 @@ void AdapterMode::setDiscoverable(const CallPtr& call, const Value& value) {
     const bool wasLimited = limited();
     m_discoverable = wanted;
     m_adapter.hardware().discoverable = wanted;
-    m_adapter.changed("Discoverable", boolValue(wanted));
+    m_adapter.changed("Discoverable", wanted);
     startDiscoverableTimeout();
     call->reply();
     classChangedFrom(wasLimited);
 }
 
 void AdapterMode::setPairable(const CallPtr& call, const Value& value) {
-    if (flag(value) == pairable())
+    if (value.flag() == pairable())
         return call->reply();
-    m_adapter.hardware().pairable = flag(value);
+    m_adapter.hardware().pairable = value.flag();
     m_adapter.changed("Pairable", value);
     startPairableTimeout();
     call->reply();
 }
 
 void AdapterMode::setDiscoverableTimeout(const CallPtr& call, const Value& value) {
-    if (number(value) == m_adapter.hardware().discoverableTimeout)
+    if (value.number() == m_adapter.hardware().discoverableTimeout)
         return call->reply();
     const bool wasLimited = limited();
-    m_adapter.hardware().discoverableTimeout = number(value);
+    m_adapter.hardware().discoverableTimeout = value.number();
     m_adapter.changed("DiscoverableTimeout", value);
     startDiscoverableTimeout();
     call->reply();
@@ -135,9 +127,9 @@ void AdapterMode::setDiscoverableTimeout(const CallPtr& call, const Value& value
 }
 
 void AdapterMode::setPairableTimeout(const CallPtr& call, const Value& value) {
-    if (number(value) == m_adapter.hardware().pairableTimeout)
+    if (value.number() == m_adapter.hardware().pairableTimeout)
         return call->reply();
-    m_adapter.hardware().pairableTimeout = number(value);
+    m_adapter.hardware().pairableTimeout = value.number();
     m_adapter.changed("PairableTimeout", value);
     startPairableTimeout();
     call->reply();
@@ -152,7 +144,7 @@ void AdapterMode::startDiscoverableTimeout() {
         const bool wasLimited = limited();
         m_discoverable = false;
         m_adapter.hardware().discoverable = false;
-        m_adapter.changed("Discoverable", boolValue(false));
+        m_adapter.changed("Discoverable", false);
         classChangedFrom(wasLimited);
     });
 }
@@ -164,19 +156,19 @@ void AdapterMode::startPairableTimeout() {
         return;
     m_pairableTimer.start(m_adapter.daemon().times().scaledSeconds(seconds), [this] {
         m_adapter.hardware().pairable = false;
-        m_adapter.changed("Pairable", boolValue(false));
+        m_adapter.changed("Pairable", false);
     });
 }
 
 void AdapterMode::classChangedFrom(bool wasLimited) {
     if (limited() != wasLimited)
-        m_adapter.changed("Class", g_variant_new_uint32(deviceClass()));
+        m_adapter.changed("Class", deviceClass());
 }
 
 void AdapterMode::requestSession(const CallPtr& call) {
     Agent* agent = m_adapter.agent();
     if (!agent)
-        return call->fail(Errors::agentNotAvailable());
+        return call->fail(Errors::agentNotAvailable);
     if (m_powered) {
         m_sessions.push_back(call->sender());
         return call->reply();
@@ -184,14 +176,13 @@ void AdapterMode::requestSession(const CallPtr& call) {
     if (agent->busy())
         return call->fail(Errors::failed("Device or resource busy"));
     const char* mode = m_restoreDiscoverable ? "discoverable" : "connectable";
-    agent->ask("ConfirmModeChange", tuple(textValue(mode)), "",
-               m_adapter.daemon().times().agentTimeout, [this, call](const CallResult& answer) {
+    agent->ask("ConfirmModeChange", tuple(mode), "", m_adapter.daemon().times().agentTimeout,
+               [this, call](const CallResult& answer) {
                    if (answer.failed)
                        return call->fail(answer.error);
                    m_sessions.push_back(call->sender());
                    m_powerFromSession = true;
-                   const Value on = boolValue(true);
-                   setPowered(call, on);
+                   setPowered(call, true);
                });
 }
 

@@ -1,12 +1,9 @@
 #include "daemon/agent.h"
 
+#include "serving/bluez4/errors.h"
+#include "serving/bluez4/interfaces.h"
+
 namespace Bluetooth::Sim {
-
-namespace {
-
-constexpr const char* agentInterface = "org.bluez.Agent";
-
-} // namespace
 
 Agent::Agent(BusConnection& bus, std::string owner, std::string path, Capability capability)
     : m_bus(bus), m_owner(std::move(owner)), m_path(std::move(path)), m_capability(capability) {}
@@ -21,7 +18,7 @@ void Agent::ask(const char* member, const Value& arguments, const char* resultSi
     m_request = g_cancellable_new();
     m_onAnswer = std::move(onAnswer);
     const std::string expected = std::string("(") + resultSignature + ")";
-    m_bus.call(m_owner, m_path, agentInterface, member, arguments, static_cast<int>(timeout),
+    m_bus.call(m_owner, m_path, Interfaces::agent, member, arguments, static_cast<int>(timeout),
                m_request, [this, expected](const CallResult& answer) {
                    const OnAnswer handler = std::move(m_onAnswer);
                    g_clear_object(&m_request);
@@ -32,18 +29,18 @@ void Agent::ask(const char* member, const Value& arguments, const char* resultSi
 }
 
 void Agent::show(const char* member, const Value& arguments) {
-    m_bus.send(m_owner, m_path, agentInterface, member, arguments);
+    m_bus.send(m_owner, m_path, Interfaces::agent, member, arguments);
 }
 
 void Agent::cancel() {
     forgetRequest();
-    m_bus.send(m_owner, m_path, agentInterface, "Cancel");
+    m_bus.send(m_owner, m_path, Interfaces::agent, "Cancel");
 }
 
 void Agent::release() {
     if (busy())
-        m_bus.send(m_owner, m_path, agentInterface, "Cancel");
-    m_bus.send(m_owner, m_path, agentInterface, "Release");
+        m_bus.send(m_owner, m_path, Interfaces::agent, "Cancel");
+    m_bus.send(m_owner, m_path, Interfaces::agent, "Release");
 }
 
 void Agent::failRequest() {

@@ -2,8 +2,8 @@
 #define KESBLUETOOTH_SIM_DAEMON_AGENT_H
 
 #include "serving.h"
+#include "serving/bluez4/capability.h"
 #include "serving/bus/bus_connection.h"
-#include "world/capability.h"
 
 #include <string>
 

@@ -4,6 +4,8 @@
 #include "daemon/agent.h"
 #include "daemon/daemon.h"
 #include "daemon/device.h"
+#include "serving/bluez4/errors.h"
+#include "serving/bluez4/properties.h"
 #include "serving/bus/dict_builder.h"
 #include "world/settings.h"
 
@@ -23,45 +25,7 @@ constexpr const char* headsetGateway = "1112";
 constexpr const char* handsFree = "111e";
 constexpr const char* handsFreeGateway = "111f";
 
-const SignalEntry propertyChanged = {"PropertyChanged", {{"name", "s"}, {"value", "v"}}};
-
 } // namespace
-
-const Interface& AudioDevice::audioTable() {
-    static const Interface table = {
-        "org.bluez.Audio",
-        {{"Connect", {}, {}, handle<&AudioDevice::connectAudio>},
-         {"Disconnect", {}, {}, handle<&AudioDevice::disconnectAudio>},
-         {"GetProperties", {}, {{"properties", "a{sv}"}}, handle<&AudioDevice::audioProperties>}},
-        {propertyChanged}};
-    return table;
-}
-
-const Interface& AudioDevice::sinkTable() {
-    static const Interface table = {
-        "org.bluez.AudioSink",
-        {{"Connect", {}, {}, handle<&AudioDevice::connectSink>},
-         {"Disconnect", {}, {}, handle<&AudioDevice::disconnectSink>},
-         {"IsConnected", {}, {{"connected", "b"}}, handle<&AudioDevice::sinkIsConnected>, true},
-         {"GetProperties", {}, {{"properties", "a{sv}"}}, handle<&AudioDevice::sinkProperties>}},
-        {{"Connected", {}, true},
-         {"Disconnected", {}, true},
-         {"Playing", {}, true},
-         {"Stopped", {}, true},
-         propertyChanged}};
-    return table;
-}
-
-const Interface& AudioDevice::controlTable() {
-    static const Interface table = {
-        "org.bluez.Control",
-        {{"IsConnected", {}, {{"connected", "b"}}, handle<&AudioDevice::controlIsConnected>},
-         {"GetProperties", {}, {{"properties", "a{sv}"}}, handle<&AudioDevice::controlProperties>},
-         {"VolumeUp", {}, {}, handle<&AudioDevice::volume>},
-         {"VolumeDown", {}, {}, handle<&AudioDevice::volume>}},
-        {{"Connected", {}, true}, {"Disconnected", {}, true}, propertyChanged}};
-    return table;
-}
 
 const char* AudioDevice::text(State state) {
     switch (state) {
@@ -92,24 +56,24 @@ void AudioDevice::serve() {
             objects.add(m_device.path(), table, this);
         served = served || wanted;
     };
-    add(audio, m_audioServed, audioTable());
-    add(sink, m_sinkServed, sinkTable());
-    add(control, m_controlServed, controlTable());
+    add(audio, m_audioServed, audioInterface<AudioDevice>());
+    add(sink, m_sinkServed, audioSinkInterface<AudioDevice>());
+    add(control, m_controlServed, remoteControlInterface<AudioDevice>());
 }
 
-void AudioDevice::emit(const Interface& interface, const char* member, const Value& arguments) {
-    m_device.adapter().daemon().bus().emit(m_device.path(), interface.name, member, arguments);
+void AudioDevice::emit(const char* interface, const char* member, const Value& arguments) {
+    m_device.adapter().daemon().bus().emit(m_device.path(), interface, member, arguments);
 }
 
-void AudioDevice::changed(const Interface& interface, const char* property, const Value& value) {
-    emit(interface, "PropertyChanged", g_variant_new("(sv)", property, value.get()));
+void AudioDevice::changed(const char* interface, const char* property, const Value& value) {
+    emit(interface, "PropertyChanged", propertyChange(property, value));
 }
 
 void AudioDevice::setSink(State state) {
     if (!m_sinkServed || m_sink == state)
         return;
     m_sink = state;
-    changed(sinkTable(), "State", g_variant_new_string(text(state)));
+    changed(Interfaces::audioSink, "State", text(state));
 }
 
 void AudioDevice::setAudio(State state) {
@@ -124,7 +88,7 @@ void AudioDevice::setAudio(State state) {
             m_audioCall->fail(Errors::failed("Connect Failed"));
         m_audioCall.reset();
     }
-    changed(audioTable(), "State", g_variant_new_string(text(state)));
+    changed(Interfaces::audio, "State", text(state));
 }
 
 void AudioDevice::setControl(bool connected) {
@@ -132,15 +96,15 @@ void AudioDevice::setControl(bool connected) {
     if (!m_controlServed || m_control == connected)
         return;
     m_control = connected;
-    emit(controlTable(), connected ? "Connected" : "Disconnected");
-    changed(controlTable(), "Connected", boolValue(connected));
+    emit(Interfaces::control, connected ? "Connected" : "Disconnected");
+    changed(Interfaces::control, "Connected", connected);
 }
 
 void AudioDevice::connectAudio(const CallPtr& call) {
     if (m_audio == State::Connecting)
-        return call->fail(Errors::inProgress());
+        return call->fail(Errors::inProgress);
     if (m_audio == State::Connected)
-        return call->fail(Errors::alreadyConnected());
+        return call->fail(Errors::alreadyConnected);
     if (!m_sinkServed && !has(headset) && !has(handsFree))
         return call->fail(Errors::failed("Connect Failed"));
     m_audioCall = call;
@@ -149,9 +113,9 @@ void AudioDevice::connectAudio(const CallPtr& call) {
 
 void AudioDevice::connectSink(const CallPtr& call) {
     if (m_sink == State::Connecting)
-        return call->fail(Errors::inProgress());
+        return call->fail(Errors::inProgress);
     if (m_sink != State::Disconnected)
-        return call->fail(Errors::alreadyConnected());
+        return call->fail(Errors::alreadyConnected);
     m_sinkCall = call;
     beginConnecting();
 }
@@ -199,8 +163,8 @@ void AudioDevice::authorize(const std::string& uuid) {
         return failed();
     const auto& times = m_device.adapter().daemon().times();
     const auto device = m_device.weak_from_this();
-    agent->ask("Authorize", g_variant_new("(os)", m_device.path().c_str(), uuid.c_str()), "",
-               times.agentTimeout, [this, device](const CallResult& answer) {
+    agent->ask("Authorize", tuple(pathValue(m_device.path()), uuid), "", times.agentTimeout,
+               [this, device](const CallResult& answer) {
                    const auto alive = device.lock();
                    if (!alive || m_sink == State::Connected ||
                        (m_audio != State::Connecting && m_sink != State::Connecting))
@@ -220,8 +184,8 @@ void AudioDevice::setUpStream() {
 void AudioDevice::connected() {
     const Times& times = m_device.adapter().daemon().times();
     if (m_sinkServed) {
-        emit(sinkTable(), "Connected");
-        changed(sinkTable(), "Connected", boolValue(true));
+        emit(Interfaces::audioSink, "Connected");
+        changed(Interfaces::audioSink, "Connected", true);
         setSink(State::Connected);
     }
     setAudio(State::Connected);
@@ -246,24 +210,24 @@ void AudioDevice::disconnected() {
     setPlaying(false);
     setControl(false);
     if (m_sink == State::Connected) {
-        emit(sinkTable(), "Disconnected");
-        changed(sinkTable(), "Connected", boolValue(false));
+        emit(Interfaces::audioSink, "Disconnected");
+        changed(Interfaces::audioSink, "Connected", false);
     }
     failed();
 }
 
 void AudioDevice::disconnectAudio(const CallPtr& call) {
     if (m_audio == State::Disconnected)
-        return call->fail(Errors::notConnected());
+        return call->fail(Errors::notConnected);
     disconnected();
     call->reply();
 }
 
 void AudioDevice::disconnectSink(const CallPtr& call) {
     if (m_sink == State::Disconnected)
-        return call->fail(Errors::notConnected());
+        return call->fail(Errors::notConnected);
     if (m_sink == State::Connecting)
-        return call->fail(Errors::inProgress());
+        return call->fail(Errors::inProgress);
     disconnected();
     call->reply();
 }
@@ -271,8 +235,8 @@ void AudioDevice::disconnectSink(const CallPtr& call) {
 void AudioDevice::setPlaying(bool playing) {
     if (m_sink != (playing ? State::Connected : State::Playing))
         return;
-    emit(sinkTable(), playing ? "Playing" : "Stopped");
-    changed(sinkTable(), "Playing", boolValue(playing));
+    emit(Interfaces::audioSink, playing ? "Playing" : "Stopped");
+    changed(Interfaces::audioSink, "Playing", playing);
     setSink(playing ? State::Playing : State::Connected);
 }
 
@@ -290,33 +254,33 @@ void AudioDevice::abandon() {
 }
 
 void AudioDevice::audioProperties(const CallPtr& call) {
-    call->reply(tuple(DictBuilder().add("State", g_variant_new_string(text(m_audio))).end()));
+    call->reply(tuple(DictBuilder().add("State", text(m_audio)).end()));
 }
 
 void AudioDevice::sinkIsConnected(const CallPtr& call) {
-    call->reply(tuple(boolValue(m_sink == State::Connected || m_sink == State::Playing)));
+    call->reply(tuple(m_sink == State::Connected || m_sink == State::Playing));
 }
 
 void AudioDevice::sinkProperties(const CallPtr& call) {
     const bool connected = m_sink == State::Connected || m_sink == State::Playing;
     call->reply(tuple(DictBuilder()
-                          .add("State", g_variant_new_string(text(m_sink)))
-                          .add("Connected", boolValue(connected))
-                          .add("Playing", boolValue(m_sink == State::Playing))
+                          .add("State", text(m_sink))
+                          .add("Connected", connected)
+                          .add("Playing", m_sink == State::Playing)
                           .end()));
 }
 
 void AudioDevice::controlIsConnected(const CallPtr& call) {
-    call->reply(tuple(boolValue(m_control)));
+    call->reply(tuple(m_control));
 }
 
 void AudioDevice::controlProperties(const CallPtr& call) {
-    call->reply(tuple(DictBuilder().add("Connected", boolValue(m_control)).end()));
+    call->reply(tuple(DictBuilder().add("Connected", m_control).end()));
 }
 
 void AudioDevice::volume(const CallPtr& call) {
     if (!m_control)
-        return call->fail(Errors::notConnected());
+        return call->fail(Errors::notConnected);
     call->reply();
 }
 

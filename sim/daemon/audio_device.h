@@ -3,7 +3,7 @@
 
 #include "daemon/link.h"
 #include "serving.h"
-#include "serving/bus/interface.h"
+#include "serving/bluez4/interfaces.h"
 #include "serving/bus/one_shot_timer.h"
 
 #include <string>
@@ -30,9 +30,13 @@ public:
 private:
     enum class State { Disconnected, Connecting, Connected, Playing };
 
-    static const Interface& audioTable();
-    static const Interface& sinkTable();
-    static const Interface& controlTable();
+    template <class Served>
+    friend const Interface& Serving::audioInterface();
+    template <class Served>
+    friend const Interface& Serving::audioSinkInterface();
+    template <class Served>
+    friend const Interface& Serving::remoteControlInterface();
+
     static const char* text(State state);
 
     void connectAudio(const CallPtr& call);
@@ -57,8 +61,8 @@ private:
     void setSink(State state);
     void setAudio(State state);
     void setControl(bool connected);
-    void emit(const Interface& interface, const char* member, const Value& arguments = {});
-    void changed(const Interface& interface, const char* property, const Value& value);
+    void emit(const char* interface, const char* member, const Value& arguments = {});
+    void changed(const char* interface, const char* property, const Value& value);
 
     Device& m_device;
     bool m_audioServed = false;

@@ -2,7 +2,7 @@
 
 #include "daemon/adapter.h"
 #include "daemon/manager.h"
-#include "world/address.h"
+#include "serving/bluez4/address.h"
 
 #include <algorithm>
 

@@ -6,28 +6,15 @@
 #include "daemon/device_creation.h"
 #include "daemon/pairing.h"
 #include "daemon/service_search.h"
+#include "serving/bluez4/address.h"
+#include "serving/bluez4/errors.h"
+#include "serving/bluez4/icon.h"
+#include "serving/bluez4/properties.h"
 #include "serving/bus/dict_builder.h"
-#include "world/address.h"
-#include "world/icon.h"
 
 #include <algorithm>
 
 namespace Bluetooth::Sim {
-
-const Interface& Device::table() {
-    static const Interface table = {
-        "org.bluez.Device",
-        {{"GetProperties", {}, {{"properties", "a{sv}"}}, handle<&Device::getProperties>},
-         {"SetProperty", {{"name", "s"}, {"value", "v"}}, {}, handle<&Device::setProperty>},
-         {"DiscoverServices",
-          {{"pattern", "s"}},
-          {{"services", "a{us}"}},
-          handle<&Device::discoverServices>},
-         {"CancelDiscovery", {}, {}, handle<&Device::cancelDiscovery>},
-         {"Disconnect", {}, {}, handle<&Device::disconnect>}},
-        {{"PropertyChanged", {{"name", "s"}, {"value", "v"}}}, {"DisconnectRequested", {}}}};
-    return table;
-}
 
 Device::Device(Adapter& adapter, std::string address)
     : m_adapter(adapter),
@@ -37,7 +24,7 @@ Device::Device(Adapter& adapter, std::string address)
       m_classKnown(m_stored.deviceClass.has_value()),
       m_name(m_stored.name),
       m_link(*this) {
-    m_adapter.daemon().objects().add(m_path, table(), this);
+    m_adapter.daemon().objects().add(m_path, deviceInterface<Device>(), this);
     m_audio = std::make_unique<AudioDevice>(*this);
     m_audio->serve();
 }
@@ -80,11 +67,11 @@ bool Device::busy() const {
 }
 
 void Device::emit(const char* member, const Value& arguments) {
-    m_adapter.daemon().bus().emit(m_path, table().name, member, arguments);
+    m_adapter.daemon().bus().emit(m_path, Interfaces::device, member, arguments);
 }
 
 void Device::changed(const char* property, const Value& value) {
-    emit("PropertyChanged", g_variant_new("(sv)", property, value.get()));
+    emit("PropertyChanged", propertyChange(property, value));
 }
 
 std::string Device::alias() const {
@@ -95,24 +82,18 @@ std::string Device::alias() const {
 
 void Device::getProperties(const CallPtr& call) {
     DictBuilder properties;
-    properties.add("Address", textValue(m_address));
-    properties.add("Name", textValue(m_name));
-    properties.add("Alias", textValue(alias()));
-    if (m_stored.deviceClass) {
-        properties.add("Class", g_variant_new_uint32(*m_stored.deviceClass));
-        if (const char* icon = iconOf(*m_stored.deviceClass))
-            properties.add("Icon", g_variant_new_string(icon));
-    }
-    if (m_stored.vendor)
-        properties.add("Vendor", g_variant_new_uint16(*m_stored.vendor));
-    if (m_stored.product)
-        properties.add("Product", g_variant_new_uint16(*m_stored.product));
-    if (m_stored.version)
-        properties.add("Version", g_variant_new_uint16(*m_stored.version));
-    properties.add("Paired", boolValue(m_stored.paired))
-        .add("Trusted", boolValue(m_stored.trusted))
-        .add("Blocked", boolValue(m_stored.blocked))
-        .add("Connected", boolValue(m_link.up()))
+    properties.add("Address", m_address)
+        .add("Name", m_name)
+        .add("Alias", alias())
+        .add("Class", m_stored.deviceClass)
+        .add("Icon", iconOf(m_stored.deviceClass))
+        .add("Vendor", m_stored.vendor)
+        .add("Product", m_stored.product)
+        .add("Version", m_stored.version)
+        .add("Paired", m_stored.paired)
+        .add("Trusted", m_stored.trusted)
+        .add("Blocked", m_stored.blocked)
+        .add("Connected", m_link.up())
         .add("UUIDs", listValue("s", m_stored.uuids))
         .add("Services", listValue("o", {}))
         .add("Adapter", pathValue(m_adapter.path()));
@@ -120,21 +101,17 @@ void Device::getProperties(const CallPtr& call) {
 }
 
 void Device::setProperty(const CallPtr& call) {
-    const std::string name = call->text(0);
-    const Value value = call->content(1);
-    if (name == "Alias" && value.is("s"))
-        return setAlias(call, value);
-    if (name == "Trusted" && value.is("b"))
-        return setTrusted(call, value);
-    if (name == "Blocked" && value.is("b"))
-        return setBlocked(call, value);
-    call->fail(Errors::invalidArguments());
+    const bool answered = setOneOf({{"Alias", "s", &Device::setAlias},
+                                    {"Trusted", "b", &Device::setTrusted},
+                                    {"Blocked", "b", &Device::setBlocked}},
+                                   *this, call);
+    if (!answered)
+        call->fail(Errors::invalidArguments);
 }
 
 void Device::setAlias(const CallPtr& call, const Value& value) {
-    const std::string alias = g_variant_get_string(value.get(), nullptr);
-    if (alias != m_stored.alias) {
-        m_stored.alias = alias;
+    if (value.text() != m_stored.alias) {
+        m_stored.alias = value.text();
         // Sent as it was given: "" too, though the name stands for it from now on.
         changed("Alias", value);
     }
@@ -142,19 +119,17 @@ void Device::setAlias(const CallPtr& call, const Value& value) {
 }
 
 void Device::setTrusted(const CallPtr& call, const Value& value) {
-    const bool trusted = g_variant_get_boolean(value.get()) != FALSE;
-    if (trusted != m_stored.trusted) {
-        m_stored.trusted = trusted;
+    if (value.flag() != m_stored.trusted) {
+        m_stored.trusted = value.flag();
         changed("Trusted", value);
     }
     call->reply();
 }
 
 void Device::setBlocked(const CallPtr& call, const Value& value) {
-    const bool blocked = g_variant_get_boolean(value.get()) != FALSE;
-    if (blocked != m_stored.blocked) {
-        m_stored.blocked = blocked;
-        if (blocked)
+    if (value.flag() != m_stored.blocked) {
+        m_stored.blocked = value.flag();
+        if (m_stored.blocked)
             m_link.drop();
         changed("Blocked", value);
     }
@@ -163,22 +138,22 @@ void Device::setBlocked(const CallPtr& call, const Value& value) {
 
 void Device::discoverServices(const CallPtr& call) {
     if (busy())
-        return call->fail(Errors::inProgress());
+        return call->fail(Errors::inProgress);
     m_search = ServiceSearch::begin(*this, call);
 }
 
 void Device::cancelDiscovery(const CallPtr& call) {
     if (!m_search)
-        return call->fail(Errors::doesNotExist());
+        return call->fail(Errors::doesNotExist);
     if (m_search->owner() != call->sender())
-        return call->fail(Errors::notAuthorized());
+        return call->fail(Errors::notAuthorized);
     m_search->cancel();
     call->reply();
 }
 
 void Device::disconnect(const CallPtr& call) {
     if (!m_link.up())
-        return call->fail(Errors::notConnected());
+        return call->fail(Errors::notConnected);
     m_link.requestDisconnect(call);
 }
 
@@ -218,9 +193,9 @@ void Device::searchEnded() {
 void Device::seen() {
     if (!m_classKnown) {
         m_classKnown = true;
-        changed("Class", g_variant_new_uint32(*m_stored.deviceClass));
-        if (const char* icon = iconOf(*m_stored.deviceClass))
-            changed("Icon", g_variant_new_string(icon));
+        changed("Class", *m_stored.deviceClass);
+        if (const auto icon = iconOf(m_stored.deviceClass))
+            changed("Icon", *icon);
     }
     learnName();
 }
@@ -232,9 +207,9 @@ void Device::learnName() {
     if (m_stored.name == m_name)
         return;
     m_name = m_stored.name;
-    changed("Name", textValue(m_name));
+    changed("Name", m_name);
     if (m_stored.alias.empty())
-        changed("Alias", textValue(alias()));
+        changed("Alias", alias());
 }
 
 void Device::learnServices() {
@@ -245,9 +220,9 @@ void Device::learnServices() {
         m_stored.vendor = peer->vendor;
         m_stored.product = peer->product.value_or(0);
         m_stored.version = peer->version.value_or(0);
-        changed("Vendor", g_variant_new_uint16(*m_stored.vendor));
-        changed("Product", g_variant_new_uint16(*m_stored.product));
-        changed("Version", g_variant_new_uint16(*m_stored.version));
+        changed("Vendor", *m_stored.vendor);
+        changed("Product", *m_stored.product);
+        changed("Version", *m_stored.version);
     }
     if (m_stored.uuids == peer->uuids)
         return;
@@ -260,7 +235,7 @@ void Device::setPaired(bool paired) {
     if (paired == m_stored.paired)
         return;
     m_stored.paired = paired;
-    changed("Paired", boolValue(paired));
+    changed("Paired", paired);
 }
 
 void Device::linkLost() {
@@ -274,7 +249,7 @@ void Device::linkLost() {
     else if (m_pairing)
         m_pairing->linkLost();
     else if (m_temporary)
-        m_adapter.removeDevice(alive);
+        m_adapter.forgetDevice(alive);
 }
 
 void Device::clientGone(const std::string& client) {

@@ -3,7 +3,7 @@
 
 #include "daemon/link.h"
 #include "serving.h"
-#include "serving/bus/interface.h"
+#include "serving/bluez4/interfaces.h"
 #include "world/world.h"
 
 #include <memory>
@@ -69,7 +69,8 @@ public:
     void changed(const char* property, const Value& value);
 
 private:
-    static const Interface& table();
+    template <class Served>
+    friend const Interface& Serving::deviceInterface();
 
     void getProperties(const CallPtr& call);
     void setProperty(const CallPtr& call);

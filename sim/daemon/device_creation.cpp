@@ -3,7 +3,7 @@
 #include "daemon/adapter.h"
 #include "daemon/daemon.h"
 #include "daemon/device.h"
-#include "serving/bus/dict_builder.h"
+#include "serving/bluez4/errors.h"
 
 namespace Bluetooth::Sim {
 
@@ -41,7 +41,7 @@ void DeviceCreation::fail(const char* text) {
 
 void DeviceCreation::removeDevice() {
     Adapter& adapter = m_device.adapter();
-    adapter.removeDevice(m_device.shared_from_this());
+    adapter.forgetDevice(m_device.shared_from_this());
     adapter.discovery().resume();
 }
 

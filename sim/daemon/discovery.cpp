@@ -3,9 +3,10 @@
 #include "daemon/adapter.h"
 #include "daemon/daemon.h"
 #include "daemon/device.h"
+#include "serving/bluez4/address.h"
+#include "serving/bluez4/errors.h"
+#include "serving/bluez4/icon.h"
 #include "serving/bus/dict_builder.h"
-#include "world/address.h"
-#include "world/icon.h"
 
 #include <algorithm>
 
@@ -69,7 +70,7 @@ void Discovery::end() {
 
 void Discovery::setActive(bool active) {
     m_active = active;
-    m_adapter.changed("Discovering", boolValue(active));
+    m_adapter.changed("Discovering", active);
 }
 
 void Discovery::startRound() {
@@ -139,7 +140,7 @@ void Discovery::endRound() {
             ++found;
             continue;
         }
-        m_adapter.emit("DeviceDisappeared", tuple(textValue(found->first)));
+        m_adapter.emit("DeviceDisappeared", tuple(found->first));
         found = m_found.erase(found);
     }
     setActive(true);
@@ -183,28 +184,24 @@ void Discovery::see(Peer& peer) {
 
 void Discovery::report(const Peer& peer, gint16 rssi) {
     const StoredDevice& stored = m_adapter.hardware().storage[peer.address];
-    DictBuilder values;
-    values.add("Address", textValue(peer.address));
-    values.add("Class", g_variant_new_uint32(peer.deviceClass));
-    if (const char* icon = iconOf(peer.deviceClass))
-        values.add("Icon", g_variant_new_string(icon));
-    values.add("RSSI", g_variant_new_int16(rssi));
-    if (!stored.name.empty())
-        values.add("Name", textValue(stored.name));
     std::string alias = stored.alias.empty() ? stored.name : stored.alias;
     if (alias.empty())
         alias = withSeparator(peer.address, '-');
-    values.add("Alias", textValue(alias));
-    values.add("LegacyPairing", boolValue(peer.legacy));
-    values.add("Paired", boolValue(stored.paired));
+    DictBuilder values;
+    values.add("Address", peer.address)
+        .add("Class", peer.deviceClass)
+        .add("Icon", iconOf(peer.deviceClass))
+        .add("RSSI", rssi);
+    if (!stored.name.empty())
+        values.add("Name", stored.name);
+    values.add("Alias", alias).add("LegacyPairing", peer.legacy).add("Paired", stored.paired);
     if (peer.lowEnergy)
-        values.add("Broadcaster", boolValue(peer.broadcaster));
+        values.add("Broadcaster", peer.broadcaster);
     else
-        values.add("Trusted", boolValue(stored.trusted));
+        values.add("Trusted", stored.trusted);
     if (!peer.uuids.empty())
         values.add("UUIDs", listValue("s", peer.uuids));
-    m_adapter.emit("DeviceFound",
-                   g_variant_new("(s@a{sv})", peer.address.c_str(), values.end().get()));
+    m_adapter.emit("DeviceFound", tuple(peer.address, values.end()));
 }
 
 } // namespace Bluetooth::Sim

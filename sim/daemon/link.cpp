@@ -4,7 +4,6 @@
 #include "daemon/audio_device.h"
 #include "daemon/daemon.h"
 #include "daemon/device.h"
-#include "serving/bus/dict_builder.h"
 
 namespace Bluetooth::Sim {
 
@@ -46,7 +45,7 @@ void Link::comeUp() {
     if (m_up)
         return;
     m_up = true;
-    m_device.changed("Connected", boolValue(true));
+    m_device.changed("Connected", true);
     m_device.learnName();
 }
 
@@ -73,7 +72,7 @@ void Link::drop() {
     m_disconnects.clear();
     for (const CallPtr& call : calls)
         call->reply();
-    m_device.changed("Connected", boolValue(false));
+    m_device.changed("Connected", false);
     m_device.linkLost();
 }
 

@@ -2,26 +2,14 @@
 
 #include "daemon/adapter.h"
 #include "daemon/daemon.h"
+#include "serving/bluez4/errors.h"
+#include "serving/bluez4/properties.h"
 #include "serving/bus/dict_builder.h"
 
 namespace Bluetooth::Sim {
 
-const Interface& Manager::table() {
-    static const Interface table = {
-        "org.bluez.Manager",
-        {{"GetProperties", {}, {{"properties", "a{sv}"}}, handle<&Manager::getProperties>},
-         {"DefaultAdapter", {}, {{"adapter", "o"}}, handle<&Manager::defaultAdapter>},
-         {"FindAdapter", {{"pattern", "s"}}, {{"adapter", "o"}}, handle<&Manager::findAdapter>},
-         {"ListAdapters", {}, {{"adapters", "ao"}}, handle<&Manager::listAdapters>}},
-        {{"PropertyChanged", {{"name", "s"}, {"value", "v"}}},
-         {"AdapterAdded", {{"adapter", "o"}}},
-         {"AdapterRemoved", {{"adapter", "o"}}},
-         {"DefaultAdapterChanged", {{"adapter", "o"}}}}};
-    return table;
-}
-
 Manager::Manager(Daemon& daemon) : m_daemon(daemon) {
-    m_daemon.objects().add("/", table(), this);
+    m_daemon.objects().add("/", managerInterface<Manager>(), this);
 }
 
 Manager::~Manager() {
@@ -34,7 +22,7 @@ void Manager::getProperties(const CallPtr& call) {
 
 void Manager::defaultAdapter(const CallPtr& call) {
     if (m_daemon.adapters().empty())
-        return call->fail(Errors::noSuchAdapter());
+        return call->fail(Errors::noSuchAdapter);
     call->reply(tuple(pathValue(m_daemon.adapters().front()->path())));
 }
 
@@ -44,7 +32,7 @@ void Manager::findAdapter(const CallPtr& call) {
         return call->reply(tuple(pathValue(m_daemon.basePath() + "/any")));
     const Adapter* adapter = m_daemon.find(pattern);
     if (!adapter)
-        return call->fail(Errors::noSuchAdapter());
+        return call->fail(Errors::noSuchAdapter);
     call->reply(tuple(pathValue(adapter->path())));
 }
 
@@ -60,11 +48,11 @@ Value Manager::adapterPaths() const {
 }
 
 void Manager::emit(const char* member, const Value& arguments) {
-    m_daemon.bus().emit("/", table().name, member, arguments);
+    m_daemon.bus().emit("/", Interfaces::manager, member, arguments);
 }
 
 void Manager::adaptersChanged() {
-    emit("PropertyChanged", g_variant_new("(sv)", "Adapters", adapterPaths().get()));
+    emit("PropertyChanged", propertyChange("Adapters", adapterPaths()));
 }
 
 void Manager::adapterAdded(const Adapter& adapter) {

@@ -2,7 +2,7 @@
 #define KESBLUETOOTH_SIM_DAEMON_MANAGER_H
 
 #include "serving.h"
-#include "serving/bus/interface.h"
+#include "serving/bluez4/interfaces.h"
 
 #include <string>
 
@@ -23,7 +23,8 @@ public:
     void adapterRemoved(const std::string& path, bool wasDefault);
 
 private:
-    static const Interface& table();
+    template <class Served>
+    friend const Interface& Serving::managerInterface();
 
     void getProperties(const CallPtr& call);
     void defaultAdapter(const CallPtr& call);

@@ -3,20 +3,13 @@
 #include "daemon/adapter.h"
 #include "daemon/daemon.h"
 #include "daemon/device.h"
-#include "serving/bus/dict_builder.h"
+#include "serving/bluez4/errors.h"
 
 namespace Bluetooth::Sim {
 
 namespace {
 
-BusError authentication(const char* name) {
-    const std::string words = std::string("Authentication ") + name;
-    return Errors::bluez((std::string("Authentication") + name).c_str(), words.c_str());
-}
-
-BusError pageTimeout() {
-    return Errors::bluez("ConnectionAttemptFailed", "Page Timeout");
-}
+constexpr BluezError pageTimeout = Errors::connectionAttemptFailed("Page Timeout");
 
 bool usablePin(const std::string& pin) {
     return !pin.empty() && pin.size() <= 16;
@@ -54,7 +47,7 @@ void Pairing::begin() {
         if (reached)
             negotiate();
         else
-            fail(pageTimeout());
+            fail(pageTimeout);
     });
 }
 
@@ -75,19 +68,17 @@ void Pairing::negotiate() {
     const Times& times = m_device.adapter().daemon().times();
     const auto peer = m_device.peer();
     if (!peer)
-        return fail(pageTimeout());
+        return fail(pageTimeout);
     if (!m_outgoing && !m_device.adapter().mode().pairable())
-        return fail(authentication("Rejected"));
+        return fail(Errors::authenticationRejected);
     switch (peer->pairingEnd) {
     case PairingEnd::Rejected:
-        return m_timer.start(duration(), [this] { fail(authentication("Rejected")); });
+        return m_timer.start(duration(), [this] { fail(Errors::authenticationRejected); });
     case PairingEnd::RepeatedAttempts:
-        return m_timer.start(
-            duration(), [this] { fail(Errors::bluez("RepeatedAttempts", "Repeated Attempts")); });
+        return m_timer.start(duration(), [this] { fail(Errors::repeatedAttempts); });
     case PairingEnd::LinkLost:
-        m_loss.start(times.scaled(times.linkLoss), [this] {
-            fail(Errors::bluez("ConnectionAttemptFailed", "Connection Timeout"));
-        });
+        m_loss.start(times.scaled(times.linkLoss),
+                     [this] { fail(Errors::connectionAttemptFailed("Connection Timeout")); });
         break;
     default:
         break;
@@ -105,7 +96,7 @@ void Pairing::ask(const char* member, const Value& arguments, const char* result
     const Times& times = m_device.adapter().daemon().times();
     if (m_agent->busy())
         return answered(false);
-    m_timeout.start(times.pairingTimeout, [this] { fail(authentication("Timeout")); });
+    m_timeout.start(times.pairingTimeout, [this] { fail(Errors::authenticationTimeout); });
     m_agent->ask(member, arguments, results, times.agentTimeout,
                  [this, onAnswer = std::move(onAnswer)](const CallResult& answer) {
                      m_timeout.stop();
@@ -122,7 +113,7 @@ void Pairing::askForPin() {
         if (!answer.failed)
             g_variant_get(answer.results.get(), "(&s)", &pin);
         if (!usablePin(pin))
-            return fail(authentication("Rejected"));
+            return fail(Errors::authenticationRejected);
         const auto peer = m_device.peer();
         answered(peer && !peer->pin.empty() && peer->pin == pin);
     });
@@ -131,7 +122,7 @@ void Pairing::askForPin() {
 void Pairing::displayPin() {
     const GlibPtr<char> pin(g_strdup_printf("%06u", passkey()));
     m_displaying = true;
-    ask("DisplayPinCode", g_variant_new("(os)", m_device.path().c_str(), pin.get()), "",
+    ask("DisplayPinCode", tuple(pathValue(m_device.path()), pin.get()), "",
         [this](const CallResult& answer) {
             m_displaying = !answer.failed;
             if (!answer.failed)
@@ -139,7 +130,7 @@ void Pairing::displayPin() {
             // An agent that cannot show a PIN is asked for one.
             if (answer.error.name == "org.freedesktop.DBus.Error.UnknownMethod")
                 return askForPin();
-            fail(authentication("Rejected"));
+            fail(Errors::authenticationRejected);
         });
 }
 
@@ -158,10 +149,10 @@ void Pairing::askByCapabilities() {
 }
 
 void Pairing::confirm(guint32 passkey) {
-    ask("RequestConfirmation", g_variant_new("(ou)", m_device.path().c_str(), passkey), "",
+    ask("RequestConfirmation", tuple(pathValue(m_device.path()), passkey), "",
         [this](const CallResult& answer) {
             if (answer.failed)
-                return fail(authentication("Failed"));
+                return fail(Errors::authenticationFailed);
             answered(true);
         });
 }
@@ -170,7 +161,7 @@ void Pairing::enter(guint32 passkey, bool typedOnBothSides) {
     ask("RequestPasskey", tuple(pathValue(m_device.path())), "u",
         [this, passkey, typedOnBothSides](const CallResult& answer) {
             if (answer.failed)
-                return fail(authentication("Failed"));
+                return fail(Errors::authenticationFailed);
             guint32 entered = 0;
             g_variant_get(answer.results.get(), "(u)", &entered);
             answered(entered == passkey || (typedOnBothSides && entered <= 999999));
@@ -180,8 +171,7 @@ void Pairing::enter(guint32 passkey, bool typedOnBothSides) {
 void Pairing::display(guint32 passkey, guint8 entered) {
     constexpr guint8 digits = 6;
     const Times& times = m_device.adapter().daemon().times();
-    m_agent->show("DisplayPasskey",
-                  g_variant_new("(ouy)", m_device.path().c_str(), passkey, entered));
+    m_agent->show("DisplayPasskey", tuple(pathValue(m_device.path()), passkey, entered));
     if (entered == digits)
         return answered(true);
     m_timer.start(times.scaled(times.keyPress),
@@ -196,12 +186,12 @@ void Pairing::answered(bool right) {
         return; // nothing more is heard until the loss is noticed
     case PairingEnd::NeverAnswers: {
         const Times& times = m_device.adapter().daemon().times();
-        return m_timer.start(times.pairingTimeout, [this] { fail(authentication("Timeout")); });
+        return m_timer.start(times.pairingTimeout, [this] { fail(Errors::authenticationTimeout); });
     }
     case PairingEnd::Refused:
-        return m_timer.start(duration(), [this] { fail(authentication("Failed")); });
+        return m_timer.start(duration(), [this] { fail(Errors::authenticationFailed); });
     case PairingEnd::CancelledByPeer:
-        return m_timer.start(duration(), [this] { fail(authentication("Canceled")); });
+        return m_timer.start(duration(), [this] { fail(Errors::authenticationCanceled); });
     default:
         break;
     }
@@ -209,7 +199,7 @@ void Pairing::answered(bool right) {
         if (right)
             finish();
         else
-            fail(authentication("Failed"));
+            fail(Errors::authenticationFailed);
     });
 }
 
@@ -274,7 +264,7 @@ void Pairing::fail(const BusError& error) {
 void Pairing::removeFailed(const std::shared_ptr<Device>& device, bool outgoing) {
     device->link().drop();
     if (device->temporary())
-        device->adapter().removeDevice(device);
+        device->adapter().forgetDevice(device);
     if (outgoing)
         device->adapter().discovery().resume();
 }
@@ -293,7 +283,7 @@ void Pairing::linkLost() {
     if (m_done && !m_cancelled)
         return succeed(); // paired already: only the services were still being read
     if (!m_cancelled)
-        return fail(pageTimeout());
+        return fail(pageTimeout);
     const auto device = m_device.shared_from_this();
     const auto agent = m_agent;
     const CallPtr creating = m_call;
@@ -305,11 +295,11 @@ void Pairing::linkLost() {
     if (agent && creating)
         agent->release();
     if (creating)
-        creating->fail(pageTimeout());
+        creating->fail(pageTimeout);
 }
 
 void Pairing::powerLost() {
-    fail(authentication("Canceled"));
+    fail(Errors::authenticationCanceled);
 }
 
 void Pairing::ownerGone() {

@@ -2,7 +2,7 @@
 #define KESBLUETOOTH_SIM_DAEMON_SERVICE_RECORDS_H
 
 #include "serving.h"
-#include "serving/bus/glib_ptr.h"
+#include "serving/bus/value.h"
 
 #include <string>
 #include <vector>

@@ -4,6 +4,7 @@
 #include "daemon/daemon.h"
 #include "daemon/device.h"
 #include "daemon/service_records.h"
+#include "serving/bluez4/errors.h"
 #include "world/settings.h"
 
 namespace Bluetooth::Sim {
@@ -12,7 +13,7 @@ std::shared_ptr<ServiceSearch> ServiceSearch::begin(Device& device, const CallPt
     const std::string pattern = call->text(0);
     const std::string uuid = pattern.empty() ? "" : uuidOfPattern(pattern);
     if (!pattern.empty() && uuid.empty()) {
-        call->fail(Errors::invalidArguments());
+        call->fail(Errors::invalidArguments);
         return nullptr;
     }
     if (!device.adapter().mode().powered()) {
@@ -28,7 +29,7 @@ void ServiceSearch::run() {
     m_hold = m_device.link().hold();
     const auto search = [this](bool reached) {
         if (!reached) {
-            m_call->fail(Errors::bluez("ConnectionAttemptFailed", "Host is down"));
+            m_call->fail(Errors::connectionAttemptFailed("Host is down"));
             return end();
         }
         const Times& times = m_device.adapter().daemon().times();
@@ -39,7 +40,7 @@ void ServiceSearch::run() {
 
 void ServiceSearch::finish() {
     m_device.learnServices();
-    m_call->reply(g_variant_new("(@a{us})", serviceRecords(m_device.stored().uuids, m_uuid).get()));
+    m_call->reply(tuple(serviceRecords(m_device.stored().uuids, m_uuid)));
     end();
 }
 
@@ -49,7 +50,7 @@ void ServiceSearch::cancel() {
 }
 
 void ServiceSearch::linkLost() {
-    m_call->fail(Errors::bluez("ConnectionAttemptFailed", "Host is down"));
+    m_call->fail(Errors::connectionAttemptFailed("Host is down"));
     end();
 }
 

@@ -1,7 +1,8 @@
 #ifndef KESBLUETOOTH_SIM_WORLD_PEER_H
 #define KESBLUETOOTH_SIM_WORLD_PEER_H
 
-#include "world/capability.h"
+#include "serving.h"
+#include "serving/bluez4/capability.h"
 
 #include <glib.h>
 

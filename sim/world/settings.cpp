@@ -1,8 +1,8 @@
 #include "world/settings.h"
 
 #include "serving.h"
+#include "serving/bluez4/address.h"
 #include "serving/bus/glib_ptr.h"
-#include "world/address.h"
 #include "world/behaviour.h"
 
 #include <algorithm>

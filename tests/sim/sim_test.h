@@ -1,7 +1,7 @@
 #ifndef KESBLUETOOTH_TESTS_SIM_SIM_TEST_H
 #define KESBLUETOOTH_TESTS_SIM_SIM_TEST_H
 
-#include "serving/bus/glib_ptr.h"
+#include "serving/bus/value.h"
 #include "support/simulation.h"
 
 #include <gtest/gtest.h>

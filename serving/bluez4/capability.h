@@ -1,17 +1,16 @@
-#ifndef KESBLUETOOTH_SIM_WORLD_CAPABILITY_H
-#define KESBLUETOOTH_SIM_WORLD_CAPABILITY_H
+#ifndef KESBLUETOOTH_SERVING_BLUEZ4_CAPABILITY_H
+#define KESBLUETOOTH_SERVING_BLUEZ4_CAPABILITY_H
 
 #include <optional>
 #include <string>
 
-namespace Bluetooth::Sim {
+namespace Bluetooth::Serving {
 
 /// What one side of a pairing can show and be told.
 enum class Capability { DisplayOnly, DisplayYesNo, KeyboardOnly, NoInputNoOutput };
 
-/// @param text  as RegisterAgent takes it: "" stands for DisplayYesNo; KeyboardDisplay is treated
-/// as
-///              DisplayYesNo, which is what the daemon tells a controller
+/// @param text  as RegisterAgent takes it; "" and KeyboardDisplay stand for DisplayYesNo, which is
+///              what the daemon tells a controller
 inline std::optional<Capability> parseCapability(const std::string& text) {
     if (text.empty() || text == "DisplayYesNo" || text == "KeyboardDisplay")
         return Capability::DisplayYesNo;
@@ -24,6 +23,6 @@ inline std::optional<Capability> parseCapability(const std::string& text) {
     return std::nullopt;
 }
 
-} // namespace Bluetooth::Sim
+} // namespace Bluetooth::Serving
 
 #endif

@@ -1,11 +1,11 @@
-#ifndef KESBLUETOOTH_SIM_WORLD_ADDRESS_H
-#define KESBLUETOOTH_SIM_WORLD_ADDRESS_H
+#ifndef KESBLUETOOTH_SERVING_BLUEZ4_ADDRESS_H
+#define KESBLUETOOTH_SERVING_BLUEZ4_ADDRESS_H
 
 #include <glib.h>
 
 #include <string>
 
-namespace Bluetooth::Sim {
+namespace Bluetooth::Serving {
 
 /// Whether the text is six two-digit hexadecimal groups with colons.
 inline bool isAddress(const std::string& text) {
@@ -30,6 +30,6 @@ inline std::string withSeparator(std::string address, char separator) {
     return address;
 }
 
-} // namespace Bluetooth::Sim
+} // namespace Bluetooth::Serving
 
 #endif
