@@ -14,7 +14,7 @@ namespace {
 
 constexpr int wrongUsage = 2;
 
-int run(const Options& options) {
+int run(const SimOptions& options) {
     if (options.version) {
         g_print("bluez4-sim " KESBLUETOOTH_VERSION ", simulating BlueZ 4.101\n");
         return 0;
@@ -34,7 +34,7 @@ int run(const Options& options) {
 } // namespace
 
 int main(int argc, char** argv) {
-    Options options;
+    SimOptions options;
     try {
         options = parseOptions(argc, argv);
     } catch (const std::exception& wrong) {

@@ -45,8 +45,8 @@ std::vector<std::string> texts(char** array) {
 
 } // namespace
 
-Options parseOptions(int argc, char** argv) {
-    Options options;
+SimOptions parseOptions(int argc, char** argv) {
+    SimOptions options;
     Raw raw;
     const GOptionEntry entries[] = {
         {"scenario", 's', 0, G_OPTION_ARG_FILENAME, &raw.scenario,

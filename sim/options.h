@@ -7,7 +7,7 @@
 namespace Bluetooth::Sim {
 
 /// What the command line asks for.
-struct Options {
+struct SimOptions {
     std::string scenario; ///< "" for the built-in one
     double timeScale = 1.0;
     int readyFd = -1;
@@ -23,7 +23,7 @@ struct Options {
 
 /// Prints the help and exits when it is asked for.
 /// @throw std::runtime_error  for wrong usage
-Options parseOptions(int argc, char** argv);
+SimOptions parseOptions(int argc, char** argv);
 
 } // namespace Bluetooth::Sim
 

@@ -1,8 +1,8 @@
 #include "daemon/adapter_mode.h"
 
-#include "daemon/adapter.h"
-#include "daemon/agent.h"
-#include "daemon/daemon.h"
+#include "daemon/bluetoothd.h"
+#include "daemon/client_agent.h"
+#include "daemon/served_adapter.h"
 #include "serving/bluez4/errors.h"
 
 #include <algorithm>
@@ -15,7 +15,7 @@ constexpr guint32 limitedDiscoverable = 0x2000;
 
 } // namespace
 
-AdapterMode::AdapterMode(Adapter& adapter) : m_adapter(adapter) {}
+AdapterMode::AdapterMode(ServedAdapter& adapter) : m_adapter(adapter) {}
 
 bool AdapterMode::pairable() const {
     return m_adapter.hardware().pairable;
@@ -166,7 +166,7 @@ void AdapterMode::classChangedFrom(bool wasLimited) {
 }
 
 void AdapterMode::requestSession(const CallPtr& call) {
-    Agent* agent = m_adapter.agent();
+    ClientAgent* agent = m_adapter.agent();
     if (!agent)
         return call->fail(Errors::agentNotAvailable);
     if (m_powered) {

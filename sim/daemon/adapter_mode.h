@@ -10,13 +10,13 @@
 
 namespace Bluetooth::Sim {
 
-class Adapter;
+class ServedAdapter;
 
 /// Power, discoverability and pairability of one adapter, with their time-outs, and the sessions
 /// by which clients ask for power.
 class AdapterMode {
 public:
-    explicit AdapterMode(Adapter& adapter);
+    explicit AdapterMode(ServedAdapter& adapter);
 
     bool powered() const { return m_powered; }
     bool discoverable() const { return m_discoverable; }
@@ -46,7 +46,7 @@ private:
     void classChangedFrom(bool wasLimited);
     void sessionEnded();
 
-    Adapter& m_adapter;
+    ServedAdapter& m_adapter;
     bool m_powered = false;
     bool m_discoverable = false;
     bool m_restoreDiscoverable = false; ///< what the next power-on brings back

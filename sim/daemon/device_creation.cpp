@@ -1,8 +1,8 @@
 #include "daemon/device_creation.h"
 
-#include "daemon/adapter.h"
-#include "daemon/daemon.h"
-#include "daemon/device.h"
+#include "daemon/bluetoothd.h"
+#include "daemon/served_adapter.h"
+#include "daemon/served_device.h"
 #include "serving/bluez4/errors.h"
 
 namespace Bluetooth::Sim {
@@ -24,7 +24,7 @@ void DeviceCreation::search() {
 }
 
 void DeviceCreation::succeed() {
-    Adapter& adapter = m_device.adapter();
+    ServedAdapter& adapter = m_device.adapter();
     m_device.learnServices();
     m_device.setTemporary(false);
     m_device.stored().known = true;
@@ -40,7 +40,7 @@ void DeviceCreation::fail(const char* text) {
 }
 
 void DeviceCreation::removeDevice() {
-    Adapter& adapter = m_device.adapter();
+    ServedAdapter& adapter = m_device.adapter();
     adapter.forgetDevice(m_device.shared_from_this());
     adapter.discovery().resume();
 }

@@ -10,12 +10,12 @@
 
 namespace Bluetooth::Sim {
 
-class Device;
+class ServedDevice;
 
 /// One CreateDevice call, from the new object to the reply.
 class DeviceCreation {
 public:
-    DeviceCreation(Device& device, const CallPtr& call) : m_device(device), m_call(call) {}
+    DeviceCreation(ServedDevice& device, const CallPtr& call) : m_device(device), m_call(call) {}
 
     std::string owner() const { return m_call->sender(); }
     void begin();
@@ -34,7 +34,7 @@ private:
     void fail(const char* text);
     void removeDevice();
 
-    Device& m_device;
+    ServedDevice& m_device;
     CallPtr m_call;
     Link::Hold m_hold;
     OneShotTimer m_timer;

@@ -1,9 +1,9 @@
 #include "daemon/link.h"
 
-#include "daemon/adapter.h"
-#include "daemon/audio_device.h"
-#include "daemon/daemon.h"
-#include "daemon/device.h"
+#include "daemon/bluetoothd.h"
+#include "daemon/device_audio.h"
+#include "daemon/served_adapter.h"
+#include "daemon/served_device.h"
 
 namespace Bluetooth::Sim {
 

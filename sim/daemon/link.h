@@ -11,7 +11,7 @@
 
 namespace Bluetooth::Sim {
 
-class Device;
+class ServedDevice;
 
 /// The connection to one device: reached, used, dropped.
 class Link {
@@ -39,7 +39,7 @@ public:
         Link* m_link = nullptr;
     };
 
-    explicit Link(Device& device) : m_device(device) {}
+    explicit Link(ServedDevice& device) : m_device(device) {}
 
     bool up() const { return m_up; }
 
@@ -62,7 +62,7 @@ private:
     void comeUp();
     void released();
 
-    Device& m_device;
+    ServedDevice& m_device;
     bool m_up = false;
     bool m_heldByPeer = false;
     unsigned m_holds = 0;

@@ -1,15 +1,15 @@
 #include "daemon/service_search.h"
 
-#include "daemon/adapter.h"
-#include "daemon/daemon.h"
-#include "daemon/device.h"
+#include "daemon/bluetoothd.h"
+#include "daemon/served_adapter.h"
+#include "daemon/served_device.h"
 #include "daemon/service_records.h"
 #include "serving/bluez4/errors.h"
 #include "world/settings.h"
 
 namespace Bluetooth::Sim {
 
-std::shared_ptr<ServiceSearch> ServiceSearch::begin(Device& device, const CallPtr& call) {
+std::shared_ptr<ServiceSearch> ServiceSearch::begin(ServedDevice& device, const CallPtr& call) {
     const std::string pattern = call->text(0);
     const std::string uuid = pattern.empty() ? "" : uuidOfPattern(pattern);
     if (!pattern.empty() && uuid.empty()) {

@@ -11,15 +11,15 @@
 
 namespace Bluetooth::Sim {
 
-class Device;
+class ServedDevice;
 
 /// One DiscoverServices call.
 class ServiceSearch {
 public:
     /// @return the search, or null when the call was answered at once
-    static std::shared_ptr<ServiceSearch> begin(Device& device, const CallPtr& call);
+    static std::shared_ptr<ServiceSearch> begin(ServedDevice& device, const CallPtr& call);
 
-    ServiceSearch(Device& device, const CallPtr& call, std::string uuid)
+    ServiceSearch(ServedDevice& device, const CallPtr& call, std::string uuid)
         : m_device(device), m_call(call), m_uuid(std::move(uuid)) {}
 
     std::string owner() const { return m_call->sender(); }
@@ -35,7 +35,7 @@ private:
     void finish();
     void end();
 
-    Device& m_device;
+    ServedDevice& m_device;
     CallPtr m_call;
     std::string m_uuid; ///< what is looked for; "" for everything
     Link::Hold m_hold;

@@ -10,7 +10,7 @@ namespace Bluetooth::Sim {
 namespace {
 
 /// The service files that were installed with this program, after those that were named.
-std::vector<std::string> serviceFolders(const Options& options) {
+std::vector<std::string> serviceFolders(const SimOptions& options) {
     std::vector<std::string> folders = options.sessionServices;
     const GlibPtr<char> bin(g_path_get_dirname(ownProgram().c_str()));
     const GlibPtr<char> prefix(g_path_get_dirname(bin.get()));
@@ -21,7 +21,7 @@ std::vector<std::string> serviceFolders(const Options& options) {
 }
 
 /// The command line by which this program serves in a process of its own, which a test may kill.
-std::vector<std::string> daemonArguments(const Options& options) {
+std::vector<std::string> daemonArguments(const SimOptions& options) {
     char scale[G_ASCII_DTOSTR_BUF_SIZE];
     g_ascii_dtostr(scale, sizeof scale, options.timeScale);
     std::vector<std::string> arguments = {ownProgram(),
@@ -36,7 +36,7 @@ std::vector<std::string> daemonArguments(const Options& options) {
 
 } // namespace
 
-int runCommand(const Options& options) {
+int runCommand(const SimOptions& options) {
     if (!options.noDaemon && !options.scenario.empty())
         loadScenario(options.scenario); // a wrong one is told before anything is started
     Session session("bluez4-sim");

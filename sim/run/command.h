@@ -8,7 +8,7 @@ namespace Bluetooth::Sim {
 /// Runs the command on private buses with the daemon.
 /// @return its exit status, as a shell gives it
 /// @throw std::runtime_error  when the buses or the daemon cannot be started
-int runCommand(const Options& options);
+int runCommand(const SimOptions& options);
 
 } // namespace Bluetooth::Sim
 

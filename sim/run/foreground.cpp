@@ -1,6 +1,6 @@
 #include "run/foreground.h"
 
-#include "control/control.h"
+#include "control/control_interface.h"
 #include "serving/session/main_loop.h"
 #include "serving/session/process.h"
 #include "world/scenario.h"
@@ -12,7 +12,7 @@ namespace Bluetooth::Sim {
 
 namespace {
 
-void tellWhoAsked(const Options& options) {
+void tellWhoAsked(const SimOptions& options) {
     if (options.readyFd >= 0) {
         tellReady(options.readyFd, "bluez4-sim");
         close(options.readyFd);
@@ -23,14 +23,14 @@ void tellWhoAsked(const Options& options) {
 
 } // namespace
 
-int serveInForeground(const Options& options) {
+int serveInForeground(const SimOptions& options) {
     World world = options.scenario.empty() ? loadDefaultScenario() : loadScenario(options.scenario);
     world.times.scale = options.timeScale;
 
     MainLoop loop;
     bool busLost = false;
     try {
-        Control control(world, systemBusAddress(), options.verbose);
+        ControlInterface control(world, systemBusAddress(), options.verbose);
         control.watchQuit([&] { loop.quit(); });
         control.daemon().watchBus([&] {
             busLost = true;

@@ -8,7 +8,7 @@ namespace Bluetooth::Sim {
 /// Serves org.bluez on the system bus until SIGTERM, SIGINT or Quit.
 /// @return the exit status
 /// @throw std::runtime_error  when it cannot start, or loses the bus
-int serveInForeground(const Options& options);
+int serveInForeground(const SimOptions& options);
 
 } // namespace Bluetooth::Sim
 

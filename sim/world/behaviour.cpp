@@ -7,12 +7,12 @@ namespace Bluetooth::Sim {
 namespace {
 
 template <Capability Value>
-void capability(Peer& peer) {
+void capability(PeerDevice& peer) {
     peer.capability = Value;
 }
 
 template <PairingEnd Value>
-void ends(Peer& peer) {
+void ends(PeerDevice& peer) {
     peer.pairingEnd = Value;
 }
 
@@ -29,14 +29,14 @@ const std::vector<Behaviour>& behaviours() {
         {"DisplayPasskey", "a passkey that our side shows is typed on it (KeyboardOnly)",
          capability<Capability::KeyboardOnly>},
         {"LegacyPin", "asks for a PIN and compares it with PIN",
-         [](Peer& peer) { peer.legacy = true; }},
+         [](PeerDevice& peer) { peer.legacy = true; }},
         {"WrongPin", "asks for a PIN and takes none",
-         [](Peer& peer) {
+         [](PeerDevice& peer) {
              peer.legacy = true;
              peer.pin.clear();
          }},
         {"DisplayPin", "a keyboard without passkeys: our side shows a PIN that is typed on it",
-         [](Peer& peer) {
+         [](PeerDevice& peer) {
              peer.legacy = true;
              peer.displaysPin = true;
          }},
@@ -47,14 +47,14 @@ const std::vector<Behaviour>& behaviours() {
         {"RepeatedAttempts", "wants fewer attempts", ends<PairingEnd::RepeatedAttempts>},
         {"VanishesWhilePairing", "its link is lost while the agent is asked",
          ends<PairingEnd::LinkLost>},
-        {"Slow", "takes 28 seconds to pair", [](Peer& peer) { peer.pairingTime = 28000; }},
+        {"Slow", "takes 28 seconds to pair", [](PeerDevice& peer) { peer.pairingTime = 28000; }},
         {"Unconnectable", "is found, but cannot be reached",
-         [](Peer& peer) { peer.connectable = false; }},
+         [](PeerDevice& peer) { peer.connectable = false; }},
         {"Vanishing", "goes out of range 5 seconds after a discovery began",
-         [](Peer& peer) { peer.visibleFor = 5000; }},
-        {"Known", "was created before", [](Peer& peer) { peer.known = true; }},
+         [](PeerDevice& peer) { peer.visibleFor = 5000; }},
+        {"Known", "was created before", [](PeerDevice& peer) { peer.known = true; }},
         {"AlreadyPaired", "was paired before",
-         [](Peer& peer) {
+         [](PeerDevice& peer) {
              peer.known = true;
              peer.paired = true;
          }},

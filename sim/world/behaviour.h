@@ -1,7 +1,7 @@
 #ifndef KESBLUETOOTH_SIM_WORLD_BEHAVIOUR_H
 #define KESBLUETOOTH_SIM_WORLD_BEHAVIOUR_H
 
-#include "world/peer.h"
+#include "world/peer_device.h"
 
 #include <string>
 #include <vector>
@@ -12,7 +12,7 @@ namespace Bluetooth::Sim {
 struct Behaviour {
     const char* name;
     const char* description;
-    void (*apply)(Peer& peer);
+    void (*apply)(PeerDevice& peer);
 };
 
 const std::vector<Behaviour>& behaviours();

@@ -88,7 +88,7 @@ private:
     void readDevice(const std::string& group, const std::string& address) {
         if (!isAddress(address))
             fail(group, "", "a device is named by its address");
-        auto peer = std::make_shared<Peer>();
+        auto peer = std::make_shared<PeerDevice>();
         peer->address = address;
         apply(*peer, group);
         m_world.peers.push_back(peer);

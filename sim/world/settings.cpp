@@ -84,45 +84,47 @@ void apply(T& target, const Key<T>* keys, std::size_t count, const std::string& 
     }
 }
 
-const Key<Peer> peerKeys[] = {
-    {"Name", [](Peer& p, const std::string& v) { p.name = v; }},
-    {"Adapter", [](Peer& p, const std::string& v) { p.adapter = v; }},
-    {"Class", [](Peer& p, const std::string& v) { p.deviceClass = u32(v); }},
-    {"RSSI", [](Peer& p, const std::string& v) { p.rssi = signedNumber(v); }},
+const Key<PeerDevice> peerKeys[] = {
+    {"Name", [](PeerDevice& p, const std::string& v) { p.name = v; }},
+    {"Adapter", [](PeerDevice& p, const std::string& v) { p.adapter = v; }},
+    {"Class", [](PeerDevice& p, const std::string& v) { p.deviceClass = u32(v); }},
+    {"RSSI", [](PeerDevice& p, const std::string& v) { p.rssi = signedNumber(v); }},
     {"RSSIVariation",
-     [](Peer& p, const std::string& v) { p.rssiVariation = static_cast<guint>(number(v, 100)); }},
-    {"UUIDs", [](Peer& p, const std::string& v) { p.uuids = uuidList(v); }},
-    {"Vendor", [](Peer& p, const std::string& v) { p.vendor = u16(v); }},
-    {"Product", [](Peer& p, const std::string& v) { p.product = u16(v); }},
-    {"Version", [](Peer& p, const std::string& v) { p.version = u16(v); }},
-    {"Present", [](Peer& p, const std::string& v) { p.present = flag(v); }},
-    {"Connectable", [](Peer& p, const std::string& v) { p.connectable = flag(v); }},
-    {"NameInInquiry", [](Peer& p, const std::string& v) { p.nameInInquiry = flag(v); }},
-    {"LowEnergy", [](Peer& p, const std::string& v) { p.lowEnergy = flag(v); }},
-    {"Broadcaster", [](Peer& p, const std::string& v) { p.broadcaster = flag(v); }},
-    {"ConnectsBack", [](Peer& p, const std::string& v) { p.connectsBack = flag(v); }},
-    {"VisibleFor", [](Peer& p, const std::string& v) { p.visibleFor = u32(v); }},
-    {"LegacyPairing", [](Peer& p, const std::string& v) { p.legacy = flag(v); }},
+     [](PeerDevice& p, const std::string& v) {
+         p.rssiVariation = static_cast<guint>(number(v, 100));
+     }},
+    {"UUIDs", [](PeerDevice& p, const std::string& v) { p.uuids = uuidList(v); }},
+    {"Vendor", [](PeerDevice& p, const std::string& v) { p.vendor = u16(v); }},
+    {"Product", [](PeerDevice& p, const std::string& v) { p.product = u16(v); }},
+    {"Version", [](PeerDevice& p, const std::string& v) { p.version = u16(v); }},
+    {"Present", [](PeerDevice& p, const std::string& v) { p.present = flag(v); }},
+    {"Connectable", [](PeerDevice& p, const std::string& v) { p.connectable = flag(v); }},
+    {"NameInInquiry", [](PeerDevice& p, const std::string& v) { p.nameInInquiry = flag(v); }},
+    {"LowEnergy", [](PeerDevice& p, const std::string& v) { p.lowEnergy = flag(v); }},
+    {"Broadcaster", [](PeerDevice& p, const std::string& v) { p.broadcaster = flag(v); }},
+    {"ConnectsBack", [](PeerDevice& p, const std::string& v) { p.connectsBack = flag(v); }},
+    {"VisibleFor", [](PeerDevice& p, const std::string& v) { p.visibleFor = u32(v); }},
+    {"LegacyPairing", [](PeerDevice& p, const std::string& v) { p.legacy = flag(v); }},
     {"Capability",
-     [](Peer& p, const std::string& v) {
+     [](PeerDevice& p, const std::string& v) {
          const auto capability = parseCapability(v);
          if (!capability)
              throw std::invalid_argument("\"" + v + "\" is not a capability");
          p.capability = *capability;
      }},
-    {"PIN", [](Peer& p, const std::string& v) { p.pin = v; }},
-    {"Passkey",
-     [](Peer& p, const std::string& v) { p.passkey = static_cast<guint32>(number(v, 999999)); }},
-    {"PairingTime", [](Peer& p, const std::string& v) { p.pairingTime = u32(v); }},
-    {"Known", [](Peer& p, const std::string& v) { p.known = flag(v); }},
+    {"PIN", [](PeerDevice& p, const std::string& v) { p.pin = v; }},
+    {"Passkey", [](PeerDevice& p,
+                   const std::string& v) { p.passkey = static_cast<guint32>(number(v, 999999)); }},
+    {"PairingTime", [](PeerDevice& p, const std::string& v) { p.pairingTime = u32(v); }},
+    {"Known", [](PeerDevice& p, const std::string& v) { p.known = flag(v); }},
     {"Paired",
-     [](Peer& p, const std::string& v) {
+     [](PeerDevice& p, const std::string& v) {
          p.paired = flag(v);
          p.known = p.known || p.paired;
      }},
-    {"Trusted", [](Peer& p, const std::string& v) { p.trusted = flag(v); }},
-    {"Blocked", [](Peer& p, const std::string& v) { p.blocked = flag(v); }},
-    {"Alias", [](Peer& p, const std::string& v) { p.alias = v; }},
+    {"Trusted", [](PeerDevice& p, const std::string& v) { p.trusted = flag(v); }},
+    {"Blocked", [](PeerDevice& p, const std::string& v) { p.blocked = flag(v); }},
+    {"Alias", [](PeerDevice& p, const std::string& v) { p.alias = v; }},
 };
 
 const Key<AdapterHardware> adapterKeys[] = {
@@ -146,7 +148,7 @@ const Key<AdapterHardware> adapterKeys[] = {
 
 } // namespace
 
-void applySettings(Peer& peer, const Settings& settings) {
+void applySettings(PeerDevice& peer, const Settings& settings) {
     for (const auto& [key, value] : settings) {
         if (key != "Behaviour")
             continue;

@@ -10,7 +10,7 @@ std::shared_ptr<AdapterHardware> World::adapter(const std::string& id) const {
     return found == adapters.end() ? nullptr : *found;
 }
 
-std::shared_ptr<Peer> World::peer(const std::string& address) const {
+std::shared_ptr<PeerDevice> World::peer(const std::string& address) const {
     const auto found = std::find_if(peers.begin(), peers.end(),
                                     [&](const auto& peer) { return peer->address == address; });
     return found == peers.end() ? nullptr : *found;
@@ -23,7 +23,7 @@ unsigned World::freeIndex() const {
     return index;
 }
 
-void World::store(AdapterHardware& adapter, const Peer& peer) {
+void World::store(AdapterHardware& adapter, const PeerDevice& peer) {
     if (!peer.known || (!peer.adapter.empty() && peer.adapter != adapter.id()))
         return;
     StoredDevice& stored = adapter.storage[peer.address];

@@ -1,7 +1,7 @@
 #ifndef KESBLUETOOTH_SIM_WORLD_WORLD_H
 #define KESBLUETOOTH_SIM_WORLD_WORLD_H
 
-#include "world/peer.h"
+#include "world/peer_device.h"
 #include "world/times.h"
 
 #include <map>
@@ -49,14 +49,14 @@ struct AdapterHardware {
 struct World {
     Times times;
     std::vector<std::shared_ptr<AdapterHardware>> adapters;
-    std::vector<std::shared_ptr<Peer>> peers;
+    std::vector<std::shared_ptr<PeerDevice>> peers;
 
     std::shared_ptr<AdapterHardware> adapter(const std::string& id) const;
-    std::shared_ptr<Peer> peer(const std::string& address) const;
+    std::shared_ptr<PeerDevice> peer(const std::string& address) const;
     /// The lowest index that no adapter has.
     unsigned freeIndex() const;
     /// Stores what an adapter shall know of a device from the start.
-    static void store(AdapterHardware& adapter, const Peer& peer);
+    static void store(AdapterHardware& adapter, const PeerDevice& peer);
 };
 
 } // namespace Bluetooth::Sim

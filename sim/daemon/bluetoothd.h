@@ -1,5 +1,5 @@
-#ifndef KESBLUETOOTH_SIM_DAEMON_DAEMON_H
-#define KESBLUETOOTH_SIM_DAEMON_DAEMON_H
+#ifndef KESBLUETOOTH_SIM_DAEMON_BLUETOOTHD_H
+#define KESBLUETOOTH_SIM_DAEMON_BLUETOOTHD_H
 
 #include "serving.h"
 #include "serving/bus/bus_connection.h"
@@ -13,19 +13,20 @@
 
 namespace Bluetooth::Sim {
 
-class Adapter;
-class Manager;
+class ServedAdapter;
+class ServedManager;
 
 /// The simulated bluetoothd: from its appearance as org.bluez to its end.
 ///
 /// It may start and stop many times; the world, with all that is stored, stays.
-class Daemon {
+class Bluetoothd {
 public:
     /// @param beforeCall  sees each call first, and may answer it, or keep it for later: then true
-    Daemon(World& world, std::string busAddress, std::function<bool(const CallPtr&)> beforeCall);
-    Daemon(const Daemon&) = delete;
-    Daemon& operator=(const Daemon&) = delete;
-    ~Daemon();
+    Bluetoothd(World& world, std::string busAddress,
+               std::function<bool(const CallPtr&)> beforeCall);
+    Bluetoothd(const Bluetoothd&) = delete;
+    Bluetoothd& operator=(const Bluetoothd&) = delete;
+    ~Bluetoothd();
 
     /// Joins the bus and plugs the world's adapters in.
     /// @param pid  the process id that is in all paths
@@ -42,16 +43,16 @@ public:
 
     void dispatch(const CallPtr& call) { m_objects.dispatch(call); }
     void plugIn(const std::shared_ptr<AdapterHardware>& hardware);
-    void pullOut(Adapter& adapter);
+    void pullOut(ServedAdapter& adapter);
 
     World& world() { return m_world; }
     const Times& times() const { return m_world.times; }
     BusConnection& bus() { return *m_bus; }
     ObjectTree& objects() { return m_objects; }
-    Manager& manager() { return *m_manager; }
-    const std::vector<std::unique_ptr<Adapter>>& adapters() const { return m_adapters; }
+    ServedManager& manager() { return *m_manager; }
+    const std::vector<std::unique_ptr<ServedAdapter>>& adapters() const { return m_adapters; }
     /// The adapter with that id or address, or null.
-    Adapter* find(const std::string& idOrAddress) const;
+    ServedAdapter* find(const std::string& idOrAddress) const;
     std::string basePath() const { return "/org/bluez/" + std::to_string(m_pid); }
 
     /// Keeps an object that has ended until the code that runs in it has returned.
@@ -69,8 +70,8 @@ private:
     std::vector<std::shared_ptr<void>> m_ended;
     ObjectTree m_objects;
     std::unique_ptr<BusConnection> m_bus;
-    std::unique_ptr<Manager> m_manager;
-    std::vector<std::unique_ptr<Adapter>> m_adapters;
+    std::unique_ptr<ServedManager> m_manager;
+    std::vector<std::unique_ptr<ServedAdapter>> m_adapters;
 };
 
 } // namespace Bluetooth::Sim

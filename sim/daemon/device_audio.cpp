@@ -1,9 +1,9 @@
-#include "daemon/audio_device.h"
+#include "daemon/device_audio.h"
 
-#include "daemon/adapter.h"
-#include "daemon/agent.h"
-#include "daemon/daemon.h"
-#include "daemon/device.h"
+#include "daemon/bluetoothd.h"
+#include "daemon/client_agent.h"
+#include "daemon/served_adapter.h"
+#include "daemon/served_device.h"
 #include "serving/bluez4/errors.h"
 #include "serving/bluez4/properties.h"
 #include "serving/bus/dict_builder.h"
@@ -27,7 +27,7 @@ constexpr const char* handsFreeGateway = "111f";
 
 } // namespace
 
-const char* AudioDevice::text(State state) {
+const char* DeviceAudio::text(State state) {
     switch (state) {
     case State::Connecting:
         return "connecting";
@@ -40,12 +40,12 @@ const char* AudioDevice::text(State state) {
     }
 }
 
-bool AudioDevice::has(const char* uuid) const {
+bool DeviceAudio::has(const char* uuid) const {
     const auto& uuids = m_device.stored().uuids;
     return std::find(uuids.begin(), uuids.end(), fullUuid(uuid)) != uuids.end();
 }
 
-void AudioDevice::serve() {
+void DeviceAudio::serve() {
     ObjectTree& objects = m_device.adapter().daemon().objects();
     const bool sink = has(audioSink);
     const bool control = has(remoteTarget) || has(remoteControl);
@@ -56,27 +56,27 @@ void AudioDevice::serve() {
             objects.add(m_device.path(), table, this);
         served = served || wanted;
     };
-    add(audio, m_audioServed, audioInterface<AudioDevice>());
-    add(sink, m_sinkServed, audioSinkInterface<AudioDevice>());
-    add(control, m_controlServed, remoteControlInterface<AudioDevice>());
+    add(audio, m_audioServed, audioInterface<DeviceAudio>());
+    add(sink, m_sinkServed, audioSinkInterface<DeviceAudio>());
+    add(control, m_controlServed, remoteControlInterface<DeviceAudio>());
 }
 
-void AudioDevice::emit(const char* interface, const char* member, const Value& arguments) {
+void DeviceAudio::emit(const char* interface, const char* member, const Value& arguments) {
     m_device.adapter().daemon().bus().emit(m_device.path(), interface, member, arguments);
 }
 
-void AudioDevice::changed(const char* interface, const char* property, const Value& value) {
+void DeviceAudio::changed(const char* interface, const char* property, const Value& value) {
     emit(interface, "PropertyChanged", propertyChange(property, value));
 }
 
-void AudioDevice::setSink(State state) {
+void DeviceAudio::setSink(State state) {
     if (!m_sinkServed || m_sink == state)
         return;
     m_sink = state;
     changed(Interfaces::audioSink, "State", text(state));
 }
 
-void AudioDevice::setAudio(State state) {
+void DeviceAudio::setAudio(State state) {
     if (m_audio == state)
         return;
     m_audio = state;
@@ -91,7 +91,7 @@ void AudioDevice::setAudio(State state) {
     changed(Interfaces::audio, "State", text(state));
 }
 
-void AudioDevice::setControl(bool connected) {
+void DeviceAudio::setControl(bool connected) {
     m_controlSetUp.stop();
     if (!m_controlServed || m_control == connected)
         return;
@@ -100,7 +100,7 @@ void AudioDevice::setControl(bool connected) {
     changed(Interfaces::control, "Connected", connected);
 }
 
-void AudioDevice::connectAudio(const CallPtr& call) {
+void DeviceAudio::connectAudio(const CallPtr& call) {
     if (m_audio == State::Connecting)
         return call->fail(Errors::inProgress);
     if (m_audio == State::Connected)
@@ -111,7 +111,7 @@ void AudioDevice::connectAudio(const CallPtr& call) {
     beginConnecting();
 }
 
-void AudioDevice::connectSink(const CallPtr& call) {
+void DeviceAudio::connectSink(const CallPtr& call) {
     if (m_sink == State::Connecting)
         return call->fail(Errors::inProgress);
     if (m_sink != State::Disconnected)
@@ -120,7 +120,7 @@ void AudioDevice::connectSink(const CallPtr& call) {
     beginConnecting();
 }
 
-void AudioDevice::beginConnecting() {
+void DeviceAudio::beginConnecting() {
     setSink(State::Connecting);
     setAudio(State::Connecting);
     m_hold = m_device.link().hold();
@@ -134,7 +134,7 @@ void AudioDevice::beginConnecting() {
     });
 }
 
-void AudioDevice::linkReached() {
+void DeviceAudio::linkReached() {
     const auto peer = m_device.peer();
     if (peer && peer->connectsBack)
         authorize(fullUuid(advancedAudio));
@@ -142,7 +142,7 @@ void AudioDevice::linkReached() {
         setUpStream();
 }
 
-void AudioDevice::serviceConnects(const std::string& uuid) {
+void DeviceAudio::serviceConnects(const std::string& uuid) {
     if (m_sink != State::Disconnected || m_audio != State::Disconnected)
         return;
     if (!m_device.link().up())
@@ -153,8 +153,8 @@ void AudioDevice::serviceConnects(const std::string& uuid) {
     authorize(uuid);
 }
 
-void AudioDevice::authorize(const std::string& uuid) {
-    Agent* agent = m_device.adapter().agent();
+void DeviceAudio::authorize(const std::string& uuid) {
+    ClientAgent* agent = m_device.adapter().agent();
     // With nobody to ask, a channel that we opened as well is taken as wanted.
     const bool wanted = m_sinkCall || m_audioCall;
     if (m_device.stored().trusted || (!agent && wanted))
@@ -176,12 +176,12 @@ void AudioDevice::authorize(const std::string& uuid) {
                });
 }
 
-void AudioDevice::setUpStream() {
+void DeviceAudio::setUpStream() {
     const Times& times = m_device.adapter().daemon().times();
     m_setUp.start(times.scaled(times.audioConnect), [this] { connected(); });
 }
 
-void AudioDevice::connected() {
+void DeviceAudio::connected() {
     const Times& times = m_device.adapter().daemon().times();
     if (m_sinkServed) {
         emit(Interfaces::audioSink, "Connected");
@@ -196,7 +196,7 @@ void AudioDevice::connected() {
         m_controlSetUp.start(times.scaled(times.controlConnect), [this] { setControl(true); });
 }
 
-void AudioDevice::failed() {
+void DeviceAudio::failed() {
     m_setUp.stop();
     if (m_sinkCall)
         m_sinkCall->fail(Errors::failed("Stream setup failed"));
@@ -206,7 +206,7 @@ void AudioDevice::failed() {
     m_hold.release();
 }
 
-void AudioDevice::disconnected() {
+void DeviceAudio::disconnected() {
     setPlaying(false);
     setControl(false);
     if (m_sink == State::Connected) {
@@ -216,14 +216,14 @@ void AudioDevice::disconnected() {
     failed();
 }
 
-void AudioDevice::disconnectAudio(const CallPtr& call) {
+void DeviceAudio::disconnectAudio(const CallPtr& call) {
     if (m_audio == State::Disconnected)
         return call->fail(Errors::notConnected);
     disconnected();
     call->reply();
 }
 
-void AudioDevice::disconnectSink(const CallPtr& call) {
+void DeviceAudio::disconnectSink(const CallPtr& call) {
     if (m_sink == State::Disconnected)
         return call->fail(Errors::notConnected);
     if (m_sink == State::Connecting)
@@ -232,7 +232,7 @@ void AudioDevice::disconnectSink(const CallPtr& call) {
     call->reply();
 }
 
-void AudioDevice::setPlaying(bool playing) {
+void DeviceAudio::setPlaying(bool playing) {
     if (m_sink != (playing ? State::Connected : State::Playing))
         return;
     emit(Interfaces::audioSink, playing ? "Playing" : "Stopped");
@@ -240,12 +240,12 @@ void AudioDevice::setPlaying(bool playing) {
     setSink(playing ? State::Playing : State::Connected);
 }
 
-void AudioDevice::linkLost() {
+void DeviceAudio::linkLost() {
     if (m_audio != State::Disconnected || m_sink != State::Disconnected)
         disconnected();
 }
 
-void AudioDevice::abandon() {
+void DeviceAudio::abandon() {
     m_setUp.stop();
     m_controlSetUp.stop();
     m_audioCall.reset();
@@ -253,15 +253,15 @@ void AudioDevice::abandon() {
     m_hold.release();
 }
 
-void AudioDevice::audioProperties(const CallPtr& call) {
+void DeviceAudio::audioProperties(const CallPtr& call) {
     call->reply(tuple(DictBuilder().add("State", text(m_audio)).end()));
 }
 
-void AudioDevice::sinkIsConnected(const CallPtr& call) {
+void DeviceAudio::sinkIsConnected(const CallPtr& call) {
     call->reply(tuple(m_sink == State::Connected || m_sink == State::Playing));
 }
 
-void AudioDevice::sinkProperties(const CallPtr& call) {
+void DeviceAudio::sinkProperties(const CallPtr& call) {
     const bool connected = m_sink == State::Connected || m_sink == State::Playing;
     call->reply(tuple(DictBuilder()
                           .add("State", text(m_sink))
@@ -270,15 +270,15 @@ void AudioDevice::sinkProperties(const CallPtr& call) {
                           .end()));
 }
 
-void AudioDevice::controlIsConnected(const CallPtr& call) {
+void DeviceAudio::controlIsConnected(const CallPtr& call) {
     call->reply(tuple(m_control));
 }
 
-void AudioDevice::controlProperties(const CallPtr& call) {
+void DeviceAudio::controlProperties(const CallPtr& call) {
     call->reply(tuple(DictBuilder().add("Connected", m_control).end()));
 }
 
-void AudioDevice::volume(const CallPtr& call) {
+void DeviceAudio::volume(const CallPtr& call) {
     if (!m_control)
         return call->fail(Errors::notConnected);
     call->reply();

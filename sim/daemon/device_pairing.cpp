@@ -1,8 +1,8 @@
-#include "daemon/pairing.h"
+#include "daemon/device_pairing.h"
 
-#include "daemon/adapter.h"
-#include "daemon/daemon.h"
-#include "daemon/device.h"
+#include "daemon/bluetoothd.h"
+#include "daemon/served_adapter.h"
+#include "daemon/served_device.h"
 #include "serving/bluez4/errors.h"
 
 namespace Bluetooth::Sim {
@@ -17,29 +17,29 @@ bool usablePin(const std::string& pin) {
 
 } // namespace
 
-std::shared_ptr<Pairing> Pairing::outgoing(Device& device, const CallPtr& call) {
-    auto agent = std::make_shared<Agent>(device.adapter().daemon().bus(), call->sender(),
-                                         call->text(1), *parseCapability(call->text(2)));
-    return std::make_shared<Pairing>(device, call, std::move(agent));
+std::shared_ptr<DevicePairing> DevicePairing::outgoing(ServedDevice& device, const CallPtr& call) {
+    auto agent = std::make_shared<ClientAgent>(device.adapter().daemon().bus(), call->sender(),
+                                               call->text(1), *parseCapability(call->text(2)));
+    return std::make_shared<DevicePairing>(device, call, std::move(agent));
 }
 
-std::shared_ptr<Pairing> Pairing::incoming(Device& device) {
-    return std::make_shared<Pairing>(device, nullptr, device.adapter().sharedAgent());
+std::shared_ptr<DevicePairing> DevicePairing::incoming(ServedDevice& device) {
+    return std::make_shared<DevicePairing>(device, nullptr, device.adapter().sharedAgent());
 }
 
-Pairing::Pairing(Device& device, CallPtr call, std::shared_ptr<Agent> agent)
+DevicePairing::DevicePairing(ServedDevice& device, CallPtr call, std::shared_ptr<ClientAgent> agent)
     : m_device(device),
       m_call(std::move(call)),
       m_agent(std::move(agent)),
       m_outgoing(m_call != nullptr) {}
 
-Pairing::~Pairing() = default;
+DevicePairing::~DevicePairing() = default;
 
-std::string Pairing::owner() const {
+std::string DevicePairing::owner() const {
     return m_call ? m_call->sender() : "";
 }
 
-void Pairing::begin() {
+void DevicePairing::begin() {
     if (m_outgoing)
         m_device.adapter().discovery().suspend();
     m_hold = m_device.link().hold();
@@ -51,20 +51,20 @@ void Pairing::begin() {
     });
 }
 
-guint Pairing::duration() const {
+guint DevicePairing::duration() const {
     const Times& times = m_device.adapter().daemon().times();
     const auto peer = m_device.peer();
     return times.scaled(peer && peer->pairingTime ? *peer->pairingTime : times.pairing);
 }
 
-guint32 Pairing::passkey() const {
+guint32 DevicePairing::passkey() const {
     const auto peer = m_device.peer();
     if (peer && peer->passkey)
         return *peer->passkey;
     return static_cast<guint32>(g_random_int_range(0, 1000000));
 }
 
-void Pairing::negotiate() {
+void DevicePairing::negotiate() {
     const Times& times = m_device.adapter().daemon().times();
     const auto peer = m_device.peer();
     if (!peer)
@@ -91,8 +91,8 @@ void Pairing::negotiate() {
         askByCapabilities();
 }
 
-void Pairing::ask(const char* member, const Value& arguments, const char* results,
-                  Agent::OnAnswer onAnswer) {
+void DevicePairing::ask(const char* member, const Value& arguments, const char* results,
+                        ClientAgent::OnAnswer onAnswer) {
     const Times& times = m_device.adapter().daemon().times();
     if (m_agent->busy())
         return answered(false);
@@ -105,7 +105,7 @@ void Pairing::ask(const char* member, const Value& arguments, const char* result
                  });
 }
 
-void Pairing::askForPin() {
+void DevicePairing::askForPin() {
     if (!m_agent)
         return answered(false);
     ask("RequestPinCode", tuple(pathValue(m_device.path())), "s", [this](const CallResult& answer) {
@@ -119,7 +119,7 @@ void Pairing::askForPin() {
     });
 }
 
-void Pairing::displayPin() {
+void DevicePairing::displayPin() {
     const GlibPtr<char> pin(g_strdup_printf("%06u", passkey()));
     m_displaying = true;
     ask("DisplayPinCode", tuple(pathValue(m_device.path()), pin.get()), "",
@@ -134,7 +134,7 @@ void Pairing::displayPin() {
         });
 }
 
-void Pairing::askByCapabilities() {
+void DevicePairing::askByCapabilities() {
     const Capability theirs = m_device.peer()->capability;
     const Capability ours = m_agent ? m_agent->capability() : Capability::NoInputNoOutput;
     if (theirs == Capability::NoInputNoOutput || ours == Capability::NoInputNoOutput)
@@ -148,7 +148,7 @@ void Pairing::askByCapabilities() {
     confirm(passkey());
 }
 
-void Pairing::confirm(guint32 passkey) {
+void DevicePairing::confirm(guint32 passkey) {
     ask("RequestConfirmation", tuple(pathValue(m_device.path()), passkey), "",
         [this](const CallResult& answer) {
             if (answer.failed)
@@ -157,7 +157,7 @@ void Pairing::confirm(guint32 passkey) {
         });
 }
 
-void Pairing::enter(guint32 passkey, bool typedOnBothSides) {
+void DevicePairing::enter(guint32 passkey, bool typedOnBothSides) {
     ask("RequestPasskey", tuple(pathValue(m_device.path())), "u",
         [this, passkey, typedOnBothSides](const CallResult& answer) {
             if (answer.failed)
@@ -168,7 +168,7 @@ void Pairing::enter(guint32 passkey, bool typedOnBothSides) {
         });
 }
 
-void Pairing::display(guint32 passkey, guint8 entered) {
+void DevicePairing::display(guint32 passkey, guint8 entered) {
     constexpr guint8 digits = 6;
     const Times& times = m_device.adapter().daemon().times();
     m_agent->show("DisplayPasskey", tuple(pathValue(m_device.path()), passkey, entered));
@@ -178,7 +178,7 @@ void Pairing::display(guint32 passkey, guint8 entered) {
                   [this, passkey, entered] { display(passkey, static_cast<guint8>(entered + 1)); });
 }
 
-void Pairing::answered(bool right) {
+void DevicePairing::answered(bool right) {
     const auto peer = m_device.peer();
     const PairingEnd how = peer ? peer->pairingEnd : PairingEnd::LinkLost;
     switch (how) {
@@ -203,7 +203,7 @@ void Pairing::answered(bool right) {
     });
 }
 
-void Pairing::finish() {
+void DevicePairing::finish() {
     const Times& times = m_device.adapter().daemon().times();
     m_done = true;
     m_loss.stop();
@@ -220,8 +220,8 @@ void Pairing::finish() {
                   [this] { succeed(); });
 }
 
-void Pairing::succeed() {
-    Adapter& adapter = m_device.adapter();
+void DevicePairing::succeed() {
+    ServedAdapter& adapter = m_device.adapter();
     const bool outgoing = m_outgoing;
     m_device.learnServices();
     if (m_call)
@@ -231,23 +231,23 @@ void Pairing::succeed() {
         adapter.discovery().resume();
 }
 
-void Pairing::stopTimers() {
+void DevicePairing::stopTimers() {
     m_timer.stop();
     m_timeout.stop();
     m_loss.stop();
 }
 
-void Pairing::abandon() {
+void DevicePairing::abandon() {
     stopTimers();
     m_hold.release();
 }
 
-void Pairing::end() {
+void DevicePairing::end() {
     abandon();
     m_device.pairingEnded();
 }
 
-void Pairing::fail(const BusError& error) {
+void DevicePairing::fail(const BusError& error) {
     const auto device = m_device.shared_from_this();
     const bool outgoing = m_outgoing;
     if (m_agent && (m_agent->busy() || m_displaying))
@@ -261,7 +261,7 @@ void Pairing::fail(const BusError& error) {
 }
 
 /// The link drops; a device that nothing was known of before goes with it.
-void Pairing::removeFailed(const std::shared_ptr<Device>& device, bool outgoing) {
+void DevicePairing::removeFailed(const std::shared_ptr<ServedDevice>& device, bool outgoing) {
     device->link().drop();
     if (device->temporary())
         device->adapter().forgetDevice(device);
@@ -269,7 +269,7 @@ void Pairing::removeFailed(const std::shared_ptr<Device>& device, bool outgoing)
         device->adapter().discovery().resume();
 }
 
-void Pairing::cancel(const CallPtr& call) {
+void DevicePairing::cancel(const CallPtr& call) {
     m_device.setTemporary(true);
     m_cancelled = true;
     stopTimers();
@@ -279,7 +279,7 @@ void Pairing::cancel(const CallPtr& call) {
     call->reply();
 }
 
-void Pairing::linkLost() {
+void DevicePairing::linkLost() {
     if (m_done && !m_cancelled)
         return succeed(); // paired already: only the services were still being read
     if (!m_cancelled)
@@ -298,11 +298,11 @@ void Pairing::linkLost() {
         creating->fail(pageTimeout);
 }
 
-void Pairing::powerLost() {
+void DevicePairing::powerLost() {
     fail(Errors::authenticationCanceled);
 }
 
-void Pairing::ownerGone() {
+void DevicePairing::ownerGone() {
     if (m_done)
         return;
     m_device.setTemporary(!m_device.stored().known);
@@ -317,7 +317,7 @@ void Pairing::ownerGone() {
         linkLost();
 }
 
-void Pairing::releaseAgent() {
+void DevicePairing::releaseAgent() {
     if (m_outgoing && m_agent)
         m_agent->release();
 }

@@ -1,19 +1,20 @@
-#include "daemon/agent.h"
+#include "daemon/client_agent.h"
 
 #include "serving/bluez4/errors.h"
 #include "serving/bluez4/interfaces.h"
 
 namespace Bluetooth::Sim {
 
-Agent::Agent(BusConnection& bus, std::string owner, std::string path, Capability capability)
+ClientAgent::ClientAgent(BusConnection& bus, std::string owner, std::string path,
+                         Capability capability)
     : m_bus(bus), m_owner(std::move(owner)), m_path(std::move(path)), m_capability(capability) {}
 
-Agent::~Agent() {
+ClientAgent::~ClientAgent() {
     forgetRequest();
 }
 
-void Agent::ask(const char* member, const Value& arguments, const char* resultSignature,
-                guint timeout, OnAnswer onAnswer) {
+void ClientAgent::ask(const char* member, const Value& arguments, const char* resultSignature,
+                      guint timeout, OnAnswer onAnswer) {
     forgetRequest();
     m_request = g_cancellable_new();
     m_onAnswer = std::move(onAnswer);
@@ -28,22 +29,22 @@ void Agent::ask(const char* member, const Value& arguments, const char* resultSi
                });
 }
 
-void Agent::show(const char* member, const Value& arguments) {
+void ClientAgent::show(const char* member, const Value& arguments) {
     m_bus.send(m_owner, m_path, Interfaces::agent, member, arguments);
 }
 
-void Agent::cancel() {
+void ClientAgent::cancel() {
     forgetRequest();
     m_bus.send(m_owner, m_path, Interfaces::agent, "Cancel");
 }
 
-void Agent::release() {
+void ClientAgent::release() {
     if (busy())
         m_bus.send(m_owner, m_path, Interfaces::agent, "Cancel");
     m_bus.send(m_owner, m_path, Interfaces::agent, "Release");
 }
 
-void Agent::failRequest() {
+void ClientAgent::failRequest() {
     if (!busy())
         return;
     const OnAnswer handler = std::move(m_onAnswer);
@@ -51,7 +52,7 @@ void Agent::failRequest() {
     handler({{}, Errors::failed("Canceled"), true});
 }
 
-void Agent::forgetRequest() {
+void ClientAgent::forgetRequest() {
     if (m_request)
         g_cancellable_cancel(m_request);
     g_clear_object(&m_request);

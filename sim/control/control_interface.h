@@ -1,9 +1,9 @@
-#ifndef KESBLUETOOTH_SIM_CONTROL_CONTROL_H
-#define KESBLUETOOTH_SIM_CONTROL_CONTROL_H
+#ifndef KESBLUETOOTH_SIM_CONTROL_CONTROL_INTERFACE_H
+#define KESBLUETOOTH_SIM_CONTROL_CONTROL_INTERFACE_H
 
 #include "control/call_log.h"
 #include "control/faults.h"
-#include "daemon/daemon.h"
+#include "daemon/bluetoothd.h"
 #include "serving.h"
 #include "serving/bus/bus_connection.h"
 #include "serving/bus/object_tree.h"
@@ -14,23 +14,23 @@
 
 namespace Bluetooth::Sim {
 
-class Adapter;
-class Device;
+class ServedAdapter;
+class ServedDevice;
 
 /// com.kestrine.bluetooth.Sim: what tests and people do to the simulation, apart from what it
 /// simulates, on a connection and under a name of its own.
 ///
 /// Each call is carried out after everything that its caller sent to the daemon before, and is
 /// answered after everything that the daemon sent because of it has passed the bus.
-class Control {
+class ControlInterface {
 public:
     /// @param verbose  whether each call to the daemon is written to stderr
-    Control(World& world, const std::string& busAddress, bool verbose);
-    Control(const Control&) = delete;
-    Control& operator=(const Control&) = delete;
-    ~Control();
+    ControlInterface(World& world, const std::string& busAddress, bool verbose);
+    ControlInterface(const ControlInterface&) = delete;
+    ControlInterface& operator=(const ControlInterface&) = delete;
+    ~ControlInterface();
 
-    Daemon& daemon() { return m_daemon; }
+    Bluetoothd& daemon() { return m_daemon; }
     void watchQuit(std::function<void()> onQuit) { m_quit = std::move(onQuit); }
 
 private:
@@ -67,14 +67,14 @@ private:
 
     void done(const CallPtr& call, const Value& results = {});
     void comeIn(const CallPtr& call, bool pairing);
-    Adapter& adapter(const std::string& id);
-    std::shared_ptr<Device> device(const CallPtr& call);
-    std::shared_ptr<Peer> peer(const std::string& address);
-    void peerChanged(const std::shared_ptr<Peer>& peer);
+    ServedAdapter& adapter(const std::string& id);
+    std::shared_ptr<ServedDevice> device(const CallPtr& call);
+    std::shared_ptr<PeerDevice> peer(const std::string& address);
+    void peerChanged(const std::shared_ptr<PeerDevice>& peer);
 
     World& m_world;
     bool m_verbose;
-    Daemon m_daemon;
+    Bluetoothd m_daemon;
     Faults m_faults;
     CallLog m_calls;
     std::function<void()> m_quit;

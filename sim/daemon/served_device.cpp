@@ -1,10 +1,10 @@
-#include "daemon/device.h"
+#include "daemon/served_device.h"
 
-#include "daemon/adapter.h"
-#include "daemon/audio_device.h"
-#include "daemon/daemon.h"
+#include "daemon/bluetoothd.h"
+#include "daemon/device_audio.h"
 #include "daemon/device_creation.h"
-#include "daemon/pairing.h"
+#include "daemon/device_pairing.h"
+#include "daemon/served_adapter.h"
 #include "daemon/service_search.h"
 #include "serving/bluez4/address.h"
 #include "serving/bluez4/errors.h"
@@ -16,7 +16,7 @@
 
 namespace Bluetooth::Sim {
 
-Device::Device(Adapter& adapter, std::string address)
+ServedDevice::ServedDevice(ServedAdapter& adapter, std::string address)
     : m_adapter(adapter),
       m_address(std::move(address)),
       m_path(adapter.path() + "/dev_" + withSeparator(m_address, '_')),
@@ -24,22 +24,22 @@ Device::Device(Adapter& adapter, std::string address)
       m_classKnown(m_stored.deviceClass.has_value()),
       m_name(m_stored.name),
       m_link(*this) {
-    m_adapter.daemon().objects().add(m_path, deviceInterface<Device>(), this);
-    m_audio = std::make_unique<AudioDevice>(*this);
+    m_adapter.daemon().objects().add(m_path, deviceInterface<ServedDevice>(), this);
+    m_audio = std::make_unique<DeviceAudio>(*this);
     m_audio->serve();
 }
 
-Device::~Device() {
+ServedDevice::~ServedDevice() {
     retire();
 }
 
-void Device::retire() {
+void ServedDevice::retire() {
     if (m_retired)
         return;
     m_retired = true;
     m_link.abandon();
     m_reverseSearch.stop();
-    Daemon& daemon = m_adapter.daemon();
+    Bluetoothd& daemon = m_adapter.daemon();
     m_audio->abandon();
     const auto end = [&](auto& work) {
         if (!work)
@@ -53,34 +53,34 @@ void Device::retire() {
     daemon.objects().remove(m_path);
 }
 
-std::shared_ptr<Peer> Device::peer() const {
+std::shared_ptr<PeerDevice> ServedDevice::peer() const {
     return m_adapter.peerAt(m_address);
 }
 
-bool Device::reachable() const {
+bool ServedDevice::reachable() const {
     const auto peer = this->peer();
     return peer && peer->present && peer->connectable && !m_stored.blocked;
 }
 
-bool Device::busy() const {
+bool ServedDevice::busy() const {
     return m_creation || m_pairing || m_search;
 }
 
-void Device::emit(const char* member, const Value& arguments) {
+void ServedDevice::emit(const char* member, const Value& arguments) {
     m_adapter.daemon().bus().emit(m_path, Interfaces::device, member, arguments);
 }
 
-void Device::changed(const char* property, const Value& value) {
+void ServedDevice::changed(const char* property, const Value& value) {
     emit("PropertyChanged", propertyChange(property, value));
 }
 
-std::string Device::alias() const {
+std::string ServedDevice::alias() const {
     if (!m_stored.alias.empty())
         return m_stored.alias;
     return m_name.empty() ? withSeparator(m_address, '-') : m_name;
 }
 
-void Device::getProperties(const CallPtr& call) {
+void ServedDevice::getProperties(const CallPtr& call) {
     DictBuilder properties;
     properties.add("Address", m_address)
         .add("Name", m_name)
@@ -100,16 +100,16 @@ void Device::getProperties(const CallPtr& call) {
     call->reply(tuple(properties.end()));
 }
 
-void Device::setProperty(const CallPtr& call) {
-    const bool answered = setOneOf({{"Alias", "s", &Device::setAlias},
-                                    {"Trusted", "b", &Device::setTrusted},
-                                    {"Blocked", "b", &Device::setBlocked}},
+void ServedDevice::setProperty(const CallPtr& call) {
+    const bool answered = setOneOf({{"Alias", "s", &ServedDevice::setAlias},
+                                    {"Trusted", "b", &ServedDevice::setTrusted},
+                                    {"Blocked", "b", &ServedDevice::setBlocked}},
                                    *this, call);
     if (!answered)
         call->fail(Errors::invalidArguments);
 }
 
-void Device::setAlias(const CallPtr& call, const Value& value) {
+void ServedDevice::setAlias(const CallPtr& call, const Value& value) {
     if (value.text() != m_stored.alias) {
         m_stored.alias = value.text();
         // Sent as it was given: "" too, though the name stands for it from now on.
@@ -118,7 +118,7 @@ void Device::setAlias(const CallPtr& call, const Value& value) {
     call->reply();
 }
 
-void Device::setTrusted(const CallPtr& call, const Value& value) {
+void ServedDevice::setTrusted(const CallPtr& call, const Value& value) {
     if (value.flag() != m_stored.trusted) {
         m_stored.trusted = value.flag();
         changed("Trusted", value);
@@ -126,7 +126,7 @@ void Device::setTrusted(const CallPtr& call, const Value& value) {
     call->reply();
 }
 
-void Device::setBlocked(const CallPtr& call, const Value& value) {
+void ServedDevice::setBlocked(const CallPtr& call, const Value& value) {
     if (value.flag() != m_stored.blocked) {
         m_stored.blocked = value.flag();
         if (m_stored.blocked)
@@ -136,13 +136,13 @@ void Device::setBlocked(const CallPtr& call, const Value& value) {
     call->reply();
 }
 
-void Device::discoverServices(const CallPtr& call) {
+void ServedDevice::discoverServices(const CallPtr& call) {
     if (busy())
         return call->fail(Errors::inProgress);
     m_search = ServiceSearch::begin(*this, call);
 }
 
-void Device::cancelDiscovery(const CallPtr& call) {
+void ServedDevice::cancelDiscovery(const CallPtr& call) {
     if (!m_search)
         return call->fail(Errors::doesNotExist);
     if (m_search->owner() != call->sender())
@@ -151,46 +151,46 @@ void Device::cancelDiscovery(const CallPtr& call) {
     call->reply();
 }
 
-void Device::disconnect(const CallPtr& call) {
+void ServedDevice::disconnect(const CallPtr& call) {
     if (!m_link.up())
         return call->fail(Errors::notConnected);
     m_link.requestDisconnect(call);
 }
 
-void Device::create(const CallPtr& call) {
+void ServedDevice::create(const CallPtr& call) {
     m_creation = std::make_shared<DeviceCreation>(*this, call);
     m_creation->begin();
 }
 
-void Device::pair(const CallPtr& call) {
-    m_pairing = Pairing::outgoing(*this, call);
+void ServedDevice::pair(const CallPtr& call) {
+    m_pairing = DevicePairing::outgoing(*this, call);
     m_pairing->begin();
 }
 
-void Device::comeIn(bool pairing) {
+void ServedDevice::comeIn(bool pairing) {
     const Times& times = m_adapter.daemon().times();
     m_link.accept(!pairing);
     if (pairing) {
-        m_pairing = Pairing::incoming(*this);
+        m_pairing = DevicePairing::incoming(*this);
         m_pairing->begin();
         return;
     }
     m_reverseSearch.start(times.scaled(times.reverseSearch), [this] { learnServices(); });
 }
 
-void Device::creationEnded() {
+void ServedDevice::creationEnded() {
     m_adapter.daemon().bury(std::move(m_creation));
 }
 
-void Device::pairingEnded() {
+void ServedDevice::pairingEnded() {
     m_adapter.daemon().bury(std::move(m_pairing));
 }
 
-void Device::searchEnded() {
+void ServedDevice::searchEnded() {
     m_adapter.daemon().bury(std::move(m_search));
 }
 
-void Device::seen() {
+void ServedDevice::seen() {
     if (!m_classKnown) {
         m_classKnown = true;
         changed("Class", *m_stored.deviceClass);
@@ -200,7 +200,7 @@ void Device::seen() {
     learnName();
 }
 
-void Device::learnName() {
+void ServedDevice::learnName() {
     const auto peer = this->peer();
     if (m_link.up() && peer)
         m_stored.name = peer->name;
@@ -212,7 +212,7 @@ void Device::learnName() {
         changed("Alias", alias());
 }
 
-void Device::learnServices() {
+void ServedDevice::learnServices() {
     const auto peer = this->peer();
     if (!peer)
         return;
@@ -231,14 +231,14 @@ void Device::learnServices() {
     changed("UUIDs", listValue("s", m_stored.uuids));
 }
 
-void Device::setPaired(bool paired) {
+void ServedDevice::setPaired(bool paired) {
     if (paired == m_stored.paired)
         return;
     m_stored.paired = paired;
     changed("Paired", paired);
 }
 
-void Device::linkLost() {
+void ServedDevice::linkLost() {
     const auto alive = shared_from_this();
     m_reverseSearch.stop();
     m_audio->linkLost();
@@ -252,7 +252,7 @@ void Device::linkLost() {
         m_adapter.forgetDevice(alive);
 }
 
-void Device::clientGone(const std::string& client) {
+void ServedDevice::clientGone(const std::string& client) {
     const auto alive = shared_from_this();
     if (m_search && m_search->owner() == client)
         m_search->ownerGone();

@@ -1,8 +1,8 @@
-#ifndef KESBLUETOOTH_SIM_DAEMON_ADAPTER_H
-#define KESBLUETOOTH_SIM_DAEMON_ADAPTER_H
+#ifndef KESBLUETOOTH_SIM_DAEMON_SERVED_ADAPTER_H
+#define KESBLUETOOTH_SIM_DAEMON_SERVED_ADAPTER_H
 
+#include "daemon/adapter_discovery.h"
 #include "daemon/adapter_mode.h"
-#include "daemon/discovery.h"
 #include "serving.h"
 #include "serving/bluez4/interfaces.h"
 #include "world/world.h"
@@ -13,28 +13,28 @@
 
 namespace Bluetooth::Sim {
 
-class Agent;
-class Daemon;
-class Device;
+class ClientAgent;
+class Bluetoothd;
+class ServedDevice;
 
 /// org.bluez.Adapter: one controller with the devices that the daemon knows on it.
-class Adapter {
+class ServedAdapter {
 public:
-    Adapter(Daemon& daemon, std::shared_ptr<AdapterHardware> hardware);
-    Adapter(const Adapter&) = delete;
-    Adapter& operator=(const Adapter&) = delete;
-    ~Adapter();
+    ServedAdapter(Bluetoothd& daemon, std::shared_ptr<AdapterHardware> hardware);
+    ServedAdapter(const ServedAdapter&) = delete;
+    ServedAdapter& operator=(const ServedAdapter&) = delete;
+    ~ServedAdapter();
 
-    Daemon& daemon() const { return m_daemon; }
+    Bluetoothd& daemon() const { return m_daemon; }
     AdapterHardware& hardware() const { return *m_hardware; }
     const std::string& path() const { return m_path; }
     AdapterMode& mode() { return m_mode; }
-    Discovery& discovery() { return m_discovery; }
+    AdapterDiscovery& discovery() { return m_discovery; }
     /// The agent that RegisterAgent gave, or null.
-    Agent* agent() const { return m_agent.get(); }
-    std::shared_ptr<Agent> sharedAgent() const { return m_agent; }
+    ClientAgent* agent() const { return m_agent.get(); }
+    std::shared_ptr<ClientAgent> sharedAgent() const { return m_agent; }
     /// The agent of the pairing under way, else the registered one, or null.
-    const Agent* currentAgent() const;
+    const ClientAgent* currentAgent() const;
 
     /// What is said of the stored devices before the adapter itself is announced.
     void announce();
@@ -48,12 +48,12 @@ public:
     void releaseAgents();
 
     /// The device in the air at that address that this adapter can reach or see, or null.
-    std::shared_ptr<Peer> peerAt(const std::string& address) const;
-    std::shared_ptr<Device> find(const std::string& address) const;
+    std::shared_ptr<PeerDevice> peerAt(const std::string& address) const;
+    std::shared_ptr<ServedDevice> find(const std::string& address) const;
     /// Makes the object of a device and announces it.
-    std::shared_ptr<Device> addDevice(const std::string& address);
+    std::shared_ptr<ServedDevice> addDevice(const std::string& address);
     /// Takes a device off the bus and out of storage, and announces that.
-    void forgetDevice(const std::shared_ptr<Device>& device);
+    void forgetDevice(const std::shared_ptr<ServedDevice>& device);
 
     void emit(const char* member, const Value& arguments);
     void changed(const char* property, const Value& value);
@@ -82,13 +82,13 @@ private:
     void devicesChanged();
     Value devicePaths() const;
 
-    Daemon& m_daemon;
+    Bluetoothd& m_daemon;
     std::shared_ptr<AdapterHardware> m_hardware;
     std::string m_path;
     AdapterMode m_mode;
-    Discovery m_discovery;
-    std::shared_ptr<Agent> m_agent;
-    std::vector<std::shared_ptr<Device>> m_devices;
+    AdapterDiscovery m_discovery;
+    std::shared_ptr<ClientAgent> m_agent;
+    std::vector<std::shared_ptr<ServedDevice>> m_devices;
 };
 
 } // namespace Bluetooth::Sim

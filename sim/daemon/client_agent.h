@@ -1,5 +1,5 @@
-#ifndef KESBLUETOOTH_SIM_DAEMON_AGENT_H
-#define KESBLUETOOTH_SIM_DAEMON_AGENT_H
+#ifndef KESBLUETOOTH_SIM_DAEMON_CLIENT_AGENT_H
+#define KESBLUETOOTH_SIM_DAEMON_CLIENT_AGENT_H
 
 #include "serving.h"
 #include "serving/bluez4/capability.h"
@@ -10,14 +10,14 @@
 namespace Bluetooth::Sim {
 
 /// An agent of a client, as the daemon sees it. It has at most one request open.
-class Agent {
+class ClientAgent {
 public:
     using OnAnswer = BusConnection::AnswerHandler;
 
-    Agent(BusConnection& bus, std::string owner, std::string path, Capability capability);
-    Agent(const Agent&) = delete;
-    Agent& operator=(const Agent&) = delete;
-    ~Agent();
+    ClientAgent(BusConnection& bus, std::string owner, std::string path, Capability capability);
+    ClientAgent(const ClientAgent&) = delete;
+    ClientAgent& operator=(const ClientAgent&) = delete;
+    ~ClientAgent();
 
     const std::string& owner() const { return m_owner; }
     const std::string& path() const { return m_path; }

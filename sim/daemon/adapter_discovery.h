@@ -1,10 +1,10 @@
-#ifndef KESBLUETOOTH_SIM_DAEMON_DISCOVERY_H
-#define KESBLUETOOTH_SIM_DAEMON_DISCOVERY_H
+#ifndef KESBLUETOOTH_SIM_DAEMON_ADAPTER_DISCOVERY_H
+#define KESBLUETOOTH_SIM_DAEMON_ADAPTER_DISCOVERY_H
 
 #include "serving.h"
 #include "serving/bus/call.h"
 #include "serving/bus/one_shot_timer.h"
-#include "world/peer.h"
+#include "world/peer_device.h"
 
 #include <deque>
 #include <map>
@@ -14,14 +14,14 @@
 
 namespace Bluetooth::Sim {
 
-class Adapter;
+class ServedAdapter;
 
 /// The discovery of one adapter, shared by the clients that started it.
 ///
 /// It runs in rounds: an inquiry that finds devices, then the names that did not come with it.
-class Discovery {
+class AdapterDiscovery {
 public:
-    explicit Discovery(Adapter& adapter) : m_adapter(adapter) {}
+    explicit AdapterDiscovery(ServedAdapter& adapter) : m_adapter(adapter) {}
 
     bool active() const { return m_active; }
 
@@ -36,7 +36,7 @@ public:
     void resume();
 
     /// A device in the air came, went or changed.
-    void peerChanged(const std::shared_ptr<Peer>& peer);
+    void peerChanged(const std::shared_ptr<PeerDevice>& peer);
 
 private:
     struct Found {
@@ -53,15 +53,15 @@ private:
     void askNames();
     void askNextName();
     void endRound();
-    void see(Peer& peer);
-    void report(const Peer& peer, gint16 rssi);
-    bool visible(const Peer& peer) const;
+    void see(PeerDevice& peer);
+    void report(const PeerDevice& peer, gint16 rssi);
+    bool visible(const PeerDevice& peer) const;
 
-    Adapter& m_adapter;
+    ServedAdapter& m_adapter;
     std::map<std::string, unsigned> m_sessions; ///< how often each client started it
     std::map<std::string, Found> m_found;
-    std::deque<std::shared_ptr<Peer>> m_toFind;
-    std::deque<std::shared_ptr<Peer>> m_toName;
+    std::deque<std::shared_ptr<PeerDevice>> m_toFind;
+    std::deque<std::shared_ptr<PeerDevice>> m_toName;
     bool m_active = false;
     bool m_inquiring = false;
     unsigned m_suspensions = 0;

@@ -1,8 +1,8 @@
-#include "daemon/discovery.h"
+#include "daemon/adapter_discovery.h"
 
-#include "daemon/adapter.h"
-#include "daemon/daemon.h"
-#include "daemon/device.h"
+#include "daemon/bluetoothd.h"
+#include "daemon/served_adapter.h"
+#include "daemon/served_device.h"
 #include "serving/bluez4/address.h"
 #include "serving/bluez4/errors.h"
 #include "serving/bluez4/icon.h"
@@ -12,7 +12,7 @@
 
 namespace Bluetooth::Sim {
 
-void Discovery::startSession(const CallPtr& call) {
+void AdapterDiscovery::startSession(const CallPtr& call) {
     const bool first = m_sessions.empty();
     ++m_sessions[call->sender()];
     call->reply();
@@ -20,7 +20,7 @@ void Discovery::startSession(const CallPtr& call) {
         begin();
 }
 
-void Discovery::stopSession(const CallPtr& call) {
+void AdapterDiscovery::stopSession(const CallPtr& call) {
     const auto session = m_sessions.find(call->sender());
     if (session == m_sessions.end())
         return call->fail(Errors::failed("Invalid discovery session"));
@@ -31,27 +31,27 @@ void Discovery::stopSession(const CallPtr& call) {
         end();
 }
 
-void Discovery::clientGone(const std::string& client) {
+void AdapterDiscovery::clientGone(const std::string& client) {
     if (m_sessions.erase(client) && m_sessions.empty())
         end();
 }
 
-void Discovery::stop() {
+void AdapterDiscovery::stop() {
     m_sessions.clear();
     end();
 }
 
-void Discovery::suspend() {
+void AdapterDiscovery::suspend() {
     if (m_suspensions++ == 0)
         end();
 }
 
-void Discovery::resume() {
+void AdapterDiscovery::resume() {
     if (--m_suspensions == 0 && !m_sessions.empty())
         begin();
 }
 
-void Discovery::begin() {
+void AdapterDiscovery::begin() {
     if (m_suspensions || !m_adapter.mode().powered())
         return;
     m_found.clear();
@@ -60,7 +60,7 @@ void Discovery::begin() {
     startRound();
 }
 
-void Discovery::end() {
+void AdapterDiscovery::end() {
     m_finder.stop();
     m_roundEnd.stop();
     m_inquiring = false;
@@ -68,12 +68,12 @@ void Discovery::end() {
         setActive(false);
 }
 
-void Discovery::setActive(bool active) {
+void AdapterDiscovery::setActive(bool active) {
     m_active = active;
     m_adapter.changed("Discovering", active);
 }
 
-void Discovery::startRound() {
+void AdapterDiscovery::startRound() {
     const Times& times = m_adapter.daemon().times();
     ++m_round;
     m_inquiring = true;
@@ -90,7 +90,7 @@ void Discovery::startRound() {
     });
 }
 
-void Discovery::findNext() {
+void AdapterDiscovery::findNext() {
     const Times& times = m_adapter.daemon().times();
     // However many there are, all are found well before the end of the round.
     const std::size_t most = std::max<std::size_t>(1, m_adapter.daemon().world().peers.size());
@@ -110,15 +110,15 @@ void Discovery::findNext() {
         m_finder.start(times.scaled(interval), [this] { findNext(); });
 }
 
-void Discovery::askNames() {
-    const auto known = [this](const std::shared_ptr<Peer>& peer) {
+void AdapterDiscovery::askNames() {
+    const auto known = [this](const std::shared_ptr<PeerDevice>& peer) {
         return !m_adapter.hardware().storage[peer->address].name.empty();
     };
     m_toName.erase(std::remove_if(m_toName.begin(), m_toName.end(), known), m_toName.end());
     askNextName();
 }
 
-void Discovery::askNextName() {
+void AdapterDiscovery::askNextName() {
     const Times& times = m_adapter.daemon().times();
     if (m_toName.empty())
         return m_roundEnd.start(times.scaled(times.inquiryGap), [this] { endRound(); });
@@ -133,7 +133,7 @@ void Discovery::askNextName() {
     });
 }
 
-void Discovery::endRound() {
+void AdapterDiscovery::endRound() {
     setActive(false);
     for (auto found = m_found.begin(); found != m_found.end();) {
         if (found->second.inThisRound) {
@@ -147,14 +147,14 @@ void Discovery::endRound() {
     startRound();
 }
 
-bool Discovery::visible(const Peer& peer) const {
+bool AdapterDiscovery::visible(const PeerDevice& peer) const {
     if (!peer.present || (!peer.adapter.empty() && peer.adapter != m_adapter.hardware().id()))
         return false;
     const gint64 elapsed = (g_get_monotonic_time() - m_began) / 1000;
     return peer.visibleFor == 0 || elapsed < m_adapter.daemon().times().scaled(peer.visibleFor);
 }
 
-void Discovery::peerChanged(const std::shared_ptr<Peer>& peer) {
+void AdapterDiscovery::peerChanged(const std::shared_ptr<PeerDevice>& peer) {
     if (m_active && m_inquiring && visible(*peer)) {
         see(*peer);
         if (!peer->nameInInquiry)
@@ -162,7 +162,7 @@ void Discovery::peerChanged(const std::shared_ptr<Peer>& peer) {
     }
 }
 
-void Discovery::see(Peer& peer) {
+void AdapterDiscovery::see(PeerDevice& peer) {
     StoredDevice& stored = m_adapter.hardware().storage[peer.address];
     stored.deviceClass = peer.deviceClass;
     if (peer.nameInInquiry)
@@ -182,7 +182,7 @@ void Discovery::see(Peer& peer) {
         report(peer, rssi);
 }
 
-void Discovery::report(const Peer& peer, gint16 rssi) {
+void AdapterDiscovery::report(const PeerDevice& peer, gint16 rssi) {
     const StoredDevice& stored = m_adapter.hardware().storage[peer.address];
     std::string alias = stored.alias.empty() ? stored.name : stored.alias;
     if (alias.empty())

@@ -1,5 +1,5 @@
-#ifndef KESBLUETOOTH_SIM_WORLD_PEER_H
-#define KESBLUETOOTH_SIM_WORLD_PEER_H
+#ifndef KESBLUETOOTH_SIM_WORLD_PEER_DEVICE_H
+#define KESBLUETOOTH_SIM_WORLD_PEER_DEVICE_H
 
 #include "serving.h"
 #include "serving/bluez4/capability.h"
@@ -24,7 +24,7 @@ enum class PairingEnd {
 };
 
 /// A device in the air: what it is, not what a daemon knows of it.
-struct Peer {
+struct PeerDevice {
     std::string address; ///< upper case
     std::string name;
     std::string adapter; ///< "hci0" when only that adapter can see it, "" for all

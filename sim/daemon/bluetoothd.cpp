@@ -1,27 +1,28 @@
-#include "daemon/daemon.h"
+#include "daemon/bluetoothd.h"
 
-#include "daemon/adapter.h"
-#include "daemon/manager.h"
+#include "daemon/served_adapter.h"
+#include "daemon/served_manager.h"
 #include "serving/bluez4/address.h"
 
 #include <algorithm>
 
 namespace Bluetooth::Sim {
 
-Daemon::Daemon(World& world, std::string busAddress, std::function<bool(const CallPtr&)> beforeCall)
+Bluetoothd::Bluetoothd(World& world, std::string busAddress,
+                       std::function<bool(const CallPtr&)> beforeCall)
     : m_world(world), m_busAddress(std::move(busAddress)), m_beforeCall(std::move(beforeCall)) {}
 
-Daemon::~Daemon() {
+Bluetoothd::~Bluetoothd() {
     clear();
 }
 
-void Daemon::start(int pid) {
+void Bluetoothd::start(int pid) {
     m_pid = pid;
     auto bus = std::make_unique<BusConnection>(m_busAddress, [this](const CallPtr& call) {
         if (!m_beforeCall(call))
             dispatch(call);
     });
-    m_manager = std::make_unique<Manager>(*this);
+    m_manager = std::make_unique<ServedManager>(*this);
     bus->watchClients([this](const std::string& client) {
         for (const auto& adapter : m_adapters)
             adapter->clientGone(client);
@@ -42,17 +43,17 @@ void Daemon::start(int pid) {
         plugIn(hardware);
 }
 
-void Daemon::vanish() {
+void Bluetoothd::vanish() {
     clear();
 }
 
-void Daemon::stop() {
+void Bluetoothd::stop() {
     for (const auto& adapter : m_adapters)
         adapter->releaseAgents();
     clear();
 }
 
-void Daemon::clear() {
+void Bluetoothd::clear() {
     // Adapters use the bus until they are gone; nothing of theirs is said on the way out.
     m_adapters.clear();
     m_manager.reset();
@@ -64,28 +65,28 @@ void Daemon::clear() {
     m_bus.reset();
 }
 
-void Daemon::plugIn(const std::shared_ptr<AdapterHardware>& hardware) {
+void Bluetoothd::plugIn(const std::shared_ptr<AdapterHardware>& hardware) {
     for (const auto& other : m_adapters)
         for (int times = 0; times < 2; ++times)
             other->uuidsChanged();
-    m_adapters.push_back(std::make_unique<Adapter>(*this, hardware));
+    m_adapters.push_back(std::make_unique<ServedAdapter>(*this, hardware));
     m_adapters.back()->announce();
     m_manager->adapterAdded(*m_adapters.back());
     m_adapters.back()->comeUp();
 }
 
-void Daemon::pullOut(Adapter& adapter) {
+void Bluetoothd::pullOut(ServedAdapter& adapter) {
     const bool wasDefault = m_adapters.front().get() == &adapter;
     const std::string path = adapter.path();
     adapter.goDown();
     const auto found = std::find_if(m_adapters.begin(), m_adapters.end(),
                                     [&](const auto& other) { return other.get() == &adapter; });
-    bury(std::shared_ptr<Adapter>(std::move(*found)));
+    bury(std::shared_ptr<ServedAdapter>(std::move(*found)));
     m_adapters.erase(found);
     m_manager->adapterRemoved(path, wasDefault);
 }
 
-Adapter* Daemon::find(const std::string& idOrAddress) const {
+ServedAdapter* Bluetoothd::find(const std::string& idOrAddress) const {
     const auto found = std::find_if(m_adapters.begin(), m_adapters.end(), [&](const auto& adapter) {
         return adapter->hardware().id() == idOrAddress ||
                adapter->hardware().address == upperCase(idOrAddress);
@@ -93,13 +94,13 @@ Adapter* Daemon::find(const std::string& idOrAddress) const {
     return found == m_adapters.end() ? nullptr : found->get();
 }
 
-void Daemon::bury(std::shared_ptr<void> ended) {
+void Bluetoothd::bury(std::shared_ptr<void> ended) {
     m_ended.push_back(std::move(ended));
     if (m_burial)
         return;
     m_burial = g_idle_add(
         [](gpointer data) -> gboolean {
-            auto* daemon = static_cast<Daemon*>(data);
+            auto* daemon = static_cast<Bluetoothd*>(data);
             daemon->m_burial = 0;
             const auto buried = std::move(daemon->m_ended);
             daemon->m_ended.clear();

@@ -1,5 +1,5 @@
-#ifndef KESBLUETOOTH_SIM_DAEMON_DEVICE_H
-#define KESBLUETOOTH_SIM_DAEMON_DEVICE_H
+#ifndef KESBLUETOOTH_SIM_DAEMON_SERVED_DEVICE_H
+#define KESBLUETOOTH_SIM_DAEMON_SERVED_DEVICE_H
 
 #include "daemon/link.h"
 #include "serving.h"
@@ -11,27 +11,27 @@
 
 namespace Bluetooth::Sim {
 
-class Adapter;
-class AudioDevice;
+class ServedAdapter;
+class DeviceAudio;
 class DeviceCreation;
-class Pairing;
+class DevicePairing;
 class ServiceSearch;
 
 /// org.bluez.Device: a device that the daemon knows.
-class Device : public std::enable_shared_from_this<Device> {
+class ServedDevice : public std::enable_shared_from_this<ServedDevice> {
 public:
-    Device(Adapter& adapter, std::string address);
-    Device(const Device&) = delete;
-    Device& operator=(const Device&) = delete;
-    ~Device();
+    ServedDevice(ServedAdapter& adapter, std::string address);
+    ServedDevice(const ServedDevice&) = delete;
+    ServedDevice& operator=(const ServedDevice&) = delete;
+    ~ServedDevice();
 
-    Adapter& adapter() const { return m_adapter; }
+    ServedAdapter& adapter() const { return m_adapter; }
     const std::string& address() const { return m_address; }
     const std::string& path() const { return m_path; }
     StoredDevice& stored() const { return m_stored; }
     Link& link() { return m_link; }
     /// The device in the air, or null when there is none any more.
-    std::shared_ptr<Peer> peer() const;
+    std::shared_ptr<PeerDevice> peer() const;
     bool reachable() const;
 
     /// Whether the object goes when its link does: nothing is stored of it yet.
@@ -45,9 +45,9 @@ public:
     void pair(const CallPtr& call);
     /// The device connects to us, and pairs when asked to.
     void comeIn(bool pairing);
-    Pairing* pairing() const { return m_pairing.get(); }
+    DevicePairing* pairing() const { return m_pairing.get(); }
     DeviceCreation* creation() const { return m_creation.get(); }
-    AudioDevice& audio() const { return *m_audio; }
+    DeviceAudio& audio() const { return *m_audio; }
     /// Each is called when the work has ended, by the work itself.
     void creationEnded();
     void pairingEnded();
@@ -83,7 +83,7 @@ private:
     void setTrusted(const CallPtr& call, const Value& value);
     void setBlocked(const CallPtr& call, const Value& value);
 
-    Adapter& m_adapter;
+    ServedAdapter& m_adapter;
     std::string m_address;
     std::string m_path;
     StoredDevice& m_stored;
@@ -94,9 +94,9 @@ private:
     Link m_link;
     OneShotTimer m_reverseSearch;
     std::shared_ptr<DeviceCreation> m_creation;
-    std::shared_ptr<Pairing> m_pairing;
+    std::shared_ptr<DevicePairing> m_pairing;
     std::shared_ptr<ServiceSearch> m_search;
-    std::unique_ptr<AudioDevice> m_audio;
+    std::unique_ptr<DeviceAudio> m_audio;
 };
 
 } // namespace Bluetooth::Sim

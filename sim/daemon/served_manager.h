@@ -1,5 +1,5 @@
-#ifndef KESBLUETOOTH_SIM_DAEMON_MANAGER_H
-#define KESBLUETOOTH_SIM_DAEMON_MANAGER_H
+#ifndef KESBLUETOOTH_SIM_DAEMON_SERVED_MANAGER_H
+#define KESBLUETOOTH_SIM_DAEMON_SERVED_MANAGER_H
 
 #include "serving.h"
 #include "serving/bluez4/interfaces.h"
@@ -8,18 +8,18 @@
 
 namespace Bluetooth::Sim {
 
-class Adapter;
-class Daemon;
+class ServedAdapter;
+class Bluetoothd;
 
 /// org.bluez.Manager at "/".
-class Manager {
+class ServedManager {
 public:
-    explicit Manager(Daemon& daemon);
-    Manager(const Manager&) = delete;
-    Manager& operator=(const Manager&) = delete;
-    ~Manager();
+    explicit ServedManager(Bluetoothd& daemon);
+    ServedManager(const ServedManager&) = delete;
+    ServedManager& operator=(const ServedManager&) = delete;
+    ~ServedManager();
 
-    void adapterAdded(const Adapter& adapter);
+    void adapterAdded(const ServedAdapter& adapter);
     void adapterRemoved(const std::string& path, bool wasDefault);
 
 private:
@@ -35,7 +35,7 @@ private:
     void emit(const char* member, const Value& arguments);
     void adaptersChanged();
 
-    Daemon& m_daemon;
+    Bluetoothd& m_daemon;
 };
 
 } // namespace Bluetooth::Sim

@@ -1,10 +1,10 @@
-#include "daemon/adapter.h"
+#include "daemon/served_adapter.h"
 
-#include "daemon/agent.h"
-#include "daemon/daemon.h"
-#include "daemon/device.h"
+#include "daemon/bluetoothd.h"
+#include "daemon/client_agent.h"
 #include "daemon/device_creation.h"
-#include "daemon/pairing.h"
+#include "daemon/device_pairing.h"
+#include "daemon/served_device.h"
 #include "serving/bluez4/address.h"
 #include "serving/bluez4/errors.h"
 #include "serving/bluez4/properties.h"
@@ -30,37 +30,37 @@ std::string cut(const std::string& name) {
 
 } // namespace
 
-Adapter::Adapter(Daemon& daemon, std::shared_ptr<AdapterHardware> hardware)
+ServedAdapter::ServedAdapter(Bluetoothd& daemon, std::shared_ptr<AdapterHardware> hardware)
     : m_daemon(daemon),
       m_hardware(std::move(hardware)),
       m_path(daemon.basePath() + "/" + m_hardware->id()),
       m_mode(*this),
       m_discovery(*this) {
-    m_daemon.objects().add(m_path, adapterInterface<Adapter>(), this);
+    m_daemon.objects().add(m_path, adapterInterface<ServedAdapter>(), this);
     for (auto& [address, stored] : m_hardware->storage) {
         if (!stored.known)
             continue;
-        m_devices.push_back(std::make_shared<Device>(*this, address));
+        m_devices.push_back(std::make_shared<ServedDevice>(*this, address));
         m_devices.back()->setTemporary(false);
     }
 }
 
-Adapter::~Adapter() {
+ServedAdapter::~ServedAdapter() {
     m_devices.clear();
     m_daemon.objects().remove(m_path);
 }
 
-void Adapter::announce() {
+void ServedAdapter::announce() {
     for (const auto& device : m_devices)
         if (device->stored().paired)
             device->changed("Paired", true);
 }
 
-void Adapter::comeUp() {
+void ServedAdapter::comeUp() {
     m_mode.comeUp();
 }
 
-void Adapter::goDown() {
+void ServedAdapter::goDown() {
     m_mode.goDown();
     releaseAgents();
     m_agent.reset();
@@ -69,7 +69,7 @@ void Adapter::goDown() {
     m_daemon.objects().remove(m_path);
 }
 
-void Adapter::loseDevices() {
+void ServedAdapter::loseDevices() {
     const auto devices = m_devices;
     for (const auto& device : devices) {
         if (device->pairing())
@@ -80,7 +80,7 @@ void Adapter::loseDevices() {
     }
 }
 
-void Adapter::clientGone(const std::string& client) {
+void ServedAdapter::clientGone(const std::string& client) {
     m_discovery.clientGone(client);
     m_mode.clientGone(client);
     const auto devices = m_devices;
@@ -92,7 +92,7 @@ void Adapter::clientGone(const std::string& client) {
     }
 }
 
-void Adapter::releaseAgents() {
+void ServedAdapter::releaseAgents() {
     for (const auto& device : m_devices)
         if (device->pairing())
             device->pairing()->releaseAgent();
@@ -100,36 +100,36 @@ void Adapter::releaseAgents() {
         m_agent->release();
 }
 
-const Agent* Adapter::currentAgent() const {
+const ClientAgent* ServedAdapter::currentAgent() const {
     for (const auto& device : m_devices)
         if (device->pairing() && device->pairing()->agent())
             return device->pairing()->agent();
     return m_agent.get();
 }
 
-std::shared_ptr<Peer> Adapter::peerAt(const std::string& address) const {
+std::shared_ptr<PeerDevice> ServedAdapter::peerAt(const std::string& address) const {
     auto peer = m_daemon.world().peer(address);
     if (peer && !peer->adapter.empty() && peer->adapter != m_hardware->id())
         return nullptr;
     return peer;
 }
 
-std::shared_ptr<Device> Adapter::find(const std::string& address) const {
+std::shared_ptr<ServedDevice> ServedAdapter::find(const std::string& address) const {
     const auto found = std::find_if(m_devices.begin(), m_devices.end(), [&](const auto& device) {
         return device->address() == address;
     });
     return found == m_devices.end() ? nullptr : *found;
 }
 
-std::shared_ptr<Device> Adapter::addDevice(const std::string& address) {
-    auto device = std::make_shared<Device>(*this, address);
+std::shared_ptr<ServedDevice> ServedAdapter::addDevice(const std::string& address) {
+    auto device = std::make_shared<ServedDevice>(*this, address);
     m_devices.push_back(device);
     emit("DeviceCreated", tuple(pathValue(device->path())));
     devicesChanged();
     return device;
 }
 
-void Adapter::forgetDevice(const std::shared_ptr<Device>& device) {
+void ServedAdapter::forgetDevice(const std::shared_ptr<ServedDevice>& device) {
     const auto found = std::find(m_devices.begin(), m_devices.end(), device);
     if (found == m_devices.end())
         return;
@@ -147,30 +147,30 @@ void Adapter::forgetDevice(const std::shared_ptr<Device>& device) {
     m_daemon.bury(device);
 }
 
-void Adapter::emit(const char* member, const Value& arguments) {
+void ServedAdapter::emit(const char* member, const Value& arguments) {
     m_daemon.bus().emit(m_path, Interfaces::adapter, member, arguments);
 }
 
-void Adapter::changed(const char* property, const Value& value) {
+void ServedAdapter::changed(const char* property, const Value& value) {
     emit("PropertyChanged", propertyChange(property, value));
 }
 
-void Adapter::uuidsChanged() {
+void ServedAdapter::uuidsChanged() {
     changed("UUIDs", listValue("s", m_hardware->uuids));
 }
 
-void Adapter::devicesChanged() {
+void ServedAdapter::devicesChanged() {
     changed("Devices", devicePaths());
 }
 
-Value Adapter::devicePaths() const {
+Value ServedAdapter::devicePaths() const {
     std::vector<std::string> paths;
     for (const auto& device : m_devices)
         paths.push_back(device->path());
     return listValue("o", paths);
 }
 
-void Adapter::getProperties(const CallPtr& call) {
+void ServedAdapter::getProperties(const CallPtr& call) {
     DictBuilder properties;
     properties.add("Address", m_hardware->address)
         .add("Name", m_hardware->name)
@@ -186,9 +186,9 @@ void Adapter::getProperties(const CallPtr& call) {
     call->reply(tuple(properties.end()));
 }
 
-void Adapter::setProperty(const CallPtr& call) {
+void ServedAdapter::setProperty(const CallPtr& call) {
     const bool answered =
-        setOneOf({{"Name", "s", &Adapter::setName}}, *this, call) ||
+        setOneOf({{"Name", "s", &ServedAdapter::setName}}, *this, call) ||
         setOneOf({{"Powered", "b", &AdapterMode::setPowered},
                   {"Discoverable", "b", &AdapterMode::setDiscoverable},
                   {"Pairable", "b", &AdapterMode::setPairable},
@@ -199,7 +199,7 @@ void Adapter::setProperty(const CallPtr& call) {
         call->fail(Errors::invalidArguments);
 }
 
-void Adapter::setName(const CallPtr& call, const Value& value) {
+void ServedAdapter::setName(const CallPtr& call, const Value& value) {
     const std::string name = cut(value.text());
     call->reply();
     if (name == m_hardware->name)
@@ -208,31 +208,31 @@ void Adapter::setName(const CallPtr& call, const Value& value) {
     changed("Name", name);
 }
 
-void Adapter::requestSession(const CallPtr& call) {
+void ServedAdapter::requestSession(const CallPtr& call) {
     m_mode.requestSession(call);
 }
 
-void Adapter::releaseSession(const CallPtr& call) {
+void ServedAdapter::releaseSession(const CallPtr& call) {
     m_mode.releaseSession(call);
 }
 
-void Adapter::startDiscovery(const CallPtr& call) {
+void ServedAdapter::startDiscovery(const CallPtr& call) {
     if (!m_mode.powered())
         return call->fail(Errors::notReady);
     m_discovery.startSession(call);
 }
 
-void Adapter::stopDiscovery(const CallPtr& call) {
+void ServedAdapter::stopDiscovery(const CallPtr& call) {
     if (!m_mode.powered())
         return call->fail(Errors::notReady);
     m_discovery.stopSession(call);
 }
 
-void Adapter::listDevices(const CallPtr& call) {
+void ServedAdapter::listDevices(const CallPtr& call) {
     call->reply(tuple(devicePaths()));
 }
 
-void Adapter::createDevice(const CallPtr& call) {
+void ServedAdapter::createDevice(const CallPtr& call) {
     const std::string address = call->text(0);
     if (!isAddress(address))
         return call->fail(Errors::invalidArguments);
@@ -243,7 +243,7 @@ void Adapter::createDevice(const CallPtr& call) {
     addDevice(upperCase(address))->create(call);
 }
 
-void Adapter::createPairedDevice(const CallPtr& call) {
+void ServedAdapter::createPairedDevice(const CallPtr& call) {
     const std::string address = call->text(0);
     if (!isAddress(address))
         return call->fail(Errors::invalidArguments);
@@ -263,7 +263,7 @@ void Adapter::createPairedDevice(const CallPtr& call) {
     device->pair(call);
 }
 
-void Adapter::cancelDeviceCreation(const CallPtr& call) {
+void ServedAdapter::cancelDeviceCreation(const CallPtr& call) {
     const std::string address = call->text(0);
     if (!isAddress(address))
         return call->fail(Errors::invalidArguments);
@@ -280,7 +280,7 @@ void Adapter::cancelDeviceCreation(const CallPtr& call) {
         device->pairing()->cancel(call);
 }
 
-void Adapter::removeDevice(const CallPtr& call) {
+void ServedAdapter::removeDevice(const CallPtr& call) {
     const std::string path = call->text(0);
     const auto found = std::find_if(m_devices.begin(), m_devices.end(),
                                     [&](const auto& device) { return device->path() == path; });
@@ -297,24 +297,25 @@ void Adapter::removeDevice(const CallPtr& call) {
     device->link().requestDisconnect(call);
 }
 
-void Adapter::findDevice(const CallPtr& call) {
+void ServedAdapter::findDevice(const CallPtr& call) {
     const auto device = find(upperCase(call->text(0)));
     if (!device)
         return call->fail(Errors::doesNotExist);
     call->reply(tuple(pathValue(device->path())));
 }
 
-void Adapter::registerAgent(const CallPtr& call) {
+void ServedAdapter::registerAgent(const CallPtr& call) {
     if (m_agent)
         return call->fail(Errors::alreadyExists);
     const auto capability = parseCapability(call->text(1));
     if (!capability)
         return call->fail(Errors::invalidArguments);
-    m_agent = std::make_shared<Agent>(m_daemon.bus(), call->sender(), call->text(0), *capability);
+    m_agent =
+        std::make_shared<ClientAgent>(m_daemon.bus(), call->sender(), call->text(0), *capability);
     call->reply();
 }
 
-void Adapter::unregisterAgent(const CallPtr& call) {
+void ServedAdapter::unregisterAgent(const CallPtr& call) {
     if (!m_agent || m_agent->owner() != call->sender() || m_agent->path() != call->text(0))
         return call->fail(Errors::doesNotExist);
     const auto agent = std::move(m_agent);

@@ -1,37 +1,37 @@
-#ifndef KESBLUETOOTH_SIM_DAEMON_PAIRING_H
-#define KESBLUETOOTH_SIM_DAEMON_PAIRING_H
+#ifndef KESBLUETOOTH_SIM_DAEMON_DEVICE_PAIRING_H
+#define KESBLUETOOTH_SIM_DAEMON_DEVICE_PAIRING_H
 
-#include "daemon/agent.h"
+#include "daemon/client_agent.h"
 #include "daemon/link.h"
 #include "serving.h"
 #include "serving/bus/bus_connection.h"
 #include "serving/bus/one_shot_timer.h"
-#include "world/peer.h"
+#include "world/peer_device.h"
 
 #include <memory>
 #include <string>
 
 namespace Bluetooth::Sim {
 
-class Device;
+class ServedDevice;
 
 /// One pairing, begun by a CreatePairedDevice call or by the device itself.
 ///
 /// The two sides' capabilities decide what the agent is asked; the device's behaviour how it ends.
-class Pairing {
+class DevicePairing {
 public:
-    static std::shared_ptr<Pairing> outgoing(Device& device, const CallPtr& call);
-    static std::shared_ptr<Pairing> incoming(Device& device);
+    static std::shared_ptr<DevicePairing> outgoing(ServedDevice& device, const CallPtr& call);
+    static std::shared_ptr<DevicePairing> incoming(ServedDevice& device);
 
-    Pairing(Device& device, CallPtr call, std::shared_ptr<Agent> agent);
-    Pairing(const Pairing&) = delete;
-    Pairing& operator=(const Pairing&) = delete;
-    ~Pairing();
+    DevicePairing(ServedDevice& device, CallPtr call, std::shared_ptr<ClientAgent> agent);
+    DevicePairing(const DevicePairing&) = delete;
+    DevicePairing& operator=(const DevicePairing&) = delete;
+    ~DevicePairing();
 
     /// The unique name of the client that wants it; "" when the device began it.
     std::string owner() const;
     /// Who is asked, or null.
-    const Agent* agent() const { return m_agent.get(); }
+    const ClientAgent* agent() const { return m_agent.get(); }
     void begin();
     /// CancelDeviceCreation of the owner.
     void cancel(const CallPtr& call);
@@ -52,20 +52,20 @@ private:
     void enter(guint32 passkey, bool typedOnBothSides);
     void display(guint32 passkey, guint8 entered);
     void ask(const char* member, const Value& arguments, const char* results,
-             Agent::OnAnswer onAnswer);
+             ClientAgent::OnAnswer onAnswer);
     void answered(bool right);
     void finish();
     void succeed();
     void fail(const BusError& error);
     void end();
-    static void removeFailed(const std::shared_ptr<Device>& device, bool outgoing);
+    static void removeFailed(const std::shared_ptr<ServedDevice>& device, bool outgoing);
     void stopTimers();
     guint32 passkey() const;
     guint duration() const;
 
-    Device& m_device;
+    ServedDevice& m_device;
     CallPtr m_call; ///< null when the device began the pairing
-    std::shared_ptr<Agent> m_agent;
+    std::shared_ptr<ClientAgent> m_agent;
     bool m_outgoing;
     bool m_displaying = false;
     bool m_cancelled = false;

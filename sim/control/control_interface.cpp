@@ -1,10 +1,10 @@
-#include "control/control.h"
+#include "control/control_interface.h"
 
-#include "daemon/adapter.h"
-#include "daemon/agent.h"
-#include "daemon/audio_device.h"
-#include "daemon/device.h"
-#include "daemon/pairing.h"
+#include "daemon/client_agent.h"
+#include "daemon/device_audio.h"
+#include "daemon/device_pairing.h"
+#include "daemon/served_adapter.h"
+#include "daemon/served_device.h"
 #include "serving/bluez4/address.h"
 #include "serving/bus/dict_builder.h"
 #include "world/settings.h"
@@ -69,56 +69,65 @@ Value bodyOf(const CallPtr& call, gsize index) {
 
 } // namespace
 
-const Interface& Control::table() {
+const Interface& ControlInterface::table() {
     static const Arguments device = {{"adapter", "s"}, {"address", "s"}};
     static const Interface table = {
         controlName,
-        {{"AddAdapter", {{"settings", "a{sv}"}}, {{"id", "s"}}, handle<&Control::addAdapter>},
-         {"RemoveAdapter", {{"id", "s"}}, {}, handle<&Control::removeAdapter>},
-         {"AddDevice", {{"address", "s"}, {"settings", "a{sv}"}}, {}, handle<&Control::addDevice>},
-         {"SetDevice", {{"address", "s"}, {"settings", "a{sv}"}}, {}, handle<&Control::setDevice>},
-         {"RemoveDevice", {{"address", "s"}}, {}, handle<&Control::removeDevice>},
-         {"ConnectDevice", device, {}, handle<&Control::connectDevice>},
-         {"StartIncomingPairing", device, {}, handle<&Control::startIncomingPairing>},
+        {{"AddAdapter",
+          {{"settings", "a{sv}"}},
+          {{"id", "s"}},
+          handle<&ControlInterface::addAdapter>},
+         {"RemoveAdapter", {{"id", "s"}}, {}, handle<&ControlInterface::removeAdapter>},
+         {"AddDevice",
+          {{"address", "s"}, {"settings", "a{sv}"}},
+          {},
+          handle<&ControlInterface::addDevice>},
+         {"SetDevice",
+          {{"address", "s"}, {"settings", "a{sv}"}},
+          {},
+          handle<&ControlInterface::setDevice>},
+         {"RemoveDevice", {{"address", "s"}}, {}, handle<&ControlInterface::removeDevice>},
+         {"ConnectDevice", device, {}, handle<&ControlInterface::connectDevice>},
+         {"StartIncomingPairing", device, {}, handle<&ControlInterface::startIncomingPairing>},
          {"ConnectService",
           {{"adapter", "s"}, {"address", "s"}, {"uuid", "s"}},
           {},
-          handle<&Control::connectService>},
-         {"DropLink", device, {}, handle<&Control::dropLink>},
+          handle<&ControlInterface::connectService>},
+         {"DropLink", device, {}, handle<&ControlInterface::dropLink>},
          {"SetPlaying",
           {{"adapter", "s"}, {"address", "s"}, {"playing", "b"}},
           {},
-          handle<&Control::setPlaying>},
+          handle<&ControlInterface::setPlaying>},
          {"EmitSignal",
           {{"path", "o"}, {"interface", "s"}, {"member", "s"}, {"arguments", "v"}},
           {},
-          handle<&Control::emitSignal>},
+          handle<&ControlInterface::emitSignal>},
          {"CallAgent",
           {{"adapter", "s"}, {"interface", "s"}, {"member", "s"}, {"arguments", "v"}},
           {{"errorName", "s"}, {"errorText", "s"}, {"results", "av"}},
-          handle<&Control::callAgent>},
+          handle<&ControlInterface::callAgent>},
          {"FailNext",
           {{"interface", "s"}, {"method", "s"}, {"errorName", "s"}, {"errorText", "s"}},
           {},
-          handle<&Control::failNext>},
+          handle<&ControlInterface::failNext>},
          {"DelayNext",
           {{"interface", "s"}, {"method", "s"}, {"milliseconds", "u"}},
           {},
-          handle<&Control::delayNext>},
-         {"ClearFaults", {}, {}, handle<&Control::clearFaults>},
-         {"GetCalls", {}, {{"calls", "a(ossav)"}}, handle<&Control::getCalls>},
-         {"ClearCalls", {}, {}, handle<&Control::clearCalls>},
-         {"SetTimeScale", {{"scale", "d"}}, {}, handle<&Control::setTimeScale>},
-         {"SetTimes", {{"milliseconds", "a{sv}"}}, {}, handle<&Control::setTimes>},
-         {"DropName", {}, {}, handle<&Control::dropName>},
-         {"RegainName", {}, {}, handle<&Control::regainName>},
-         {"Restart", {}, {{"pid", "u"}}, handle<&Control::restart>},
-         {"Quit", {}, {}, handle<&Control::quit>}},
+          handle<&ControlInterface::delayNext>},
+         {"ClearFaults", {}, {}, handle<&ControlInterface::clearFaults>},
+         {"GetCalls", {}, {{"calls", "a(ossav)"}}, handle<&ControlInterface::getCalls>},
+         {"ClearCalls", {}, {}, handle<&ControlInterface::clearCalls>},
+         {"SetTimeScale", {{"scale", "d"}}, {}, handle<&ControlInterface::setTimeScale>},
+         {"SetTimes", {{"milliseconds", "a{sv}"}}, {}, handle<&ControlInterface::setTimes>},
+         {"DropName", {}, {}, handle<&ControlInterface::dropName>},
+         {"RegainName", {}, {}, handle<&ControlInterface::regainName>},
+         {"Restart", {}, {{"pid", "u"}}, handle<&ControlInterface::restart>},
+         {"Quit", {}, {}, handle<&ControlInterface::quit>}},
         {{"CallReceived", {{"path", "o"}, {"interface", "s"}, {"member", "s"}, {"sender", "s"}}}}};
     return table;
 }
 
-Control::Control(World& world, const std::string& busAddress, bool verbose)
+ControlInterface::ControlInterface(World& world, const std::string& busAddress, bool verbose)
     : m_world(world),
       m_verbose(verbose),
       m_daemon(world, busAddress, [this](const CallPtr& call) { return beforeCall(call); }),
@@ -131,9 +140,9 @@ Control::Control(World& world, const std::string& busAddress, bool verbose)
     m_bus.own(controlName);
 }
 
-Control::~Control() = default;
+ControlInterface::~ControlInterface() = default;
 
-bool Control::beforeCall(const CallPtr& call) {
+bool ControlInterface::beforeCall(const CallPtr& call) {
     if (m_verbose)
         g_printerr("%s %s.%s%s\n", call->path().c_str(), call->interface().c_str(),
                    call->member().c_str(),
@@ -144,7 +153,7 @@ bool Control::beforeCall(const CallPtr& call) {
     return m_faults.take(call);
 }
 
-void Control::received(const CallPtr& call) {
+void ControlInterface::received(const CallPtr& call) {
     const auto run = [this, call] { carryOut(call, [&] { m_objects.dispatch(call); }); };
     if (m_daemon.running())
         m_daemon.bus().afterRoundTrip(run);
@@ -152,7 +161,7 @@ void Control::received(const CallPtr& call) {
         run();
 }
 
-void Control::carryOut(const CallPtr& call, const std::function<void()>& what) {
+void ControlInterface::carryOut(const CallPtr& call, const std::function<void()>& what) {
     try {
         what();
     } catch (const SettingError& wrong) {
@@ -162,34 +171,34 @@ void Control::carryOut(const CallPtr& call, const std::function<void()>& what) {
     }
 }
 
-void Control::done(const CallPtr& call, const Value& results) {
+void ControlInterface::done(const CallPtr& call, const Value& results) {
     if (!call->expectsReply() || !m_daemon.running())
         return call->reply(results);
     m_daemon.bus().afterRoundTrip([call, results] { call->reply(results); });
 }
 
-Adapter& Control::adapter(const std::string& id) {
-    Adapter* found = m_daemon.find(id);
+ServedAdapter& ControlInterface::adapter(const std::string& id) {
+    ServedAdapter* found = m_daemon.find(id);
     if (!found)
         throw std::runtime_error("there is no adapter \"" + id + "\"");
     return *found;
 }
 
-std::shared_ptr<Peer> Control::peer(const std::string& address) {
+std::shared_ptr<PeerDevice> ControlInterface::peer(const std::string& address) {
     auto found = m_world.peer(upperCase(address));
     if (!found)
         throw std::runtime_error("there is no device \"" + address + "\"");
     return found;
 }
 
-std::shared_ptr<Device> Control::device(const CallPtr& call) {
+std::shared_ptr<ServedDevice> ControlInterface::device(const CallPtr& call) {
     auto found = adapter(call->text(0)).find(upperCase(call->text(1)));
     if (!found)
         throw std::runtime_error("the daemon does not know \"" + call->text(1) + "\"");
     return found;
 }
 
-void Control::peerChanged(const std::shared_ptr<Peer>& peer) {
+void ControlInterface::peerChanged(const std::shared_ptr<PeerDevice>& peer) {
     for (const auto& adapter : m_daemon.adapters()) {
         adapter->discovery().peerChanged(peer);
         const auto known = adapter->find(peer->address);
@@ -198,7 +207,7 @@ void Control::peerChanged(const std::shared_ptr<Peer>& peer) {
     }
 }
 
-void Control::addAdapter(const CallPtr& call) {
+void ControlInterface::addAdapter(const CallPtr& call) {
     auto hardware = std::make_shared<AdapterHardware>();
     hardware->index = m_world.freeIndex();
     hardware->name = hardware->id();
@@ -213,24 +222,24 @@ void Control::addAdapter(const CallPtr& call) {
     done(call, tuple(hardware->id()));
 }
 
-void Control::removeAdapter(const CallPtr& call) {
+void ControlInterface::removeAdapter(const CallPtr& call) {
     const auto hardware = m_world.adapter(call->text(0));
     if (!hardware)
         throw std::runtime_error("there is no adapter \"" + call->text(0) + "\"");
-    if (Adapter* plugged = m_daemon.find(hardware->id()))
+    if (ServedAdapter* plugged = m_daemon.find(hardware->id()))
         m_daemon.pullOut(*plugged);
     auto& all = m_world.adapters;
     all.erase(std::find(all.begin(), all.end(), hardware));
     done(call);
 }
 
-void Control::addDevice(const CallPtr& call) {
+void ControlInterface::addDevice(const CallPtr& call) {
     const std::string address = upperCase(call->text(0));
     if (!isAddress(address))
         throw std::runtime_error("\"" + address + "\" is not an address");
     if (m_world.peer(address))
         throw std::runtime_error("there is a device " + address + " already");
-    auto peer = std::make_shared<Peer>();
+    auto peer = std::make_shared<PeerDevice>();
     peer->address = address;
     applySettings(*peer, settingsOf(call, 1));
     m_world.peers.push_back(peer);
@@ -238,16 +247,16 @@ void Control::addDevice(const CallPtr& call) {
     done(call);
 }
 
-void Control::setDevice(const CallPtr& call) {
+void ControlInterface::setDevice(const CallPtr& call) {
     const auto changed = peer(call->text(0));
-    Peer copy = *changed; // nothing changes unless everything can
+    PeerDevice copy = *changed; // nothing changes unless everything can
     applySettings(copy, settingsOf(call, 1));
     *changed = copy;
     peerChanged(changed);
     done(call);
 }
 
-void Control::removeDevice(const CallPtr& call) {
+void ControlInterface::removeDevice(const CallPtr& call) {
     const auto gone = peer(call->text(0));
     auto& all = m_world.peers;
     all.erase(std::find(all.begin(), all.end(), gone));
@@ -256,8 +265,8 @@ void Control::removeDevice(const CallPtr& call) {
     done(call);
 }
 
-void Control::comeIn(const CallPtr& call, bool pairing) {
-    Adapter& to = adapter(call->text(0));
+void ControlInterface::comeIn(const CallPtr& call, bool pairing) {
+    ServedAdapter& to = adapter(call->text(0));
     const auto from = peer(call->text(1));
     if (!to.mode().powered())
         throw std::runtime_error("the adapter is off");
@@ -270,15 +279,15 @@ void Control::comeIn(const CallPtr& call, bool pairing) {
     done(call);
 }
 
-void Control::connectDevice(const CallPtr& call) {
+void ControlInterface::connectDevice(const CallPtr& call) {
     comeIn(call, false);
 }
 
-void Control::startIncomingPairing(const CallPtr& call) {
+void ControlInterface::startIncomingPairing(const CallPtr& call) {
     comeIn(call, true);
 }
 
-void Control::connectService(const CallPtr& call) {
+void ControlInterface::connectService(const CallPtr& call) {
     const std::string uuid = fullUuid(call->text(2));
     if (uuid.empty())
         throw std::runtime_error("\"" + call->text(2) + "\" is not a UUID");
@@ -286,17 +295,17 @@ void Control::connectService(const CallPtr& call) {
     done(call);
 }
 
-void Control::dropLink(const CallPtr& call) {
+void ControlInterface::dropLink(const CallPtr& call) {
     device(call)->link().drop();
     done(call);
 }
 
-void Control::setPlaying(const CallPtr& call) {
+void ControlInterface::setPlaying(const CallPtr& call) {
     device(call)->audio().setPlaying(call->argument(2).flag());
     done(call);
 }
 
-void Control::emitSignal(const CallPtr& call) {
+void ControlInterface::emitSignal(const CallPtr& call) {
     const std::string interface = call->text(1);
     const std::string member = call->text(2);
     if (!g_dbus_is_interface_name(interface.c_str()) || !g_dbus_is_member_name(member.c_str()))
@@ -307,9 +316,9 @@ void Control::emitSignal(const CallPtr& call) {
     done(call);
 }
 
-void Control::callAgent(const CallPtr& call) {
-    Adapter& of = adapter(call->text(0));
-    const Agent* agent = of.currentAgent();
+void ControlInterface::callAgent(const CallPtr& call) {
+    ServedAdapter& of = adapter(call->text(0));
+    const ClientAgent* agent = of.currentAgent();
     if (!agent)
         throw std::runtime_error("the adapter has no agent");
     const std::string interface = call->text(1).empty() ? Interfaces::agent : call->text(1);
@@ -323,7 +332,7 @@ void Control::callAgent(const CallPtr& call) {
         });
 }
 
-void Control::failNext(const CallPtr& call) {
+void ControlInterface::failNext(const CallPtr& call) {
     const BusError error = {call->text(2), call->text(3)};
     if (!g_dbus_is_interface_name(error.name.c_str()))
         throw std::runtime_error("\"" + error.name + "\" is not an error name");
@@ -331,26 +340,26 @@ void Control::failNext(const CallPtr& call) {
     done(call);
 }
 
-void Control::delayNext(const CallPtr& call) {
+void ControlInterface::delayNext(const CallPtr& call) {
     m_faults.delayNext(call->text(0), call->text(1), call->number(2));
     done(call);
 }
 
-void Control::clearFaults(const CallPtr& call) {
+void ControlInterface::clearFaults(const CallPtr& call) {
     m_faults.clear();
     done(call);
 }
 
-void Control::getCalls(const CallPtr& call) {
+void ControlInterface::getCalls(const CallPtr& call) {
     done(call, tuple(m_calls.list()));
 }
 
-void Control::clearCalls(const CallPtr& call) {
+void ControlInterface::clearCalls(const CallPtr& call) {
     m_calls.clear();
     done(call);
 }
 
-void Control::setTimeScale(const CallPtr& call) {
+void ControlInterface::setTimeScale(const CallPtr& call) {
     double scale = 0;
     g_variant_get(call->arguments().get(), "(d)", &scale);
     if (!(scale >= 0 && scale <= 1000))
@@ -359,7 +368,7 @@ void Control::setTimeScale(const CallPtr& call) {
     done(call);
 }
 
-void Control::setTimes(const CallPtr& call) {
+void ControlInterface::setTimes(const CallPtr& call) {
     Times copy = m_world.times;
     applySettings(copy, settingsOf(call, 0));
     m_world.times = copy;
@@ -367,7 +376,7 @@ void Control::setTimes(const CallPtr& call) {
 }
 
 /// The bus learns of a closed connection in its own time: what follows comes after that.
-void Control::whenGone(std::function<void()> next) {
+void ControlInterface::whenGone(std::function<void()> next) {
     m_bus.call(busName, busPath, busName, "NameHasOwner", tuple("org.bluez"), -1, nullptr,
                [this, next = std::move(next)](const CallResult& answer) {
                    gboolean owned = FALSE;
@@ -380,18 +389,18 @@ void Control::whenGone(std::function<void()> next) {
                });
 }
 
-void Control::dropName(const CallPtr& call) {
+void ControlInterface::dropName(const CallPtr& call) {
     m_daemon.vanish();
     whenGone([call] { call->reply(); });
 }
 
-void Control::regainName(const CallPtr& call) {
+void ControlInterface::regainName(const CallPtr& call) {
     if (!m_daemon.running())
         m_daemon.start(m_daemon.pid());
     done(call);
 }
 
-void Control::restart(const CallPtr& call) {
+void ControlInterface::restart(const CallPtr& call) {
     const int pid = m_daemon.pid() + 1;
     m_daemon.stop();
     whenGone([this, call, pid] {
@@ -402,7 +411,7 @@ void Control::restart(const CallPtr& call) {
     });
 }
 
-void Control::quit(const CallPtr& call) {
+void ControlInterface::quit(const CallPtr& call) {
     call->reply();
     m_quit();
 }

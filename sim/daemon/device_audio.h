@@ -1,5 +1,5 @@
-#ifndef KESBLUETOOTH_SIM_DAEMON_AUDIO_DEVICE_H
-#define KESBLUETOOTH_SIM_DAEMON_AUDIO_DEVICE_H
+#ifndef KESBLUETOOTH_SIM_DAEMON_DEVICE_AUDIO_H
+#define KESBLUETOOTH_SIM_DAEMON_DEVICE_AUDIO_H
 
 #include "daemon/link.h"
 #include "serving.h"
@@ -10,13 +10,13 @@
 
 namespace Bluetooth::Sim {
 
-class Device;
+class ServedDevice;
 
 /// The audio side of a device: org.bluez.Audio, and org.bluez.AudioSink and org.bluez.Control when
 /// its service classes have them.
-class AudioDevice {
+class DeviceAudio {
 public:
-    explicit AudioDevice(Device& device) : m_device(device) {}
+    explicit DeviceAudio(ServedDevice& device) : m_device(device) {}
 
     /// Serves the interfaces that the device's UUIDs call for and that are not served yet.
     void serve();
@@ -64,7 +64,7 @@ private:
     void emit(const char* interface, const char* member, const Value& arguments = {});
     void changed(const char* interface, const char* property, const Value& value);
 
-    Device& m_device;
+    ServedDevice& m_device;
     bool m_audioServed = false;
     bool m_sinkServed = false;
     bool m_controlServed = false;
