@@ -1,7 +1,7 @@
 #!/usr/bin/env bash
 # Writes the documentation of the classes and the pages to build/docs/html. Any warning is a failure,
-# and so is an operation that does not name its D-Bus method or signal. Installs the Debian package
-# that is missing.
+# and so is an operation that does not name its D-Bus method or signal, and a place in CONTRIBUTING.md
+# that is not there. Installs the Debian package that is missing.
 source "$(dirname "$0")/lib.sh"
 
 need_packages doxygen
@@ -14,6 +14,12 @@ rm -rf "$KESBLUETOOTH_DOCS"/{html,examples}
 mkdir -p "$KESBLUETOOTH_DOCS"
 doxygen docs/Doxyfile
 cp -r examples "$KESBLUETOOTH_DOCS/" # the pages link to them
+
+# What CONTRIBUTING.md names is there.
+grep -oE '`[a-zA-Z.][a-zA-Z0-9_./-]*/[a-zA-Z0-9_./-]*`' CONTRIBUTING.md | tr -d '`' | while read -r place; do
+    [ -n "$(find . -path "*/${place%/}" -not -path './build*' -print -quit)" ] ||
+        die "CONTRIBUTING.md names $place, which is not there"
+done
 
 for header in include/bluetooth/*.h; do
     source=$(echo src/*/"$(basename "$header" .h).cpp")
