@@ -23,6 +23,9 @@ done
 [ -e /usr/share/dbus-1/services/com.kestrine.bluetooth.service ] || fail "no bus can start the scanner"
 grep -q '^ExecStart=/usr/bin/kesbt-autoconnectd$' /usr/lib/systemd/system/kesbt-autoconnectd.service ||
     fail "systemd cannot start kesbt-autoconnectd"
+# Enabled, as systemctl does it; there is none here.
+mkdir -p /etc/systemd/system/multi-user.target.wants
+ln -s /lib/systemd/system/kesbt-autoconnectd.service /etc/systemd/system/multi-user.target.wants/
 
 say "The tour"
 /usr/share/kesbluetooth/tour.sh >tour.log 2>&1 || { cat tour.log >&2; fail "the tour fails"; }
