@@ -38,17 +38,21 @@ endmacro()
 kesbluetooth_package(runtime ${library} libs "" "Client library for the BlueZ 4 Bluetooth daemon"
 "Proxies for the manager, adapters, devices and their audio and remote-control
 interfaces over D-Bus, a pairing agent, and a scan that programs share.")
+# CPack adds scripts that call ldconfig unless there are others; these do not exist, so none are added.
+set(CPACK_DEBIAN_RUNTIME_PACKAGE_CONTROL_EXTRA
+    ${debianFiles}/runtime/triggers ${debianFiles}/runtime/postinst ${debianFiles}/runtime/postrm)
 
 kesbluetooth_package(dev libkesbluetooth-dev libdevel
     "${library} (= ${version}), libdbus-1-dev, libdbus-glib-1-dev, libboost-dev"
     "Client library for the BlueZ 4 Bluetooth daemon - development files"
-"Headers, the CMake package kesbluetooth, the pkg-config file and kesbluetooth(7).
-bluez4-sim lets programs be tried without hardware.")
+"Headers, the CMake package kesbluetooth, the pkg-config file and the manual
+page kesbluetooth(7). bluez4-sim lets programs be tried without hardware.")
 set(CPACK_DEBIAN_DEV_PACKAGE_SUGGESTS "libkesbluetooth-doc, bluez4-sim")
 
 kesbluetooth_package(doc libkesbluetooth-doc doc ""
     "Client library for the BlueZ 4 Bluetooth daemon - documentation"
-"The reference of all classes, pages on tasks, threads and lifetimes, and examples.")
+"The reference of all classes and functions, pages on tasks, on the programs and
+on threads and lifetimes, and six small programs to begin with.")
 set(CPACK_DEBIAN_DOC_PACKAGE_ARCHITECTURE all)
 
 kesbluetooth_package(kesbt kesbt utils "${library} (>= ${PROJECT_VERSION})"
@@ -61,14 +65,14 @@ set(CPACK_DEBIAN_KESBT_PACKAGE_SUGGESTS "kesbt-autoconnectd, bluez4-sim")
 
 kesbluetooth_package(scannerd kesbt-scannerd utils "${library} (>= ${PROJECT_VERSION})"
     "Bluetooth discovery that programs share"
-"Runs the discovery of BlueZ 4's daemon for several programs at once. The session
-bus starts it when it is asked.")
+"Runs the discovery of BlueZ 4's daemon for several programs at once. The
+session bus starts it when it is asked.")
 set(CPACK_DEBIAN_SCANNERD_PACKAGE_RECOMMENDS "default-dbus-session-bus | dbus-session-bus")
 
 kesbluetooth_package(autoconnectd kesbt-autoconnectd utils "${library} (>= ${PROJECT_VERSION})"
     "Connects listed Bluetooth devices whenever they are in reach"
-"Headsets of the auto-connect lists are connected as they appear. The service is
-not enabled by the installation.")
+"Headsets of the auto-connect lists are connected as they appear. The service
+is not enabled by the installation.")
 set(maintainer ${debianFiles}/autoconnectd)
 set(CPACK_DEBIAN_AUTOCONNECTD_PACKAGE_CONTROL_EXTRA
     ${maintainer}/postinst ${maintainer}/prerm ${maintainer}/postrm)
@@ -76,7 +80,7 @@ set(CPACK_DEBIAN_AUTOCONNECTD_PACKAGE_CONTROL_EXTRA
 kesbluetooth_package(sim bluez4-sim devel "dbus-daemon | dbus, libglib2.0-bin"
     "Simulated BlueZ 4 Bluetooth daemon"
 "Behaves on D-Bus as BlueZ 4.101 does, with adapters and devices that are told
-what to do, so that Bluetooth programs can be tried and tested without hardware.")
+what to do: Bluetooth programs can be tried and tested without hardware.")
 set(CPACK_DEBIAN_SIM_PACKAGE_RECOMMENDS "kesbt, kesbt-scannerd, kesbt-autoconnectd")
 
 # What only packages have.
@@ -94,6 +98,10 @@ if(CMAKE_INSTALL_PREFIX STREQUAL /usr)
             ${PROJECT_BINARY_DIR}/changelog.Debian.gz ${PROJECT_BINARY_DIR}/changelog.gz
             DESTINATION share/doc/${CPACK_DEBIAN_${upper}_PACKAGE_NAME} COMPONENT ${component})
     endforeach()
+    if(KESBLUETOOTH_BUILD_DOCS)
+        install(FILES ${debianFiles}/doc/libkesbluetooth-doc.kesbluetooth
+            DESTINATION share/doc-base COMPONENT doc)
+    endif()
 endif()
 
 include(CPack)

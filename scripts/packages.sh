@@ -1,5 +1,5 @@
 #!/usr/bin/env bash
-# Makes the Debian packages; they are in build-packages/ then.
+# Makes the Debian packages and checks them with lintian; they are in build-packages/ then.
 #   scripts/packages.sh [--test]   --test: installs them in a new Debian system in a folder as well,
 #                                  uses them there as a new user would, and removes them (as root)
 source "$(dirname "$0")/lib.sh"
@@ -8,13 +8,19 @@ case "${1:-}" in '' | --test) ;; *) echo "usage: packages.sh [--test]" >&2; exit
 [ -z "${1:-}" ] || [ "$(id -u)" -eq 0 ] || die "--test makes a Debian system, which takes root"
 
 folder=$root/build-packages
-need_packages "${build_packages[@]}" "${docs_packages[@]}" dpkg-dev file
+need_packages "${build_packages[@]}" "${docs_packages[@]}" dpkg-dev file lintian
 echo "Building in ${folder#"$root"/} ..."
 build "$folder" -DCMAKE_INSTALL_PREFIX=/usr -DCMAKE_SKIP_INSTALL_RPATH=ON \
     -DKESBLUETOOTH_BUILD_TESTS=OFF -DKESBLUETOOTH_BUILD_DOCS=ON
 rm -f "$folder"/*.deb
+# The files bear the time of the changelog: the same build gives the same packages.
+SOURCE_DATE_EPOCH=$(dpkg-parsechangelog -l "$root/packaging/debian/changelog" -S Timestamp)
+export SOURCE_DATE_EPOCH
 (cd "$folder" && cpack -G DEB) >"$folder/cpack.log" 2>&1 || { cat "$folder/cpack.log" >&2; die "cpack failed"; }
 (cd "$folder" && ls ./*.deb)
+# Only an upload to Debian itself closes the bug that asked for the package.
+lintian --allow-root --fail-on error,warning --suppress-tags initial-upload-closes-no-bugs \
+    "$folder"/*.deb || die "lintian objects to the packages, see above"
 [ "${1:-}" = --test ] || exit 0
 
 need_packages debootstrap
