@@ -64,7 +64,7 @@ RemoteObject::RemoteObject(const char* destination, const char* path, const char
       m_interface(textOf(interface)),
       m_connection(Connection::get(busType)),
       m_busType(busType),
-      // libdbus ends the process on names that are none.
+      // libdbus ends the process on invalid names.
       m_usable(dbus_validate_bus_name(m_destination.c_str(), nullptr) &&
                dbus_validate_path(m_path.c_str(), nullptr) &&
                dbus_validate_interface(m_interface.c_str(), nullptr)) {}
