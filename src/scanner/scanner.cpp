@@ -46,7 +46,7 @@ std::vector<std::pair<std::string, Dict*>>* Scanner::listDevices(const char* ada
         if (!properties)
             continue;
         devices->emplace_back(address, properties.get());
-        properties.release();
+        static_cast<void>(properties.release());
     }
     return devices.release();
 }
