@@ -65,23 +65,16 @@ guint32 DevicePairing::passkey() const {
 }
 
 void DevicePairing::negotiate() {
-    const Times& times = m_device.adapter().daemon().times();
     const auto peer = m_device.peer();
     if (!peer)
         return fail(pageTimeout);
     if (!m_outgoing && !m_device.adapter().mode().pairable())
         return fail(Errors::authenticationRejected);
-    switch (peer->pairingEnd) {
-    case PairingEnd::Rejected:
-        return m_timer.start(duration(), [this] { fail(Errors::authenticationRejected); });
-    case PairingEnd::RepeatedAttempts:
-        return m_timer.start(duration(), [this] { fail(Errors::repeatedAttempts); });
-    case PairingEnd::LinkLost:
-        m_loss.start(times.scaled(times.linkLoss),
-                     [this] { fail(Errors::connectionAttemptFailed("Connection Timeout")); });
-        break;
-    default:
-        break;
+    if (const auto& end = peer->pairingEnd) {
+        if (end->since == PairingEnd::Since::Begun)
+            return failLater(m_timer, *end);
+        if (end->since == PairingEnd::Since::Asked)
+            failLater(m_loss, *end);
     }
     if (peer->legacy && peer->displaysPin && m_outgoing)
         displayPin();
@@ -180,27 +173,23 @@ void DevicePairing::display(guint32 passkey, guint8 entered) {
 
 void DevicePairing::answered(bool right) {
     const auto peer = m_device.peer();
-    const PairingEnd how = peer ? peer->pairingEnd : PairingEnd::LinkLost;
-    switch (how) {
-    case PairingEnd::LinkLost:
+    const auto end = peer ? peer->pairingEnd : std::nullopt;
+    if (!peer || (end && end->since == PairingEnd::Since::Asked))
         return; // nothing more is heard until the loss is noticed
-    case PairingEnd::NeverAnswers: {
-        const Times& times = m_device.adapter().daemon().times();
-        return m_timer.start(times.pairingTimeout, [this] { fail(Errors::authenticationTimeout); });
-    }
-    case PairingEnd::Refused:
-        return m_timer.start(duration(), [this] { fail(Errors::authenticationFailed); });
-    case PairingEnd::CancelledByPeer:
-        return m_timer.start(duration(), [this] { fail(Errors::authenticationCanceled); });
-    default:
-        break;
-    }
+    if (end && end->since == PairingEnd::Since::Answered)
+        return failLater(m_timer, *end);
     m_timer.start(duration(), [this, right] {
         if (right)
             finish();
         else
             fail(Errors::authenticationFailed);
     });
+}
+
+void DevicePairing::failLater(OneShotTimer& timer, const PairingEnd& end) {
+    const Times& times = m_device.adapter().daemon().times();
+    const guint delay = end.after ? times.lasting(end.after) : duration();
+    timer.start(delay, [this, error = end.error] { fail(error); });
 }
 
 void DevicePairing::finish() {

@@ -56,6 +56,7 @@ private:
     void answered(bool right);
     void finish();
     void succeed();
+    void failLater(OneShotTimer& timer, const PairingEnd& end);
     void fail(const BusError& error);
     void end();
     static void removeFailed(const std::shared_ptr<ServedDevice>& device, bool outgoing);

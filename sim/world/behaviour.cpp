@@ -6,57 +6,62 @@ namespace Bluetooth::Sim {
 
 namespace {
 
-template <Capability Value>
-void capability(PeerDevice& peer) {
-    peer.capability = Value;
+/// One setting.
+template <class T, class U>
+std::function<void(PeerDevice&)> with(T PeerDevice::*setting, U value) {
+    return [setting, value](PeerDevice& device) { device.*setting = value; };
 }
 
-template <PairingEnd Value>
-void ends(PeerDevice& peer) {
-    peer.pairingEnd = Value;
+/// The pairing ends in this way, whatever the agent answers.
+std::function<void(PeerDevice&)> ends(PairingEnd::Since since, BluezError error,
+                                      guint Times::*after = nullptr) {
+    return with(&PeerDevice::pairingEnd, PairingEnd{since, error, after});
 }
 
 } // namespace
 
 const std::vector<Behaviour>& behaviours() {
+    using Since = PairingEnd::Since;
     static const std::vector<Behaviour> table = {
         {"JustWorks", "pairs without a question (NoInputNoOutput)",
-         capability<Capability::NoInputNoOutput>},
+         with(&PeerDevice::capability, Capability::NoInputNoOutput)},
         {"ConfirmPasskey", "both sides show a passkey, ours confirms it (DisplayYesNo)",
-         capability<Capability::DisplayYesNo>},
+         with(&PeerDevice::capability, Capability::DisplayYesNo)},
         {"EnterPasskey", "shows a passkey that a KeyboardOnly agent enters (DisplayOnly)",
-         capability<Capability::DisplayOnly>},
+         with(&PeerDevice::capability, Capability::DisplayOnly)},
         {"DisplayPasskey", "a passkey that our side shows is typed on it (KeyboardOnly)",
-         capability<Capability::KeyboardOnly>},
-        {"LegacyPin", "asks for a PIN and compares it with PIN",
-         [](PeerDevice& peer) { peer.legacy = true; }},
+         with(&PeerDevice::capability, Capability::KeyboardOnly)},
+        {"LegacyPin", "asks for a PIN and compares it with PIN", with(&PeerDevice::legacy, true)},
         {"WrongPin", "asks for a PIN and takes none",
-         [](PeerDevice& peer) {
-             peer.legacy = true;
-             peer.pin.clear();
+         [](PeerDevice& device) {
+             device.legacy = true;
+             device.pin.clear();
          }},
         {"DisplayPin", "a keyboard without passkeys: our side shows a PIN that is typed on it",
-         [](PeerDevice& peer) {
-             peer.legacy = true;
-             peer.displaysPin = true;
+         [](PeerDevice& device) {
+             device.legacy = true;
+             device.displaysPin = true;
          }},
-        {"Rejects", "allows no pairing", ends<PairingEnd::Rejected>},
-        {"RefusesConfirmation", "its user says no", ends<PairingEnd::Refused>},
-        {"NeverAnswers", "falls silent while it pairs", ends<PairingEnd::NeverAnswers>},
-        {"CancelsPairing", "its user stops the pairing", ends<PairingEnd::CancelledByPeer>},
-        {"RepeatedAttempts", "wants fewer attempts", ends<PairingEnd::RepeatedAttempts>},
+        {"Rejects", "allows no pairing", ends(Since::Begun, Errors::authenticationRejected)},
+        {"RefusesConfirmation", "its user says no",
+         ends(Since::Answered, Errors::authenticationFailed)},
+        {"NeverAnswers", "falls silent while it pairs",
+         ends(Since::Answered, Errors::authenticationTimeout, &Times::pairingTimeout)},
+        {"CancelsPairing", "its user stops the pairing",
+         ends(Since::Answered, Errors::authenticationCanceled)},
+        {"RepeatedAttempts", "wants fewer attempts", ends(Since::Begun, Errors::repeatedAttempts)},
         {"VanishesWhilePairing", "its link is lost while the agent is asked",
-         ends<PairingEnd::LinkLost>},
-        {"Slow", "takes 28 seconds to pair", [](PeerDevice& peer) { peer.pairingTime = 28000; }},
-        {"Unconnectable", "is found, but cannot be reached",
-         [](PeerDevice& peer) { peer.connectable = false; }},
+         ends(Since::Asked, Errors::connectionAttemptFailed("Connection Timeout"),
+              &Times::linkLoss)},
+        {"Slow", "takes 28 seconds to pair", with(&PeerDevice::pairingTime, 28000U)},
+        {"Unconnectable", "is found, but cannot be reached", with(&PeerDevice::connectable, false)},
         {"Vanishing", "goes out of range 5 seconds after a discovery began",
-         [](PeerDevice& peer) { peer.visibleFor = 5000; }},
-        {"Known", "was created before", [](PeerDevice& peer) { peer.known = true; }},
+         with(&PeerDevice::visibleFor, 5000U)},
+        {"Known", "was created before", with(&PeerDevice::known, true)},
         {"AlreadyPaired", "was paired before",
-         [](PeerDevice& peer) {
-             peer.known = true;
-             peer.paired = true;
+         [](PeerDevice& device) {
+             device.known = true;
+             device.paired = true;
          }},
     };
     return table;

@@ -3,16 +3,18 @@
 
 #include "world/peer_device.h"
 
+#include <functional>
 #include <string>
 #include <vector>
 
 namespace Bluetooth::Sim {
 
-/// A named set of settings that makes a device behave in one way.
+/// A name for what makes a device behave in one way. The table of them is all that scenarios, the
+/// control interface and --list-behaviours know.
 struct Behaviour {
     const char* name;
     const char* description;
-    void (*apply)(PeerDevice& peer);
+    std::function<void(PeerDevice& device)> apply;
 };
 
 const std::vector<Behaviour>& behaviours();

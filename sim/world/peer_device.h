@@ -3,6 +3,8 @@
 
 #include "serving.h"
 #include "serving/bluez4/capability.h"
+#include "serving/bluez4/errors.h"
+#include "world/times.h"
 
 #include <glib.h>
 
@@ -12,15 +14,16 @@
 
 namespace Bluetooth::Sim {
 
-/// How a pairing with a device ends, whatever the user of the agent answers.
-enum class PairingEnd {
-    AsAnswered,       ///< well, when the agent's answer is right
-    Rejected,         ///< the device does not allow pairing
-    Refused,          ///< its user says no
-    NeverAnswers,     ///< it falls silent: the pairing times out
-    CancelledByPeer,  ///< its user stops the pairing
-    RepeatedAttempts, ///< it wants fewer attempts
-    LinkLost          ///< it goes out of range while the agent is asked
+/// How a pairing with a device ends, whatever the agent answers.
+struct PairingEnd {
+    enum class Since {
+        Begun,   ///< the agent is not asked at all
+        Asked,   ///< the agent is asked meanwhile, and its answer changes nothing
+        Answered ///< the agent is asked first
+    };
+    Since since;
+    BluezError error;
+    guint Times::*after = nullptr; ///< how long it takes, when not as long as any pairing
 };
 
 /// A device in the air: what it is, not what a daemon knows of it.
@@ -47,7 +50,7 @@ struct PeerDevice {
     bool legacy = false;
     bool displaysPin = false; ///< a legacy keyboard: we choose the PIN and show it
     Capability capability = Capability::DisplayYesNo;
-    PairingEnd pairingEnd = PairingEnd::AsAnswered;
+    std::optional<PairingEnd> pairingEnd; ///< not set: well, when the agent's answer is right
     std::string pin = "0000";
     std::optional<guint32> passkey; ///< random when not set
     std::optional<guint> pairingTime;

@@ -6,7 +6,8 @@
 #include "world/behaviour.h"
 
 #include <algorithm>
-#include <limits>
+#include <iterator>
+#include <optional>
 
 namespace Bluetooth::Sim {
 
@@ -23,19 +24,6 @@ guint64 number(const std::string& text, guint64 most) {
     return value;
 }
 
-gint16 signedNumber(const std::string& text) {
-    gint64 value = 0;
-    if (!g_ascii_string_to_signed(text.c_str(), 10, G_MININT16, G_MAXINT16, &value, nullptr))
-        throw std::invalid_argument("\"" + text + "\" is not a number from -32768 to 32767");
-    return static_cast<gint16>(value);
-}
-
-bool flag(const std::string& text) {
-    if (text != "true" && text != "false")
-        throw std::invalid_argument("\"" + text + "\" is neither true nor false");
-    return text == "true";
-}
-
 std::vector<std::string> list(const std::string& text) {
     std::vector<std::string> items;
     const GlibPtr<char*> parts(g_strsplit(text.c_str(), ";", -1));
@@ -45,143 +33,187 @@ std::vector<std::string> list(const std::string& text) {
     return items;
 }
 
-std::vector<std::string> uuidList(const std::string& text) {
-    std::vector<std::string> uuids;
+// How a setting of each type is written; std::invalid_argument says what is wrong with another.
+
+void parse(const std::string& text, std::string& value) {
+    value = text;
+}
+
+void parse(const std::string& text, bool& value) {
+    if (text != "true" && text != "false")
+        throw std::invalid_argument("\"" + text + "\" is neither true nor false");
+    value = text == "true";
+}
+
+void parse(const std::string& text, guint32& value) {
+    value = static_cast<guint32>(number(text, G_MAXUINT32));
+}
+
+void parse(const std::string& text, guint16& value) {
+    value = static_cast<guint16>(number(text, G_MAXUINT16));
+}
+
+void parse(const std::string& text, gint16& value) {
+    gint64 parsed = 0;
+    if (!g_ascii_string_to_signed(text.c_str(), 10, G_MININT16, G_MAXINT16, &parsed, nullptr))
+        throw std::invalid_argument("\"" + text + "\" is not a number from -32768 to 32767");
+    value = static_cast<gint16>(parsed);
+}
+
+void parse(const std::string& text, Capability& value) {
+    const auto capability = parseCapability(text);
+    if (!capability)
+        throw std::invalid_argument("\"" + text + "\" is not a capability");
+    value = *capability;
+}
+
+/// UUIDs
+void parse(const std::string& text, std::vector<std::string>& value) {
+    value.clear();
     for (const std::string& item : list(text)) {
-        uuids.push_back(fullUuid(item));
-        if (uuids.back().empty())
+        value.push_back(fullUuid(item));
+        if (value.back().empty())
             throw std::invalid_argument("\"" + item + "\" is not a UUID");
     }
-    return uuids;
 }
 
 template <class T>
-guint32 u32(const T& text) {
-    return static_cast<guint32>(number(text, G_MAXUINT32));
-}
-
-guint16 u16(const std::string& text) {
-    return static_cast<guint16>(number(text, G_MAXUINT16));
+void parse(const std::string& text, std::optional<T>& value) {
+    parse(text, value.emplace());
 }
 
 template <class T>
-struct Key {
+struct SettingKey {
     const char* name;
-    void (*set)(T& target, const std::string& value);
+    void (*set)(T& target, const std::string& text);
 };
 
-template <class T>
-void apply(T& target, const Key<T>* keys, std::size_t count, const std::string& name,
-           const std::string& value) {
-    const Key<T>* end = keys + count;
-    const Key<T>* key = std::find_if(keys, end, [&](const Key<T>& k) { return name == k.name; });
-    if (key == end)
-        throw SettingError(name, "there is no such key");
-    try {
-        key->set(target, value);
-    } catch (const std::invalid_argument& wrong) {
-        throw SettingError(name, wrong.what());
+template <auto Member, class T>
+void set(T& target, const std::string& text) {
+    parse(text, target.*Member);
+}
+
+template <auto Member, guint32 Most, class T>
+void setUpTo(T& target, const std::string& text) {
+    target.*Member = static_cast<guint32>(number(text, Most));
+}
+
+const SettingKey<PeerDevice> deviceKeys[] = {
+    {"Name", set<&PeerDevice::name>},
+    {"Adapter", set<&PeerDevice::adapter>},
+    {"Class", set<&PeerDevice::deviceClass>},
+    {"RSSI", set<&PeerDevice::rssi>},
+    {"RSSIVariation", setUpTo<&PeerDevice::rssiVariation, 100>},
+    {"UUIDs", set<&PeerDevice::uuids>},
+    {"Vendor", set<&PeerDevice::vendor>},
+    {"Product", set<&PeerDevice::product>},
+    {"Version", set<&PeerDevice::version>},
+    {"Present", set<&PeerDevice::present>},
+    {"Connectable", set<&PeerDevice::connectable>},
+    {"NameInInquiry", set<&PeerDevice::nameInInquiry>},
+    {"LowEnergy", set<&PeerDevice::lowEnergy>},
+    {"Broadcaster", set<&PeerDevice::broadcaster>},
+    {"ConnectsBack", set<&PeerDevice::connectsBack>},
+    {"VisibleFor", set<&PeerDevice::visibleFor>},
+    {"LegacyPairing", set<&PeerDevice::legacy>},
+    {"Capability", set<&PeerDevice::capability>},
+    {"PIN", set<&PeerDevice::pin>},
+    {"Passkey", setUpTo<&PeerDevice::passkey, 999999>},
+    {"PairingTime", set<&PeerDevice::pairingTime>},
+    {"Known", set<&PeerDevice::known>},
+    {"Paired",
+     [](PeerDevice& device, const std::string& text) {
+         parse(text, device.paired);
+         device.known = device.known || device.paired;
+     }},
+    {"Trusted", set<&PeerDevice::trusted>},
+    {"Blocked", set<&PeerDevice::blocked>},
+    {"Alias", set<&PeerDevice::alias>},
+};
+
+const SettingKey<AdapterHardware> adapterKeys[] = {
+    {"Address",
+     [](AdapterHardware& adapter, const std::string& text) {
+         if (!isAddress(text))
+             throw std::invalid_argument("\"" + text + "\" is not an address");
+         adapter.address = upperCase(text);
+     }},
+    {"Name", set<&AdapterHardware::name>},
+    {"Class", set<&AdapterHardware::deviceClass>},
+    {"Powered", set<&AdapterHardware::powered>},
+    {"Discoverable", set<&AdapterHardware::discoverable>},
+    {"Pairable", set<&AdapterHardware::pairable>},
+    {"DiscoverableTimeout", set<&AdapterHardware::discoverableTimeout>},
+    {"PairableTimeout", set<&AdapterHardware::pairableTimeout>},
+    {"UUIDs", set<&AdapterHardware::uuids>},
+};
+
+template <guint Times::*Member>
+constexpr auto setTime = setUpTo<Member, G_MAXINT, Times>;
+
+const SettingKey<Times> timeKeys[] = {
+    {"Inquiry", setTime<&Times::inquiry>},
+    {"InquiryGap", setTime<&Times::inquiryGap>},
+    {"FirstFound", setTime<&Times::firstFound>},
+    {"FoundInterval", setTime<&Times::foundInterval>},
+    {"NameRequest", setTime<&Times::nameRequest>},
+    {"Connect", setTime<&Times::connect>},
+    {"PageTimeout", setTime<&Times::pageTimeout>},
+    {"ServiceSearch", setTime<&Times::serviceSearch>},
+    {"ReverseSearch", setTime<&Times::reverseSearch>},
+    {"Pairing", setTime<&Times::pairing>},
+    {"KeyPress", setTime<&Times::keyPress>},
+    {"LinkLoss", setTime<&Times::linkLoss>},
+    {"IdleDisconnect", setTime<&Times::idleDisconnect>},
+    {"DisconnectRequest", setTime<&Times::disconnectRequest>},
+    {"AudioConnect", setTime<&Times::audioConnect>},
+    {"ControlConnect", setTime<&Times::controlConnect>},
+    {"PairingTimeout", setTime<&Times::pairingTimeout>},
+    {"AgentTimeout", setTime<&Times::agentTimeout>},
+};
+
+/// @param what  what a key is called in the message about an unknown one
+template <class T, std::size_t Count>
+void apply(T& target, const SettingKey<T> (&keys)[Count], const Settings& settings,
+           const char* what = "key") {
+    for (const auto& [name, text] : settings) {
+        const auto* key = std::find_if(std::begin(keys), std::end(keys),
+                                       [&, &n = name](const auto& k) { return n == k.name; });
+        if (key == std::end(keys))
+            throw SettingError(name, std::string("there is no such ") + what);
+        try {
+            key->set(target, text);
+        } catch (const std::invalid_argument& wrong) {
+            throw SettingError(name, wrong.what());
+        }
     }
 }
-
-const Key<PeerDevice> peerKeys[] = {
-    {"Name", [](PeerDevice& p, const std::string& v) { p.name = v; }},
-    {"Adapter", [](PeerDevice& p, const std::string& v) { p.adapter = v; }},
-    {"Class", [](PeerDevice& p, const std::string& v) { p.deviceClass = u32(v); }},
-    {"RSSI", [](PeerDevice& p, const std::string& v) { p.rssi = signedNumber(v); }},
-    {"RSSIVariation",
-     [](PeerDevice& p, const std::string& v) {
-         p.rssiVariation = static_cast<guint>(number(v, 100));
-     }},
-    {"UUIDs", [](PeerDevice& p, const std::string& v) { p.uuids = uuidList(v); }},
-    {"Vendor", [](PeerDevice& p, const std::string& v) { p.vendor = u16(v); }},
-    {"Product", [](PeerDevice& p, const std::string& v) { p.product = u16(v); }},
-    {"Version", [](PeerDevice& p, const std::string& v) { p.version = u16(v); }},
-    {"Present", [](PeerDevice& p, const std::string& v) { p.present = flag(v); }},
-    {"Connectable", [](PeerDevice& p, const std::string& v) { p.connectable = flag(v); }},
-    {"NameInInquiry", [](PeerDevice& p, const std::string& v) { p.nameInInquiry = flag(v); }},
-    {"LowEnergy", [](PeerDevice& p, const std::string& v) { p.lowEnergy = flag(v); }},
-    {"Broadcaster", [](PeerDevice& p, const std::string& v) { p.broadcaster = flag(v); }},
-    {"ConnectsBack", [](PeerDevice& p, const std::string& v) { p.connectsBack = flag(v); }},
-    {"VisibleFor", [](PeerDevice& p, const std::string& v) { p.visibleFor = u32(v); }},
-    {"LegacyPairing", [](PeerDevice& p, const std::string& v) { p.legacy = flag(v); }},
-    {"Capability",
-     [](PeerDevice& p, const std::string& v) {
-         const auto capability = parseCapability(v);
-         if (!capability)
-             throw std::invalid_argument("\"" + v + "\" is not a capability");
-         p.capability = *capability;
-     }},
-    {"PIN", [](PeerDevice& p, const std::string& v) { p.pin = v; }},
-    {"Passkey", [](PeerDevice& p,
-                   const std::string& v) { p.passkey = static_cast<guint32>(number(v, 999999)); }},
-    {"PairingTime", [](PeerDevice& p, const std::string& v) { p.pairingTime = u32(v); }},
-    {"Known", [](PeerDevice& p, const std::string& v) { p.known = flag(v); }},
-    {"Paired",
-     [](PeerDevice& p, const std::string& v) {
-         p.paired = flag(v);
-         p.known = p.known || p.paired;
-     }},
-    {"Trusted", [](PeerDevice& p, const std::string& v) { p.trusted = flag(v); }},
-    {"Blocked", [](PeerDevice& p, const std::string& v) { p.blocked = flag(v); }},
-    {"Alias", [](PeerDevice& p, const std::string& v) { p.alias = v; }},
-};
-
-const Key<AdapterHardware> adapterKeys[] = {
-    {"Address",
-     [](AdapterHardware& a, const std::string& v) {
-         if (!isAddress(v))
-             throw std::invalid_argument("\"" + v + "\" is not an address");
-         a.address = upperCase(v);
-     }},
-    {"Name", [](AdapterHardware& a, const std::string& v) { a.name = v; }},
-    {"Class", [](AdapterHardware& a, const std::string& v) { a.deviceClass = u32(v); }},
-    {"Powered", [](AdapterHardware& a, const std::string& v) { a.powered = flag(v); }},
-    {"Discoverable", [](AdapterHardware& a, const std::string& v) { a.discoverable = flag(v); }},
-    {"Pairable", [](AdapterHardware& a, const std::string& v) { a.pairable = flag(v); }},
-    {"DiscoverableTimeout",
-     [](AdapterHardware& a, const std::string& v) { a.discoverableTimeout = u32(v); }},
-    {"PairableTimeout",
-     [](AdapterHardware& a, const std::string& v) { a.pairableTimeout = u32(v); }},
-    {"UUIDs", [](AdapterHardware& a, const std::string& v) { a.uuids = uuidList(v); }},
-};
 
 } // namespace
 
-void applySettings(PeerDevice& peer, const Settings& settings) {
+void applySettings(PeerDevice& device, const Settings& settings) {
+    Settings others;
     for (const auto& [key, value] : settings) {
-        if (key != "Behaviour")
+        if (key != "Behaviour") {
+            others.emplace_back(key, value);
             continue;
+        }
         for (const std::string& name : list(value)) {
             const Behaviour* behaviour = findBehaviour(name);
             if (!behaviour)
                 throw SettingError(key, "\"" + name + "\" is not a behaviour");
-            behaviour->apply(peer);
+            behaviour->apply(device);
         }
     }
-    for (const auto& [key, value] : settings)
-        if (key != "Behaviour")
-            apply(peer, peerKeys, std::size(peerKeys), key, value);
+    apply(device, deviceKeys, others);
 }
 
 void applySettings(AdapterHardware& adapter, const Settings& settings) {
-    for (const auto& [key, value] : settings)
-        apply(adapter, adapterKeys, std::size(adapterKeys), key, value);
+    apply(adapter, adapterKeys, settings);
 }
 
 void applySettings(Times& times, const Settings& settings) {
-    for (const auto& [key, value] : settings) {
-        const auto& keys = Times::keys();
-        const auto found = std::find_if(keys.begin(), keys.end(),
-                                        [&, &name = key](const auto& k) { return name == k.name; });
-        if (found == keys.end())
-            throw SettingError(key, "there is no such time");
-        try {
-            times.*(found->time) = static_cast<guint>(number(value, G_MAXINT));
-        } catch (const std::invalid_argument& wrong) {
-            throw SettingError(key, wrong.what());
-        }
-    }
+    apply(times, timeKeys, settings, "time");
 }
 
 std::string fullUuid(const std::string& text) {

@@ -27,7 +27,7 @@ using Settings = std::vector<std::pair<std::string, std::string>>;
 
 /// Each of these sets what the keys name, and throws SettingError at the first that is unknown or
 /// has an unusable value. Behaviours are applied first, so that other keys refine them.
-void applySettings(PeerDevice& peer, const Settings& settings);
+void applySettings(PeerDevice& device, const Settings& settings);
 void applySettings(AdapterHardware& adapter, const Settings& settings);
 void applySettings(Times& times, const Settings& settings);
 

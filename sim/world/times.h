@@ -3,9 +3,6 @@
 
 #include <glib.h>
 
-#include <string>
-#include <vector>
-
 namespace Bluetooth::Sim {
 
 /// How long things take, in milliseconds. All but the two last are multiplied by `scale`.
@@ -32,19 +29,17 @@ struct Times {
     guint pairingTimeout = 30000; ///< until a pairing whose agent does not answer is given up
     guint agentTimeout = 60000;   ///< until any other request to an agent is given up
 
-    struct Key {
-        const char* name;
-        guint Times::*time;
-    };
-    /// The names by which scenarios and the control interface set the times.
-    static const std::vector<Key>& keys();
-
     guint scaledSeconds(guint32 seconds) const {
         const double milliseconds = 1000.0 * static_cast<double>(seconds) * scale;
         return milliseconds < G_MAXUINT ? static_cast<guint>(milliseconds) : G_MAXUINT;
     }
     guint scaled(guint milliseconds) const {
         return static_cast<guint>(static_cast<double>(milliseconds) * scale);
+    }
+    /// How long one of these takes.
+    guint lasting(guint Times::*time) const {
+        const bool waitsForClient = time == &Times::pairingTimeout || time == &Times::agentTimeout;
+        return waitsForClient ? this->*time : scaled(this->*time);
     }
 };
 
