@@ -3,6 +3,7 @@
 
 #include "control/call_log.h"
 #include "control/faults.h"
+#include "control/world_control.h"
 #include "daemon/bluetoothd.h"
 #include "serving.h"
 #include "serving/bus/bus_connection.h"
@@ -13,9 +14,6 @@
 #include <string>
 
 namespace Bluetooth::Sim {
-
-class ServedAdapter;
-class ServedDevice;
 
 /// com.kestrine.bluetooth.Sim: what tests and people do to the simulation, apart from what it
 /// simulates, on a connection and under a name of its own.
@@ -38,19 +36,13 @@ private:
 
     bool beforeCall(const CallPtr& call);
     void received(const CallPtr& call);
+    void afterDaemonsMessages(std::function<void()> next);
     void whenGone(std::function<void()> next);
     static void carryOut(const CallPtr& call, const std::function<void()>& what);
 
-    void addAdapter(const CallPtr& call);
-    void removeAdapter(const CallPtr& call);
-    void addDevice(const CallPtr& call);
-    void setDevice(const CallPtr& call);
-    void removeDevice(const CallPtr& call);
-    void connectDevice(const CallPtr& call);
-    void startIncomingPairing(const CallPtr& call);
-    void connectService(const CallPtr& call);
-    void dropLink(const CallPtr& call);
-    void setPlaying(const CallPtr& call);
+    /// Lets the world change, and answers with what came of it.
+    template <auto Function>
+    void inWorld(const CallPtr& call);
     void emitSignal(const CallPtr& call);
     void callAgent(const CallPtr& call);
     void failNext(const CallPtr& call);
@@ -58,23 +50,16 @@ private:
     void clearFaults(const CallPtr& call);
     void getCalls(const CallPtr& call);
     void clearCalls(const CallPtr& call);
-    void setTimeScale(const CallPtr& call);
-    void setTimes(const CallPtr& call);
     void dropName(const CallPtr& call);
     void regainName(const CallPtr& call);
     void restart(const CallPtr& call);
     void quit(const CallPtr& call);
 
     void done(const CallPtr& call, const Value& results = {});
-    void comeIn(const CallPtr& call, bool pairing);
-    ServedAdapter& adapter(const std::string& id);
-    std::shared_ptr<ServedDevice> device(const CallPtr& call);
-    std::shared_ptr<PeerDevice> peer(const std::string& address);
-    void peerChanged(const std::shared_ptr<PeerDevice>& peer);
 
-    World& m_world;
     bool m_verbose;
     Bluetoothd m_daemon;
+    WorldControl m_worldControl;
     Faults m_faults;
     CallLog m_calls;
     std::function<void()> m_quit;
