@@ -15,7 +15,7 @@
 #include <bluetooth/scanner.h>
 
 #include <atomic>
-#include <functional>
+#include <future>
 #include <memory>
 #include <thread>
 
@@ -62,26 +62,6 @@ bool scanUntilFound() {
     return true;
 }
 
-/// Does something again and again on a thread of its own.
-class Meanwhile {
-public:
-    explicit Meanwhile(std::function<void()> task)
-        : m_thread([this, task = std::move(task)] {
-              while (!m_stop)
-                  task();
-          }) {}
-    ~Meanwhile() {
-        m_stop = true;
-        m_thread.join();
-    }
-    Meanwhile(const Meanwhile&) = delete;
-    Meanwhile& operator=(const Meanwhile&) = delete;
-
-private:
-    std::atomic<bool> m_stop{false};
-    std::thread m_thread;
-};
-
 } // namespace
 
 /// The simulated daemon, a session bus, and the scanner service in its own process.
@@ -112,8 +92,13 @@ protected:
 };
 
 TEST_F(DaemonLossTest, ListsAndTheScannerSurviveADaemonThatComesAndGoes) {
-    const Meanwhile listing([] { listAll(); });
-    const Meanwhile asking([] { scan(); });
+    std::atomic<bool> done{false};
+    const auto repeat = [&done](long (*task)()) {
+        while (!done)
+            task();
+    };
+    const auto listing = std::async(std::launch::async, repeat, listAll);
+    const auto asking = std::async(std::launch::async, repeat, scan);
     dropAndRegain(20);
     const Holdings before;
     dropAndRegain(soakCount(1'000));
@@ -124,6 +109,7 @@ TEST_F(DaemonLossTest, ListsAndTheScannerSurviveADaemonThatComesAndGoes) {
     EXPECT_TRUE(scanner.removeFinder("hci0"));
     EXPECT_TRUE(scanUntilFound());
     EXPECT_FALSE(service.hasEnded());
+    done = true;
 }
 
 TEST_F(DaemonLossTest, TheLossOfTheBusEndsAScanWithErrors) {

@@ -23,14 +23,17 @@
 #include <fstream>
 #include <functional>
 #include <memory>
+#include <utility>
 
 // The library's failures are logged by the thousand here; recording them would take memory.
 extern "C" void syslog(int /*priority*/, const char* /*format*/, ...) {}
 
 namespace {
 
-thread_local int untilFailure = 0; // 0: none fails; below: it has
-std::atomic<long> liveBlocks{0};   // how many the process holds
+/// Which allocation of this thread fails, from 1; 0: none does; below: one has. The malloc()
+/// here takes the place of the C library's, for libdbus and the C++ library too.
+thread_local int untilFailure = 0;
+std::atomic<long> liveBlocks{0}; // how many the process holds
 
 } // namespace
 
@@ -94,19 +97,6 @@ namespace Bluetooth::Test {
 
 namespace {
 
-/// Makes one allocation of this thread fail while it lives: the `which`th, from 1. The executable's
-/// own malloc() takes the place of the C library's, for libdbus and the C++ library too.
-class FailingMalloc {
-public:
-    explicit FailingMalloc(int which) { untilFailure = which; }
-    ~FailingMalloc() { untilFailure = 0; }
-    FailingMalloc(const FailingMalloc&) = delete;
-    FailingMalloc& operator=(const FailingMalloc&) = delete;
-
-    /// Whether that many allocations were made, so that one has failed.
-    static bool hasFailed() { return untilFailure < 0; }
-};
-
 using Operation = std::function<bool()>;
 
 void onDict(RemoteObject*, const char*, const Dict* dict) {
@@ -114,7 +104,7 @@ void onDict(RemoteObject*, const char*, const Dict* dict) {
 }
 
 void appendProperties(Writer& w) {
-    w("00:11:22:33:44:55").dict("sv", [](Writer& d) {
+    w.dict("sv", [](Writer& d) {
         d.entry("Name", Var{"a name that does not fit into the string itself"});
         d.entry("Class", Var{360u});
         d.entryWith("UUIDs", [](Writer& v) {
@@ -127,15 +117,12 @@ void appendProperties(Writer& w) {
 int failEachAllocation(const char* name, const Operation& operation) {
     for (int which = 1;; ++which) {
         bool succeeded = false;
-        bool failed = false;
-        {
-            const FailingMalloc failing(which);
-            try {
-                succeeded = operation();
-            } catch (const std::bad_alloc&) {
-            }
-            failed = failing.hasFailed();
+        untilFailure = which;
+        try {
+            succeeded = operation();
+        } catch (const std::bad_alloc&) {
         }
+        const bool failed = std::exchange(untilFailure, 0) < 0; // were so many made?
         EXPECT_TRUE(failed || succeeded) << name;
         EXPECT_TRUE(operation()) << name << " after allocation " << which << " had failed";
         if (!failed || ::testing::Test::HasFailure())
@@ -193,8 +180,7 @@ TEST_F(MemoryTest, CallsAndSubscriptionsSurviveEachFailedAllocation) {
     const auto subscriber = busProxy("/");
     ASSERT_EQ(subscriber->setSignalHandlerStringDict("Changed", onDict), 0);
     const MessagePtr signal(dbus_message_new_signal("/", DBUS_INTERFACE_DBUS, "Changed"));
-    Writer writer(signal.get());
-    appendProperties(writer);
+    appendProperties(Writer(signal.get())("00:11:22:33:44:55"));
     checkEachAllocation("a signal", [&] {
         subscriber->signalHandlerDispatcherStringDict(signal.get());
         return true;
@@ -223,10 +209,7 @@ TEST_F(MemoryTest, DecodingAndTextSurviveEachFailedAllocation) {
     const PrivateBus bus(PrivateBus::Kind::Session);
     RemoteObject proxy(peerName, peerPath, peerInterface, DBUS_BUS_SESSION);
     const MessagePtr reply(dbus_message_new(DBUS_MESSAGE_TYPE_METHOD_RETURN));
-    Writer(reply.get()).dict("sv", [](Writer& d) {
-        d.entry("Name", Var{"a name that does not fit into the string itself"});
-        d.entry("Address", Var{"00:11:22:33:44:55"}).entry("Class", Var{360u});
-    });
+    const Writer arguments(reply.get(), appendProperties);
     checkEachAllocation("a dictionary and its text", [&] {
         Dict dict;
         proxy.setReplyMessage(dbus_message_ref(reply.get()));

@@ -20,23 +20,18 @@ void look(const std::string& text) {
         abort();
 }
 
-void onNothing(RemoteObject*) {}
-void onString(RemoteObject*, const char* text) {
-    look(text);
-}
-void onPath(RemoteObject*, const ObjectPath* path) {
-    look(*path);
-}
-void onVariant(RemoteObject*, const char* name, const Variant* value) {
-    look(dictToString({{name, *value}}));
-}
-void onDict(RemoteObject*, const char* text, const Dict* dict) {
-    look(dictConquerToString(*dict, text));
-}
-
 RemoteObject* subscribe() {
     static const Test::PrivateBus bus(Test::PrivateBus::Kind::Session);
     auto* proxy = new RemoteObject("org.bluez", Fuzz::path, Fuzz::interface, DBUS_BUS_SESSION);
+    const auto onNothing = [](RemoteObject*) {};
+    const auto onString = [](RemoteObject*, const char* text) { look(text); };
+    const auto onPath = [](RemoteObject*, const ObjectPath* path) { look(*path); };
+    const auto onVariant = [](RemoteObject*, const char* name, const Variant* value) {
+        look(dictToString({{name, *value}}));
+    };
+    const auto onDict = [](RemoteObject*, const char* text, const Dict* dict) {
+        look(dictConquerToString(*dict, text));
+    };
     if (proxy->setSignalHandlerNoArgument(Fuzz::member, onNothing) != 0 ||
         proxy->setSignalHandlerString(Fuzz::member, onString) != 0 ||
         proxy->setSignalHandlerObjectPath(Fuzz::member, onPath) != 0 ||
