@@ -30,42 +30,36 @@ std::string outputOf(const Texts& command, int status = 1) {
 }
 
 /// A daemon in the foreground, and its log.
-class Daemon {
-public:
+struct Daemon : ChildProcess {
     explicit Daemon(const std::string& arguments = "--interval 1 --max-interval 1")
-        : m_process(commandLine("--foreground " + arguments), ChildProcess::Output::Capture) {}
+        : ChildProcess(commandLine("--foreground " + arguments), Output::Capture) {}
     ~Daemon() {
-        if (!m_process.hasEnded()) {
+        if (!hasEnded()) {
             EXPECT_EQ(stop(), 0);
         }
     }
-    Daemon(const Daemon&) = delete;
-    Daemon& operator=(const Daemon&) = delete;
 
     /// @return whether the line has come; lines before it are passed over
     bool waitFor(const std::string& text, Milliseconds limit = patience) {
-        for (;;) {
-            const std::string line = m_process.readLine(limit);
+        do {
+            const std::string line = readLine(limit);
             if (line.empty())
                 return false;
-            m_log.push_back(line.substr(line.find(": ") + 2)); // "kesbt-autoconnectd[5]: "
-            if (m_log.back() == text)
-                return true;
-        }
+            passed.push_back(line.substr(line.find(": ") + 2)); // "kesbt-autoconnectd[5]: "
+        } while (passed.back() != text);
+        return true;
     }
     /// Ends it. @return its exit status
     int stop(int signal = SIGTERM) {
-        m_process.signal(signal);
-        return m_process.wait();
+        this->signal(signal);
+        return wait();
     }
     /// How often a line has been passed so far.
     long count(const std::string& text) const {
-        return std::count(m_log.begin(), m_log.end(), text);
+        return std::count(passed.begin(), passed.end(), text);
     }
 
-private:
-    ChildProcess m_process;
-    Texts m_log;
+    Texts passed;
 };
 
 } // namespace
@@ -127,15 +121,10 @@ TEST_F(AutoConnectDaemonTest, EveryCommandOfManySendersArrivesAlsoThroughAPipeMa
     ASSERT_TRUE(daemon.waitFor("started"));
     constexpr int senders = 4;
     constexpr int each = 50;
-    std::vector<std::thread> threads;
-    threads.reserve(senders);
-    for (int sender = 0; sender < senders; ++sender)
-        threads.emplace_back([] {
-            for (int count = 0; count < each; ++count)
-                EXPECT_TRUE(AutoConnect().pause());
-        });
-    for (std::thread& thread : threads)
-        thread.join();
+    inThreads(senders, [](int) {
+        for (int count = 0; count < each; ++count)
+            EXPECT_TRUE(AutoConnect().pause());
+    });
     EXPECT_TRUE(autoConnect.resume());
     EXPECT_TRUE(daemon.waitFor("resumed"));
     EXPECT_EQ(daemon.count("paused"), senders * each);

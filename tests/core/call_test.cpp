@@ -5,6 +5,7 @@
 
 #include <bluetooth/connection.h>
 
+#include <array>
 #include <limits>
 
 namespace Bluetooth::Test {
@@ -70,12 +71,7 @@ TEST_F(CallTest, UnusableArgumentsAreRefusedAndTheCallCanStillBeMade) {
 }
 
 TEST_F(CallTest, UnusableNamesMakeNoMessageAndEveryStepAfterFails) {
-    const struct {
-        const char* destination;
-        const char* path;
-        const char* interface;
-        const char* method;
-    } cases[] = {
+    const std::array<const char*, 4> cases[] = {
         {"no name", peerPath, peerInterface, "Take"}, {"", peerPath, peerInterface, "Take"},
         {peerName, "dev", peerInterface, "Take"},     {peerName, "/a/", peerInterface, "Take"},
         {peerName, peerPath, "nodot", "Take"},        {peerName, peerPath, notUtf8, "Take"},

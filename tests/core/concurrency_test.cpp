@@ -93,22 +93,14 @@ TEST_F(ConcurrencyTest, NoReplyAndNoSignalIsLostWhenFourThreadsCallAndCallbacksC
                             [&](Writer& w) { w(std::to_string(emitted)); });
         } while (!callsDone.wait(Milliseconds(5)));
     });
-    std::vector<Echoes> echoes(4);
-    std::vector<std::thread> callers;
-    callers.reserve(echoes.size());
-    for (Echoes& result : echoes)
-        callers.emplace_back([&] {
-            result = callEchoes(callsPerThread, std::to_string(&result - echoes.data()) + "-");
-        });
-    for (std::thread& thread : callers)
-        thread.join();
+    inThreads(4, [](int caller) {
+        const Echoes echoes = callEchoes(callsPerThread, std::to_string(caller) + "-");
+        EXPECT_EQ(echoes.failures, 0);
+        EXPECT_LT(echoes.longest(), std::chrono::seconds(1));
+    });
     callsDone.open();
     emitter.join();
 
-    for (const Echoes& result : echoes) {
-        EXPECT_EQ(result.failures, 0);
-        EXPECT_LT(result.longest(), std::chrono::seconds(1));
-    }
     const auto deadline = Clock::now() + patience;
     while (numbers.next < emitted && Clock::now() < deadline)
         callEchoes(1, "wait"); // passes the time usefully

@@ -36,8 +36,7 @@ Texts namesOf(DeviceList* list) {
 class AutoConnectTest : public AutoConnectFixture {
 protected:
     static void power(const char* adapter, bool on) {
-        const std::unique_ptr<Manager> manager(Manager::getManager());
-        const std::unique_ptr<Adapter> proxy(manager->findAdapter(adapter));
+        const std::unique_ptr<Adapter> proxy(Manager().findAdapter(adapter));
         EXPECT_EQ(proxy->setProperty("Powered", on), 0);
         delete proxy->getProperties(); // answered after that
     }

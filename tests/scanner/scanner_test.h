@@ -10,6 +10,7 @@
 
 #include <memory>
 #include <string>
+#include <thread>
 
 namespace Bluetooth::Test {
 
@@ -23,11 +24,15 @@ inline constexpr const char* speaker = "00:11:22:33:44:03"; // in reach of hci1 
 /// An answer that tells of no device, as argumentsOf() writes it.
 inline constexpr const char* emptyAnswer = "a(e(s: s:))";
 
+inline bool lists(const std::string& answer, const char* address) {
+    return answer.find(std::string("s:") + address) != std::string::npos;
+}
+
 /// The simulated daemon and a session bus, for a scanner service. Discovery goes in rounds of
 /// 0.1 s.
 class ScannerTest : public ::testing::Test {
 protected:
-    ScannerTest();
+    ScannerTest() { simulation.watchCalls(); }
 
     void comeInReach(const char* address) { simulation.setDevice(address, "Present", true); }
 
@@ -41,27 +46,52 @@ protected:
         return std::string("/") + adapter + " s:org.bluez.Adapter s:" + what + "Discovery ";
     }
     /// @return the path of an adapter
-    std::string pathOf(const char* adapter);
+    std::string pathOf(const char* adapter) {
+        const auto pattern = [adapter](Writer& w) { w(adapter); };
+        const MessagePtr reply =
+            system.call("org.bluez", "/", "org.bluez.Manager", "FindAdapter", pattern).get();
+        return argumentsOf(reply.get()).substr(std::string("o:").size());
+    }
 
     /// Calls the service and awaits its answer.
     /// @return its arguments as text; for an error its text after "ERROR "
-    std::string call(const char* method, const char* adapterId);
+    std::string call(const char* method, const char* adapterId) {
+        const auto id = [adapterId](Writer& w) { w(adapterId); };
+        const MessagePtr reply = session.call(serviceName, "/", serviceInterface, method, id).get();
+        if (!reply)
+            return "ERROR no reply";
+        const std::string arguments = argumentsOf(reply.get());
+        return dbus_message_get_type(reply.get()) == DBUS_MESSAGE_TYPE_ERROR
+                   ? "ERROR " + arguments.substr(std::string("s:").size())
+                   : arguments;
+    }
     std::string ask(const char* adapterId) { return call("ListDevices", adapterId); }
     /// Asks until a device is listed, or gone: the service tells nobody when it has found
     /// something.
     /// @return the last answer
-    std::string askUntilListed(const char* adapterId, const char* address, bool listed = true);
+    std::string askUntilListed(const char* adapterId, const char* address, bool listed = true) {
+        const auto end = std::chrono::steady_clock::now() + patience;
+        std::string answer = ask(adapterId);
+        while (lists(answer, address) != listed && std::chrono::steady_clock::now() < end) {
+            std::this_thread::sleep_for(Milliseconds(10));
+            answer = ask(adapterId);
+        }
+        EXPECT_EQ(lists(answer, address), listed) << address << ": " << answer;
+        return answer;
+    }
 
     SyslogCapture log;
-    Simulation simulation;
+    Simulation simulation{
+        // Nothing is in reach until a test says so.
+        "[Adapter hci0]\nAddress=00:1A:7D:DA:71:10\n[Adapter hci1]\nAddress=00:1A:7D:DA:71:11\n"
+        "[Device 00:11:22:33:44:01]\nName=Mouse\nAdapter=hci0\nBehaviour=AlreadyPaired\n"
+        "Present=false\n"
+        "[Device 00:11:22:33:44:02]\nName=Phone\nClass=360\nRSSI=-60\nPresent=false\n"
+        "[Device 00:11:22:33:44:03]\nName=Speaker\nAdapter=hci1\nPresent=false\n"};
     RawPeer& system = simulation.peer();
     PrivateBus sessionBus{PrivateBus::Kind::Session, SESSION_BUS_CONFIGURATION};
     RawPeer session{sessionBus.address()};
 };
-
-inline bool lists(const std::string& answer, const char* address) {
-    return answer.find(std::string("s:") + address) != std::string::npos;
-}
 
 } // namespace Bluetooth::Test
 

@@ -6,6 +6,7 @@
 #include <cstddef>
 #include <mutex>
 #include <string>
+#include <thread>
 #include <utility>
 #include <vector>
 
@@ -83,6 +84,17 @@ public:
 private:
     Recorder<bool> m_opened;
 };
+
+/// Does a task in several threads at once, which are numbered from 0, and waits for their ends.
+template <class Task>
+void inThreads(int count, const Task& task) {
+    std::vector<std::thread> threads;
+    threads.reserve(static_cast<std::size_t>(count));
+    for (int number = 0; number < count; ++number)
+        threads.emplace_back(task, number);
+    for (std::thread& thread : threads)
+        thread.join();
+}
 
 } // namespace Bluetooth::Test
 
