@@ -104,6 +104,17 @@ TEST_F(PendingTest, WhatComesAtOnceIsNotLeftToTheReceiveThread) {
     EXPECT_EQ(served().count(), static_cast<std::size_t>(rounds));
 }
 
+TEST_F(PendingTest, ACallbackThatWaitsServesRequestsToo) {
+    serveAgent();
+    pairAsks(1);
+    ASSERT_EQ(proxy.setSignalHandlerNoArgument(
+                  "Changed", [](RemoteObject* receiver) { callPending(*receiver, "Pair"); }),
+              0);
+    const RunningLoop running(loop);
+    peer.emit(peerPath, peerInterface, "Changed");
+    EXPECT_TRUE(served().waitFor(1));
+}
+
 TEST_F(PendingTest, ALateReplyAfterAnInterruptionChangesNothing) {
     auto doomed = std::make_unique<RemoteObject>(peerName, peerPath, peerInterface, busType);
     for (const auto& [number, caller] :
