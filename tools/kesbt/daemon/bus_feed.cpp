@@ -49,7 +49,7 @@ int BusFeed::fd() const {
     return descriptor;
 }
 
-bool BusFeed::next(Signal& signal) {
+bool BusFeed::next(BusSignal& signal) {
     DBusConnection* connection = m_connection.get();
     dbus_connection_read_write(connection, 0);
     while (const std::unique_ptr<DBusMessage, Unref> message{
@@ -70,12 +70,12 @@ bool BusFeed::next(Signal& signal) {
     return false;
 }
 
-bool BusFeed::isDaemonChange(const Signal& signal) {
+bool BusFeed::isDaemonChange(const BusSignal& signal) {
     return signal.interface == DBUS_INTERFACE_DBUS && signal.member == ownerChanged &&
            signal.arguments.size() == 3;
 }
 
-bool BusFeed::isDaemonGone(const Signal& signal) {
+bool BusFeed::isDaemonGone(const BusSignal& signal) {
     return isDaemonChange(signal) && display(signal.arguments[2]).empty();
 }
 

@@ -12,7 +12,7 @@
 namespace Kesbt {
 
 /// One signal with all that it carries.
-struct Signal {
+struct BusSignal {
     std::string path;
     std::string interface;
     std::string member;
@@ -32,11 +32,11 @@ public:
     /// For waitForInput(), once next() has returned false.
     int fd() const;
     /// @return false when no signal is there. A Failure when the bus has gone.
-    bool next(Signal& signal);
+    bool next(BusSignal& signal);
 
     /// Whether the signal tells that bluetoothd came or went.
-    static bool isDaemonChange(const Signal& signal);
-    static bool isDaemonGone(const Signal& signal);
+    static bool isDaemonChange(const BusSignal& signal);
+    static bool isDaemonGone(const BusSignal& signal);
 
 private:
     struct Close {

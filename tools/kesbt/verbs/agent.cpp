@@ -1,6 +1,6 @@
 #include "command/verb.h"
-#include "daemon/bluez.h"
 #include "daemon/bus_feed.h"
+#include "daemon/objects.h"
 #include "daemon/shown_agent.h"
 #include "show/style.h"
 #include "show/text.h"
@@ -55,7 +55,7 @@ void answerRequests(DBusConnection* connection) {
 
 bool hasDaemonGone(BusFeed& daemon) {
     bool hasGone = false;
-    for (Signal signal; daemon.next(signal);)
+    for (BusSignal signal; daemon.next(signal);)
         hasGone = hasGone || BusFeed::isDaemonGone(signal);
     return hasGone;
 }

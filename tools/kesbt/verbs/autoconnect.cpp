@@ -1,7 +1,7 @@
 #include "command/answer_limit.h"
 #include "command/verb.h"
-#include "daemon/autoconnect_file.h"
-#include "daemon/bluez.h"
+#include "daemon/autoconnect_list.h"
+#include "daemon/objects.h"
 #include "show/text.h"
 
 #include <bluetooth/auto_connect.h>
@@ -22,7 +22,7 @@ std::string adapterAddress(const Options& options) {
     return readProperties(*adapter).value("Address", "");
 }
 
-void show(const Options& options, const AutoConnectFile& file, const std::string& adapter) {
+void show(const Options& options, const AutoConnectList& file, const std::string& adapter) {
     const Json document = {{"adapterAddress", adapter},
                            {"file", file.path()},
                            {"enabled", file.isEnabled()},
@@ -39,19 +39,19 @@ void show(const Options& options, const AutoConnectFile& file, const std::string
 
 void showFile(const Options& options) {
     const std::string adapter = adapterAddress(options);
-    show(options, AutoConnectFile(adapter), adapter);
+    show(options, AutoConnectList(adapter), adapter);
 }
 
 void enable(const Options& options, bool enabled) {
     const std::string adapter = adapterAddress(options);
-    AutoConnectFile file(adapter);
+    AutoConnectList file(adapter);
     file.write(enabled);
     show(options, file, adapter);
 }
 
 void change(const Options& options, const std::string& device, bool listed) {
     const std::string adapter = adapterAddress(options);
-    AutoConnectFile file(adapter);
+    AutoConnectList file(adapter);
     if (!listed && !file.has(device))
         throw Failure(device + " is not in the list; see what is: kesbt autoconnect show");
     if (listed && !file.has(device))
@@ -66,7 +66,7 @@ void listKnown(const Options& options) {
     const AnswerLimit limit;
     openManager();
     const std::string adapter = adapterAddress(options);
-    AutoConnectFile file(adapter);
+    AutoConnectList file(adapter);
     file.checkWritable(); // unknown devices are taken out of an enabled list
     const std::unique_ptr<Bluetooth::DeviceList> devices(
         AutoConnect().getDeviceList(adapter.c_str()));

@@ -1,7 +1,7 @@
 #include "command/verb.h"
-#include "daemon/bluez.h"
 #include "daemon/bus_feed.h"
-#include "daemon/receive_loop.h"
+#include "daemon/objects.h"
+#include "daemon/signal_delivery.h"
 #include "show/device_watch.h"
 #include "wait/waiting.h"
 
@@ -59,7 +59,7 @@ void watch(const Options& options, const Bluetooth::Adapter& adapter, BusFeed& d
             else if (event->kind == Event::Kind::Powered && event->value == false)
                 throw adapterOff(adapterName(adapter));
         }
-        for (Signal signal; daemon.next(signal);) {
+        for (BusSignal signal; daemon.next(signal);) {
             if (BusFeed::isDaemonGone(signal))
                 throw daemonLost();
         }
@@ -74,7 +74,7 @@ void discover(const Options& options, double seconds) {
     const std::string name = adapterName(*adapter);
     BusFeed daemon({BusFeed::daemonRule});
     subscribe(*manager, *adapter);
-    const ReceiveLoop loop(*adapter);
+    const SignalDelivery delivery(*adapter);
 
     ask(options, "cannot start a discovery on " + name, *adapter, "StartDiscovery");
     const auto isDiscovering = [&] {

@@ -1,6 +1,6 @@
 #include "command/verb.h"
-#include "daemon/bluez.h"
 #include "daemon/bus_feed.h"
+#include "daemon/objects.h"
 #include "show/style.h"
 #include "show/text.h"
 #include "wait/waiting.h"
@@ -26,7 +26,7 @@ std::string shortPath(const std::string& path) {
     return adapter + "/" + address;
 }
 
-std::string argumentText(const Signal& signal) {
+std::string argumentText(const BusSignal& signal) {
     if (signal.member == "PropertyChanged" && signal.arguments.size() == 2)
         return display(signal.arguments[0]) + " = " + display(signal.arguments[1]);
     return display(signal.arguments);
@@ -52,7 +52,7 @@ void printDaemon(const Options& options, bool isThere) {
         printLine("bluetoothd", isThere ? "is on the bus" : "has left the bus", "");
 }
 
-void printSignal(const Options& options, const Signal& signal) {
+void printSignal(const Options& options, const BusSignal& signal) {
     if (BusFeed::isDaemonChange(signal)) {
         printDaemon(options, !BusFeed::isDaemonGone(signal));
         return;
@@ -76,7 +76,7 @@ void monitor(const Options& options) {
     openManager(); // without a daemon to watch the user has most likely mistaken something
     printDaemon(options, true);
     while (!interrupt.came()) {
-        for (Signal signal; feed.next(signal);)
+        for (BusSignal signal; feed.next(signal);)
             printSignal(options, signal);
         waitForInput({feed.fd(), interrupt.fd()});
     }

@@ -1,6 +1,6 @@
 #include "command/answer_limit.h"
 #include "command/verb.h"
-#include "daemon/bluez.h"
+#include "daemon/objects.h"
 #include "wait/waiting.h"
 
 #include <iostream>

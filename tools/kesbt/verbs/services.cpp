@@ -1,6 +1,6 @@
 #include "command/verb.h"
-#include "daemon/bluez.h"
 #include "daemon/creation.h"
+#include "daemon/objects.h"
 #include "show/service_record.h"
 #include "show/table.h"
 #include "show/uuid.h"

@@ -1,5 +1,5 @@
 #include "command/verb.h"
-#include "daemon/bluez.h"
+#include "daemon/objects.h"
 #include "wait/waiting.h"
 
 #include <bluetooth/audio.h>

@@ -1,7 +1,7 @@
 #include "command/answer_limit.h"
 #include "command/verb.h"
-#include "daemon/bluez.h"
 #include "daemon/bus_feed.h"
+#include "daemon/objects.h"
 #include "show/text.h"
 #include "wait/waiting.h"
 
@@ -16,10 +16,10 @@ struct Goal {
     const char* name;    ///< e.g. "paired"
     std::string subject; ///< an address or an adapter
     std::function<bool()> isReached;
-    std::function<void(const Signal&)> observe = [](const Signal&) {};
+    std::function<void(const BusSignal&)> observe = [](const BusSignal&) {};
 };
 
-bool isRemoval(const Signal& signal, const Bluetooth::Adapter& adapter) {
+bool isRemoval(const BusSignal& signal, const Bluetooth::Adapter& adapter) {
     return signal.member == "AdapterRemoved" && !signal.arguments.empty() &&
            signal.arguments[0] == adapter.getPath();
 }
@@ -40,7 +40,7 @@ void await(const Options& options, BusFeed& feed, const Bluetooth::Adapter& adap
         if (Clock::now() >= deadline)
             throw notConfirmed(goal.subject + " was not " + goal.name);
         waitForInput({feed.fd(), interrupt.fd()}, deadline);
-        for (Signal signal; feed.next(signal);) {
+        for (BusSignal signal; feed.next(signal);) {
             if (BusFeed::isDaemonGone(signal))
                 throw daemonLost();
             if (isRemoval(signal, adapter))
@@ -63,7 +63,7 @@ void awaitFound(const Options& options, const std::string& address) {
     const auto adapter = openAdapter(options);
     bool isFound = false;
     Goal goal = {"found", address, [&isFound] { return isFound; }};
-    goal.observe = [&](const Signal& signal) {
+    goal.observe = [&](const BusSignal& signal) {
         if (signal.path != adapter->getPath())
             return;
         if (signal.member == "PropertyChanged" && signal.arguments == Json{"Powered", false})

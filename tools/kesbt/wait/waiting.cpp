@@ -40,7 +40,7 @@ int millisecondsUntil(Clock::time_point deadline) {
 
 } // namespace
 
-Descriptor::~Descriptor() {
+FileDescriptor::~FileDescriptor() {
     if (m_fd >= 0)
         close(m_fd);
 }

@@ -17,12 +17,12 @@ namespace Kesbt {
 using Clock = std::chrono::steady_clock;
 
 /// A file descriptor, closed in the end.
-class Descriptor {
+class FileDescriptor {
 public:
-    explicit Descriptor(int fd) : m_fd(fd) {}
-    ~Descriptor();
-    Descriptor(const Descriptor&) = delete;
-    Descriptor& operator=(const Descriptor&) = delete;
+    explicit FileDescriptor(int fd) : m_fd(fd) {}
+    ~FileDescriptor();
+    FileDescriptor(const FileDescriptor&) = delete;
+    FileDescriptor& operator=(const FileDescriptor&) = delete;
     int fd() const { return m_fd; }
 
 private:
@@ -44,7 +44,7 @@ public:
     bool came() { return m_came = take() || m_came; }
 
 private:
-    Descriptor m_descriptor;
+    FileDescriptor m_descriptor;
     bool m_came = false;
 };
 
@@ -57,7 +57,7 @@ public:
     void clear();
 
 private:
-    Descriptor m_descriptor;
+    FileDescriptor m_descriptor;
 };
 
 /// Hands events from the receive thread to the thread that prints them.

@@ -1,5 +1,5 @@
-#ifndef KESBT_DAEMON_BLUEZ_H
-#define KESBT_DAEMON_BLUEZ_H
+#ifndef KESBT_DAEMON_OBJECTS_H
+#define KESBT_DAEMON_OBJECTS_H
 
 #include "command/options.h"
 #include "daemon/refusal.h"

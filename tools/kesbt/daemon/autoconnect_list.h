@@ -1,18 +1,18 @@
-#ifndef KESBT_DAEMON_AUTOCONNECT_FILE_H
-#define KESBT_DAEMON_AUTOCONNECT_FILE_H
+#ifndef KESBT_DAEMON_AUTOCONNECT_LIST_H
+#define KESBT_DAEMON_AUTOCONNECT_LIST_H
 
 #include <string>
 #include <vector>
 
 namespace Kesbt {
 
-/// An adapter's auto-connect file as it is: unlike the library's lists with the devices that no
-/// adapter knows, and without the daemon.
-class AutoConnectFile {
+/// An adapter's auto-connect list as it is in its file: unlike the library's lists with the devices
+/// that no adapter knows, and without the daemon.
+class AutoConnectList {
 public:
     /// @param adapter the adapter's address
     /// A Failure when there is a file that cannot be read. A missing one is disabled and empty.
-    explicit AutoConnectFile(const std::string& adapter);
+    explicit AutoConnectList(const std::string& adapter);
 
     const std::string& path() const { return m_path; }
     bool isEnabled() const;

@@ -1,4 +1,4 @@
-#include "daemon/bluez.h"
+#include "daemon/objects.h"
 
 #include "command/answer_limit.h"
 #include "show/table.h"

@@ -1,5 +1,5 @@
-#ifndef KESBT_DAEMON_RECEIVE_LOOP_H
-#define KESBT_DAEMON_RECEIVE_LOOP_H
+#ifndef KESBT_DAEMON_SIGNAL_DELIVERY_H
+#define KESBT_DAEMON_SIGNAL_DELIVERY_H
 
 #include "show/failure.h"
 
@@ -8,19 +8,19 @@
 namespace Kesbt {
 
 /// Delivers the library's signals while it lives. A program can run it once.
-class ReceiveLoop {
+class SignalDelivery {
 public:
-    /// @param proxy must outlive the loop
-    explicit ReceiveLoop(Bluetooth::RemoteObject& proxy) : m_proxy(proxy) {
+    /// @param proxy must outlive this
+    explicit SignalDelivery(Bluetooth::RemoteObject& proxy) : m_proxy(proxy) {
         if (proxy.startLoop() != 0)
             throw Failure("cannot start a thread; close other programs and try again");
     }
-    ~ReceiveLoop() {
+    ~SignalDelivery() {
         m_proxy.stopLoop();
         m_proxy.waitLoop();
     }
-    ReceiveLoop(const ReceiveLoop&) = delete;
-    ReceiveLoop& operator=(const ReceiveLoop&) = delete;
+    SignalDelivery(const SignalDelivery&) = delete;
+    SignalDelivery& operator=(const SignalDelivery&) = delete;
 
 private:
     Bluetooth::RemoteObject& m_proxy;

@@ -1,4 +1,4 @@
-#include "daemon/autoconnect_file.h"
+#include "daemon/autoconnect_list.h"
 
 #include "show/failure.h"
 #include "show/text.h"
@@ -50,12 +50,12 @@ int writeError(const std::string& path) {
 
 } // namespace
 
-AutoConnectFile::AutoConnectFile(const std::string& adapter)
+AutoConnectList::AutoConnectList(const std::string& adapter)
     : m_adapter(adapter), m_path(folder + adapter) {
     read();
 }
 
-void AutoConnectFile::read() {
+void AutoConnectList::read() {
     struct stat status {};
     if (stat(m_path.c_str(), &status) != 0) {
         if (errno != ENOENT)
@@ -72,11 +72,11 @@ void AutoConnectFile::read() {
     m_content.erase(m_content.find_last_not_of("\r\n") + 1);
 }
 
-bool AutoConnectFile::isEnabled() const {
+bool AutoConnectList::isEnabled() const {
     return std::strtol(m_content.c_str(), nullptr, 10) != 0;
 }
 
-std::vector<std::string> AutoConnectFile::devices() const {
+std::vector<std::string> AutoConnectList::devices() const {
     constexpr std::size_t firstEntry = 2; // after the flag and a comma
     std::vector<std::string> entries;
     std::istringstream stream(m_content.size() > firstEntry ? m_content.substr(firstEntry) : "");
@@ -85,7 +85,7 @@ std::vector<std::string> AutoConnectFile::devices() const {
     return entries;
 }
 
-bool AutoConnectFile::has(const std::string& device) const {
+bool AutoConnectList::has(const std::string& device) const {
     for (const std::string& entry : devices()) {
         if (upperCase(entry) == device)
             return true;
@@ -93,12 +93,12 @@ bool AutoConnectFile::has(const std::string& device) const {
     return false;
 }
 
-void AutoConnectFile::add(const std::string& device) {
+void AutoConnectList::add(const std::string& device) {
     // A list that ends with a comma has its place for an entry already.
     m_content += (!list().empty() && list().back() == ',' ? "" : ",") + device;
 }
 
-void AutoConnectFile::remove(const std::string& device) {
+void AutoConnectList::remove(const std::string& device) {
     std::string kept;
     for (const std::string& entry : devices()) {
         if (upperCase(entry) != device)
@@ -107,12 +107,12 @@ void AutoConnectFile::remove(const std::string& device) {
     m_content.replace(std::min<std::size_t>(1, m_content.size()), std::string::npos, kept);
 }
 
-void AutoConnectFile::checkWritable() const {
+void AutoConnectList::checkWritable() const {
     if (const int reason = writeError(m_path))
         throw unusable(m_path, reason);
 }
 
-void AutoConnectFile::write(bool enable) {
+void AutoConnectList::write(bool enable) {
     checkWritable();
     const std::string wanted = (enable ? "1" : "0") + list();
     if (list().find('\0') != std::string::npos)
