@@ -6,9 +6,23 @@
 
 namespace Kesbt {
 
-std::shared_ptr<std::string> addAddress(CLI::App& command) {
+Build noArguments(void (*action)(const Options&)) {
+    return [action](const Syntax& syntax) {
+        return [action, &options = syntax.options] { action(options); };
+    };
+}
+
+Build oneDevice(DeviceAction action) {
+    return [action](const Syntax& syntax) {
+        return [action, &options = syntax.options, address = addAddress(syntax)] {
+            action(options, *address);
+        };
+    };
+}
+
+std::shared_ptr<std::string> addAddress(const Syntax& syntax) {
     auto address = std::make_shared<std::string>();
-    command.add_option("ADDRESS", *address, "The device, e.g. 00:11:22:33:44:55")
+    syntax.app.add_option("ADDRESS", *address, "The device, e.g. 00:11:22:33:44:55")
         ->required()
         ->type_name("")
         ->transform(addressInCapitals)
@@ -19,10 +33,10 @@ std::shared_ptr<std::string> addAddress(CLI::App& command) {
     return address;
 }
 
-std::shared_ptr<double> addSeconds(CLI::App& command, const std::string& name,
+std::shared_ptr<double> addSeconds(const Syntax& syntax, const std::string& name,
                                    const std::string& description) {
     auto seconds = std::make_shared<double>(0);
-    command.add_option(name, *seconds, description)->type_name("SECONDS")->check(checkSeconds);
+    syntax.app.add_option(name, *seconds, description)->type_name("SECONDS")->check(checkSeconds);
     return seconds;
 }
 

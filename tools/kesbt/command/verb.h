@@ -5,28 +5,55 @@
 
 #include <CLI/CLI.hpp>
 
+#include <functional>
 #include <memory>
 #include <string>
+#include <utility>
 #include <vector>
 
 namespace Kesbt {
 
-/// One verb of the program. A new verb is one file that defines one, and its name in verbs.cpp.
+/// Where a form of a verb adds what it takes.
+struct Syntax {
+    CLI::App& app;
+    const Options& options;
+};
+
+/// What a form of a verb does once the command line is parsed.
+using Action = std::function<void()>;
+using Build = std::function<Action(const Syntax&)>;
+
+/// A verb alone, as in "kesbt adapter", or with a word behind it, as in "kesbt adapter set".
+struct Form {
+    Form(Limit limitOfThis, Build builder) : limit(limitOfThis), build(std::move(builder)) {}
+    Form(const char* word, const char* what, Limit limitOfThis, Build builder)
+        : name(word), summary(what), limit(limitOfThis), build(std::move(builder)) {}
+
+    const char* name = ""; ///< the word; "" for the verb alone, which comes first
+    const char* summary = "";
+    Limit limit;
+    Build build;
+};
+
+/// One verb of the program. A new verb is a file in verbs/ that defines one, and its name in
+/// verbs/list.h.
 struct Verb {
     const char* name;
     const char* group; ///< heading in the program's help
     const char* summary;
     const char* examples; ///< command lines, one a line
-    /// Adds the verb's arguments to `command` and sets what it does as its callback.
-    void (*build)(CLI::App& command, const Options& options);
+    std::vector<Form> forms;
 };
 
-const std::vector<const Verb*>& allVerbs();
+/// Forms that take nothing, or a device.
+Build noArguments(void (*action)(const Options&));
+using DeviceAction = void (*)(const Options&, const std::string& address);
+Build oneDevice(DeviceAction action);
 
-/// The arguments that several verbs have. What is returned holds its value once the command line
-/// is parsed; callbacks keep it alive by copying it.
-std::shared_ptr<std::string> addAddress(CLI::App& command);
-std::shared_ptr<double> addSeconds(CLI::App& command, const std::string& name,
+/// Arguments that several verbs have. What is returned holds the value once the command line is
+/// parsed; actions keep it alive by copying it.
+std::shared_ptr<std::string> addAddress(const Syntax& syntax);
+std::shared_ptr<double> addSeconds(const Syntax& syntax, const std::string& name,
                                    const std::string& description);
 
 /// A validator of a positive time. @return what is wrong with it, or ""

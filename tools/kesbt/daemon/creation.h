@@ -21,13 +21,6 @@ inline Watchdog::Task creationTask(const Bluetooth::Adapter& adapter, const std:
     return task;
 }
 
-/// The library's calls that wait for a reply end after 25 s and cannot cancel what the daemon
-/// does: a watched one is cancelled before.
-inline std::chrono::milliseconds watchedLimit(const Options& options) {
-    constexpr std::chrono::milliseconds longest{24500};
-    return std::min(options.timeLimit(), longest);
-}
-
 } // namespace Kesbt
 
 #endif

@@ -1,6 +1,6 @@
 #include "daemon/objects.h"
 
-#include "command/answer_limit.h"
+#include "command/limit.h"
 #include "show/table.h"
 #include "show/text.h"
 
@@ -25,18 +25,17 @@ std::string addressOf(const Device& device) {
 } // namespace
 
 std::unique_ptr<Manager> openManager() {
-    const AnswerLimit limit;
-    std::unique_ptr<Manager> manager(Manager::getManager());
+    std::unique_ptr<Manager> manager(withinLimit([] { return Manager::getManager(); }));
     if (!manager)
         throw daemonAbsent();
     return manager;
 }
 
 std::unique_ptr<Adapter> openAdapter(Manager& manager, const Options& options) {
-    const AnswerLimit limit;
     const bool chosen = !options.adapter.empty();
-    std::unique_ptr<Adapter> adapter(chosen ? manager.findAdapter(options.adapter.c_str())
-                                            : manager.defaultAdapter());
+    std::unique_ptr<Adapter> adapter(withinLimit([&] {
+        return chosen ? manager.findAdapter(options.adapter.c_str()) : manager.defaultAdapter();
+    }));
     if (adapter)
         return adapter;
     const std::string reason = manager.getErrorMessage();
@@ -53,14 +52,18 @@ std::unique_ptr<Adapter> openAdapter(const Options& options) {
 }
 
 std::string defaultAdapterPath(Manager& manager) {
-    const AnswerLimit limit;
-    const std::unique_ptr<Adapter> adapter(manager.defaultAdapter());
+    const std::unique_ptr<Adapter> adapter(
+        withinLimit([&manager] { return manager.defaultAdapter(); }));
     return adapter ? adapter->getPath() : "";
 }
 
+std::unique_ptr<Device> findDevice(Adapter& adapter, const std::string& address) {
+    return std::unique_ptr<Device>(
+        withinLimit([&] { return adapter.findDevice(address.c_str(), false); }));
+}
+
 std::unique_ptr<Device> openDevice(Adapter& adapter, const std::string& address) {
-    const AnswerLimit limit;
-    std::unique_ptr<Device> device(adapter.findDevice(address.c_str(), false));
+    std::unique_ptr<Device> device = findDevice(adapter, address);
     if (device)
         return device;
     if (adapter.getErrorMessage() == "Does Not Exist")
@@ -80,18 +83,28 @@ std::string adapterName(const Bluetooth::RemoteObject& object) {
     return lastComponent(path.substr(0, device));
 }
 
-Json readProperties(Bluetooth::BluezObject& object) {
-    const AnswerLimit limit;
+Bluetooth::Dict readDict(Bluetooth::BluezObject& object) {
     const std::unique_ptr<Bluetooth::Dict> properties(
-        object.Bluetooth::BluezObject::getProperties());
+        withinLimit([&object] { return object.Bluetooth::BluezObject::getProperties(); }));
     if (!properties)
         throw refusal("cannot read the properties of " + lastComponent(object.getPath()), object);
-    return toJson(*properties);
+    return *properties;
+}
+
+Json readProperties(Bluetooth::BluezObject& object) {
+    return toJson(readDict(object));
+}
+
+Json readIfKnown(Adapter& adapter, const std::string& address) {
+    return withinLimit([&] {
+        const auto device = findDevice(adapter, address);
+        return device ? readProperties(*device) : Json();
+    });
 }
 
 Json readOptional(Bluetooth::BluezObject& object) {
-    const AnswerLimit limit;
-    const std::unique_ptr<Bluetooth::Dict> properties(object.getProperties());
+    const std::unique_ptr<Bluetooth::Dict> properties(
+        withinLimit([&object] { return object.getProperties(); }));
     if (properties)
         return toJson(*properties);
     const std::string reason = object.getErrorMessage();

@@ -28,7 +28,10 @@ std::unique_ptr<Bluetooth::Adapter> openAdapter(Bluetooth::Manager& manager,
 /// The path of the daemon's default adapter; "" without one.
 std::string defaultAdapterPath(Bluetooth::Manager& manager);
 
-/// A device that the adapter knows.
+/// A device that the adapter knows; null when the daemon does not say that it does.
+std::unique_ptr<Bluetooth::Device> findDevice(Bluetooth::Adapter& adapter,
+                                              const std::string& address);
+/// The same, and a Failure without it.
 std::unique_ptr<Bluetooth::Device> openDevice(Bluetooth::Adapter& adapter,
                                               const std::string& address);
 std::unique_ptr<Bluetooth::Device> openDevice(const Options& options, const std::string& address);
@@ -37,7 +40,11 @@ std::unique_ptr<Bluetooth::Device> openDevice(const Options& options, const std:
 std::string adapterName(const Bluetooth::RemoteObject& object);
 
 /// The properties that the daemon tells (for an adapter without "HCIVersion").
+Bluetooth::Dict readDict(Bluetooth::BluezObject& object);
 Json readProperties(Bluetooth::BluezObject& object);
+
+/// The properties of a device that the adapter may not know yet; null then. It is one step.
+Json readIfKnown(Bluetooth::Adapter& adapter, const std::string& address);
 
 /// The properties of an interface that not every device has; null without it.
 Json readOptional(Bluetooth::BluezObject& object);
@@ -58,7 +65,7 @@ template <class... Args>
 void ask(const Options& options, const std::string& what, Bluetooth::RemoteObject& proxy,
          const char* method, const Args&... args) {
     proxy.resetError();
-    const int timeoutMs = static_cast<int>(options.timeLimit().count());
+    const int timeoutMs = static_cast<int>(options.limit.step().count());
     if (proxy.newMessage(method) < 0 || (... || (proxy.append(args) < 0)) || proxy.hasError() ||
         proxy.sendMessage(true, timeoutMs) < 0)
         throw refusal(what, proxy);

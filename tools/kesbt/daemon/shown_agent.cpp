@@ -43,14 +43,14 @@ DBusHandlerResult replyEmpty(DBusConnection* connection, DBusMessage* message) {
 
 } // namespace
 
-std::shared_ptr<AgentSettings> addAgentOptions(CLI::App& command) {
+std::shared_ptr<AgentSettings> addAgentOptions(const Syntax& syntax) {
     auto settings = std::make_shared<AgentSettings>();
-    command
+    syntax.app
         .add_option("--pin", settings->pin,
                     "The answer to a request for a PIN code or a\npasskey (default: 5820)")
         ->type_name("TEXT")
         ->check(checkPin);
-    command
+    syntax.app
         .add_option("--capability", settings->capability,
                     "What this side can do: DisplayYesNo (default),\nDisplayOnly, KeyboardOnly or "
                     "NoInputNoOutput")
@@ -65,7 +65,7 @@ std::shared_ptr<AgentSettings> addAgentOptions(CLI::App& command) {
             return quoted(text) + " is none of DisplayYesNo, DisplayOnly, KeyboardOnly, "
                                   "NoInputNoOutput";
         });
-    command.add_option("--delay", settings->delay, "Wait so long before each answer")
+    syntax.app.add_option("--delay", settings->delay, "Wait so long before each answer")
         ->type_name("SECONDS")
         ->check([](const std::string& text) {
             constexpr std::size_t longest = 4;
@@ -73,9 +73,9 @@ std::shared_ptr<AgentSettings> addAgentOptions(CLI::App& command) {
                                   text.find_first_not_of("0123456789") == std::string::npos;
             return isNumber ? std::string() : quoted(text) + " is no number from 0 to 9999";
         });
-    command.add_flag("--reject", settings->reject,
-                     "Refuse passkeys, confirmations and services (a PIN\ncode is given all the "
-                     "same)");
+    syntax.app.add_flag("--reject", settings->reject,
+                        "Refuse passkeys, confirmations and services (a PIN\ncode is given all the "
+                        "same)");
     return settings;
 }
 

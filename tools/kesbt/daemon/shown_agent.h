@@ -22,7 +22,7 @@ struct AgentSettings {
 };
 
 /// The options of the verbs that have an agent.
-std::shared_ptr<AgentSettings> addAgentOptions(CLI::App& command);
+std::shared_ptr<AgentSettings> addAgentOptions(const Syntax& syntax);
 
 /// What the daemon asked the agent, and the answer.
 struct AgentRequest {

@@ -1,7 +1,6 @@
-#include "command/answer_limit.h"
-#include "command/verb.h"
 #include "daemon/objects.h"
 #include "show/text.h"
+#include "verbs/list.h"
 #include "wait/waiting.h"
 
 #include <charconv>
@@ -17,7 +16,6 @@ using Bluetooth::Variant;
 constexpr std::size_t longestName = 248; // bytes; the controller cuts what is longer
 
 void showAdapter(const Options& options) {
-    const AnswerLimit limit;
     const auto manager = openManager();
     const auto adapter = openAdapter(*manager, options);
     // The proxy's own properties: they have the HCI version too.
@@ -35,14 +33,6 @@ void showAdapter(const Options& options) {
                   {"Default", document["default"]}};
     lines.update(document["properties"]);
     printProperties(lines);
-}
-
-std::unique_ptr<Bluetooth::Dict> typedProperties(Bluetooth::Adapter& adapter) {
-    const AnswerLimit limit;
-    std::unique_ptr<Bluetooth::Dict> properties(adapter.Bluetooth::BluezObject::getProperties());
-    if (!properties)
-        throw refusal("cannot read the properties of " + adapterName(adapter), adapter);
-    return properties;
 }
 
 const Bluetooth::DictEntry& findProperty(const Bluetooth::Dict& properties, const std::string& name,
@@ -104,8 +94,8 @@ void setProperty(const Options& options, const std::string& givenName,
                  const std::string& givenValue) {
     const auto adapter = openAdapter(options);
     const std::string adapterText = adapterName(*adapter);
-    const std::unique_ptr<Bluetooth::Dict> properties = typedProperties(*adapter);
-    const auto& [name, old] = findProperty(*properties, givenName, adapterText);
+    const Bluetooth::Dict properties = readDict(*adapter);
+    const auto& [name, old] = findProperty(properties, givenName, adapterText);
     const Variant wanted = boost::apply_visitor(ParseAs(givenValue, name), old);
     adapter->resetError();
     try {
@@ -124,7 +114,7 @@ void setProperty(const Options& options, const std::string& givenName,
         now = readProperties(*adapter).value(property, Json());
         return now == expected;
     };
-    if (!waitUntil(isSet, options.timeLimit()))
+    if (!waitUntil(isSet, options.limit.step()))
         throw notConfirmed(name + " of " + adapterText + " is still " + quoted(display(now)));
     if (options.json)
         printDocument(
@@ -134,36 +124,31 @@ void setProperty(const Options& options, const std::string& givenName,
                   << printable(display(now)) << '\n';
 }
 
-void build(CLI::App& command, const Options& options) {
-    command.require_subcommand(0, 1);
-    CLI::App* info = command.add_subcommand("info", "Show all properties (also without this word)");
-    CLI::App* set = command.add_subcommand("set", "Set a property and show its old and new value");
-    set->footer("Can be set: Name, Powered, Discoverable, Pairable, DiscoverableTimeout,\n"
-                "PairableTimeout. Booleans are true or false, time-outs are seconds.\n\n"
-                "Examples:\n  kesbt adapter set Powered true\n"
-                "  kesbt --adapter hci1 adapter set Name \"Living room\"\n\n" +
-                command.get_footer().substr(command.get_footer().rfind("\n\n") + 2));
-
+Action buildSet(const Syntax& syntax) {
+    const std::string ofVerb = syntax.app.get_footer(); // as that of the verb alone
+    syntax.app.footer("Can be set: Name, Powered, Discoverable, Pairable, DiscoverableTimeout,\n"
+                      "PairableTimeout. Booleans are true or false, time-outs are seconds.\n\n"
+                      "Examples:\n  kesbt adapter set Powered true\n"
+                      "  kesbt --adapter hci1 adapter set Name \"Living room\"\n\n" +
+                      ofVerb.substr(ofVerb.rfind("\n\n") + 2));
     auto name = std::make_shared<std::string>();
     auto value = std::make_shared<std::string>();
-    set->add_option("NAME", *name, "The property, e.g. Powered")->required()->type_name("");
-    set->add_option("VALUE", *value, "Its new value")->required()->type_name("");
-
-    const auto show = [&options] { showAdapter(options); };
-    info->callback(show);
-    set->callback([&options, name, value] { setProperty(options, *name, *value); });
-    command.callback([&command, show] {
-        if (command.get_subcommands().empty())
-            show();
-    });
+    syntax.app.add_option("NAME", *name, "The property, e.g. Powered")->required()->type_name("");
+    syntax.app.add_option("VALUE", *value, "Its new value")->required()->type_name("");
+    return [&options = syntax.options, name, value] { setProperty(options, *name, *value); };
 }
 
 } // namespace
 
-extern const Verb adapterVerb;
-const Verb adapterVerb = {"adapter", "Adapters", "Show an adapter's properties, or set one",
-                          "kesbt adapter\nkesbt --adapter hci1 adapter info --json\n"
-                          "kesbt adapter set Discoverable true",
-                          build};
+const Verb adapterVerb = {
+    "adapter",
+    "Adapters",
+    "Show an adapter's properties, or set one",
+    "kesbt adapter\nkesbt --adapter hci1 adapter info --json\n"
+    "kesbt adapter set Discoverable true",
+    {{Limit::Whole, noArguments(showAdapter)},
+     {"info", "Show all properties (also without this word)", Limit::Whole,
+      noArguments(showAdapter)},
+     {"set", "Set a property and show its old and new value", Limit::Steps, buildSet}}};
 
 } // namespace Kesbt

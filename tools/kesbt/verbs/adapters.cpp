@@ -1,7 +1,6 @@
-#include "command/answer_limit.h"
-#include "command/verb.h"
 #include "daemon/objects.h"
 #include "show/table.h"
+#include "verbs/list.h"
 
 #include <bluetooth/adapter_list.h>
 
@@ -10,7 +9,6 @@ namespace Kesbt {
 namespace {
 
 Json readAdapters(Bluetooth::Manager& manager) {
-    const AnswerLimit limit;
     const std::unique_ptr<Bluetooth::AdapterList> adapters(manager.listAdapters());
     if (!adapters)
         throw refusal("cannot list the adapters", manager);
@@ -44,14 +42,12 @@ void listAdapters(const Options& options) {
     table.print();
 }
 
-void build(CLI::App& command, const Options& options) {
-    command.callback([&options] { listAdapters(options); });
-}
-
 } // namespace
 
-extern const Verb adaptersVerb;
-const Verb adaptersVerb = {"adapters", "Adapters", "List the adapters",
-                           "kesbt adapters\nkesbt adapters --json", build};
+const Verb adaptersVerb = {"adapters",
+                           "Adapters",
+                           "List the adapters",
+                           "kesbt adapters\nkesbt adapters --json",
+                           {{Limit::Whole, noArguments(listAdapters)}}};
 
 } // namespace Kesbt

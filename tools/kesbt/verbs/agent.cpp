@@ -1,9 +1,9 @@
-#include "command/verb.h"
 #include "daemon/bus_feed.h"
 #include "daemon/objects.h"
 #include "daemon/shown_agent.h"
 #include "show/style.h"
 #include "show/text.h"
+#include "verbs/list.h"
 #include "wait/waiting.h"
 
 #include <iostream>
@@ -95,17 +95,19 @@ void runAgent(const Options& options, const AgentSettings& settings) {
         Bluetooth::ObjectPath(agent.getPath()));
 }
 
-void build(CLI::App& command, const Options& options) {
-    const auto settings = addAgentOptions(command);
-    command.callback([&options, settings] { runAgent(options, *settings); });
+Action build(const Syntax& syntax) {
+    return [&options = syntax.options, settings = addAgentOptions(syntax)] {
+        runAgent(options, *settings);
+    };
 }
 
 } // namespace
 
-extern const Verb agentVerb;
-const Verb agentVerb = {"agent", "Pairing", "Answer devices that want to pair, until Ctrl-C",
+const Verb agentVerb = {"agent",
+                        "Pairing",
+                        "Answer devices that want to pair, until Ctrl-C",
                         "kesbt agent --pin 1234\n"
                         "kesbt --adapter hci1 agent --reject\nkesbt agent --json",
-                        build};
+                        {{Limit::Stream, build}}};
 
 } // namespace Kesbt

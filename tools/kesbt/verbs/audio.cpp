@@ -1,6 +1,5 @@
-#include "command/answer_limit.h"
-#include "command/verb.h"
 #include "daemon/objects.h"
+#include "verbs/list.h"
 #include "wait/waiting.h"
 
 #include <bluetooth/audio.h>
@@ -64,36 +63,35 @@ void change(const Options& options, const std::string& address, bool connect) {
     if (!isThere())
         ask(options, std::string("cannot ") + (connect ? "connect " : "disconnect ") + address,
             *device.audio, connect ? "Connect" : "Disconnect");
-    if (!waitUntil(isThere, options.timeLimit()))
+    if (!waitUntil(isThere, options.limit.step()))
         throw notConfirmed(address + " is not " + (connect ? "connected" : "disconnected"));
     printStatus(options, device, address);
 }
 
-void build(CLI::App& command, const Options& options) {
-    command.require_subcommand(1);
-    const auto add = [&command](const char* name, const char* description, auto action) {
-        CLI::App* verb = command.add_subcommand(name, description);
-        const auto address = addAddress(*verb);
-        verb->callback([address, action] { action(*address); });
-    };
-    add("connect", "Connect all audio profiles of a known device",
-        [&options](const std::string& address) { change(options, address, true); });
-    add("disconnect", "Disconnect them",
-        [&options](const std::string& address) { change(options, address, false); });
-    add("status", "Show what is connected", [&options](const std::string& address) {
-        const AnswerLimit limit;
-        AudioDevice device = openAudio(options, address);
-        printStatus(options, device, address);
-    });
+void connect(const Options& options, const std::string& address) {
+    change(options, address, true);
+}
+
+void disconnect(const Options& options, const std::string& address) {
+    change(options, address, false);
+}
+
+void showStatus(const Options& options, const std::string& address) {
+    AudioDevice device = openAudio(options, address);
+    printStatus(options, device, address);
 }
 
 } // namespace
 
-extern const Verb audioVerb;
-const Verb audioVerb = {"audio", "Audio", "Connect or disconnect a headset, or show its state",
-                        "kesbt audio connect 00:11:22:33:44:55\n"
-                        "kesbt audio status 00:11:22:33:44:55 --json\n"
-                        "kesbt audio disconnect 00:11:22:33:44:55",
-                        build};
+const Verb audioVerb = {
+    "audio",
+    "Audio",
+    "Connect or disconnect a headset, or show its state",
+    "kesbt audio connect 00:11:22:33:44:55\n"
+    "kesbt audio status 00:11:22:33:44:55 --json\n"
+    "kesbt audio disconnect 00:11:22:33:44:55",
+    {{"connect", "Connect all audio profiles of a known device", Limit::Steps, oneDevice(connect)},
+     {"disconnect", "Disconnect them", Limit::Steps, oneDevice(disconnect)},
+     {"status", "Show what is connected", Limit::Whole, oneDevice(showStatus)}}};
 
 } // namespace Kesbt

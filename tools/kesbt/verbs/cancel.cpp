@@ -1,5 +1,5 @@
-#include "command/verb.h"
 #include "daemon/objects.h"
+#include "verbs/list.h"
 
 #include <iostream>
 
@@ -25,15 +25,12 @@ void cancel(const Options& options, const std::string& address) {
         std::cout << "Cancelled the creation of " << address << " on " << name << '\n';
 }
 
-void build(CLI::App& command, const Options& options) {
-    const auto address = addAddress(command);
-    command.callback([&options, address] { cancel(options, *address); });
-}
-
 } // namespace
 
-extern const Verb cancelVerb;
-const Verb cancelVerb = {"cancel", "Pairing", "Stop a creation; only for the program that began it",
-                         "kesbt cancel 00:11:22:33:44:55", build};
+const Verb cancelVerb = {"cancel",
+                         "Pairing",
+                         "Stop a creation; only for the program that began it",
+                         "kesbt cancel 00:11:22:33:44:55",
+                         {{Limit::Steps, oneDevice(cancel)}}};
 
 } // namespace Kesbt

@@ -1,6 +1,6 @@
-#include "command/verb.h"
 #include "daemon/creation.h"
 #include "daemon/objects.h"
+#include "verbs/list.h"
 
 namespace Kesbt {
 
@@ -8,11 +8,9 @@ namespace {
 
 void createDevice(const Options& options, const std::string& address) {
     const auto adapter = openAdapter(options);
-    Watchdog::Task task = creationTask(*adapter, address, "creating");
-    task.limit = watchedLimit(options);
     std::unique_ptr<Bluetooth::Device> device;
     {
-        const Watchdog watchdog(std::move(task));
+        const Watchdog watchdog(options.limit, creationTask(*adapter, address, "creating"));
         device.reset(adapter->createDevice(address.c_str()));
         if (!device)
             watchdog.throwIfCancelled();
@@ -22,16 +20,12 @@ void createDevice(const Options& options, const std::string& address) {
     printDevice(options, *device);
 }
 
-void build(CLI::App& command, const Options& options) {
-    const auto address = addAddress(command);
-    command.callback([&options, address] { createDevice(options, *address); });
-}
-
 } // namespace
 
-extern const Verb createVerb;
-const Verb createVerb = {"create", "Devices",
+const Verb createVerb = {"create",
+                         "Devices",
                          "Connect to a device and make it known, without pairing",
-                         "kesbt create 00:11:22:33:44:55", build};
+                         "kesbt create 00:11:22:33:44:55",
+                         {{Limit::Task, oneDevice(createDevice)}}};
 
 } // namespace Kesbt

@@ -1,26 +1,22 @@
-#include "command/answer_limit.h"
-#include "command/verb.h"
 #include "daemon/objects.h"
+#include "verbs/list.h"
 
 namespace Kesbt {
 
 namespace {
 
-void build(CLI::App& command, const Options& options) {
-    const auto address = addAddress(command);
-    command.callback([&options, address] {
-        const AnswerLimit limit;
-        const auto device = openDevice(options, *address);
-        printDevice(options, *device);
-    });
+void showDevice(const Options& options, const std::string& address) {
+    const auto device = openDevice(options, address);
+    printDevice(options, *device);
 }
 
 } // namespace
 
-extern const Verb deviceVerb;
-const Verb deviceVerb = {"device", "Devices", "Show a known device's properties",
+const Verb deviceVerb = {"device",
+                         "Devices",
+                         "Show a known device's properties",
                          "kesbt device 00:11:22:33:44:55\n"
                          "kesbt device 00:11:22:33:44:55 --json",
-                         build};
+                         {{Limit::Whole, oneDevice(showDevice)}}};
 
 } // namespace Kesbt

@@ -1,6 +1,5 @@
-#include "command/answer_limit.h"
-#include "command/verb.h"
 #include "daemon/objects.h"
+#include "verbs/list.h"
 
 #include <bluetooth/device_list.h>
 
@@ -9,7 +8,6 @@ namespace Kesbt {
 namespace {
 
 void listDevices(const Options& options) {
-    const AnswerLimit limit;
     const auto adapter = openAdapter(options);
     const std::unique_ptr<Bluetooth::DeviceList> devices(adapter->listDevices());
     if (!devices)
@@ -17,14 +15,12 @@ void listDevices(const Options& options) {
     printDevices(options, *devices);
 }
 
-void build(CLI::App& command, const Options& options) {
-    command.callback([&options] { listDevices(options); });
-}
-
 } // namespace
 
-extern const Verb devicesVerb;
-const Verb devicesVerb = {"devices", "Devices", "List the devices that an adapter knows",
-                          "kesbt devices\nkesbt --adapter hci1 devices --json", build};
+const Verb devicesVerb = {"devices",
+                          "Devices",
+                          "List the devices that an adapter knows",
+                          "kesbt devices\nkesbt --adapter hci1 devices --json",
+                          {{Limit::Whole, noArguments(listDevices)}}};
 
 } // namespace Kesbt

@@ -1,8 +1,8 @@
-#include "command/verb.h"
 #include "daemon/bus_feed.h"
 #include "daemon/objects.h"
 #include "daemon/signal_delivery.h"
 #include "show/device_watch.h"
+#include "verbs/list.h"
 #include "wait/waiting.h"
 
 namespace Kesbt {
@@ -80,7 +80,7 @@ void discover(const Options& options, double seconds) {
     const auto isDiscovering = [&] {
         return interrupt.came() || readProperties(*adapter).value("Discovering", false);
     };
-    if (!waitUntil(isDiscovering, options.timeLimit()))
+    if (!waitUntil(isDiscovering, options.limit.step()))
         throw notConfirmed(name + " does not discover");
 
     const auto deadline =
@@ -91,17 +91,19 @@ void discover(const Options& options, double seconds) {
     ask(options, "cannot stop the discovery on " + name, *adapter, "StopDiscovery");
 }
 
-void build(CLI::App& command, const Options& options) {
+Action build(const Syntax& syntax) {
     const auto seconds =
-        addSeconds(command, "--seconds", "End after this time (default: on Ctrl-C)");
-    command.callback([&options, seconds] { discover(options, *seconds); });
+        addSeconds(syntax, "--seconds", "End after this time (default: on Ctrl-C)");
+    return [&options = syntax.options, seconds] { discover(options, *seconds); };
 }
 
 } // namespace
 
-extern const Verb discoverVerb;
 const Verb discoverVerb = {
-    "discover", "Devices", "Show devices within reach as they appear, change and vanish",
-    "kesbt discover\nkesbt discover --seconds 10 --json\nkesbt --adapter hci1 discover", build};
+    "discover",
+    "Devices",
+    "Show devices within reach as they appear, change and vanish",
+    "kesbt discover\nkesbt discover --seconds 10 --json\nkesbt --adapter hci1 discover",
+    {{Limit::Stream, build}}};
 
 } // namespace Kesbt

@@ -1,8 +1,8 @@
-#include "command/verb.h"
 #include "daemon/bus_feed.h"
 #include "daemon/objects.h"
 #include "show/style.h"
 #include "show/text.h"
+#include "verbs/list.h"
 #include "wait/waiting.h"
 
 #include <iostream>
@@ -82,15 +82,12 @@ void monitor(const Options& options) {
     }
 }
 
-void build(CLI::App& command, const Options& options) {
-    command.callback([&options] { monitor(options); });
-}
-
 } // namespace
 
-extern const Verb monitorVerb;
-const Verb monitorVerb = {"monitor", "General",
+const Verb monitorVerb = {"monitor",
+                          "General",
                           "Show every signal of bluetoothd as it comes, until Ctrl-C",
-                          "kesbt monitor\nkesbt monitor --json", build};
+                          "kesbt monitor\nkesbt monitor --json",
+                          {{Limit::Stream, noArguments(monitor)}}};
 
 } // namespace Kesbt

@@ -1,7 +1,7 @@
-#include "command/verb.h"
 #include "show/failure.h"
 #include "show/output.h"
 #include "show/text.h"
+#include "verbs/list.h"
 
 #include <bluetooth/commandlib.h>
 
@@ -37,10 +37,10 @@ void showName(const Options& options, const std::string& address, int timeoutMs)
         std::cout << printable(name) << '\n';
 }
 
-void build(CLI::App& command, const Options& options) {
-    const auto address = addAddress(command);
+Action build(const Syntax& syntax) {
+    const auto address = addAddress(syntax);
     auto timeoutMs = std::make_shared<int>(0);
-    command
+    syntax.app
         .add_option("--timeout", *timeoutMs,
                     "How long the device may take, in milliseconds\n(default: 10000)")
         ->type_name("MS")
@@ -50,21 +50,22 @@ void build(CLI::App& command, const Options& options) {
                                   text.find_first_not_of("0123456789") == std::string::npos;
             return isNumber ? std::string() : quoted(text) + " is no time such as 5000";
         });
-    command.callback([&options, address, timeoutMs] {
+    return [&options = syntax.options, address, timeoutMs] {
         int limit = *timeoutMs;
         if (limit == 0) // before the verb it is the option of every verb
-            limit = options.limited ? static_cast<int>(options.timeLimit().count())
-                                    : Bluetooth::GET_NAME_TIMEOUT_DEFAULT;
+            limit = options.limit.isGiven() ? static_cast<int>(options.limit.step().count())
+                                            : Bluetooth::GET_NAME_TIMEOUT_DEFAULT;
         showName(options, *address, limit);
-    });
+    };
 }
 
 } // namespace
 
-extern const Verb nameVerb;
-const Verb nameVerb = {"name", "Host", "Ask a device within reach for its name, without bluetoothd",
+const Verb nameVerb = {"name",
+                       "Host",
+                       "Ask a device within reach for its name, without bluetoothd",
                        "kesbt name 00:11:22:33:44:55\n"
                        "kesbt name 00:11:22:33:44:55 --timeout 2000",
-                       build};
+                       {{Limit::OnlyGiven, build}}};
 
 } // namespace Kesbt

@@ -1,8 +1,7 @@
-#include "command/answer_limit.h"
-#include "command/verb.h"
 #include "daemon/refusal.h"
 #include "show/output.h"
 #include "show/text.h"
+#include "verbs/list.h"
 
 #include <bluetooth/dbus_object.h>
 
@@ -13,7 +12,6 @@ namespace Kesbt {
 namespace {
 
 void listNames(const Options& options) {
-    const AnswerLimit limit;
     Bluetooth::DBusObject bus;
     const std::unique_ptr<std::vector<std::string>> names(bus.listNames());
     if (!bus.getConnection())
@@ -28,14 +26,12 @@ void listNames(const Options& options) {
         std::cout << printable(name) << '\n';
 }
 
-void build(CLI::App& command, const Options& options) {
-    command.callback([&options] { listNames(options); });
-}
-
 } // namespace
 
-extern const Verb namesVerb;
-const Verb namesVerb = {"names", "General", "List the names on the system bus",
-                        "kesbt names\nkesbt names --json", build};
+const Verb namesVerb = {"names",
+                        "General",
+                        "List the names on the system bus",
+                        "kesbt names\nkesbt names --json",
+                        {{Limit::Whole, noArguments(listNames)}}};
 
 } // namespace Kesbt

@@ -1,8 +1,8 @@
-#include "command/verb.h"
 #include "daemon/creation.h"
 #include "daemon/objects.h"
 #include "daemon/shown_agent.h"
 #include "show/text.h"
+#include "verbs/list.h"
 
 #include <iostream>
 
@@ -21,10 +21,8 @@ std::unique_ptr<Bluetooth::Device> createPaired(const Options& options, Bluetoot
         shown = request.text();
     });
     Watchdog::Task task = creationTask(adapter, address, "pairing with");
-    if (options.limited) // otherwise as long as the other side's user takes
-        task.limit = options.timeLimit();
     task.showsProgress = true;
-    const Watchdog watchdog(std::move(task));
+    const Watchdog watchdog(options.limit, std::move(task));
     std::unique_ptr<Bluetooth::Device> device(adapter.createPairedDevice(address.c_str(), agent));
     if (!device)
         watchdog.throwIfCancelled();
@@ -39,24 +37,24 @@ void pair(const Options& options, const std::string& address, const AgentSetting
     if (!device)
         throw refusal("cannot pair with " + address, *adapter);
     const auto isPaired = [&] { return readProperties(*device).value("Paired", false); };
-    if (!waitUntil(isPaired, options.timeLimit()))
+    if (!waitUntil(isPaired, options.limit.step()))
         throw notConfirmed(address + " is not paired");
     printDevice(options, *device);
 }
 
-void build(CLI::App& command, const Options& options) {
-    const auto address = addAddress(command);
-    const auto settings = addAgentOptions(command);
-    command.callback([&options, address, settings] { pair(options, *address, *settings); });
+Action build(const Syntax& syntax) {
+    return [&options = syntax.options, address = addAddress(syntax),
+            settings = addAgentOptions(syntax)] { pair(options, *address, *settings); };
 }
 
 } // namespace
 
-extern const Verb pairVerb;
-const Verb pairVerb = {"pair", "Pairing", "Pair with a device and make it known",
+const Verb pairVerb = {"pair",
+                       "Pairing",
+                       "Pair with a device and make it known",
                        "kesbt pair 00:11:22:33:44:55\n"
                        "kesbt pair 00:11:22:33:44:55 --pin 1234\n"
                        "kesbt pair 00:11:22:33:44:55 --capability NoInputNoOutput",
-                       build};
+                       {{Limit::OnlyGiven, build}}};
 
 } // namespace Kesbt

@@ -1,6 +1,5 @@
-#include "command/answer_limit.h"
-#include "command/verb.h"
 #include "daemon/objects.h"
+#include "verbs/list.h"
 #include "wait/waiting.h"
 
 #include <iostream>
@@ -16,11 +15,9 @@ void removeDevice(const Options& options, const std::string& address) {
         Bluetooth::ObjectPath(device->getPath()));
 
     const auto isGone = [&] {
-        const AnswerLimit limit;
-        const std::unique_ptr<Bluetooth::Device> found(adapter->findDevice(address.c_str(), false));
-        return !found && adapter->getErrorMessage() == "Does Not Exist";
+        return !findDevice(*adapter, address) && adapter->getErrorMessage() == "Does Not Exist";
     };
-    if (!waitUntil(isGone, options.timeLimit()))
+    if (!waitUntil(isGone, options.limit.step()))
         throw notConfirmed(address + " is still known to " + adapterName(*adapter));
     if (options.json)
         printDocument({{"address", address},
@@ -31,15 +28,12 @@ void removeDevice(const Options& options, const std::string& address) {
         std::cout << "Removed " << address << " from " << adapterName(*adapter) << '\n';
 }
 
-void build(CLI::App& command, const Options& options) {
-    const auto address = addAddress(command);
-    command.callback([&options, address] { removeDevice(options, *address); });
-}
-
 } // namespace
 
-extern const Verb removeVerb;
-const Verb removeVerb = {"remove", "Devices", "Forget a device and its pairing",
-                         "kesbt remove 00:11:22:33:44:55", build};
+const Verb removeVerb = {"remove",
+                         "Devices",
+                         "Forget a device and its pairing",
+                         "kesbt remove 00:11:22:33:44:55",
+                         {{Limit::Steps, oneDevice(removeDevice)}}};
 
 } // namespace Kesbt

@@ -1,6 +1,6 @@
-#include "command/verb.h"
 #include "show/failure.h"
 #include "show/output.h"
+#include "verbs/list.h"
 #include "wait/waiting.h"
 
 #include <bluetooth/bluez_object.h>
@@ -32,7 +32,7 @@ void restartDaemon(const Options& options) {
                           : "bluetoothd was not restarted: no adapter is plugged in (there is no "
                             "/tmp/bluetooth.info_* file); plug one in");
     // That its process runs is not enough: it may fail to come to the bus.
-    if (!waitUntil(Bluetooth::BluezObject::hasBluetoothd, options.timeLimit()))
+    if (!waitUntil(Bluetooth::BluezObject::hasBluetoothd, options.limit.step()))
         throw notConfirmed("bluetoothd was started and did not come to the system bus");
     if (options.json)
         printDocument({{"restarted", true}});
@@ -40,14 +40,12 @@ void restartDaemon(const Options& options) {
         std::cout << "Restarted bluetoothd\n";
 }
 
-void build(CLI::App& command, const Options& options) {
-    command.callback([&options] { restartDaemon(options); });
-}
-
 } // namespace
 
-extern const Verb restartDaemonVerb;
-const Verb restartDaemonVerb = {"restart-daemon", "Host", "Kill bluetoothd and start it again",
-                                "kesbt restart-daemon", build};
+const Verb restartDaemonVerb = {"restart-daemon",
+                                "Host",
+                                "Kill bluetoothd and start it again",
+                                "kesbt restart-daemon",
+                                {{Limit::Steps, noArguments(restartDaemon)}}};
 
 } // namespace Kesbt

@@ -1,9 +1,9 @@
-#include "command/verb.h"
 #include "daemon/creation.h"
 #include "daemon/objects.h"
 #include "show/service_record.h"
 #include "show/table.h"
 #include "show/uuid.h"
+#include "verbs/list.h"
 
 #include <cstdlib>
 
@@ -15,13 +15,12 @@ Bluetooth::Dict discover(const Options& options, Bluetooth::Device& device,
                          const std::string& address, const std::string& pattern) {
     Watchdog::Task task;
     task.name = "reading the services of " + address;
-    task.limit = watchedLimit(options);
     task.cancel = [path = std::string(device.getPath())] {
         Bluetooth::Device(path.c_str()).cancelDiscovery();
     };
     std::unique_ptr<Bluetooth::Dict> records;
     {
-        const Watchdog watchdog(std::move(task));
+        const Watchdog watchdog(options.limit, std::move(task));
         records.reset(device.discoverServices(pattern.c_str()));
         if (!records)
             watchdog.throwIfCancelled();
@@ -57,22 +56,25 @@ void listServices(const Options& options, const std::string& address, const std:
     table.print();
 }
 
-void build(CLI::App& command, const Options& options) {
-    const auto address = addAddress(command);
+Action build(const Syntax& syntax) {
+    const auto address = addAddress(syntax);
     auto pattern = std::make_shared<std::string>();
-    command
+    syntax.app
         .add_option("PATTERN", *pattern,
                     "Which services: a UUID such as 0x110b, or a name\nsuch as spp")
         ->type_name("");
-    command.callback([&options, address, pattern] { listServices(options, *address, *pattern); });
+    return [&options = syntax.options, address, pattern] {
+        listServices(options, *address, *pattern);
+    };
 }
 
 } // namespace
 
-extern const Verb servicesVerb;
-const Verb servicesVerb = {"services", "Devices", "Read a known device's service records",
+const Verb servicesVerb = {"services",
+                           "Devices",
+                           "Read a known device's service records",
                            "kesbt services 00:11:22:33:44:55\n"
                            "kesbt services 00:11:22:33:44:55 0x110b --json",
-                           build};
+                           {{Limit::Task, build}}};
 
 } // namespace Kesbt

@@ -1,5 +1,5 @@
-#include "command/verb.h"
 #include "daemon/objects.h"
+#include "verbs/list.h"
 #include "wait/waiting.h"
 
 #include <bluetooth/audio.h>
@@ -23,7 +23,7 @@ bool awaitConnection(const Options& options, Bluetooth::Control& control) {
     const std::unique_ptr<Bluetooth::Audio> audio(Bluetooth::Audio::getAudio(control.getPath()));
     const Json state = audio ? readOptional(*audio) : Json();
     const bool isComing = state.is_object() && state.value("State", "") != "disconnected";
-    return isComing && waitUntil(isConnected, std::min(options.timeLimit(), longest));
+    return isComing && waitUntil(isConnected, std::min(options.limit.step(), longest));
 }
 
 void changeVolume(const Options& options, const std::string& address, bool up) {
@@ -49,22 +49,22 @@ void changeVolume(const Options& options, const std::string& address, bool up) {
         std::cout << "Volume " << direction << " sent to " << address << '\n';
 }
 
-void build(CLI::App& command, const Options& options) {
-    command.require_subcommand(1);
-    for (const bool up : {true, false}) {
-        CLI::App* verb =
-            command.add_subcommand(up ? "up" : "down", up ? "Make it louder" : "Make it quieter");
-        const auto address = addAddress(*verb);
-        verb->callback([&options, address, up] { changeVolume(options, *address, up); });
-    }
+void makeLouder(const Options& options, const std::string& address) {
+    changeVolume(options, address, true);
+}
+
+void makeQuieter(const Options& options, const std::string& address) {
+    changeVolume(options, address, false);
 }
 
 } // namespace
 
-extern const Verb volumeVerb;
-const Verb volumeVerb = {"volume", "Audio", "Press a connected headset's volume key",
+const Verb volumeVerb = {"volume",
+                         "Audio",
+                         "Press a connected headset's volume key",
                          "kesbt volume up 00:11:22:33:44:55\n"
                          "kesbt volume down 00:11:22:33:44:55",
-                         build};
+                         {{"up", "Make it louder", Limit::Steps, oneDevice(makeLouder)},
+                          {"down", "Make it quieter", Limit::Steps, oneDevice(makeQuieter)}}};
 
 } // namespace Kesbt

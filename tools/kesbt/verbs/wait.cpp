@@ -1,8 +1,7 @@
-#include "command/answer_limit.h"
-#include "command/verb.h"
 #include "daemon/bus_feed.h"
 #include "daemon/objects.h"
 #include "show/text.h"
+#include "verbs/list.h"
 #include "wait/waiting.h"
 
 #include <iostream>
@@ -27,8 +26,7 @@ bool isRemoval(const BusSignal& signal, const Bluetooth::Adapter& adapter) {
 void await(const Options& options, BusFeed& feed, const Bluetooth::Adapter& adapter,
            const Goal& goal) {
     Interrupt interrupt;
-    const auto deadline =
-        options.limited ? Clock::now() + options.timeLimit() : Clock::time_point::max();
+    const auto deadline = options.limit.end();
     bool isTold = false;
     while (!goal.isReached()) {
         if (!isTold)
@@ -81,11 +79,8 @@ void awaitDevice(const Options& options, const std::string& address, const char*
     BusFeed feed = openFeed();
     const auto adapter = openAdapter(options);
     const auto isSo = [&] {
-        const AnswerLimit limit;
-        // It may become known only later.
-        const std::unique_ptr<Bluetooth::Device> device(
-            adapter->findDevice(address.c_str(), false));
-        return device && readProperties(*device).value(property, false);
+        const Json properties = readIfKnown(*adapter, address);
+        return properties.is_object() && properties.value(property, false);
     };
     await(options, feed, *adapter, {name, address, isSo});
 }
@@ -97,34 +92,28 @@ void awaitPower(const Options& options) {
     await(options, feed, *adapter, {"powered", adapterName(*adapter), isOn});
 }
 
-void build(CLI::App& command, const Options& options) {
-    command.require_subcommand(1);
-    const auto add = [&](const char* name, const char* description, const auto& action) {
-        CLI::App* verb = command.add_subcommand(name, description);
-        const auto address = addAddress(*verb);
-        verb->callback([address, action] { action(*address); });
-    };
-    add("found", "Until a device is within reach (with a discovery)",
-        [&options](const std::string& address) { awaitFound(options, address); });
-    add("connected", "Until a device is connected", [&options](const std::string& address) {
-        awaitDevice(options, address, "connected", "Connected");
-    });
-    add("paired", "Until a device is paired", [&options](const std::string& address) {
-        awaitDevice(options, address, "paired", "Paired");
-    });
-    command.add_subcommand("powered", "Until the adapter is on")->callback([&options] {
-        awaitPower(options);
-    });
+void awaitConnected(const Options& options, const std::string& address) {
+    awaitDevice(options, address, "connected", "Connected");
+}
+
+void awaitPaired(const Options& options, const std::string& address) {
+    awaitDevice(options, address, "paired", "Paired");
 }
 
 } // namespace
 
-extern const Verb waitVerb;
-const Verb waitVerb = {"wait", "General", "Wait until something is so; the exit status tells",
-                       "kesbt wait found 00:11:22:33:44:55\n"
-                       "kesbt --timeout 60 wait connected 00:11:22:33:44:55\n"
-                       "kesbt wait paired 00:11:22:33:44:55 && echo paired\n"
-                       "kesbt --adapter hci1 wait powered",
-                       build};
+const Verb waitVerb = {
+    "wait",
+    "General",
+    "Wait until something is so; the exit status tells",
+    "kesbt wait found 00:11:22:33:44:55\n"
+    "kesbt --timeout 60 wait connected 00:11:22:33:44:55\n"
+    "kesbt wait paired 00:11:22:33:44:55 && echo paired\n"
+    "kesbt --adapter hci1 wait powered",
+    {{"found", "Until a device is within reach (with a discovery)", Limit::OnlyGiven,
+      oneDevice(awaitFound)},
+     {"connected", "Until a device is connected", Limit::OnlyGiven, oneDevice(awaitConnected)},
+     {"paired", "Until a device is paired", Limit::OnlyGiven, oneDevice(awaitPaired)},
+     {"powered", "Until the adapter is on", Limit::OnlyGiven, noArguments(awaitPower)}}};
 
 } // namespace Kesbt

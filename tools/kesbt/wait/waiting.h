@@ -1,6 +1,7 @@
 #ifndef KESBT_WAIT_WAITING_H
 #define KESBT_WAIT_WAITING_H
 
+#include "command/limit.h"
 #include "show/failure.h"
 
 #include <chrono>
@@ -13,8 +14,6 @@
 #include <utility>
 
 namespace Kesbt {
-
-using Clock = std::chrono::steady_clock;
 
 /// A file descriptor, closed in the end.
 class FileDescriptor {

@@ -17,7 +17,8 @@ constexpr std::chrono::seconds progressInterval{5};
 
 } // namespace
 
-Watchdog::Watchdog(Task task) : m_task(std::move(task)), m_thread([this] { watch(); }) {}
+Watchdog::Watchdog(const TimeLimit& limit, Task task)
+    : m_task(std::move(task)), m_deadline(limit.end()), m_thread([this] { watch(); }) {}
 
 Watchdog::~Watchdog() {
     m_hasEnded = true;
@@ -31,9 +32,7 @@ void Watchdog::throwIfCancelled() const {
 }
 
 void Watchdog::watch() {
-    const auto deadline =
-        m_task.limit.count() < 0 ? Clock::time_point::max() : m_begin + m_task.limit;
-    if (awaitEnd(deadline))
+    if (awaitEnd(m_deadline))
         return;
     m_task.cancel();
     // A daemon that does not answer any more must not keep the user waiting: leaving the bus ends

@@ -1,7 +1,6 @@
 #ifndef KESBT_WAIT_WATCHDOG_H
 #define KESBT_WAIT_WATCHDOG_H
 
-#include "command/options.h"
 #include "wait/waiting.h"
 
 #include <atomic>
@@ -12,18 +11,16 @@
 namespace Kesbt {
 
 /// Watches over a call that blocks in the library: cancels it when the user interrupts the program
-/// or its time is over. Only one thread waits for the daemon, so the watching is done by another.
+/// or the limit is over. Only one thread waits for the daemon, so the watching is done by another.
 class Watchdog {
 public:
     struct Task {
         std::string name;             ///< e.g. "creating 00:11:22:33:44:55", for messages
         std::function<void()> cancel; ///< called at most once, on the watching thread
-        /// How long the call may take; negative for as long as it wants.
-        std::chrono::milliseconds limit{-1};
-        bool showsProgress = false; ///< tells on standard error every few seconds
+        bool showsProgress = false;   ///< tells on standard error every few seconds
     };
 
-    explicit Watchdog(Task task);
+    Watchdog(const TimeLimit& limit, Task task);
     ~Watchdog();
     Watchdog(const Watchdog&) = delete;
     Watchdog& operator=(const Watchdog&) = delete;
@@ -41,6 +38,7 @@ private:
 
     const Task m_task;
     const Clock::time_point m_begin = Clock::now();
+    const Clock::time_point m_deadline;
     Interrupt m_interrupt;
     Wakeup m_ended;
     std::atomic<bool> m_hasEnded{false};

@@ -1,7 +1,10 @@
+#ifndef KESBT_VERBS_LIST_H
+#define KESBT_VERBS_LIST_H
+
 #include "command/verb.h"
 
-/// All verbs, in the order of the program's help. Each is defined in the file of its name in
-/// verbs/ as NAMEVerb.
+/// All verbs, in the order of the program's help. Each is defined in a file of its own in this
+/// folder as NAMEVerb.
 #define KESBT_VERBS(VERB)                                                                          \
     VERB(names)                                                                                    \
     VERB(monitor)                                                                                  \
@@ -28,11 +31,8 @@ namespace Kesbt {
 
 #define KESBT_DECLARE(name) extern const Verb name##Verb;
 KESBT_VERBS(KESBT_DECLARE)
-
-const std::vector<const Verb*>& allVerbs() {
-#define KESBT_ENTRY(name) &name##Verb,
-    static const std::vector<const Verb*> verbs = {KESBT_VERBS(KESBT_ENTRY)};
-    return verbs;
-}
+#undef KESBT_DECLARE
 
 } // namespace Kesbt
+
+#endif

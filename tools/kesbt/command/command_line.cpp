@@ -1,0 +1,92 @@
+#include "command/command_line.h"
+
+#include "command/usage.h"
+#include "show/text.h"
+
+#include <sstream>
+
+namespace Kesbt {
+
+namespace {
+
+std::string indented(const std::string& lines) {
+    std::istringstream stream(lines);
+    std::string result;
+    for (std::string line; std::getline(stream, line);)
+        result.append("  ").append(line).append("\n");
+    return result;
+}
+
+std::string checkAdapter(const std::string& text) {
+    const bool isName = text.size() > 3 && text.compare(0, 3, "hci") == 0 &&
+                        text.find_first_not_of("0123456789", 3) == std::string::npos;
+    return isName || isAddress(text) ? "" : quoted(text) + " is no adapter such as hci0";
+}
+
+} // namespace
+
+CommandLine::CommandLine(const std::vector<const Verb*>& verbs)
+    : m_program("Works with Bluetooth through bluetoothd (BlueZ 4).", "kesbt") {
+    m_program.fallthrough(); // global options may stand behind the verb too
+    m_program.require_subcommand(1);
+    constexpr std::size_t nameColumns = 20;
+    m_program.get_formatter()->column_width(nameColumns);
+    m_program.get_formatter()->label("SUBCOMMAND", "VERB ...");
+    m_program.footer("kesbt VERB --help tells more about a verb and gives examples.\n"
+                     "Exit status: 0 success, 1 failure, 2 wrong usage.\n");
+    addOptions();
+    for (const Verb* verb : verbs)
+        add(*verb);
+}
+
+void CommandLine::run(int argc, const char* const* argv) {
+    try {
+        m_program.parse(argc, argv);
+    } catch (const CLI::ParseError& error) {
+        if (error.get_exit_code() != 0)
+            throw usageFailure(m_program, error);
+        m_program.exit(error);
+    }
+}
+
+void CommandLine::addOptions() {
+    m_program.add_option("--adapter", m_options.adapter, "The adapter: hci0, or its address")
+        ->type_name("ADAPTER")
+        ->transform(addressInCapitals)
+        ->check(checkAdapter);
+    m_program.add_flag("--json", m_options.json,
+                       "Results for programs: one document, or one line an event");
+    m_program
+        .add_option_function<double>(
+            "--timeout", [this](double seconds) { m_options.limit.give(seconds); },
+            "How long the daemon may take, in seconds (default: 25)")
+        ->type_name("SECONDS")
+        ->check(checkSeconds);
+    m_program.set_version_flag("--version", "kesbt " KESBT_VERSION);
+}
+
+void CommandLine::add(const Verb& verb) {
+    CLI::App* app = m_program.add_subcommand(verb.name, verb.summary);
+    app->group(verb.group);
+    app->footer("Examples:\n" + indented(verb.examples) +
+                "\nOptions of every verb: --adapter, --json, --timeout; see: kesbt --help");
+    for (const Form& form : verb.forms) {
+        const bool isAlone = *form.name == '\0';
+        if (isAlone)
+            setAction(*app, form);
+        else
+            setAction(*app->add_subcommand(form.name, form.summary), form);
+    }
+    const bool standsAlone = *verb.forms.front().name == '\0';
+    if (!app->get_subcommands({}).empty())
+        app->require_subcommand(standsAlone ? 0 : 1, 1);
+}
+
+void CommandLine::setAction(CLI::App& app, const Form& form) {
+    app.callback([this, &app, limit = form.limit, action = form.build({app, m_options})] {
+        if (app.get_subcommands().empty()) // otherwise the word behind the verb tells what to do
+            m_options.limit.run(limit, action);
+    });
+}
+
+} // namespace Kesbt
