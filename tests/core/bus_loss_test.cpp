@@ -42,12 +42,11 @@ protected:
 
 TEST_F(BusLossTest, CallsInFlightAndLaterOnesFailWithAText) {
     peer.neverReply("Slow");
-    std::thread killer([&] {
+    const auto killer = std::async(std::launch::async, [&] {
         EXPECT_TRUE(peer.waitForCalls("Slow", 1));
         bus.kill();
     });
     EXPECT_EQ(ask(proxy, "Slow"), "-1 11 Connection was disconnected before a reply was received");
-    killer.join();
     EXPECT_EQ(ask(proxy, "Slow"), "-1 11 Connection is closed");
     ASSERT_EQ(proxy.newMessage("Take"), 0);
     EXPECT_EQ(outcomeOf(proxy, proxy.sendMessage(false, -1)), "-1 10 Failed to send message");

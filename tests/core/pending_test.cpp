@@ -45,8 +45,8 @@ protected:
     }
 
     /// Does something as soon as Slow has been called.
-    std::thread onceSlowWaits(const std::function<void()>& action) {
-        return std::thread([this, action] {
+    std::future<void> onceSlowWaits(const std::function<void()>& action) {
+        return std::async(std::launch::async, [this, action] {
             EXPECT_TRUE(peer.waitForCalls("Slow", 1));
             action();
         });
@@ -125,9 +125,8 @@ TEST_F(PendingTest, ALateReplyAfterAnInterruptionChangesNothing) {
             late = replyTo(request, [](Writer& w) { w("late"); });
             return MessagePtr();
         });
-        std::thread interrupter = onceSlowWaits([signal = number] { kill(getpid(), signal); });
+        const auto interrupter = onceSlowWaits([signal = number] { kill(getpid(), signal); });
         EXPECT_EQ(callPending(*caller, "Slow"), 0);
-        interrupter.join();
         std::string text;
         EXPECT_EQ(outcomeOf(*caller, caller->getReplyValue(text)), noReply);
         if (number == SIGTERM)
@@ -160,9 +159,8 @@ TEST_F(PendingTest, TheInterruptHandlersStayAndAnInterruptionInBetweenEndsTheNex
 
 TEST_F(PendingTest, TheWaitEndsWhenTheConnectionCloses) {
     peer.neverReply("Slow");
-    std::thread killer = onceSlowWaits([&] { bus.kill(); });
+    const auto killer = onceSlowWaits([&] { bus.kill(); });
     EXPECT_EQ(callPending("Slow"), 0); // it had been sent
-    killer.join();
     // libdbus itself answers what is pending on a connection that closes.
     std::string text;
     EXPECT_EQ(proxy.getReplyValue(text), -1);
@@ -185,7 +183,7 @@ TEST_F(PendingTest, RequestsAreServedOnTheWaitingThreadWhileTheReceiveThreadDeli
         request.reset(dbus_message_ref(pair));
         return MessagePtr();
     });
-    std::thread daemon([&] {
+    const auto daemon = std::async(std::launch::async, [&] {
         EXPECT_TRUE(peer.waitForCalls("Pair", 1));
         for (int i = 0; i < 20; ++i) {
             peer.emit(peerPath, peerInterface, "Changed");
@@ -197,7 +195,6 @@ TEST_F(PendingTest, RequestsAreServedOnTheWaitingThreadWhileTheReceiveThreadDeli
         peer.send(replyTo(request.get()));
     });
     EXPECT_EQ(callPending("Pair"), 0);
-    daemon.join();
     EXPECT_EQ(served().events(), std::vector<std::thread::id>(20, self));
     for (const std::thread::id& thread : delivered.events())
         EXPECT_NE(thread, self);
@@ -216,8 +213,7 @@ TEST_F(PendingTest, AnInterruptionLeavesTheRequestsThatAreStillQueued) {
 
 TEST_F(PendingTest, OtherThreadsCallWhileOneWaits) {
     peer.neverReply("Slow");
-    std::thread other([&] {
-        EXPECT_TRUE(peer.waitForCalls("Slow", 1));
+    const auto other = onceSlowWaits([&] {
         RemoteObject object(peerName, peerPath, peerInterface, busType);
         for (int i = 0; i < 100; ++i)
             EXPECT_EQ(call(object, "Quick"), 0);
@@ -225,7 +221,6 @@ TEST_F(PendingTest, OtherThreadsCallWhileOneWaits) {
         kill(getpid(), SIGINT);
     });
     EXPECT_EQ(textFrom("Slow"), noReply);
-    other.join();
 }
 
 } // namespace Bluetooth::Test

@@ -109,7 +109,7 @@ TEST_F(RestartTest, ADaemonThatDoesNotStartIsAFailureWhateverItReturns) {
 TEST(AddressFromPathTest, TakesAllThatFollowsTheDevice) {
     const std::pair<const char*, const char*> cases[] = {
         {"/org/bluez/1234/hci0/dev_00_11_22_33_44_55", "00:11:22:33:44:55"},
-        {"/dev_AA_BB/service_1", "AA:BB/service:1"},
+        {"/hci0/dev_00_11_22_33_44_55/service_1", "00:11:22:33:44:55/service:1"},
         {"/dev_1/dev_2", "1/dev:2"},
         {"dev_", ""},
         {"/org/bluez/1234/hci0", nullptr},
