@@ -6,36 +6,46 @@ namespace {
 
 using ControlTest = SimTest;
 
+/// No arguments: an empty tuple cannot be sent.
+void nothing(Writer& w) {
+    w.variant("av", [](Writer& v) { v.array("v"); });
+}
+
 TEST_F(ControlTest, TheNextCallFailsOnceOrWaits) {
     simulation.failNext("org.bluez.Adapter", "ListDevices", "org.example.Error.Made", "up");
-    EXPECT_EQ(client->call("Adapter.FindDevice", "('x',)"), "error DoesNotExist: Does Not Exist");
+    EXPECT_EQ(client->call({"Adapter.FindDevice", "x"}), "error DoesNotExist: Does Not Exist");
     EXPECT_EQ(client->call("Adapter.ListDevices"), "error org.example.Error.Made: up");
-    EXPECT_EQ(client->call("Adapter.ListDevices"), "reply []");
+    EXPECT_EQ(client->call("Adapter.ListDevices"), "a()");
     simulation.delayNext("org.bluez.Adapter", "ListDevices", 30);
-    client->start("late", "Adapter.ListDevices");
-    EXPECT_EQ(client->trace("Adapter.ListDevices", "()", "reply late"),
-              lines("reply call []", "reply late []"));
+    client->start("Adapter.ListDevices");
+    client->start({"Manager.FindAdapter", "hci1"});
+    EXPECT_EQ(client->until("answer ListDevices"),
+              lines("answer FindAdapter o:hci1", "answer ListDevices a()"));
 }
 
 TEST_F(ControlTest, AnySignalCanBeEmittedAndComesBeforeTheAnswer) {
-    const auto emit = [&](const std::string& arguments) {
-        client->call("com.kestrine.bluetooth.Sim.EmitSignal",
-                     "(objectpath '" + base + "hci0', 'org.bluez.Adapter', " + arguments + ")");
+    const auto emit = [&](const char* member, const auto& arguments) {
+        client->call({"com.kestrine.bluetooth.Sim.EmitSignal", Path{base + "hci0"},
+                      "org.bluez.Adapter", member, arguments});
         return client->taken();
     };
-    EXPECT_EQ(emit("'DeviceFound', <(uint32 5, [true])>"), lines("hci0 DeviceFound 5 [true]"));
-    EXPECT_EQ(emit("'Made.Up', <@av []>"), Texts{}); // refused: not a member name
-    EXPECT_EQ(emit("'AdapterAdded', <@av []>"), lines("hci0 AdapterAdded"));
-    EXPECT_EQ(emit("'PropertyChanged', <'alone'>"), lines("hci0 PropertyChanged 'alone'"));
+    const auto tuple = [](Writer& w) {
+        w.variant("(uab)",
+                  [](Writer& v) { v.structure([](Writer& s) { s(5U).array("b", with(true)); }); });
+    };
+    EXPECT_EQ(emit("DeviceFound", tuple), lines("hci0 DeviceFound u:5 a(b:1)"));
+    EXPECT_EQ(emit("Made.Up", nothing), Texts{}); // refused: not a member name
+    EXPECT_EQ(emit("AdapterAdded", nothing), lines("hci0 AdapterAdded"));
+    EXPECT_EQ(emit("PropertyChanged", Var{"alone"}), lines("hci0 PropertyChanged s:alone"));
 }
 
 TEST_F(ControlTest, CallsAreRecordedInOrder) {
     client->control("ClearCalls");
-    client->start("set", "Adapter.SetProperty", "('Pairable', <true>)");
-    client->start("find", "Manager.FindAdapter", "('hci1',)");
+    client->start({"Adapter.SetProperty", "Pairable", Var{true}});
+    client->start({"Manager.FindAdapter", "hci1"});
     EXPECT_EQ(client->control("GetCalls"),
-              "reply [('hci0', 'org.bluez.Adapter', 'SetProperty', [<'Pairable'>, <<true>>]), "
-              "('/', 'org.bluez.Manager', 'FindAdapter', [<'hci1'>])]");
+              "a(r(o:hci0 s:org.bluez.Adapter s:SetProperty a(v(s:Pairable) v(v(b:1)))) "
+              "r(o:/ s:org.bluez.Manager s:FindAdapter a(v(s:hci1))))");
 }
 
 TEST(ScenarioTest, WhatIsSetShowsInTheProperties) {
@@ -45,42 +55,44 @@ TEST(ScenarioTest, WhatIsSetShowsInTheProperties) {
         "[Device 00:11:22:33:44:55]\nAdapter=hci0\nPaired=true\n"
         "Trusted=true\nBlocked=true\nAlias=Mine\n");
     SimClient client;
-    client.base();
     const auto expectIn = [](const std::string& properties, const Texts& entries) {
         for (const std::string& entry : entries)
-            EXPECT_NE(properties.find(entry), std::string::npos) << entry << ": " << properties;
+            EXPECT_NE(properties.find("(s:" + entry + ")"), std::string::npos)
+                << entry << ": " << properties;
     };
     expectIn(client.call("Device.GetProperties"),
-             {"'Paired': <true>", "'Trusted': <true>", "'Blocked': <true>", "'Alias': <'Mine'>"});
+             {"Paired v(b:1)", "Trusted v(b:1)", "Blocked v(b:1)", "Alias v(s:Mine)"});
     expectIn(client.call("Adapter.GetProperties"),
-             {"'Powered': <false>", "'Pairable': <false>", "'DiscoverableTimeout': <7>",
-              "'PairableTimeout': <8>"});
+             {"Powered v(b:0)", "Pairable v(b:0)", "DiscoverableTimeout v(u:7)",
+              "PairableTimeout v(u:8)"});
 }
 
 TEST_F(ControlTest, WrongSettingsChangeNothing) {
-    const auto refused = [&](const std::string& settings) {
-        return client->call("com.kestrine.bluetooth.Sim.AddDevice",
-                            "('00:11:22:33:44:55', {" + settings + "})");
+    const auto refused = [&](const char* key, const char* value) {
+        return client->call(
+            {"com.kestrine.bluetooth.Sim.AddDevice", newDevice, Settings{{key, value}}});
     };
     const std::string failed = "error com.kestrine.bluetooth.Sim.Error.Failed: ";
-    EXPECT_EQ(refused("'Nothing': <'x'>"), failed + "Nothing: there is no such key");
-    EXPECT_EQ(refused("'Passkey': <'1000000'>"),
+    EXPECT_EQ(refused("Nothing", "x"), failed + "Nothing: there is no such key");
+    EXPECT_EQ(refused("Passkey", "1000000"),
               failed + "Passkey: \"1000000\" is not a number from 0 to 999999");
-    EXPECT_EQ(refused("'Behaviour': <'Magic'>"),
-              failed + "Behaviour: \"Magic\" is not a behaviour");
+    EXPECT_EQ(refused("Behaviour", "Magic"), failed + "Behaviour: \"Magic\" is not a behaviour");
     add();
-    EXPECT_EQ(refused("'Name': <'x'>"), failed + "there is a device 00:11:22:33:44:55 already");
+    EXPECT_EQ(refused("Name", "x"), failed + "there is a device 00:11:22:33:44:55 already");
 }
 
 TEST_F(ControlTest, AgentsCanBeCalledWithAnything) {
     registerAgent();
-    client->agentAnswers("RequestPinCode", "('1234',)");
-    client->agentAnswers("Nonsense", "!org.freedesktop.DBus.Error.UnknownMethod");
-    EXPECT_EQ(client->control("CallAgent", "('hci0', '', 'RequestPinCode', <(int16 5, 'x')>)"),
-              "reply '' '' [<'1234'>]");
-    EXPECT_EQ(client->taken().back(), "agent RequestPinCode 5 'x'");
-    EXPECT_EQ(client->control("CallAgent", "('hci0', 'org.bluez.Other', 'Nonsense', <@av []>)"),
-              "reply 'org.freedesktop.DBus.Error.UnknownMethod' 'said no' []");
+    client->peer().reply("RequestPinCode", with("1234"));
+    client->peer().replyError("Nonsense", DBUS_ERROR_UNKNOWN_METHOD, "said no");
+    const auto tuple = [](Writer& w) {
+        w.variant("(ns)", [](Writer& v) { v.structure(with(std::int16_t{5}, "x")); });
+    };
+    EXPECT_EQ(client->control({"CallAgent", "hci0", "", "RequestPinCode", tuple}),
+              "s: s: a(v(s:1234))");
+    EXPECT_EQ(client->taken().back(), "agent RequestPinCode n:5 s:x");
+    EXPECT_EQ(client->control({"CallAgent", "hci0", "org.bluez.Other", "Nonsense", nothing}),
+              "s:org.freedesktop.DBus.Error.UnknownMethod s:said no a()");
 }
 
 } // namespace

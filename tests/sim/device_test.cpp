@@ -6,183 +6,191 @@ namespace {
 
 using DeviceTest = SimTest;
 
-constexpr const char* serialPort = "'00001101-0000-1000-8000-00805f9b34fb'";
-const std::string headset =
-    "'Name': <'Headset'>, 'Class': <uint32 0x240404>, 'UUIDs': <['110b', '110e']>";
+const std::string serialPort = "a(s:00001101-0000-1000-8000-00805f9b34fb)";
+const Settings audioDevice{{"Name", "Headset"}, {"Class", "0x240404"}, {"UUIDs", "110b;110e"}};
 const std::string unknownDevice = "error DoesNotExist: Does Not Exist";
+const std::string notConnected = "error NotConnected: Not Connected";
 
 TEST_F(DeviceTest, CreatingADeviceAnnouncesItAndAnswersAfterTheSearch) {
-    add("'Name': <'Phone'>, 'UUIDs': <['1101']>, 'Vendor': <uint16 15>");
-    const std::string uuids = std::string("[") + serialPort + "]";
-    EXPECT_EQ(client->trace("Adapter.CreateDevice", byAddress),
-              created + lines("phone Connected=true", "phone Name='Phone'", "phone Alias='Phone'",
-                              "phone Vendor=15", "phone Product=0", "phone Version=0",
-                              "phone UUIDs=" + uuids, "reply call phone"));
+    add({{"Name", "Phone"}, {"UUIDs", "1101"}, {"Vendor", "15"}});
+    EXPECT_EQ(client->trace({"Adapter.CreateDevice", newDevice}),
+              created + lines("device Connected=b:1", "device Name=s:Phone", "device Alias=s:Phone",
+                              "device Vendor=q:15", "device Product=q:0", "device Version=q:0",
+                              "device UUIDs=" + serialPort, "answer CreateDevice o:device"));
     EXPECT_EQ(client->call("Device.GetProperties"),
-              "reply {'Address': <'00:11:22:33:44:55'>, 'Name': <'Phone'>, 'Alias': <'Phone'>, "
-              "'Vendor': <15>, 'Product': <0>, 'Version': <0>, 'Paired': <false>, 'Trusted': "
-              "<false>, 'Blocked': <false>, 'Connected': <true>, 'UUIDs': <" +
-                  uuids + ">, 'Services': <[]>, 'Adapter': <'hci0'>}");
-    EXPECT_EQ(client->call("Adapter.FindDevice", byAddress), "reply phone");
-    EXPECT_EQ(client->call("Adapter.CreateDevice", byAddress),
+              "a(e(s:Address v(s:00:11:22:33:44:55)) e(s:Name v(s:Phone)) e(s:Alias v(s:Phone)) "
+              "e(s:Vendor v(q:15)) e(s:Product v(q:0)) e(s:Version v(q:0)) e(s:Paired v(b:0)) "
+              "e(s:Trusted v(b:0)) e(s:Blocked v(b:0)) e(s:Connected v(b:1)) e(s:UUIDs v(" +
+                  serialPort + ")) e(s:Services v(a())) e(s:Adapter v(o:hci0)))");
+    EXPECT_EQ(client->call({"Adapter.FindDevice", newDevice}), "o:device");
+    EXPECT_EQ(client->call({"Adapter.CreateDevice", newDevice}),
               "error AlreadyExists: Already Exists");
-    add("", "00:aa:bb:cc:dd:ee");
-    EXPECT_EQ(client->call("Adapter.CreateDevice", "('00:aa:bb:cc:dd:ee',)"),
-              "reply 'hci0/dev_00_AA_BB_CC_DD_EE'");
+    add({}, "00:aa:bb:cc:dd:ee");
+    EXPECT_EQ(client->call({"Adapter.CreateDevice", "00:aa:bb:cc:dd:ee"}),
+              "o:hci0/dev_00_AA_BB_CC_DD_EE");
 }
 
 TEST_F(DeviceTest, ADeviceThatDoesNotAnswerIsTakenBack) {
-    add("'Behaviour': <'Unconnectable'>");
-    EXPECT_EQ(client->trace("Adapter.CreateDevice", byAddress, "hci0 DeviceRemoved"),
-              created + lines("error call Failed: Host is down") + removed);
-    EXPECT_EQ(client->call("Adapter.CreateDevice", "('00:11:22:33:44',)"), "error " + badArguments);
-    EXPECT_EQ(client->call("Adapter.FindDevice", "('junk',)"), unknownDevice);
+    add({{"Behaviour", "Unconnectable"}});
+    EXPECT_EQ(client->trace({"Adapter.CreateDevice", newDevice}, removed[1]),
+              created + lines("answer CreateDevice error Failed: Host is down") + removed);
+    EXPECT_EQ(client->call({"Adapter.CreateDevice", "00:11:22:33:44"}), badArguments);
+    EXPECT_EQ(client->call({"Adapter.FindDevice", "junk"}), unknownDevice);
 }
 
 TEST_F(DeviceTest, ACreationEndsWithItsCallerWhoAloneCancelsIt) {
-    const std::string cancel = "Adapter.CancelDeviceCreation";
-    EXPECT_EQ(client->call(cancel, byAddress), unknownDevice);
-    EXPECT_EQ(client->call(cancel, "('x',)"), "error " + badArguments);
-    setTimes("'PageTimeout': <60000000>");
-    client->start("create", "Adapter.CreateDevice", byAddress);
+    const Question cancel("Adapter.CancelDeviceCreation", newDevice);
+    EXPECT_EQ(client->call(cancel), unknownDevice);
+    EXPECT_EQ(client->call({"Adapter.CancelDeviceCreation", "x"}), badArguments);
+    setTime("PageTimeout", "60000000");
+    client->start({"Adapter.CreateDevice", newDevice});
     client->until(created[1]);
     auto other = std::make_unique<SimClient>();
-    other->base();
-    EXPECT_EQ(other->call(cancel, byAddress), "error NotAuthorized: Operation Not Authorized");
-    EXPECT_EQ(other->call("Adapter.RemoveDevice", byPath),
+    EXPECT_EQ(other->call(cancel), "error NotAuthorized: Operation Not Authorized");
+    EXPECT_EQ(other->call({"Adapter.RemoveDevice", device}),
               "error DoesNotExist: Device creation in progress");
-    EXPECT_EQ(client->trace(cancel, byAddress),
-              removed + lines("error create Failed: Operation canceled", "reply call"));
+    EXPECT_EQ(client->trace(cancel),
+              removed + lines("answer CreateDevice error Failed: Operation canceled",
+                              "answer CancelDeviceCreation"));
 
-    other->start("create", "Adapter.CreateDevice", byAddress);
+    other->start({"Adapter.CreateDevice", newDevice});
     client->until(created[1]);
     other.reset();
-    EXPECT_EQ(client->until("hci0 DeviceRemoved"), removed);
+    EXPECT_EQ(client->until(removed[1]), removed);
 }
 
 TEST_F(DeviceTest, ARemovedDeviceIsGone) {
+    const Question remove("Adapter.RemoveDevice", device);
     create();
-    EXPECT_EQ(client->trace("Adapter.RemoveDevice", byPath, "hci0 DeviceRemoved"),
-              lines("phone DisconnectRequested", "reply call", "phone Connected=false") + removed);
-    EXPECT_EQ(client->call("Adapter.RemoveDevice", byPath), unknownDevice);
-    EXPECT_EQ(
-        client->call("Device.Disconnect").find("error org.freedesktop.DBus.Error.UnknownObject:"),
-        0U);
-    client->call("Adapter.CreateDevice", byAddress);
-    client->control("DropLink", onAdapter);
-    EXPECT_EQ(client->trace("Adapter.RemoveDevice", byPath), removed + lines("reply call"));
+    EXPECT_EQ(client->trace(remove, removed[1]),
+              lines("device DisconnectRequested", "answer RemoveDevice", "device Connected=b:0") +
+                  removed);
+    EXPECT_EQ(client->call(remove), unknownDevice);
+    EXPECT_EQ(client->call("Device.Disconnect")
+                  .rfind("error org.freedesktop.DBus.Error.UnknownObject:", 0),
+              0U);
+    client->call({"Adapter.CreateDevice", newDevice});
+    client->control({"DropLink", "hci0", newDevice});
+    EXPECT_EQ(client->trace(remove), removed + lines("answer RemoveDevice"));
 }
 
 TEST_F(DeviceTest, LinksEndByThemselvesOrAfterAnAnnouncement) {
     create();
-    EXPECT_EQ(client->trace("Device.Disconnect", "()", "phone Connected"),
-              lines("phone DisconnectRequested", "reply call", "phone Connected=false"));
-    EXPECT_EQ(client->call("Device.Disconnect"), "error NotConnected: Not Connected");
-    EXPECT_EQ(client->call("Adapter.RemoveDevice", byPath), "reply");
-    setTimes("'IdleDisconnect': <4000>");
-    client->call("Adapter.CreateDevice", byAddress);
-    client->until("phone Connected=false");
-    EXPECT_EQ(client->call("Adapter.ListDevices"), "reply [phone]");
+    EXPECT_EQ(client->trace("Device.Disconnect", "device Connected"),
+              lines("device DisconnectRequested", "answer Disconnect", "device Connected=b:0"));
+    EXPECT_EQ(client->call("Device.Disconnect"), notConnected);
+    EXPECT_EQ(client->call({"Adapter.RemoveDevice", device}), "");
+    setTime("IdleDisconnect", "4000");
+    client->call({"Adapter.CreateDevice", newDevice});
+    client->until("device Connected=b:0");
+    EXPECT_EQ(client->call("Adapter.ListDevices"), "a(o:device)");
 }
 
 TEST_F(DeviceTest, PropertiesAreSaidBeforeTheReply) {
-    create("'Name': <'Phone'>");
-    EXPECT_EQ(set("Alias", "'Mine'", "Device"), lines("phone Alias='Mine'", "reply set"));
-    EXPECT_EQ(set("Alias", "'Mine'", "Device"), lines("reply set"));
-    EXPECT_EQ(set("Alias", "''", "Device"), lines("phone Alias=''", "reply set"));
-    EXPECT_NE(client->call("Device.GetProperties").find("'Alias': <'Phone'>"), std::string::npos);
-    EXPECT_EQ(set("Trusted", "true", "Device"), lines("phone Trusted=true", "reply set"));
-    EXPECT_EQ(set("Blocked", "true", "Device"),
-              lines("phone Connected=false", "phone Blocked=true", "reply set"));
-    EXPECT_EQ(set("Paired", "true", "Device"), lines("error set " + badArguments));
-    EXPECT_EQ(set("Trusted", "'true'", "Device"), lines("error set " + badArguments));
+    const std::string answer = "answer SetProperty";
+    create({{"Name", "Phone"}});
+    EXPECT_EQ(setOfDevice("Alias", "Mine"), lines("device Alias=s:Mine", answer));
+    EXPECT_EQ(setOfDevice("Alias", "Mine"), lines(answer));
+    EXPECT_EQ(setOfDevice("Alias", ""), lines("device Alias=s:", answer));
+    EXPECT_NE(client->call("Device.GetProperties").find("(s:Alias v(s:Phone))"), std::string::npos);
+    EXPECT_EQ(setOfDevice("Trusted", true), lines("device Trusted=b:1", answer));
+    EXPECT_EQ(setOfDevice("Blocked", true),
+              lines("device Connected=b:0", "device Blocked=b:1", answer));
+    EXPECT_EQ(setOfDevice("Paired", true), lines(answer + " " + badArguments));
+    EXPECT_EQ(setOfDevice("Trusted", "true"), lines(answer + " " + badArguments));
 }
 
 TEST_F(DeviceTest, ServicesAreFoundByAnyFormOfTheirClass) {
-    create("'UUIDs': <['1101', '110b']>");
-    const auto discover = [&](const std::string& pattern) {
-        return client->call("Device.DiscoverServices", "('" + pattern + "',)");
+    create({{"UUIDs", "1101;110b"}});
+    const auto discover = [&](const char* pattern) {
+        return client->call({"Device.DiscoverServices", pattern});
     };
     const std::string serial = discover("0x1101");
-    EXPECT_EQ(serial.find("reply {65536: '<?xml version=\"1.0\" encoding=\"UTF-8\" "
-                          "?>\\n\\n<record>\\n\\t<attribute id=\"0x0000\">"),
+    EXPECT_EQ(serial.rfind("a(e(u:65536 s:<?xml version=\"1.0\" encoding=\"UTF-8\" ?>\n\n<record>"
+                           "\n\t<attribute id=\"0x0000\">",
+                           0),
               0U);
     for (const char* form : {"1101", "spp", "00001101-0000-1000-8000-00805F9B34FB"})
         EXPECT_EQ(discover(form), serial) << form;
-    EXPECT_NE(discover("").find("65537: "), std::string::npos);
-    EXPECT_EQ(discover("1200"), "reply {}");
-    EXPECT_EQ(discover("nonsense"), "error " + badArguments);
+    EXPECT_NE(discover("").find("e(u:65537 "), std::string::npos);
+    EXPECT_EQ(discover("1200"), "a()");
+    EXPECT_EQ(discover("nonsense"), badArguments);
 }
 
 TEST_F(DeviceTest, ASearchCanBeCancelledByItsCaller) {
     create();
+    const Question search("Device.DiscoverServices", "");
     EXPECT_EQ(client->call("Device.CancelDiscovery"), unknownDevice);
-    setTimes("'ServiceSearch': <60000000>");
-    client->start("search", "Device.DiscoverServices", "('',)");
-    EXPECT_EQ(client->call("Device.DiscoverServices", "('',)"), "error InProgress: In Progress");
+    setTime("ServiceSearch", "60000000");
+    client->start(search);
+    EXPECT_EQ(client->call(search), "error InProgress: In Progress");
     EXPECT_EQ(client->trace("Device.CancelDiscovery"),
-              lines("error search Failed: Operation canceled", "reply call"));
-    client->start("search", "Device.DiscoverServices", "('',)");
-    client->control("DropLink", onAdapter);
-    EXPECT_EQ(client->until("error search").back(),
-              "error search ConnectionAttemptFailed: Host is down");
-    set("Powered", "false");
-    EXPECT_EQ(client->call("Device.DiscoverServices", "('',)"), "error Failed: No route to host");
+              lines("answer DiscoverServices error Failed: Operation canceled",
+                    "answer CancelDiscovery"));
+    client->start(search);
+    client->control({"DropLink", "hci0", newDevice});
+    EXPECT_EQ(client->until("answer").back(),
+              "answer DiscoverServices error ConnectionAttemptFailed: Host is down");
+    set("Powered", false);
+    EXPECT_EQ(client->call(search), "error Failed: No route to host");
 }
 
 TEST_F(DeviceTest, AudioConnectsWithAllItsInterfacesAndDisconnects) {
-    create(headset);
-    EXPECT_EQ(client->call("Control.VolumeUp"), "error NotConnected: Not Connected");
-    const Texts connected{"phone Connected", "phone Connected=true"};
+    create(audioDevice);
+    EXPECT_EQ(client->call("Control.VolumeUp"), notConnected);
+    const Texts connected{"device Connected", "device Connected=b:1"};
+    const std::string connecting = "device State=s:connecting";
+    const std::string isConnected = "device State=s:connected";
     EXPECT_EQ(client->trace("AudioSink.Connect"),
-              lines("phone State='connecting'", "phone State='connecting'") + connected +
-                  lines("phone State='connected'", "phone State='connected'", "reply call"));
-    EXPECT_EQ(client->until("phone Connected=true"), connected);
-    EXPECT_EQ(client->call("Control.VolumeUp"), "reply");
+              lines(connecting, connecting) + connected +
+                  lines(isConnected, isConnected, "answer Connect"));
+    EXPECT_EQ(client->until(connected[1]), connected);
+    EXPECT_EQ(client->call("Control.VolumeUp"), "");
     EXPECT_EQ(client->call("AudioSink.Connect"), "error AlreadyConnected: Already Connected");
-    client->control("SetPlaying", "('hci0', '00:11:22:33:44:55', true)");
+    client->control({"SetPlaying", "hci0", newDevice, true});
     EXPECT_EQ(client->taken(),
-              lines("phone Playing", "phone Playing=true", "phone State='playing'"));
-    EXPECT_EQ(client->call("AudioSink.IsConnected"), "reply true");
-    EXPECT_EQ(client->call("Control.IsConnected"), "reply true");
-    EXPECT_EQ(client->call("Control.GetProperties"), "reply {'Connected': <true>}");
+              lines("device Playing", "device Playing=b:1", "device State=s:playing"));
+    EXPECT_EQ(client->call("AudioSink.IsConnected"), "b:1");
+    EXPECT_EQ(client->call("Control.IsConnected"), "b:1");
+    EXPECT_EQ(client->call("Control.GetProperties"), "a(e(s:Connected v(b:1)))");
     EXPECT_EQ(client->call("AudioSink.GetProperties"),
-              "reply {'State': <'playing'>, 'Connected': <true>, 'Playing': <true>}");
-    EXPECT_EQ(client->trace("Audio.Disconnect").front(), "phone Stopped");
-    EXPECT_EQ(client->call("Audio.GetProperties"), "reply {'State': <'disconnected'>}");
-    EXPECT_EQ(client->call("Audio.Disconnect"), "error NotConnected: Not Connected");
-    EXPECT_EQ(client->call("AudioSink.Disconnect"), "error NotConnected: Not Connected");
-    EXPECT_EQ(client->call("AudioSink.Connect"), "reply");
-    EXPECT_EQ(client->call("AudioSink.Disconnect"), "reply");
-    client->control("SetDevice", "('00:11:22:33:44:55', {'Connectable': <false>})");
+              "a(e(s:State v(s:playing)) e(s:Connected v(b:1)) e(s:Playing v(b:1)))");
+    EXPECT_EQ(client->trace("Audio.Disconnect").front(), "device Stopped");
+    EXPECT_EQ(client->call("Audio.GetProperties"), "a(e(s:State v(s:disconnected)))");
+    EXPECT_EQ(client->call("Audio.Disconnect"), notConnected);
+    EXPECT_EQ(client->call("AudioSink.Disconnect"), notConnected);
+    EXPECT_EQ(client->call("AudioSink.Connect"), "");
+    EXPECT_EQ(client->call("AudioSink.Disconnect"), "");
+    client->control({"SetDevice", newDevice, Settings{{"Connectable", "false"}}});
     EXPECT_EQ(client->call("Audio.Connect"), "error Failed: Connect Failed");
 }
 
 TEST_F(DeviceTest, AServiceOfAnUntrustedDeviceNeedsTheAgentsConsent) {
-    create(headset + ", 'ConnectsBack': <true>");
+    Settings settings = audioDevice;
+    settings.emplace_back("ConnectsBack", "true");
+    create(settings);
     registerAgent();
-    const std::string asked = "agent Authorize phone '0000110d-0000-1000-8000-00805f9b34fb'";
-    client->agentAnswers("Authorize", "!org.bluez.Error.Rejected");
+    const std::string asked = "agent Authorize o:device s:0000110d-0000-1000-8000-00805f9b34fb";
+    client->peer().replyError("Authorize", "org.bluez.Error.Rejected", "said no");
     EXPECT_EQ(client->call("AudioSink.Connect"), "error Failed: Stream setup failed");
     client->until(asked);
-    client->agentAnswers("Authorize", "");
-    client->control("ConnectService", "('hci0', '00:11:22:33:44:55', '110d')");
+    client->peer().reply("Authorize");
+    client->control({"ConnectService", "hci0", newDevice, "110d"});
     client->until(asked);
-    client->until("phone State='connected'");
+    client->until("device State=s:connected");
     client->call("Audio.Disconnect");
-    set("Trusted", "true", "Device");
+    setOfDevice("Trusted", true);
     for (const std::string& line : client->trace("Audio.Connect"))
         EXPECT_EQ(line.find("agent"), std::string::npos) << line;
 }
 
 TEST_F(DeviceTest, ADeviceThatConnectsByItselfStaysOnlyAsLongAsItsLink) {
-    add("'UUIDs': <['1101']>");
-    client->control("ConnectDevice", onAdapter);
-    EXPECT_EQ(client->until("phone UUIDs"),
-              created +
-                  lines("phone Connected=true", std::string("phone UUIDs=[") + serialPort + "]"));
-    client->control("DropLink", onAdapter);
-    EXPECT_EQ(client->taken(), lines("phone Connected=false") + removed);
+    add({{"UUIDs", "1101"}});
+    client->control({"ConnectDevice", "hci0", newDevice});
+    EXPECT_EQ(client->until("device UUIDs"),
+              created + lines("device Connected=b:1", "device UUIDs=" + serialPort));
+    client->control({"DropLink", "hci0", newDevice});
+    EXPECT_EQ(client->taken(), lines("device Connected=b:0") + removed);
 }
 
 } // namespace

@@ -4,100 +4,110 @@ namespace Bluetooth::Test {
 
 namespace {
 
-using DiscoveryTest = SimTest;
+class DiscoveryTest : public SimTest {
+protected:
+    void makeInquiryEndless() { setTime("Inquiry", "60000000"); }
 
-const std::string found = "hci0 DeviceFound '00:11:22:33:44:55' ";
-const char* const endless = "'Inquiry': <60000000>"; // one round that does not end
+    const std::string found = "hci0 DeviceFound s:00:11:22:33:44:55 ";
+    const std::string foundOther = "hci0 DeviceFound s:00:11:22:33:44:66 ";
+    const std::string begins = "hci0 Discovering=b:1";
+    const std::string ends = "hci0 Discovering=b:0";
+};
 
 TEST_F(DiscoveryTest, ADeviceIsFoundOnceWithItsValuesInOrder) {
-    add("'Name': <'Phone'>, 'Class': <uint32 0x5a020c>, 'UUIDs': <['110a', '1112']>, "
-        "'RSSI': <int16 -48>, 'LegacyPairing': <true>");
-    EXPECT_EQ(client->trace("Adapter.StartDiscovery", "()", "hci0 Discovering=false"),
-              lines("reply call", "hci0 Discovering=true",
-                    found + "{'Address': <'00:11:22:33:44:55'>, 'Class': <5898764>, "
-                            "'Icon': <'phone'>, 'RSSI': <-48>, 'Name': <'Phone'>, "
-                            "'Alias': <'Phone'>, 'LegacyPairing': <true>, 'Paired': <false>, "
-                            "'Trusted': <false>, 'UUIDs': "
-                            "<['0000110a-0000-1000-8000-00805f9b34fb', "
-                            "'00001112-0000-1000-8000-00805f9b34fb']>}",
-                    "hci0 Discovering=false"));
-    EXPECT_EQ(client->until("hci0 Discovering=false"),
-              lines("hci0 Discovering=true", "hci0 Discovering=false"));
+    client->control({"AddDevice", newDevice, [](Writer& w) { // values may have types of their own
+                         w.dict("sv", [](Writer& d) {
+                             d.entry("Name", Var{"Phone"}).entry("Class", Var{0x5a020cU});
+                             d.entryWith("UUIDs", [](Writer& uuids) {
+                                 uuids.variant(
+                                     "as", [](Writer& v) { v.array("s", with("110a", "1112")); });
+                             });
+                             d.entry("RSSI", Var{std::int16_t{-48}});
+                             d.entry("LegacyPairing", Var{true});
+                         });
+                     }});
+    EXPECT_EQ(client->trace("Adapter.StartDiscovery", ends),
+              lines("answer StartDiscovery", begins,
+                    found + "a(e(s:Address v(s:00:11:22:33:44:55)) e(s:Class v(u:5898764)) "
+                            "e(s:Icon v(s:phone)) e(s:RSSI v(n:-48)) e(s:Name v(s:Phone)) "
+                            "e(s:Alias v(s:Phone)) e(s:LegacyPairing v(b:1)) e(s:Paired v(b:0)) "
+                            "e(s:Trusted v(b:0)) e(s:UUIDs v(a("
+                            "s:0000110a-0000-1000-8000-00805f9b34fb "
+                            "s:00001112-0000-1000-8000-00805f9b34fb))))",
+                    ends));
+    EXPECT_EQ(client->until(ends), lines(begins, ends));
 }
 
 TEST_F(DiscoveryTest, ADeviceIsFoundAgainWhenItChanges) {
-    setTimes(endless);
+    makeInquiryEndless();
     add();
-    EXPECT_EQ(client->trace("Adapter.StartDiscovery", "()", found).back(),
-              found + "{'Address': <'00:11:22:33:44:55'>, 'Class': <0>, 'RSSI': <-60>, 'Alias': "
-                      "<'00-11-22-33-44-55'>, 'LegacyPairing': <false>, 'Paired': <false>, "
-                      "'Trusted': <false>}");
+    EXPECT_EQ(client->trace("Adapter.StartDiscovery", found).back(),
+              found + "a(e(s:Address v(s:00:11:22:33:44:55)) e(s:Class v(u:0)) e(s:RSSI v(n:-60)) "
+                      "e(s:Alias v(s:00-11-22-33-44-55)) e(s:LegacyPairing v(b:0)) "
+                      "e(s:Paired v(b:0)) e(s:Trusted v(b:0)))");
     // The last changes nothing that shows.
-    for (const char* change :
-         {"'RSSI': <int16 -50>", "'Name': <'Late'>, 'Class': <uint32 0x002540>", "'PIN': <'1'>"})
-        client->control("SetDevice", std::string("('00:11:22:33:44:55', {") + change + "})");
+    for (const Settings& change :
+         {Settings{{"RSSI", "-50"}}, {{"Name", "Late"}, {"Class", "0x002540"}}, {{"PIN", "1"}}})
+        client->control({"SetDevice", newDevice, change});
     const Texts came = client->taken();
     ASSERT_EQ(came.size(), 2U);
-    EXPECT_NE(came[0].find("'RSSI': <-50>"), std::string::npos) << came[0];
-    EXPECT_NE(came[1].find("'Icon': <'input-keyboard'>, 'RSSI': <-50>, 'Name': <'Late'>"),
+    EXPECT_NE(came[0].find("(s:RSSI v(n:-50))"), std::string::npos) << came[0];
+    EXPECT_NE(came[1].find("e(s:Icon v(s:input-keyboard)) e(s:RSSI v(n:-50)) e(s:Name v(s:Late))"),
               std::string::npos)
         << came[1];
 }
 
 TEST_F(DiscoveryTest, NamesThatDoNotComeWithTheInquiryAreAskedForAfterIt) {
-    add("'Name': <'Keyboard'>, 'NameInInquiry': <false>");
-    const Texts came = client->trace("Adapter.StartDiscovery", "()", "hci0 Discovering=false");
+    add({{"Name", "Keyboard"}, {"NameInInquiry", "false"}});
+    const Texts came = client->trace("Adapter.StartDiscovery", ends);
     ASSERT_EQ(came.size(), 5U);
-    EXPECT_EQ(came[2].find("'Name'"), std::string::npos) << came[2];
-    EXPECT_NE(came[3].find("'Name': <'Keyboard'>"), std::string::npos) << came[3];
+    EXPECT_EQ(came[2].find("s:Name"), std::string::npos) << came[2];
+    EXPECT_NE(came[3].find("(s:Name v(s:Keyboard))"), std::string::npos) << came[3];
 }
 
 TEST_F(DiscoveryTest, WhatIsMissingForAWholeRoundHasDisappeared) {
+    const std::string disappeared = "hci0 DeviceDisappeared s:";
     add();
-    add("'Behaviour': <'Vanishing'>", "00:11:22:33:44:66");
-    client->trace("Adapter.StartDiscovery", "()", "hci0 DeviceDisappeared '00:11:22:33:44:66'");
-    client->control("RemoveDevice", byAddress);
+    add({{"Behaviour", "Vanishing"}}, otherDevice);
+    client->trace("Adapter.StartDiscovery", disappeared + otherDevice);
+    client->control({"RemoveDevice", newDevice});
     client->taken();
-    const Texts came = client->until("hci0 DeviceDisappeared '00:11:22:33:44:55'");
-    EXPECT_EQ(came[came.size() - 2], "hci0 Discovering=false");
+    const Texts came = client->until(disappeared + newDevice);
+    EXPECT_EQ(came[came.size() - 2], ends);
     add();
     client->until(found);
 }
 
 TEST_F(DiscoveryTest, SessionsAreCountedForEachClientAndANewDiscoveryFindsEverythingAgain) {
-    setTimes(endless);
+    makeInquiryEndless();
     add();
     auto other = std::make_unique<SimClient>();
-    other->base();
     const std::string none = "error Failed: Invalid discovery session";
-    EXPECT_EQ(other->call("Adapter.StartDiscovery"), "reply");
-    EXPECT_EQ(other->call("Adapter.StartDiscovery"), "reply");
+    EXPECT_EQ(other->call("Adapter.StartDiscovery"), "");
+    EXPECT_EQ(other->call("Adapter.StartDiscovery"), "");
     EXPECT_EQ(client->call("Adapter.StopDiscovery"), none);
-    EXPECT_EQ(client->call("Adapter.StartDiscovery"), "reply");
+    EXPECT_EQ(client->call("Adapter.StartDiscovery"), "");
     client->until(found);
-    EXPECT_EQ(client->trace("Adapter.StopDiscovery"), lines("reply call"));
+    EXPECT_EQ(client->trace("Adapter.StopDiscovery"), lines("answer StopDiscovery"));
     EXPECT_EQ(client->call("Adapter.StopDiscovery"), none);
     leave(other);
-    EXPECT_EQ(client->taken(), lines("hci0 Discovering=false"));
+    EXPECT_EQ(client->taken(), lines(ends));
 
-    client->trace("Adapter.StartDiscovery", "()", found);
-    EXPECT_EQ(client->trace("Adapter.StopDiscovery", "()", "hci0 Discovering=false"),
-              lines("reply call", "hci0 Discovering=false"));
+    client->trace("Adapter.StartDiscovery", found);
+    EXPECT_EQ(client->trace("Adapter.StopDiscovery", ends), lines("answer StopDiscovery", ends));
 }
 
 TEST_F(DiscoveryTest, CreatingADeviceSuspendsItAndPowerOffEndsIt) {
-    setTimes(endless);
+    makeInquiryEndless();
     add();
-    add("'Adapter': <'hci0'>", "00:11:22:33:44:66");
-    client->trace("Adapter.StartDiscovery", "()", "hci0 DeviceFound '00:11:22:33:44:66'");
-    EXPECT_EQ(client->trace("Adapter.CreateDevice", byAddress),
-              created +
-                  lines("hci0 Discovering=false", "phone Connected=true", "reply call phone"));
-    EXPECT_EQ(client->until("hci0 DeviceFound '00:11:22:33:44:66'").size(), 3U);
-    const Texts off = set("Powered", "false");
-    EXPECT_EQ(
-        Texts(off.end() - 4, off.end()),
-        lines("hci0 Pairable=false", "hci0 Discovering=false", "hci0 Powered=false", "reply set"));
+    add({{"Adapter", "hci0"}}, otherDevice);
+    client->trace("Adapter.StartDiscovery", foundOther);
+    EXPECT_EQ(client->trace({"Adapter.CreateDevice", newDevice}),
+              created + lines(ends, "device Connected=b:1", "answer CreateDevice o:device"));
+    EXPECT_EQ(client->until(foundOther).size(), 3U);
+    const Texts off = set("Powered", false);
+    EXPECT_EQ(Texts(off.end() - 4, off.end()),
+              lines("hci0 Pairable=b:0", ends, "hci0 Powered=b:0", "answer SetProperty"));
 }
 
 } // namespace

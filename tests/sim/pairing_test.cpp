@@ -6,231 +6,244 @@ namespace {
 
 class SimPairingTest : public SimTest {
 protected:
-    void startPairing(const std::string& capability = "") {
+    void startPairing(const char* capability = "") {
         client->taken();
-        client->start("pair", "Adapter.CreatePairedDevice",
-                      "('00:11:22:33:44:55', objectpath '/agent', '" + capability + "')");
+        client->start({"Adapter.CreatePairedDevice", newDevice, agent, capability});
     }
     /// What comes between the new connection and the end of a pairing with this agent.
-    Texts pair(const std::string& capability = "") {
+    Texts pair(const char* capability = "") {
         startPairing(capability);
-        client->until("phone Connected=true");
+        client->until("device Connected=b:1");
         Texts came = client->until("agent Release");
         client->control("ClearFaults");
         return came;
     }
-    void comeToPair() { client->control("StartIncomingPairing", onAdapter); }
+    void comeToPair(const char* address = newDevice) {
+        client->control({"StartIncomingPairing", "hci0", address});
+    }
     /// A pairing whose agent has been asked and stays silent.
-    void startWaiting(const std::string& settings = "'Passkey': <uint32 7>") {
+    void startWaiting(const Settings& settings = {{"Passkey", "7"}}) {
         add(settings);
-        client->agentAnswers("RequestConfirmation", "-");
+        client->peer().neverReply("RequestConfirmation");
         startPairing();
         client->until("agent RequestConfirmation");
     }
-    const Texts disconnected = lines("phone Connected=false") + removed;
+    void forgetDevice() {
+        client->control({"DropLink", "hci0", newDevice});
+        client->call({"Adapter.RemoveDevice", device});
+    }
+
+    const std::string answer = "answer CreatePairedDevice";
+    const std::string failed = answer + " error ";
+    const std::string paired = "device Paired=b:1";
+    const std::string connected = "device Connected=b:1";
+    const std::string uuids = "device UUIDs=a(s:00001101-0000-1000-8000-00805f9b34fb)";
+    const Texts disconnected = lines("device Connected=b:0") + removed;
 };
 
 TEST_F(SimPairingTest, SuccessComesInTheOrderOfTheDaemon) {
-    add("'Name': <'Phone'>, 'Passkey': <uint32 42>, 'UUIDs': <['1101']>");
+    add({{"Name", "Phone"}, {"Passkey", "42"}, {"UUIDs", "1101"}});
     startPairing();
-    EXPECT_EQ(client->until("reply pair"),
-              created + lines("phone Connected=true", "phone Name='Phone'", "phone Alias='Phone'",
-                              "agent RequestConfirmation phone 42", "phone Paired=true",
-                              "agent Release",
-                              "phone UUIDs=['00001101-0000-1000-8000-00805f9b34fb']",
-                              "reply pair phone"));
+    EXPECT_EQ(client->until(answer),
+              created + lines(connected, "device Name=s:Phone", "device Alias=s:Phone",
+                              "agent RequestConfirmation o:device u:42", paired, "agent Release",
+                              uuids, answer + " o:device"));
     startPairing();
-    EXPECT_EQ(client->until("error pair"), lines("error pair AlreadyExists: Already Exists"));
+    EXPECT_EQ(client->until(answer), lines(failed + "AlreadyExists: Already Exists"));
 }
 
 TEST_F(SimPairingTest, ADeviceThatExistsIsOnlyPaired) {
-    create("'Behaviour': <'JustWorks'>");
+    create({{"Behaviour", "JustWorks"}});
     startPairing();
-    EXPECT_EQ(client->until("reply pair"),
-              lines("phone Paired=true", "agent Release", "reply pair phone"));
+    EXPECT_EQ(client->until(answer), lines(paired, "agent Release", answer + " o:device"));
 }
 
 TEST_F(SimPairingTest, TheTwoCapabilitiesDecideWhatTheAgentIsAsked) {
-    client->agentAnswers("RequestPasskey", "(uint32 7,)");
-    const std::string confirmation = "agent RequestConfirmation phone 7";
-    const std::string passkey = "agent RequestPasskey phone";
-    const std::string display = "agent DisplayPasskey phone 7 0x00";
-    const std::string nothing = "phone Paired=true";
-    const Texts ours{"", "DisplayOnly", "KeyboardOnly", "NoInputNoOutput", "KeyboardDisplay"};
-    const std::vector<Texts> rows = {
+    client->peer().reply("RequestPasskey", with(7U));
+    const std::string confirmation = "agent RequestConfirmation o:device u:7";
+    const std::string passkey = "agent RequestPasskey o:device";
+    const std::string display = "agent DisplayPasskey o:device u:7 y:0";
+    const std::string& nothing = paired;
+    const char* const ours[] = {"", "DisplayOnly", "KeyboardOnly", "NoInputNoOutput",
+                                "KeyboardDisplay"};
+    const Texts rows[] = {
         // theirs, and what follows for each of ours
         {"DisplayYesNo", confirmation, confirmation, passkey, nothing, confirmation},
         {"DisplayOnly", confirmation, confirmation, passkey, nothing, confirmation},
         {"KeyboardOnly", display, display, passkey, nothing, display},
         {"NoInputNoOutput", nothing, nothing, nothing, nothing, nothing}};
     for (const auto& row : rows) {
-        for (std::size_t i = 0; i < ours.size(); ++i) {
-            add("'Passkey': <uint32 7>, 'Capability': <'" + row[0] + "'>");
-            const Texts came = pair(ours[i]);
-            EXPECT_EQ(came.front(), row[i + 1]) << row[0] << " and " << ours[i];
-            EXPECT_EQ(came[came.size() - 2], nothing);
-            client->until("reply pair");
-            client->control("DropLink", onAdapter);
-            client->call("Adapter.RemoveDevice", byPath);
-            client->control("RemoveDevice", byAddress);
+        auto expected = row.begin();
+        for (const char* capability : ours) {
+            add({{"Passkey", "7"}, {"Capability", row[0]}});
+            const Texts came = pair(capability);
+            EXPECT_EQ(came.front(), *++expected) << row[0] << " and " << capability;
+            EXPECT_EQ(came[came.size() - 2], paired);
+            client->until(answer + " o:");
+            forgetDevice();
+            client->control({"RemoveDevice", newDevice});
         }
     }
     startPairing("Telepathy");
-    EXPECT_EQ(client->until("error pair").back(), "error pair " + badArguments);
+    EXPECT_EQ(client->until(answer).back(), answer + " " + badArguments);
 }
 
 TEST_F(SimPairingTest, APasskeyIsShownWhileItIsTypedThere) {
-    add("'Behaviour': <'DisplayPasskey'>, 'Passkey': <uint32 123456>");
+    add({{"Behaviour", "DisplayPasskey"}, {"Passkey", "123456"}});
     Texts expected;
     for (const char* typed : {"0", "1", "2", "3", "4", "5", "6"})
-        expected.push_back(std::string("agent DisplayPasskey phone 123456 0x0") + typed);
-    EXPECT_EQ(pair(), expected + lines("agent Cancel", "phone Paired=true", "agent Release"));
+        expected.push_back(std::string("agent DisplayPasskey o:device u:123456 y:") + typed);
+    EXPECT_EQ(pair(), expected + lines("agent Cancel", paired, "agent Release"));
 }
 
 TEST_F(SimPairingTest, APinIsShownToAnAgentThatCanAndAskedOfOneThatCannot) {
-    add("'Behaviour': <'DisplayPin'>, 'PIN': <'0000'>, 'Passkey': <uint32 42>");
-    client->agentAnswers("DisplayPinCode", "!org.freedesktop.DBus.Error.UnknownMethod");
-    client->agentAnswers("RequestPinCode", "('0000',)");
-    EXPECT_EQ(pair(), lines("agent DisplayPinCode phone '000042'", "agent RequestPinCode phone",
-                            "phone Paired=true", "agent Release"));
+    add({{"Behaviour", "DisplayPin"}, {"PIN", "0000"}, {"Passkey", "42"}});
+    client->peer().replyError("DisplayPinCode", DBUS_ERROR_UNKNOWN_METHOD, "");
+    client->peer().reply("RequestPinCode", with("0000"));
+    EXPECT_EQ(pair(), lines("agent DisplayPinCode o:device s:000042",
+                            "agent RequestPinCode o:device", paired, "agent Release"));
 }
 
 TEST_F(SimPairingTest, FailuresHaveTheErrorOfTheirCauseAndTakeTheDeviceBack) {
-    setTimes("'PairingTimeout': <200>");
-    const std::string confirm = "ConfirmPasskey'>";
-    const std::string pin = "LegacyPin'>, 'PIN': <'1234'>";
-    const char* const failed = "Failed: Authentication Failed";
+    setTime("PairingTimeout", "200");
+    const char* const authentication = "Failed: Authentication Failed";
     const char* const rejected = "Rejected: Authentication Rejected";
-    const char* const refusal = "!org.bluez.Error.Rejected";
+    const auto refuses = [](const char* error) {
+        return [error](DBusMessage* request) {
+            return MessagePtr(dbus_message_new_error(request, error, ""));
+        };
+    };
+    const auto gives = [](const auto& value) {
+        return [value](DBusMessage* request) { return replyTo(request, with(value)); };
+    };
+    const RawPeer::Handler agrees = [](DBusMessage* request) { return replyTo(request); };
+    const auto refusal = refuses("org.bluez.Error.Rejected");
     const struct {
-        std::string settings; ///< from the behaviour on
-        std::string method;   ///< what the agent is asked
-        const char* answer;
+        const char* behaviour;
+        const char* request; ///< what the agent is asked
+        RawPeer::Handler answer;
         std::string error;
     } failures[] = {
-        {confirm, "RequestConfirmation", refusal, failed},
-        {confirm, "RequestConfirmation", "!org.bluez.Error.Canceled", failed},
-        {pin, "RequestPinCode", "('4321',)", failed},
-        {"WrongPin'>", "RequestPinCode", "('0000',)", failed},
-        {pin, "RequestPinCode", refusal, rejected},
-        {pin, "RequestPinCode", "('',)", rejected},
-        {pin, "RequestPinCode", "('12345678901234567',)", rejected},
-        {pin, "RequestPinCode", "(uint32 1234,)", rejected},
-        {"RefusesConfirmation'>", "RequestConfirmation", "", failed},
-        {"CancelsPairing'>", "RequestConfirmation", "", "Canceled: Authentication Canceled"},
-        {"NeverAnswers'>", "RequestConfirmation", "", "Timeout: Authentication Timeout"},
-        {"Rejects'>", "", "", rejected}};
+        {"ConfirmPasskey", "RequestConfirmation", refusal, authentication},
+        {"ConfirmPasskey", "RequestConfirmation", refuses("org.bluez.Error.Canceled"),
+         authentication},
+        {"LegacyPin", "RequestPinCode", gives("4321"), authentication},
+        {"WrongPin", "RequestPinCode", gives("0000"), authentication}, // the device's own
+        {"LegacyPin", "RequestPinCode", refusal, rejected},
+        {"LegacyPin", "RequestPinCode", gives(""), rejected},
+        {"LegacyPin", "RequestPinCode", gives("12345678901234567"), rejected},
+        {"LegacyPin", "RequestPinCode", gives(1234U), rejected},
+        {"RefusesConfirmation", "RequestConfirmation", agrees, authentication},
+        {"CancelsPairing", "RequestConfirmation", agrees, "Canceled: Authentication Canceled"},
+        {"NeverAnswers", "RequestConfirmation", agrees, "Timeout: Authentication Timeout"},
+        {"Rejects", nullptr, agrees, rejected}};
     for (const auto& failure : failures) {
-        add("'Behaviour': <'" + failure.settings);
-        client->agentAnswers(failure.method, failure.answer);
+        add({{"Behaviour", failure.behaviour}});
+        Texts expected = lines(connected);
+        if (failure.request) {
+            client->peer().handle(failure.request, failure.answer);
+            expected.push_back(std::string("agent ") + failure.request + " o:device");
+        }
         startPairing();
         client->until(created[1]);
-        Texts came = client->until("hci0 DeviceRemoved");
-        if (!failure.method.empty()) {
-            ASSERT_GT(came.size(), 1U);
-            EXPECT_EQ(came[1].find("agent " + failure.method), 0U) << came[1];
-            came.erase(came.begin() + 1);
-        }
-        EXPECT_EQ(came, lines("phone Connected=true", "error pair Authentication" + failure.error,
-                              "agent Release") +
+        Texts came = client->until(removed[1]);
+        for (std::string& line : came)
+            line = line.substr(0, line.find(" u:")); // the passkey to confirm
+        EXPECT_EQ(came, expected +
+                            lines(failed + "Authentication" + failure.error, "agent Release") +
                             disconnected)
-            << failure.settings << failure.answer;
-        client->control("RemoveDevice", byAddress);
+            << failure.behaviour << " and " << failure.error;
+        client->control({"RemoveDevice", newDevice});
     }
-    add("'Behaviour': <'RepeatedAttempts'>");
+    add({{"Behaviour", "RepeatedAttempts"}});
     startPairing();
-    EXPECT_EQ(client->until("error pair").back(), "error pair RepeatedAttempts: Repeated Attempts");
-    client->until("hci0 DeviceRemoved");
-    client->control("RemoveDevice", byAddress);
+    EXPECT_EQ(client->until(answer).back(), failed + "RepeatedAttempts: Repeated Attempts");
+    client->until(removed[1]);
+    client->control({"RemoveDevice", newDevice});
     startPairing(); // and nobody there is a page timeout
-    EXPECT_EQ(client->until("hci0 DeviceRemoved"),
-              created + lines("error pair ConnectionAttemptFailed: Page Timeout", "agent Release") +
+    EXPECT_EQ(client->until(removed[1]),
+              created + lines(failed + "ConnectionAttemptFailed: Page Timeout", "agent Release") +
                   removed);
 }
 
 TEST_F(SimPairingTest, SilenceTimesOutWithCancel) {
-    setTimes("'PairingTimeout': <100>");
+    setTime("PairingTimeout", "100");
     startWaiting();
-    EXPECT_EQ(client->until("hci0 DeviceRemoved"),
-              lines("agent Cancel", "error pair AuthenticationTimeout: Authentication Timeout",
+    EXPECT_EQ(client->until(removed[1]),
+              lines("agent Cancel", failed + "AuthenticationTimeout: Authentication Timeout",
                     "agent Release") +
                   disconnected);
 }
 
 TEST_F(SimPairingTest, ALostLinkIsToldToAgentAndCaller) {
-    startWaiting("'Behaviour': <'VanishesWhilePairing'>");
+    startWaiting({{"Behaviour", "VanishesWhilePairing"}});
     EXPECT_EQ(client->until("agent Release"),
-              lines("agent Cancel", "error pair ConnectionAttemptFailed: Connection Timeout",
+              lines("agent Cancel", failed + "ConnectionAttemptFailed: Connection Timeout",
                     "agent Release"));
 }
 
 TEST_F(SimPairingTest, CancellingByItsOwnerKeepsTheDaemonsOrder) {
     startWaiting();
     startPairing();
-    EXPECT_EQ(client->until("error pair"), lines("error pair InProgress: In Progress"));
-    EXPECT_EQ(client->call("Adapter.CreateDevice", byAddress),
+    EXPECT_EQ(client->until(answer), lines(failed + "InProgress: In Progress"));
+    EXPECT_EQ(client->call({"Adapter.CreateDevice", newDevice}),
               "error AlreadyExists: Already Exists");
     SimClient other;
-    other.base();
-    EXPECT_EQ(other.call("Adapter.CancelDeviceCreation", byAddress),
-              "error NotAuthorized: Operation Not Authorized");
-    EXPECT_EQ(
-        client->trace("Adapter.CancelDeviceCreation", byAddress, "error pair"),
-        lines("phone DisconnectRequested", "reply call", "phone Connected=false", "agent Cancel") +
-            removed + lines("agent Release", "error pair ConnectionAttemptFailed: Page Timeout"));
+    const Question cancel("Adapter.CancelDeviceCreation", newDevice);
+    EXPECT_EQ(other.call(cancel), "error NotAuthorized: Operation Not Authorized");
+    EXPECT_EQ(client->trace(cancel, answer),
+              lines("device DisconnectRequested", "answer CancelDeviceCreation",
+                    "device Connected=b:0", "agent Cancel") +
+                  removed +
+                  lines("agent Release", failed + "ConnectionAttemptFailed: Page Timeout"));
 }
 
 TEST_F(SimPairingTest, PowerOffCancels) {
     client->call("Adapter.StartDiscovery"); // suspended; it does not come back either
     startWaiting();
-    EXPECT_EQ(set("Powered", "false"),
-              lines("agent Cancel", "error pair AuthenticationCanceled: Authentication Canceled",
+    EXPECT_EQ(set("Powered", false),
+              lines("agent Cancel", failed + "AuthenticationCanceled: Authentication Canceled",
                     "agent Release") +
-                  disconnected + lines("hci0 Pairable=false", "hci0 Powered=false", "reply set"));
+                  disconnected +
+                  lines("hci0 Pairable=b:0", "hci0 Powered=b:0", "answer SetProperty"));
 }
 
 TEST_F(SimPairingTest, ThePairingEndsWithItsClient) {
     add();
     auto other = std::make_unique<SimClient>();
-    other->base();
-    other->agentAnswers("RequestConfirmation", "-");
-    other->start("pair", "Adapter.CreatePairedDevice",
-                 "('00:11:22:33:44:55', objectpath '/agent', '')");
+    other->peer().neverReply("RequestConfirmation");
+    other->start({"Adapter.CreatePairedDevice", newDevice, agent, ""});
     other->until("agent RequestConfirmation");
-    client->until("phone Connected=true");
+    client->until(connected);
     other.reset();
-    EXPECT_EQ(client->until("hci0 DeviceRemoved"),
-              lines("phone DisconnectRequested") + disconnected);
+    EXPECT_EQ(client->until(removed[1]), lines("device DisconnectRequested") + disconnected);
 }
 
 TEST_F(SimPairingTest, AnUnregisteredAgentNoLongerAnswers) {
     add();
-    client->agentAnswers("RequestConfirmation", "-");
+    client->peer().neverReply("RequestConfirmation");
     registerAgent();
     comeToPair();
     client->until("agent RequestConfirmation");
-    EXPECT_EQ(client->trace("Adapter.UnregisterAgent", "(objectpath '/agent',)"),
-              lines("agent Cancel", "agent Release", "reply call"));
-    EXPECT_EQ(client->until("hci0 DeviceRemoved"), disconnected);
+    EXPECT_EQ(client->trace({"Adapter.UnregisterAgent", agent}),
+              lines("agent Cancel", "agent Release", "answer UnregisterAgent"));
+    EXPECT_EQ(client->until(removed[1]), disconnected);
 }
 
 TEST_F(SimPairingTest, IncomingPairingsAskTheRegisteredAgentAndJustWorkWithoutOne) {
-    add("'Passkey': <uint32 7>, 'UUIDs': <['1101']>");
+    add({{"Passkey", "7"}, {"UUIDs", "1101"}});
     comeToPair();
-    client->until("phone UUIDs");
-    client->control("DropLink", onAdapter);
-    client->call("Adapter.RemoveDevice", byPath);
+    client->until(uuids);
+    forgetDevice();
     registerAgent();
     client->taken();
     comeToPair();
-    EXPECT_EQ(client->until("phone UUIDs"),
-              created + lines("phone Connected=true", "agent RequestConfirmation phone 7",
-                              "phone Paired=true",
-                              "phone UUIDs=['00001101-0000-1000-8000-00805f9b34fb']"));
-    set("Pairable", "false");
-    add("", "00:11:22:33:44:66");
-    client->control("StartIncomingPairing", "('hci0', '00:11:22:33:44:66')");
-    client->until("hci0 DeviceRemoved 'hci0/dev_00_11_22_33_44_66'");
+    EXPECT_EQ(client->until(uuids),
+              created + lines(connected, "agent RequestConfirmation o:device u:7", paired, uuids));
+    set("Pairable", false);
+    add({}, otherDevice);
+    comeToPair(otherDevice);
+    client->until("hci0 DeviceRemoved o:hci0/dev_00_11_22_33_44_66");
 }
 
 } // namespace

@@ -1,255 +1,162 @@
 #include "sim/sim_test.h"
 
 #include <algorithm>
-#include <csignal>
-#include <cstdlib>
 #include <regex>
 
 namespace Bluetooth::Test {
 
 namespace {
 
-bool begins(const std::string& text, const std::string& beginning) {
-    return text.compare(0, beginning.size(), beginning) == 0;
+std::string joined(const std::string& first, const std::string& second) {
+    return second.empty() ? first : first + " " + second;
 }
 
-Serving::Value parse(const std::string& arguments) {
-    GVariant* value = g_variant_parse(nullptr, arguments.c_str(), nullptr, nullptr, nullptr);
-    EXPECT_NE(value, nullptr) << arguments;
-    return value;
+std::string answerOf(DBusMessage* reply) {
+    ScopedError error;
+    if (dbus_set_error_from_message(error, reply))
+        return std::string("error ") + error.get().name + ": " + error.message();
+    return argumentsOf(reply);
+}
+
+std::string shorten(std::string text) {
+    for (const auto& [noise, name] : {std::pair("/org/bluez/[0-9]+/", ""),
+                                      {"(hci0/)?dev_00_11_22_33_44_55", "device"},
+                                      {"org\\.bluez\\.Error\\.", ""},
+                                      {"PropertyChanged s:(\\w+) v\\((.*)\\)$", "$1=$2"}})
+        text = std::regex_replace(text, std::regex(noise), name);
+    return text;
 }
 
 } // namespace
 
-SimClient::SimClient() {
-    Serving::ErrorOut error;
-    constexpr auto flags =
-        static_cast<GDBusConnectionFlags>(G_DBUS_CONNECTION_FLAGS_AUTHENTICATION_CLIENT |
-                                          G_DBUS_CONNECTION_FLAGS_MESSAGE_BUS_CONNECTION);
-    m_connection = g_dbus_connection_new_for_address_sync(std::getenv("DBUS_SYSTEM_BUS_ADDRESS"),
-                                                          flags, nullptr, nullptr, error.out());
-    if (!m_connection)
-        throw std::runtime_error(error->message);
-    m_filter = g_dbus_connection_add_filter(m_connection, onMessage, this, nullptr);
-    call("org.freedesktop.DBus.AddMatch", "(\"type='signal',sender='org.bluez'\",)");
+SimClient::SimClient()
+    : m_peer(PrivateBus::address(PrivateBus::Kind::System), "",
+             [this](DBusMessage* message) { write(message); }) {
+    for (const char* request :
+         {"RequestPinCode", "RequestPasskey", "RequestConfirmation", "DisplayPasskey",
+          "DisplayPinCode", "Authorize", "ConfirmModeChange", "Cancel", "Release"})
+        m_peer.reply(request);
+    m_peer.addMatch("type='signal',sender='org.bluez'");
+    base();
 }
 
-SimClient::~SimClient() {
-    g_dbus_connection_close_sync(m_connection, nullptr, nullptr);
-    g_dbus_connection_remove_filter(m_connection, m_filter);
-    g_object_unref(m_connection);
+SimClient::Target SimClient::targetOf(const Question& question) const {
+    const std::size_t dot = question.method.rfind('.');
+    const std::string interface = question.method.substr(0, dot);
+    const std::string member = question.method.substr(dot + 1);
+    if (interface.find('.') != std::string::npos)
+        return {interface, "/" + std::regex_replace(interface, std::regex("\\."), "/"), interface,
+                member};
+    const std::string adapter = m_base + "hci0";
+    return {"org.bluez",
+            interface == "Manager"   ? "/"
+            : interface == "Adapter" ? adapter
+                                     : adapter + "/dev_00_11_22_33_44_55",
+            "org.bluez." + interface, member};
 }
 
-SimClient::Message SimClient::makeCall(const std::string& method, const std::string& arguments,
-                                       const std::string& path) {
-    const std::lock_guard<std::mutex> lock(m_mutex);
-    const std::size_t dot = method.rfind('.');
-    std::string interface = method.substr(0, dot);
-    std::string destination = interface;
-    std::string usual = "/" + std::regex_replace(interface, std::regex("\\."), "/");
-    if (!begins(interface, "com.") && !begins(interface, "org.")) {
-        const std::string adapter = m_base + "hci0";
-        usual = interface == "Adapter" ? adapter : adapter + "/dev_00_11_22_33_44_55";
-        if (interface == "Manager")
-            usual = "/";
-        destination = "org.bluez";
-        interface = "org.bluez." + interface;
-    }
-    Message message(g_dbus_message_new_method_call(destination.c_str(),
-                                                   (path.empty() ? usual : path).c_str(),
-                                                   interface.c_str(), method.c_str() + dot + 1));
-    g_dbus_message_set_body(message.get(), parse(arguments).get());
-    return message;
+void SimClient::start(const Question& question) {
+    const auto [destination, path, interface, member] = targetOf(question);
+    const MessagePtr message(dbus_message_new_method_call(destination.c_str(), path.c_str(),
+                                                          interface.c_str(), member.c_str()));
+    Writer(message.get(), question.arguments);
+    m_peer.run([&, &asked = member](DBusConnection* connection) {
+        dbus_uint32_t serial = 0;
+        dbus_connection_send(connection, message.get(), &serial);
+        m_asked[serial] = asked;
+    });
 }
 
-void SimClient::start(const std::string& label, const std::string& method,
-                      const std::string& arguments) {
-    const Message message = makeCall(method, arguments, "");
-    const std::lock_guard<std::mutex> lock(m_mutex);
-    guint32 serial = 0;
-    g_dbus_connection_send_message(m_connection, message.get(), G_DBUS_SEND_MESSAGE_FLAGS_NONE,
-                                   &serial, nullptr);
-    m_labels[serial] = label;
+std::string SimClient::call(const Question& question, const std::string& path) {
+    const Target target = targetOf(question);
+    const MessagePtr reply = m_peer
+                                 .call(target.destination, path.empty() ? target.path : path,
+                                       target.interface, target.member, question.arguments)
+                                 .get();
+    return reply ? shorten(answerOf(reply.get())) : "no answer to " + question.method;
 }
 
-std::string SimClient::call(const std::string& method, const std::string& arguments,
-                            const std::string& path) {
-    const Message reply(g_dbus_connection_send_message_with_reply_sync(
-        m_connection, makeCall(method, arguments, path).get(), G_DBUS_SEND_MESSAGE_FLAGS_NONE,
-        static_cast<gint>(patience.count()), nullptr, nullptr, nullptr));
-    const std::lock_guard<std::mutex> lock(m_mutex);
-    return reply ? answer(reply.get(), "") : "no answer to " + method;
+std::string SimClient::control(Question question) {
+    question.method.insert(0, "com.kestrine.bluetooth.Sim.");
+    std::string answer = call(question);
+    EXPECT_NE(answer.substr(0, 5), "error") << question.method << ": " << answer;
+    return answer;
 }
 
-std::string SimClient::control(const std::string& method, const std::string& arguments) {
-    std::string reply = call("com.kestrine.bluetooth.Sim." + method, arguments);
-    EXPECT_TRUE(begins(reply, "reply")) << method << arguments << ": " << reply;
-    return reply;
-}
-
-Texts SimClient::trace(const std::string& method, const std::string& arguments,
-                       const std::string& last) {
+Texts SimClient::trace(const Question& question, std::string last) {
+    if (last.empty())
+        last = "answer " + targetOf(question).member;
     taken();
-    start("call", method, arguments);
+    start(question);
     return until(last);
 }
 
-void SimClient::agentAnswers(const std::string& method, const std::string& answer) {
-    const std::lock_guard<std::mutex> lock(m_mutex);
-    m_agent[method] = answer;
-}
-
 Texts SimClient::until(const std::string& beginning) {
-    std::unique_lock<std::mutex> lock(m_mutex);
-    const auto isLast = [&](const std::string& line) {
-        return beginning.empty() ? begins(line, "reply call") || begins(line, "error call")
-                                 : begins(line, beginning);
-    };
-    auto last = m_lines.end();
-    m_changed.wait_for(lock, patience, [&] {
-        last = std::find_if(m_lines.begin(), m_lines.end(), isLast);
-        return last != m_lines.end();
-    });
-    EXPECT_NE(last, m_lines.end()) << "never came: " << beginning;
-    const auto end = last == m_lines.end() ? last : std::next(last);
-    Texts lines(m_lines.begin(), end);
-    m_lines.erase(m_lines.begin(), end);
-    return lines;
+    std::size_t end = 0;
+    EXPECT_TRUE(m_lines.waitUntil([&](const Texts& all) {
+        for (end = m_taken; end < all.size(); ++end) {
+            if (all[end].rfind(beginning, 0) == 0)
+                return true;
+        }
+        return false;
+    })) << "never came: "
+        << beginning;
+    return take(std::min(end + 1, m_lines.count()));
 }
 
-Texts SimClient::taken() {
-    const std::lock_guard<std::mutex> lock(m_mutex);
-    return std::exchange(m_lines, {});
+Texts SimClient::take(std::size_t end) {
+    const Texts all = m_lines.events();
+    const auto place = [&](std::size_t index) {
+        return all.begin() + static_cast<std::ptrdiff_t>(index);
+    };
+    return {place(std::exchange(m_taken, end)), place(end)};
 }
 
 std::string SimClient::base() {
-    call("Manager.FindAdapter", "('any',)");
-    return m_base;
+    const MessagePtr reply =
+        m_peer.call("org.bluez", "/", "org.bluez.Manager", "FindAdapter", with("any")).get();
+    const std::string path = reply ? argumentsOf(reply.get()) : "";
+    return m_base = path.substr(2, path.rfind('/') - 1);
 }
 
-std::string SimClient::shorten(std::string text) {
-    static const std::regex base("/org/bluez/[0-9]+/");
-    static const std::regex types("objectpath |@a[osv] |u?int(16|32) |byte ");
-    static const std::regex path("'?(hci0/)?dev_00_11_22_33_44_55'?");
-    static const std::regex errors("org\\.bluez\\.Error\\.");
-    std::smatch found;
-    if (std::regex_search(text, found, base))
-        m_base = found[0];
-    for (const std::regex& noise : {base, types, errors})
-        text = std::regex_replace(text, noise, "");
-    return std::regex_replace(text, path, "phone");
-}
-
-/// The arguments, each after a space.
-std::string SimClient::bodyOf(GDBusMessage* message) {
-    GVariant* body = g_dbus_message_get_body(message);
-    std::string text;
-    for (gsize i = 0; body && i < g_variant_n_children(body); ++i)
-        text += " " + print(Serving::GlibPtr<GVariant>(g_variant_get_child_value(body, i)).get());
-    return text;
-}
-
-std::string SimClient::print(GVariant* value) {
-    return shorten(Serving::GlibPtr<char>(g_variant_print(value, FALSE)).get());
-}
-
-std::string SimClient::answer(GDBusMessage* message, const std::string& label) {
-    if (g_dbus_message_get_message_type(message) != G_DBUS_MESSAGE_TYPE_ERROR)
-        return "reply" + label + bodyOf(message);
-    const char* text = nullptr;
-    g_variant_get(g_dbus_message_get_body(message), "(&s)", &text);
-    return "error" + label + " " + shorten(g_dbus_message_get_error_name(message)) + ": " + text;
-}
-
-std::string SimClient::signalLine(GDBusMessage* message) {
-    const std::string path = g_dbus_message_get_path(message);
-    if (begins(path, DBUS_PATH_DBUS)) // the bus's own
-        return "";
-    const std::string sender = path == "/" ? path : shorten(path.substr(path.rfind('/') + 1));
-    const std::string member = g_dbus_message_get_member(message);
-    GVariant* body = g_dbus_message_get_body(message);
-    if (member != "PropertyChanged" || !g_variant_is_of_type(body, G_VARIANT_TYPE("(sv)")))
-        return sender + " " + member + bodyOf(message);
-    const char* name = nullptr;
-    GVariant* value = nullptr;
-    g_variant_get(body, "(&sv)", &name, &value);
-    return sender + " " + name + "=" + print(Serving::GlibPtr<GVariant>(value).get());
-}
-
-GDBusMessage* SimClient::onMessage(GDBusConnection*, GDBusMessage* message, gboolean incoming,
-                                   gpointer data) {
-    if (!incoming)
-        return message;
-    auto* client = static_cast<SimClient*>(data);
-    const auto type = g_dbus_message_get_message_type(message);
-    const std::lock_guard<std::mutex> lock(client->m_mutex);
+void SimClient::write(DBusMessage* message) {
+    const int type = dbus_message_get_type(message);
     std::string line;
-    if (type == G_DBUS_MESSAGE_TYPE_METHOD_CALL) {
-        line = "agent " + std::string(g_dbus_message_get_member(message)) + client->bodyOf(message);
-    } else if (type == G_DBUS_MESSAGE_TYPE_SIGNAL) {
-        line = client->signalLine(message);
+    if (type == DBUS_MESSAGE_TYPE_METHOD_CALL) {
+        line =
+            joined(std::string("agent ") + dbus_message_get_member(message), argumentsOf(message));
+    } else if (type == DBUS_MESSAGE_TYPE_SIGNAL) {
+        const std::string path = dbus_message_get_path(message);
+        if (path.rfind(DBUS_PATH_DBUS, 0) == 0)
+            return; // the bus's own
+        line = joined(path + " " + dbus_message_get_member(message), argumentsOf(message));
     } else {
-        const auto label = client->m_labels.find(g_dbus_message_get_reply_serial(message));
-        if (label != client->m_labels.end())
-            line = client->answer(message, " " + label->second);
+        const auto asked = m_asked.find(dbus_message_get_reply_serial(message));
+        if (asked == m_asked.end())
+            return;
+        line = joined("answer " + asked->second, answerOf(message));
     }
-    if (!line.empty()) {
-        client->m_lines.push_back(line);
-        client->m_changed.notify_all();
-    }
-    if (type != G_DBUS_MESSAGE_TYPE_METHOD_CALL)
-        return message;
-    client->answerAgentCall(message);
-    g_object_unref(message);
-    return nullptr;
+    m_lines.add(shorten(line));
 }
 
-void SimClient::answerAgentCall(GDBusMessage* call) {
-    const std::string answer = m_agent[g_dbus_message_get_member(call)];
-    if (answer == "-")
-        return;
-    const Message reply(begins(answer, "!") ? g_dbus_message_new_method_error_literal(
-                                                  call, answer.c_str() + 1, "said no")
-                                            : g_dbus_message_new_method_reply(call));
-    if (!answer.empty() && answer[0] != '!')
-        g_dbus_message_set_body(reply.get(), parse(answer).get());
-    g_dbus_connection_send_message(m_connection, reply.get(), G_DBUS_SEND_MESSAGE_FLAGS_NONE,
-                                   nullptr, nullptr);
-}
-
-void SimTest::TearDown() {
-    client.reset();
-    if (daemon.hasEnded())
-        return;
-    daemon.signal(SIGTERM);
-    EXPECT_EQ(daemon.wait(), 0);
-    daemon.readAll();
-    EXPECT_EQ(daemon.readErrors(), "");
-}
-
-void SimTest::add(const std::string& settings, const std::string& address) {
-    client->control("AddDevice", "('" + address + "', @a{sv} {" + settings + "})");
-}
-
-void SimTest::create(const std::string& settings) {
+void SimTest::create(const Settings& settings) {
     add(settings);
-    EXPECT_EQ(client->call("Adapter.CreateDevice", byAddress), "reply phone");
+    EXPECT_EQ(client->call({"Adapter.CreateDevice", newDevice}), "o:device");
     client->taken();
 }
 
-Texts SimTest::set(const std::string& name, const std::string& value,
-                   const std::string& interface) {
+Texts SimTest::effectOf(const Question& question) {
     client->taken();
-    client->start("set", interface + ".SetProperty", "('" + name + "', <" + value + ">)");
+    client->start(question);
     client->control("ClearFaults"); // answered after all that the call brought about
     return client->taken();
 }
 
 void SimTest::leave(std::unique_ptr<SimClient>& other) {
-    const std::string name = other->uniqueName();
+    std::string name;
+    other->peer().run([&](DBusConnection* bus) { name = dbus_bus_get_unique_name(bus); });
     other.reset();
-    while (client->call("org.freedesktop.DBus.NameHasOwner", "('" + name + "',)") == "reply true") {
-    }
+    EXPECT_TRUE(client->peer().waitForOwner(name, false));
     client->control("ClearFaults");
 }
 

@@ -1,131 +1,123 @@
 #ifndef KESBLUETOOTH_TESTS_SIM_SIM_TEST_H
 #define KESBLUETOOTH_TESTS_SIM_SIM_TEST_H
 
-#include "serving/bus/value.h"
+#include "support/devices.h"
 #include "support/simulation.h"
 
 #include <gtest/gtest.h>
 
-#include <condition_variable>
 #include <map>
 #include <memory>
-#include <mutex>
 #include <string>
 
 namespace Bluetooth::Test {
 
-inline constexpr const char* phone = "00:11:22:33:44:55";
+/// What is asked of the daemon: "Interface.Method" and the arguments.
+struct Question {
+    template <class... Arguments>
+    Question(const char* asked, const Arguments&... given)
+        : method(asked), arguments(with(given...)) {}
+
+    std::string method;
+    Writer::Build arguments;
+};
 
 /// A client of the simulated daemon that writes down everything that reaches it, in the order of
-/// the wire: signals, replies, and the requests to its agent. In what it writes down and returns
-/// paths are without the daemon's prefix, the phone's path on hci0 is `phone`, and error names are
-/// without "org.bluez.Error.".
+/// the wire: signals, answers, and the requests to its agent. In what it writes down and returns
+/// paths are without the daemon's prefix, the path of `newDevice` on hci0 is `device`, and error
+/// names are without "org.bluez.Error.".
 ///
-/// Lines look like "hci0 DeviceCreated phone", "phone Connected=true", "reply create phone",
-/// "error create Failed: Host is down" and "agent RequestPinCode phone".
+/// Lines look like "hci0 DeviceCreated o:device", "device Connected=b:1",
+/// "answer CreateDevice o:device", "answer CreateDevice error Failed: Host is down" and
+/// "agent RequestPinCode o:device".
 class SimClient {
 public:
     SimClient();
-    SimClient(const SimClient&) = delete;
-    SimClient& operator=(const SimClient&) = delete;
-    /// Leaves the bus.
-    ~SimClient();
 
-    /// Makes a call of "Interface.Method"; its answer becomes a line with that label.
-    /// @param arguments  in GVariant's text form, e.g. "('00:11:22:33:44:55',)"
-    void start(const std::string& label, const std::string& method,
-               const std::string& arguments = "()");
-    /// Makes a call, of the bus's or the control interface as well, and waits for its answer, which
-    /// is not written down.
-    /// @param path  another than that of the manager, of hci0 or of the phone
-    /// @return "reply …" or "error …"
-    std::string call(const std::string& method, const std::string& arguments = "()",
-                     const std::string& path = "");
+    /// Asks; the answer becomes a line.
+    void start(const Question& question);
+    /// Asks, the bus or the control interface as well, and waits for the answer, which is not
+    /// written down.
+    /// @param path  another than that of the manager, of hci0 or of the device
+    /// @return its arguments, or "error …"
+    std::string call(const Question& question, const std::string& path = "");
     /// The same for the control interface; an error fails the test.
-    std::string control(const std::string& method, const std::string& arguments = "()");
-    /// Makes a call. @return all lines up to its answer, or to one that begins so; of those before
-    /// the call none. The answer's label is "call".
-    Texts trace(const std::string& method, const std::string& arguments = "()",
-                const std::string& last = "");
-
-    /// What the agent answers to a method: "" for an empty reply, "-" to stay silent,
-    /// "!name" for that error, anything else as the arguments of the reply.
-    void agentAnswers(const std::string& method, const std::string& answer);
+    std::string control(Question question);
+    /// Asks. @return all lines up to the answer, or to one that begins so; of those before none
+    Texts trace(const Question& question, std::string last = "");
 
     /// Waits for a line that begins so, after what was taken before, and takes all up to it.
     Texts until(const std::string& beginning);
     /// Takes what came up to now: all that was sent to us before the last call's answer.
-    Texts taken();
+    Texts taken() { return take(m_lines.count()); }
 
     /// Where the daemon's paths begin at present, with a slash at the end.
     std::string base();
-    std::string uniqueName() const { return g_dbus_connection_get_unique_name(m_connection); }
+    /// The participant itself. As the agent it says yes to everything until it is told otherwise.
+    RawPeer& peer() { return m_peer; }
 
 private:
-    using Message = Serving::ObjectPtr<GDBusMessage>;
+    struct Target {
+        std::string destination, path, interface, member;
+    };
 
-    static GDBusMessage* onMessage(GDBusConnection* connection, GDBusMessage* message,
-                                   gboolean incoming, gpointer data);
-    void answerAgentCall(GDBusMessage* call);
-    std::string shorten(std::string text);
-    std::string print(GVariant* value);
-    std::string bodyOf(GDBusMessage* message);
-    std::string answer(GDBusMessage* message, const std::string& label);
-    std::string signalLine(GDBusMessage* message);
-    Message makeCall(const std::string& method, const std::string& arguments,
-                     const std::string& path);
+    Target targetOf(const Question& question) const;
+    void write(DBusMessage* message);
+    Texts take(std::size_t end);
 
-    GDBusConnection* m_connection;
-    guint m_filter;
-    std::mutex m_mutex;
-    std::condition_variable m_changed;
-    std::map<guint32, std::string> m_labels;
-    std::map<std::string, std::string> m_agent;
-    Texts m_lines;
+    Recorder<std::string> m_lines;
+    std::size_t m_taken = 0;
+    std::map<dbus_uint32_t, std::string> m_asked; // methods by serial; of the peer's thread
     std::string m_base;
+    RawPeer m_peer; // last, since it uses the others to its end
 };
 
 /// The daemon with two adapters and no devices.
 class SimTest : public testing::Test {
 protected:
-    /// Whatever happened, the daemon ends when asked, quietly: a sanitizer's findings show here.
-    void TearDown() override;
-
     /// A device in range.
-    /// @param settings  as GVariant text, e.g. "'Behaviour': <'LegacyPin'>"
-    void add(const std::string& settings = "", const std::string& address = phone);
+    void add(const Settings& settings = {}, const char* address = newDevice) {
+        client->control({"AddDevice", address, settings});
+    }
     /// The same, known to hci0 and connected; what was written down of it is forgotten.
-    void create(const std::string& settings = "");
-    void setTimes(const std::string& times) { client->control("SetTimes", "({" + times + "},)"); }
-    /// Sets a property of hci0, or with "Device" of the phone. @return what that brought about
-    Texts set(const std::string& name, const std::string& value,
-              const std::string& interface = "Adapter");
-    void registerAgent() { client->call("Adapter.RegisterAgent", agent); }
+    void create(const Settings& settings = {});
+    void setTime(const char* name, const char* milliseconds) {
+        client->control({"SetTimes", Settings{{name, milliseconds}}});
+    }
+    /// Sets a property of hci0. @return all that this brought about, after its answer too
+    template <class Value>
+    Texts set(const char* name, const Value& value) {
+        return effectOf({"Adapter.SetProperty", name, Var{value}});
+    }
+    /// The same for a property of the device.
+    template <class Value>
+    Texts setOfDevice(const char* name, const Value& value) {
+        return effectOf({"Device.SetProperty", name, Var{value}});
+    }
+    Texts effectOf(const Question& question);
+    void registerAgent() { client->call({"Adapter.RegisterAgent", agent, ""}); }
     /// Another client leaves the bus, and the daemon has been told so.
     void leave(std::unique_ptr<SimClient>& other);
-
-    const std::string byAddress = "('00:11:22:33:44:55',)";
-    const std::string onAdapter = "('hci0', '00:11:22:33:44:55')";
-    const std::string agent = "(objectpath '/agent', '')";
-    const std::string badArguments = "InvalidArguments: Invalid arguments in method call";
 
     Simulation simulation{"[Times]\nIdleDisconnect=4000000\n"
                           "[Adapter hci0]\nAddress=00:1A:7D:DA:71:10\nName=first\n"
                           "[Adapter hci1]\nAddress=00:1A:7D:DA:71:11\nName=second\n"};
-    ChildProcess& daemon = simulation.process();
     std::unique_ptr<SimClient> client = std::make_unique<SimClient>();
     const std::string base = client->base();
-    const std::string byPath = "(objectpath '" + base + "hci0/dev_00_11_22_33_44_55',)";
+    const Path device{base + "hci0/dev_00_11_22_33_44_55"};
+    const Path agent{"/agent"};
 };
+
+inline const std::string badArguments = "error InvalidArguments: Invalid arguments in method call";
 
 template <class... Line>
 Texts lines(Line... line) {
     return {line...};
 }
 
-/// What comes before and after the life of the phone's object.
-inline const Texts created{"hci0 DeviceCreated phone", "hci0 Devices=[phone]"};
-inline const Texts removed{"hci0 Devices=[]", "hci0 DeviceRemoved phone"};
+/// What comes before and after the life of the device's object.
+inline const Texts created{"hci0 DeviceCreated o:device", "hci0 Devices=a(o:device)"};
+inline const Texts removed{"hci0 Devices=a()", "hci0 DeviceRemoved o:device"};
 
 inline Texts operator+(Texts first, const Texts& second) {
     first.insert(first.end(), second.begin(), second.end());

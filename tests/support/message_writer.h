@@ -7,6 +7,8 @@
 #include <functional>
 #include <string>
 #include <type_traits>
+#include <utility>
+#include <vector>
 
 namespace Bluetooth::Test {
 
@@ -23,34 +25,28 @@ struct Var {
 template <class Value>
 Var(Value) -> Var<Value>;
 
-/// The D-Bus type of a number.
-template <class Number>
-constexpr const char* numberType() {
-    if (std::is_floating_point_v<Number>)
+/// The keys and values of a scenario's device or adapter, as the scenario file writes them.
+using Settings = std::vector<std::pair<std::string, std::string>>;
+
+template <class Value>
+inline constexpr bool isVariant = false;
+template <class Value>
+inline constexpr bool isVariant<Var<Value>> = true;
+
+/// The D-Bus type of a value; that of a string of any kind is "s".
+template <class Value>
+constexpr const char* signatureOf() {
+    if (std::is_same_v<Value, bool>)
+        return "b";
+    if (std::is_floating_point_v<Value>)
         return "d";
+    if (!std::is_integral_v<Value>)
+        return std::is_same_v<Value, Path> ? "o" : isVariant<Value> ? "v" : "s";
     constexpr const char* types[] = {"y", "q", "u", "t", "", "n", "i", "x"};
-    int place = std::is_signed_v<Number> ? 4 : 0;
-    for (std::size_t size = sizeof(Number); size > 1; size /= 2)
+    int place = std::is_signed_v<Value> ? 4 : 0;
+    for (std::size_t size = sizeof(Value); size > 1; size /= 2)
         ++place;
     return types[place];
-}
-
-inline const char* signatureOf(const char*) {
-    return "s";
-}
-inline const char* signatureOf(const std::string&) {
-    return "s";
-}
-inline const char* signatureOf(const Path&) {
-    return "o";
-}
-template <class Value>
-const char* signatureOf(const Var<Value>&) {
-    return "v";
-}
-template <class Number>
-std::enable_if_t<std::is_arithmetic_v<Number>, const char*> signatureOf(Number) {
-    return std::is_same_v<Number, bool> ? "b" : numberType<Number>();
 }
 
 /// Appends arguments of any type, good or bad: w("hci0")(Path{"/"})(Var{std::int16_t{-60}}).
@@ -70,23 +66,36 @@ public:
         const char* text = value.text.c_str();
         return basic(DBUS_TYPE_OBJECT_PATH, &text);
     }
-    Writer& operator()(bool value) {
-        const dbus_bool_t boolean = value;
-        return basic(DBUS_TYPE_BOOLEAN, &boolean);
-    }
     template <class Number>
     std::enable_if_t<std::is_arithmetic_v<Number>, Writer&> operator()(Number value) {
-        return basic(*signatureOf(value), &value);
+        const std::conditional_t<std::is_same_v<Number, bool>, dbus_bool_t, Number> sent = value;
+        return basic(*signatureOf<Number>(), &sent);
     }
     template <class Value>
     Writer& operator()(const Var<Value>& variant) {
-        return container(DBUS_TYPE_VARIANT, signatureOf(variant.value),
+        return container(DBUS_TYPE_VARIANT, signatureOf<Value>(),
                          [&](Writer& inner) { inner(variant.value); });
+    }
+
+    /// What another function appends.
+    Writer& operator()(const Build& arguments) {
+        arguments(*this);
+        return *this;
+    }
+    /// A dictionary of type a{sv} whose values are strings.
+    Writer& operator()(const Settings& settings) {
+        return dict("sv", [&](Writer& entries) {
+            for (const auto& [key, value] : settings)
+                entries.entry(key, Var{value});
+        });
     }
 
     /// An array: array("s", [](Writer& w) { w("a")("b"); }).
     Writer& array(const char* elementSignature, const Build& elements = {}) {
         return container(DBUS_TYPE_ARRAY, elementSignature, elements);
+    }
+    Writer& structure(const Build& members) {
+        return container(DBUS_TYPE_STRUCT, nullptr, members);
     }
     /// A variant of any content.
     Writer& variant(const char* signature, const Build& content) {
@@ -123,6 +132,12 @@ private:
 
     DBusMessageIter m_iter{};
 };
+
+/// Appends these: with("hci0", Path{"/"}, true).
+template <class... Values>
+Writer::Build with(Values... values) {
+    return [=]([[maybe_unused]] Writer& writer) { (writer(values), ...); };
+}
 
 /// The arguments of a message as text: s:hci0 o:/org/bluez u:5 v(s:x) a(s:a s:b) e(s:key v(u:1)).
 std::string argumentsOf(DBusMessage* message);

@@ -27,7 +27,8 @@ std::string SeenCall::text() const {
     return member + (wantsReply ? "" : "!") + (arguments.empty() ? "" : " ") + arguments;
 }
 
-RawPeer::RawPeer(const std::string& address, const std::string& name) {
+RawPeer::RawPeer(const std::string& address, const std::string& name, Observer observer)
+    : m_observer(std::move(observer)) {
     ScopedError error;
     m_wakeFd = eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK);
     m_connection = dbus_connection_open_private(address.c_str(), error);
@@ -111,27 +112,31 @@ std::future<MessagePtr> RawPeer::call(const std::string& destination, const std:
     own->deadline = Clock::now() + timeout;
     std::future<MessagePtr> result = own->reply.get_future();
     post([this, message, own](DBusConnection* connection) {
-        DBusPendingCall* pending = nullptr;
-        dbus_connection_send_with_reply(connection, message->get(), &pending,
-                                        DBUS_TIMEOUT_INFINITE);
-        own->pending.reset(pending);
-        m_ownCalls.push_back(std::move(*own));
+        dbus_uint32_t serial = 0;
+        dbus_connection_send(connection, message->get(), &serial);
+        m_ownCalls[serial] = own;
     });
     return result;
 }
 
-/// libdbus looks after time-outs only inside its own waits and main loops.
-void RawPeer::finishOwnCalls() {
-    m_ownCalls.remove_if([](OwnCall& call) {
-        const bool answered = call.pending && dbus_pending_call_get_completed(call.pending.get());
-        if (!answered && call.pending && Clock::now() < call.deadline)
-            return false;
-        if (!answered && call.pending)
-            dbus_pending_call_cancel(call.pending.get());
-        call.reply.set_value(
-            MessagePtr(answered ? dbus_pending_call_steal_reply(call.pending.get()) : nullptr));
-        return true;
-    });
+void RawPeer::takeReply(DBusMessage* message) {
+    const auto call = m_ownCalls.find(dbus_message_get_reply_serial(message));
+    if (call == m_ownCalls.end())
+        return;
+    call->second->reply.set_value(MessagePtr(dbus_message_ref(message)));
+    m_ownCalls.erase(call);
+}
+
+void RawPeer::giveUpOwnCalls() {
+    const bool isConnected = dbus_connection_get_is_connected(m_connection);
+    for (auto call = m_ownCalls.begin(); call != m_ownCalls.end();) {
+        if (isConnected && Clock::now() < call->second->deadline) {
+            ++call;
+            continue;
+        }
+        call->second->reply.set_value(nullptr);
+        call = m_ownCalls.erase(call);
+    }
 }
 
 bool RawPeer::own(const std::string& name) {
@@ -222,7 +227,7 @@ void RawPeer::loop() {
         for (const Task& task : tasks)
             task(m_connection);
         sendDueReplies();
-        finishOwnCalls();
+        giveUpOwnCalls();
         wait();
         dbus_connection_read_write(m_connection, 0);
         while (dbus_connection_dispatch(m_connection) == DBUS_DISPATCH_DATA_REMAINS) {
@@ -261,6 +266,8 @@ DBusHandlerResult RawPeer::filter(DBusConnection*, DBusMessage* message, void* p
 }
 
 DBusHandlerResult RawPeer::take(DBusMessage* message) {
+    if (m_observer)
+        m_observer(message);
     switch (dbus_message_get_type(message)) {
     case DBUS_MESSAGE_TYPE_METHOD_CALL:
         if (!m_isMonitor)
@@ -276,6 +283,7 @@ DBusHandlerResult RawPeer::take(DBusMessage* message) {
         m_signals.add(textOf(dbus_message_get_member(message)) + " " + argumentsOf(message));
         return DBUS_HANDLER_RESULT_NOT_YET_HANDLED;
     default:
+        takeReply(message);
         return DBUS_HANDLER_RESULT_NOT_YET_HANDLED;
     }
 }

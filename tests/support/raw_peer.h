@@ -9,8 +9,8 @@
 #include <deque>
 #include <functional>
 #include <future>
-#include <list>
 #include <map>
+#include <memory>
 #include <mutex>
 #include <string>
 #include <thread>
@@ -46,9 +46,12 @@ public:
     using Build = Writer::Build;
     /// Runs on the peer's thread. @return the reply, or null for none
     using Handler = std::function<MessagePtr(DBusMessage* call)>;
+    using Observer = std::function<void(DBusMessage* message)>;
 
     /// Connects, and owns `name` unless it is empty. Throws std::runtime_error when that fails.
-    explicit RawPeer(const std::string& address, const std::string& name = "");
+    /// @param observer sees each message that comes, on the peer's thread, before anything else
+    explicit RawPeer(const std::string& address, const std::string& name = "",
+                     Observer observer = {});
     ~RawPeer();
     RawPeer(const RawPeer&) = delete;
     RawPeer& operator=(const RawPeer&) = delete;
@@ -101,7 +104,6 @@ private:
         Milliseconds delay{0};
     };
     struct OwnCall {
-        PendingPtr pending;
         std::promise<MessagePtr> reply;
         Clock::time_point deadline;
     };
@@ -110,7 +112,8 @@ private:
     void loop();
     void wait();
     void sendDueReplies();
-    void finishOwnCalls();
+    void giveUpOwnCalls();
+    void takeReply(DBusMessage* message);
     DBusHandlerResult take(DBusMessage* message);
     void answerCall(DBusMessage* message);
     static DBusHandlerResult filter(DBusConnection*, DBusMessage* message, void* peer);
@@ -122,9 +125,10 @@ private:
     std::mutex m_mutex; // guards m_tasks and m_answers
     std::deque<Task> m_tasks;
     std::map<std::string, Answer> m_answers;
-    std::multimap<Clock::time_point, MessagePtr> m_dueReplies; // of the peer's thread
-    std::list<OwnCall> m_ownCalls;                             // of the peer's thread
-    bool m_isMonitor = false;                                  // of the peer's thread
+    std::multimap<Clock::time_point, MessagePtr> m_dueReplies;    // of the peer's thread
+    std::map<dbus_uint32_t, std::shared_ptr<OwnCall>> m_ownCalls; // by serial; of the peer's thread
+    bool m_isMonitor = false;                                     // of the peer's thread
+    Observer m_observer;
     Recorder<SeenCall> m_calls;
     Recorder<std::string> m_signals;
     std::thread m_thread;
