@@ -2,14 +2,10 @@
 
 namespace Bluetooth::Test {
 
-namespace {
-
 using ControlTest = SimTest;
 
 /// No arguments: an empty tuple cannot be sent.
-void nothing(Writer& w) {
-    w.variant("av", [](Writer& v) { v.array("v"); });
-}
+const Writer::Build nothing = [](Writer& w) { w.variant("av", [](Writer& v) { v.array("v"); }); };
 
 TEST_F(ControlTest, TheNextCallFailsOnceOrWaits) {
     simulation.failNext("org.bluez.Adapter", "ListDevices", "org.example.Error.Made", "up");
@@ -94,7 +90,5 @@ TEST_F(ControlTest, AgentsCanBeCalledWithAnything) {
     EXPECT_EQ(client->control({"CallAgent", "hci0", "org.bluez.Other", "Nonsense", nothing}),
               "s:org.freedesktop.DBus.Error.UnknownMethod s:said no a()");
 }
-
-} // namespace
 
 } // namespace Bluetooth::Test

@@ -4,8 +4,6 @@
 
 namespace Bluetooth::Test {
 
-namespace {
-
 using SimDaemonTest = SimTest;
 
 const std::string noMethod = "error org.freedesktop.DBus.Error.UnknownMethod: Method ";
@@ -182,7 +180,5 @@ TEST_F(SimDaemonTest, OneAgentForEachAdapterUntilItsOwnerUnregistersItOrLeaves) 
     EXPECT_EQ(client->trace({"Adapter.UnregisterAgent", agent}),
               lines("agent Release", "answer UnregisterAgent"));
 }
-
-} // namespace
 
 } // namespace Bluetooth::Test

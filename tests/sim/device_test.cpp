@@ -2,8 +2,6 @@
 
 namespace Bluetooth::Test {
 
-namespace {
-
 using DeviceTest = SimTest;
 
 const std::string serialPort = "a(s:00001101-0000-1000-8000-00805f9b34fb)";
@@ -192,7 +190,5 @@ TEST_F(DeviceTest, ADeviceThatConnectsByItselfStaysOnlyAsLongAsItsLink) {
     client->control({"DropLink", "hci0", newDevice});
     EXPECT_EQ(client->taken(), lines("device Connected=b:0") + removed);
 }
-
-} // namespace
 
 } // namespace Bluetooth::Test

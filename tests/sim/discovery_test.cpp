@@ -2,8 +2,6 @@
 
 namespace Bluetooth::Test {
 
-namespace {
-
 class DiscoveryTest : public SimTest {
 protected:
     void makeInquiryEndless() { setTime("Inquiry", "60000000"); }
@@ -109,7 +107,5 @@ TEST_F(DiscoveryTest, CreatingADeviceSuspendsItAndPowerOffEndsIt) {
     EXPECT_EQ(Texts(off.end() - 4, off.end()),
               lines("hci0 Pairable=b:0", ends, "hci0 Powered=b:0", "answer SetProperty"));
 }
-
-} // namespace
 
 } // namespace Bluetooth::Test

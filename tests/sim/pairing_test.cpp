@@ -2,8 +2,6 @@
 
 namespace Bluetooth::Test {
 
-namespace {
-
 class SimPairingTest : public SimTest {
 protected:
     void startPairing(const char* capability = "") {
@@ -108,42 +106,35 @@ TEST_F(SimPairingTest, FailuresHaveTheErrorOfTheirCauseAndTakeTheDeviceBack) {
     setTime("PairingTimeout", "200");
     const char* const authentication = "Failed: Authentication Failed";
     const char* const rejected = "Rejected: Authentication Rejected";
-    const auto refuses = [](const char* error) {
-        return [error](DBusMessage* request) {
-            return MessagePtr(dbus_message_new_error(request, error, ""));
-        };
-    };
-    const auto gives = [](const auto& value) {
-        return [value](DBusMessage* request) { return replyTo(request, with(value)); };
-    };
-    const RawPeer::Handler agrees = [](DBusMessage* request) { return replyTo(request); };
-    const auto refusal = refuses("org.bluez.Error.Rejected");
+    const char* const refusal = "org.bluez.Error.Rejected";
     const struct {
         const char* behaviour;
         const char* request; ///< what the agent is asked
-        RawPeer::Handler answer;
+        const char* refusal; ///< what it answers, or else:
+        Writer::Build answer;
         std::string error;
     } failures[] = {
-        {"ConfirmPasskey", "RequestConfirmation", refusal, authentication},
-        {"ConfirmPasskey", "RequestConfirmation", refuses("org.bluez.Error.Canceled"),
-         authentication},
-        {"LegacyPin", "RequestPinCode", gives("4321"), authentication},
-        {"WrongPin", "RequestPinCode", gives("0000"), authentication}, // the device's own
-        {"LegacyPin", "RequestPinCode", refusal, rejected},
-        {"LegacyPin", "RequestPinCode", gives(""), rejected},
-        {"LegacyPin", "RequestPinCode", gives("12345678901234567"), rejected},
-        {"LegacyPin", "RequestPinCode", gives(1234U), rejected},
-        {"RefusesConfirmation", "RequestConfirmation", agrees, authentication},
-        {"CancelsPairing", "RequestConfirmation", agrees, "Canceled: Authentication Canceled"},
-        {"NeverAnswers", "RequestConfirmation", agrees, "Timeout: Authentication Timeout"},
-        {"Rejects", nullptr, agrees, rejected}};
+        {"ConfirmPasskey", "RequestConfirmation", refusal, {}, authentication},
+        {"ConfirmPasskey", "RequestConfirmation", "org.bluez.Error.Canceled", {}, authentication},
+        {"LegacyPin", "RequestPinCode", nullptr, with("4321"), authentication},
+        {"WrongPin", "RequestPinCode", nullptr, with("0000"), authentication}, // the device's own
+        {"LegacyPin", "RequestPinCode", refusal, {}, rejected},
+        {"LegacyPin", "RequestPinCode", nullptr, with(""), rejected},
+        {"LegacyPin", "RequestPinCode", nullptr, with("12345678901234567"), rejected},
+        {"LegacyPin", "RequestPinCode", nullptr, with(1234U), rejected},
+        {"RefusesConfirmation", "RequestConfirmation", nullptr, {}, authentication},
+        {"CancelsPairing", "RequestConfirmation", nullptr, {}, "Canceled: Authentication Canceled"},
+        {"NeverAnswers", "RequestConfirmation", nullptr, {}, "Timeout: Authentication Timeout"},
+        {"Rejects", nullptr, nullptr, {}, rejected}};
     for (const auto& failure : failures) {
         add({{"Behaviour", failure.behaviour}});
         Texts expected = lines(connected);
         if (failure.request) {
-            client->peer().handle(failure.request, failure.answer);
+            client->peer().reply(failure.request, failure.answer);
             expected.push_back(std::string("agent ") + failure.request + " o:device");
         }
+        if (failure.refusal)
+            client->peer().replyError(failure.request, failure.refusal, "");
         startPairing();
         client->until(created[1]);
         Texts came = client->until(removed[1]);
@@ -245,7 +236,5 @@ TEST_F(SimPairingTest, IncomingPairingsAskTheRegisteredAgentAndJustWorkWithoutOn
     comeToPair(otherDevice);
     client->until("hci0 DeviceRemoved o:hci0/dev_00_11_22_33_44_66");
 }
-
-} // namespace
 
 } // namespace Bluetooth::Test

@@ -123,6 +123,12 @@ int ChildProcess::wait(Milliseconds limit) {
     return m_status;
 }
 
+Result ChildProcess::finish() {
+    std::string out = readAll();
+    std::string err = readErrors();
+    return {wait(), std::move(out), std::move(err)};
+}
+
 std::string ChildProcess::readLine(Milliseconds limit) {
     std::string line;
     while (!takeLine(m_buffer, line)) {

@@ -5,10 +5,26 @@
 
 #include <sys/types.h>
 
+#include <ostream>
 #include <string>
 #include <vector>
 
 namespace Bluetooth::Test {
+
+/// What a program has left behind.
+struct Result {
+    int status;
+    std::string out;
+    std::string err;
+
+    bool operator==(const Result& other) const {
+        return status == other.status && out == other.out && err == other.err;
+    }
+};
+inline std::ostream& operator<<(std::ostream& stream, const Result& result) {
+    return stream << "status " << result.status << "\nout: " << result.out
+                  << "\nerr: " << result.err;
+}
 
 /// A program that runs beside the test. It is killed when this object or the test's process ends.
 class ChildProcess {
@@ -30,6 +46,8 @@ public:
     /// @return the exit status, 128 + N after signal N, -1 when it has not ended in time
     int wait(Milliseconds limit = patience);
     bool hasEnded() { return wait(Milliseconds(0)) >= 0; }
+    /// Waits for the end, with the output captured.
+    Result finish();
 
     /// @return the next line of standard output without its newline; "" at its end or in time-out
     std::string readLine(Milliseconds limit = patience);

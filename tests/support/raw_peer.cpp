@@ -79,7 +79,7 @@ void RawPeer::post(Task task) {
     eventfd_write(m_wakeFd, 1);
 }
 
-void RawPeer::run(const std::function<void(DBusConnection*)>& task) {
+void RawPeer::run(const Task& task) {
     if (std::this_thread::get_id() == m_thread.get_id())
         return task(m_connection); // a handler's
     std::promise<void> done;
@@ -106,15 +106,15 @@ void RawPeer::emit(const std::string& path, const std::string& interface, const 
 std::future<MessagePtr> RawPeer::call(const std::string& destination, const std::string& path,
                                       const std::string& interface, const std::string& member,
                                       const Build& arguments, Milliseconds timeout) {
-    auto message = std::make_shared<MessagePtr>(methodCall(destination, path, interface, member));
-    Writer(message->get(), arguments);
-    auto own = std::make_shared<OwnCall>();
-    own->deadline = Clock::now() + timeout;
-    std::future<MessagePtr> result = own->reply.get_future();
-    post([this, message, own](DBusConnection* connection) {
+    const MessagePtr message = methodCall(destination, path, interface, member);
+    Writer(message.get(), arguments);
+    std::future<MessagePtr> result;
+    run([&](DBusConnection* connection) {
         dbus_uint32_t serial = 0;
-        dbus_connection_send(connection, message->get(), &serial);
-        m_ownCalls[serial] = own;
+        dbus_connection_send(connection, message.get(), &serial);
+        OwnCall& own = m_ownCalls[serial];
+        own.deadline = Clock::now() + timeout;
+        result = own.reply.get_future();
     });
     return result;
 }
@@ -123,18 +123,19 @@ void RawPeer::takeReply(DBusMessage* message) {
     const auto call = m_ownCalls.find(dbus_message_get_reply_serial(message));
     if (call == m_ownCalls.end())
         return;
-    call->second->reply.set_value(MessagePtr(dbus_message_ref(message)));
+    call->second.reply.set_value(MessagePtr(dbus_message_ref(message)));
     m_ownCalls.erase(call);
 }
 
 void RawPeer::giveUpOwnCalls() {
-    const bool isConnected = dbus_connection_get_is_connected(m_connection);
+    const auto oldest =
+        dbus_connection_get_is_connected(m_connection) ? Clock::now() : Clock::time_point::max();
     for (auto call = m_ownCalls.begin(); call != m_ownCalls.end();) {
-        if (isConnected && Clock::now() < call->second->deadline) {
+        if (call->second.deadline > oldest) {
             ++call;
             continue;
         }
-        call->second->reply.set_value(nullptr);
+        call->second.reply.set_value(nullptr);
         call = m_ownCalls.erase(call);
     }
 }

@@ -10,7 +10,6 @@
 #include <functional>
 #include <future>
 #include <map>
-#include <memory>
 #include <mutex>
 #include <string>
 #include <thread>
@@ -47,6 +46,7 @@ public:
     /// Runs on the peer's thread. @return the reply, or null for none
     using Handler = std::function<MessagePtr(DBusMessage* call)>;
     using Observer = std::function<void(DBusMessage* message)>;
+    using Task = std::function<void(DBusConnection* connection)>;
 
     /// Connects, and owns `name` unless it is empty. Throws std::runtime_error when that fails.
     /// @param observer sees each message that comes, on the peer's thread, before anything else
@@ -74,7 +74,7 @@ public:
     void send(MessagePtr message);
 
     /// Runs something on the peer's thread and waits for it. Handlers may do so too.
-    void run(const std::function<void(DBusConnection*)>& task);
+    void run(const Task& task);
     bool own(const std::string& name);
     void disown(const std::string& name);
     bool hasOwner(const std::string& name);
@@ -98,7 +98,6 @@ public:
 
 private:
     using Clock = std::chrono::steady_clock;
-    using Task = std::function<void(DBusConnection*)>;
     struct Answer {
         Handler handler;
         Milliseconds delay{0};
@@ -125,9 +124,9 @@ private:
     std::mutex m_mutex; // guards m_tasks and m_answers
     std::deque<Task> m_tasks;
     std::map<std::string, Answer> m_answers;
-    std::multimap<Clock::time_point, MessagePtr> m_dueReplies;    // of the peer's thread
-    std::map<dbus_uint32_t, std::shared_ptr<OwnCall>> m_ownCalls; // by serial; of the peer's thread
-    bool m_isMonitor = false;                                     // of the peer's thread
+    std::multimap<Clock::time_point, MessagePtr> m_dueReplies; // of the peer's thread
+    std::map<dbus_uint32_t, OwnCall> m_ownCalls;               // by serial; of the peer's thread
+    bool m_isMonitor = false;                                  // of the peer's thread
     Observer m_observer;
     Recorder<SeenCall> m_calls;
     Recorder<std::string> m_signals;
