@@ -2,41 +2,39 @@
 
 namespace Bluetooth::Test {
 
-namespace {
-
 class AdapterVerbs : public KesbtTest {};
 
 TEST_F(AdapterVerbs, AdaptersAreListedAndChosenByNameOrAddress) {
-    const Json adapters = run({"adapters", "--json"}).json();
+    const Json adapters = json({"adapters"});
     ASSERT_EQ(adapters.size(), 2U);
     EXPECT_EQ(adapters[0]["default"], true);
     EXPECT_EQ(adapters[1]["default"], false);
-    EXPECT_EQ(run({"--json", "adapter", "info"}).json()["path"], adapters[0]["path"]);
+    EXPECT_EQ(Json::parse(run({"--json", "adapter", "info"}).out)["path"], adapters[0]["path"]);
     for (const char* choice : {"hci1", "00:1A:7D:DA:71:11", "00:1a:7d:da:71:11"})
-        EXPECT_EQ(run({"--adapter", choice, "adapter", "--json"}).json()["adapter"], "hci1");
+        EXPECT_EQ(json({"--adapter", choice, "adapter"})["adapter"], "hci1");
     EXPECT_EQ(failure({"adapter", "--adapter", "hci9"}),
               "there is no adapter hci9; see which there are: kesbt adapters\n");
 }
 
 TEST_F(AdapterVerbs, SetTellsOldAndNewValueInThePropertysOwnType) {
     EXPECT_EQ(run({"adapter", "set", "powered", "off"}), (Result{0, "Powered: yes -> no\n", ""}));
-    EXPECT_EQ(run({"adapter", "set", "Powered", "true"}), (Result{0, "Powered: no -> yes\n", ""}));
+    EXPECT_EQ(run({"adapter", "set", "Powered", "true"}).out, "Powered: no -> yes\n");
     EXPECT_EQ(run({"adapter", "set", "DiscoverableTimeout", "60"}).out,
               "DiscoverableTimeout: 180 -> 60\n");
     EXPECT_EQ(
-        run({"adapter", "set", "Name", "42", "--json"}).json(),
+        json({"adapter", "set", "Name", "42"}),
         (Json{{"adapter", "hci0"}, {"property", "Name"}, {"old", "kestrine-0"}, {"new", "42"}}));
     EXPECT_EQ(adapterProperties()["Name"], "42");
 }
 
 TEST_F(AdapterVerbs, SetRefusesWhatCannotBeSet) {
+    const std::string see = "; see what can be set: kesbt adapter set --help\n";
     EXPECT_EQ(failure({"adapter", "set", "Address", "x"}),
-              "the daemon does not let Address of hci0 be set to \"x\"; see what can be set: kesbt "
-              "adapter set --help\n");
+              "the daemon does not let Address of hci0 be set to \"x\"" + see);
     EXPECT_EQ(failure({"adapter", "set", "UUIDs", "x"}),
               "UUIDs cannot be set; see what can: kesbt adapter set --help\n");
     EXPECT_EQ(failure({"adapter", "set", "Colour", "red"}),
-              "hci0 has no property \"Colour\"; see what can be set: kesbt adapter set --help\n");
+              "hci0 has no property \"Colour\"" + see);
     failure({"adapter", "set", "Powered", "perhaps"}, 2);
     failure({"adapter", "set", "PairableTimeout", "-1"}, 2);
     failure({"adapter", "set", "PairableTimeout", "4294967296"}, 2);
@@ -46,23 +44,21 @@ TEST_F(AdapterVerbs, SetRefusesWhatCannotBeSet) {
 
 TEST_F(AdapterVerbs, ACallThatDoesNothingOrIsNotAnsweredIsAFailure) {
     // The daemon answers and changes nothing: only reading back shows it.
-    peer = std::make_unique<RawPeer>(bus.address());
-    control("DropName");
-    RawPeer liar(bus.address(), "org.bluez");
-    liar.reply("DefaultAdapter", [](Writer& w) { w(Path{"/org/bluez/1/hci0"}); });
+    simulation.control("DropName");
+    RawPeer liar(simulation.bus().address(), "org.bluez");
+    liar.reply("DefaultAdapter", with(Path{"/org/bluez/1/hci0"}));
     liar.reply("SetProperty");
     liar.reply("GetProperties",
                [](Writer& w) { w.dict("sv", [](Writer& d) { d.entry("Powered", Var{true}); }); });
-    EXPECT_EQ(failure({"--timeout", "0.3", "adapter", "set", "Powered", "off"}),
+    const Texts switchOff = {"--timeout", "0.3", "adapter", "set", "Powered", "off"};
+    EXPECT_EQ(failure(switchOff),
               "Powered of hci0 is still \"yes\" within the time-out; try again or give a longer "
               "--timeout\n");
     liar.neverReply("SetProperty");
-    EXPECT_NE(failure({"--timeout", "0.3", "adapter", "set", "Powered", "off"})
-                  .find("Did not receive a reply"),
-              std::string::npos);
+    EXPECT_NE(failure(switchOff).find("Did not receive a reply"), std::string::npos);
     // The library's own calls wait for longer than the user wants to.
     liar.neverReply("GetProperties");
-    EXPECT_EQ(failure({"--timeout", "0.3", "adapter", "set", "Powered", "off"}),
+    EXPECT_EQ(failure(switchOff),
               "no answer within the time-out; try again or give a longer --timeout\n");
     failure({"adapter", "info", "--timeout", "0.3"});
 }
@@ -75,8 +71,9 @@ TEST_F(AdapterVerbs, NamesFromOutsideCannotControlTheTerminal) {
 
 TEST_F(AdapterVerbs, ColoursAreForTerminalsOnlyAndNoColorEndsThem) {
     const auto onTerminal = [](const std::string& environment) {
-        return runCommand({"env", "TERM=xterm", environment, "script", "-qec",
-                           KESBT " adapters; " KESBT " wait found 00:11:22:33:44:01", "/dev/null"})
+        return runShell("env TERM=xterm " + environment +
+                        " script -qec '" KESBT " adapters; " KESBT
+                        " wait found 00:11:22:33:44:01' /dev/null")
             .out;
     };
     EXPECT_NE(onTerminal("X=").find("\033["), std::string::npos);
@@ -86,7 +83,5 @@ TEST_F(AdapterVerbs, ColoursAreForTerminalsOnlyAndNoColorEndsThem) {
     EXPECT_EQ(onTerminal("TERM=dumb").find("\033["), std::string::npos);
     EXPECT_EQ(run({"adapters"}).out.find("\033["), std::string::npos);
 }
-
-} // namespace
 
 } // namespace Bluetooth::Test

@@ -4,68 +4,58 @@
 
 #include <unistd.h>
 
-#include <cstdlib>
 #include <filesystem>
-#include <fstream>
-#include <iterator>
 
 namespace Bluetooth::Test {
 
-namespace {
-
-constexpr const char* adapterAddress = "00:1A:7D:DA:71:10";
-constexpr const char* folder = "/etc/bluetooth/autoconnect/";
-const std::string file = std::string(folder) + adapterAddress;
+const std::string adapterAddress = "00:1A:7D:DA:71:10";
+const std::string file = configFolder + adapterAddress;
+const std::string mouse = knownMouse;
+const std::string receiver = pinReceiver;
 
 class HostVerbs : public HostTest {
 protected:
-    static std::string content() {
-        std::ifstream stream(file, std::ios::binary);
-        return std::string(std::istreambuf_iterator<char>(stream), {});
-    }
     static void setContent(const std::string& text) {
-        std::filesystem::create_directory(folder);
-        std::ofstream(file, std::ios::binary) << text;
+        std::filesystem::create_directory(configFolder);
+        writeFile(file, text);
     }
 };
 
 TEST_F(HostVerbs, TheListIsChangedEntryByEntryAndTheFlagStays) {
-    EXPECT_EQ(run({"autoconnect", "show", "--json"}).json(),
-              (Json{{"adapterAddress", adapterAddress},
-                    {"file", file},
-                    {"enabled", false},
-                    {"devices", Json::array()}}));
-    EXPECT_FALSE(std::filesystem::exists(folder)); // looking changes nothing
+    EXPECT_EQ(json({"autoconnect", "show"}), (Json{{"adapterAddress", adapterAddress},
+                                                   {"file", file},
+                                                   {"enabled", false},
+                                                   {"devices", Json::array()}}));
+    EXPECT_FALSE(std::filesystem::exists(configFolder)); // looking changes nothing
 
     EXPECT_EQ(run({"autoconnect", "add", mouse}).status, 0);
-    EXPECT_EQ(content(), std::string("0,") + mouse);
-    run({"autoconnect", "add", gps});
+    EXPECT_EQ(readFile(file), "0," + mouse);
+    run({"autoconnect", "add", receiver});
     run({"autoconnect", "enable"});
-    run({"autoconnect", "add", gps});
-    EXPECT_EQ(content(), std::string("1,") + mouse + "," + gps);
+    run({"autoconnect", "add", receiver});
+    EXPECT_EQ(readFile(file), "1," + mouse + "," + receiver);
     run({"autoconnect", "remove", mouse});
-    EXPECT_EQ(content(), std::string("1,") + gps);
+    EXPECT_EQ(readFile(file), "1," + receiver);
     run({"autoconnect", "disable"});
-    EXPECT_EQ(content(), std::string("0,") + gps);
+    EXPECT_EQ(readFile(file), "0," + receiver);
     failure({"autoconnect", "remove", mouse});
 
-    setContent(std::string("1,") + gps + "\n"); // written with an editor
+    setContent("1," + receiver + "\n"); // written with an editor
     run({"autoconnect", "add", headset});
-    EXPECT_EQ(content(), std::string("1,") + gps + "," + headset);
-    setContent(std::string("1,") + gps + ",");
+    EXPECT_EQ(readFile(file), "1," + receiver + "," + headset);
+    setContent("1," + receiver + ",");
     run({"autoconnect", "add", mouse});
-    EXPECT_EQ(content(), std::string("1,") + gps + "," + mouse);
-    EXPECT_EQ(
-        run({"--adapter", "00:1a:7d:da:71:10", "autoconnect", "show", "--json"}).json()["devices"],
-        (Json{gps, mouse}));
+    EXPECT_EQ(readFile(file), "1," + receiver + "," + mouse);
+    EXPECT_EQ(json({"--adapter", "00:1a:7d:da:71:10", "autoconnect", "show"})["devices"],
+              (Json{receiver, mouse}));
 }
 
 TEST_F(HostVerbs, KnownDevicesAndTargetsAreListed) {
-    setContent(std::string("1,") + mouse + "," + gps);
-    EXPECT_EQ(run({"autoconnect", "targets", "--json"}).json()[0]["address"], mouse);
-    setContent(std::string("1,") + mouse + "," + gps);
-    EXPECT_EQ(run({"autoconnect", "list", "--json"}).json()[0]["address"], mouse);
-    EXPECT_EQ(content(), std::string("1,") + mouse); // what the adapter does not know leaves
+    setContent("1," + mouse + "," + receiver);
+    EXPECT_EQ(json({"autoconnect", "targets"})[0]["address"], mouse);
+    setContent("1," + mouse + "," + receiver);
+    EXPECT_EQ(json({"autoconnect", "list"})[0]["address"], mouse);
+    EXPECT_EQ(readFile(file), "1," + mouse); // what the adapter does not know leaves
 }
 
 TEST_F(HostVerbs, AFileThatCannotBeUsedIsAFailureAndStays) {
@@ -80,11 +70,9 @@ TEST_F(HostVerbs, CommandsNeedTheAutoConnectDaemon) {
     for (const char* verb : {"reload", "pause", "resume"})
         EXPECT_EQ(failure({"autoconnect", verb}),
                   "no auto-connect daemon takes commands; start it: kesbt-autoconnectd\n");
-    ChildProcess reader({"cat", "/tmp/kes_bluetooth_autoconnect"}, // made by the failures
-                        ChildProcess::Output::Capture);
-    while (run({"autoconnect", "pause"}).status != 0) { // until the reader is there
-    }
-    EXPECT_EQ(reader.readAll(), "pause");
+    const PipeReader daemon(commandPipe);
+    EXPECT_EQ(run({"autoconnect", "pause"}).status, 0);
+    EXPECT_EQ(daemon.take(), "pause");
 }
 
 TEST_F(HostVerbs, ARestartedDaemonHasToComeToTheBus) {
@@ -95,20 +83,18 @@ TEST_F(HostVerbs, ARestartedDaemonHasToComeToTheBus) {
         std::filesystem::remove(copy);
         std::filesystem::copy_file(program, copy);
         // It returns once the program runs, as a daemon that puts itself into the background does.
-        std::ofstream("/usr/sbin/bluetoothd")
-            << "#!/bin/sh\n"
-            << copy << arguments << " >/dev/null 2>&1 &\n"
-            << "until readlink /proc/$!/exe | grep -q bluetoothd; do :; done\n";
-        std::filesystem::permissions("/usr/sbin/bluetoothd", std::filesystem::perms::owner_all);
+        writeProgram("/usr/sbin/bluetoothd",
+                     copy + arguments + " >/dev/null 2>&1 &\n" +
+                         "until readlink /proc/$!/exe | grep -q bluetoothd; do :; done\n");
     };
-    std::ofstream("/tmp/bluetooth.info_hci0");
-    daemon->kill();
+    writeFile("/tmp/bluetooth.info_hci0", "");
+    simulation.process().kill();
     install("/usr/bin/sleep", " 60");
     EXPECT_EQ(failure({"restart-daemon", "--timeout", "0.2"}),
               "bluetoothd was started and did not come to the system bus within the time-out; try "
               "again or give a longer --timeout\n");
     install(BLUEZ4_SIM);
-    EXPECT_EQ(run({"restart-daemon", "--json"}).json(), (Json{{"restarted", true}}));
+    EXPECT_EQ(json({"restart-daemon"}), (Json{{"restarted", true}}));
     EXPECT_EQ(run({"adapters"}).status, 0);
 }
 
@@ -122,7 +108,5 @@ TEST_F(HostVerbs, WithoutAdaptersThereIsNothingToRestartOrAsk) {
                           "/tmp/bluetooth.info_* file); plug one in\n"
                         : "only root may restart bluetoothd; run it as root\n");
 }
-
-} // namespace
 
 } // namespace Bluetooth::Test

@@ -1,64 +1,34 @@
 #include "kesbt/kesbt_test.h"
 
-#include <algorithm>
-#include <cstdlib>
-#include <filesystem>
-#include <ostream>
-
 namespace Bluetooth::Test {
 
 namespace {
 
-constexpr const char* simName = "com.kestrine.bluetooth.Sim";
-constexpr const char* simPath = "/com/kestrine/bluetooth/Sim";
-
-std::unique_ptr<ChildProcess> startSim(const std::string& timeScale) {
-    auto sim = std::make_unique<ChildProcess>(
-        Arguments{BLUEZ4_SIM, "--print-ready", "--time-scale=" + timeScale},
-        ChildProcess::Output::Capture);
-    if (sim->readLine() != "ready")
-        throw std::runtime_error("bluez4-sim does not start: " + sim->readErrors());
-    return sim;
-}
-
-std::size_t countOf(const std::vector<std::string>& signals, const std::string& member) {
-    return static_cast<std::size_t>(
-        std::count_if(signals.begin(), signals.end(), [&](const std::string& signal) {
-            return signal.find("s:" + member + " ") != std::string::npos;
-        }));
+std::unique_ptr<ChildProcess> startCommand(const Texts& command) {
+    return std::make_unique<ChildProcess>(command, ChildProcess::Output::Capture);
 }
 
 } // namespace
 
-std::ostream& operator<<(std::ostream& stream, const Result& result) {
-    return stream << "status " << result.status << "\nout: " << result.out
-                  << "\nerr: " << result.err;
+std::unique_ptr<ChildProcess> start(Texts arguments) {
+    arguments.insert(arguments.begin(), KESBT);
+    return startCommand(arguments);
 }
 
-std::unique_ptr<ChildProcess> start(const Arguments& arguments) {
-    Arguments command = {KESBT};
-    command.insert(command.end(), arguments.begin(), arguments.end());
-    return std::make_unique<ChildProcess>(command, ChildProcess::Output::Capture);
+Result run(const Texts& arguments) {
+    return start(arguments)->finish();
 }
 
-Result finish(ChildProcess& program) {
-    Result result;
-    result.out = program.readAll();
-    result.err = program.readErrors();
-    result.status = program.wait();
-    return result;
+Json json(Texts arguments) {
+    arguments.emplace_back("--json");
+    return Json::parse(run(arguments).out);
 }
 
-Result run(const Arguments& arguments) {
-    return finish(*start(arguments));
+Result runShell(const std::string& command) {
+    return startCommand({"sh", "-c", command})->finish();
 }
 
-Result runCommand(const Arguments& command) {
-    ChildProcess program(command, ChildProcess::Output::Capture);
-    return finish(program);
-}
-
-std::string failure(const Arguments& arguments, int status) {
+std::string failure(const Texts& arguments, int status) {
     const Result result = run(arguments);
     EXPECT_EQ(result.status, status) << result;
     EXPECT_EQ(result.out, "");
@@ -74,41 +44,6 @@ Json awaitEvent(ChildProcess& program, const std::string& member, const Json& va
     }
     ADD_FAILURE() << "no event with " << member << " " << value;
     return Json::object();
-}
-
-KesbtTest::KesbtTest(const std::string& timeScale)
-    : daemon(startSim(timeScale)), peer(std::make_unique<RawPeer>(bus.address())) {
-    peer->addMatch(std::string("type='signal',interface='") + simName + "'");
-}
-
-HostTest::HostTest() {
-    if (!getenv("KESBLUETOOTH_TEST_NAMESPACE"))
-        throw std::runtime_error("this would change the machine's own files: run it with ctest");
-    std::filesystem::remove_all("/etc/bluetooth");
-    std::filesystem::create_directory("/etc/bluetooth");
-}
-
-MessagePtr KesbtTest::control(const char* method, const RawPeer::Build& arguments) {
-    MessagePtr reply = peer->call(simName, simPath, simName, method, arguments).get();
-    EXPECT_TRUE(reply && dbus_message_get_type(reply.get()) != DBUS_MESSAGE_TYPE_ERROR)
-        << method << " " << (reply ? argumentsOf(reply.get()) : "no reply");
-    return reply;
-}
-
-void KesbtTest::setTimeScale(double scale) {
-    control("SetTimeScale", [scale](Writer& w) { w(scale); });
-}
-
-void KesbtTest::awaitCall(const std::string& member, std::size_t count) {
-    EXPECT_TRUE(peer->signals().waitUntil([&](const auto& signals) {
-        return countOf(signals, member) >= count;
-    })) << "no call of "
-        << member;
-}
-
-std::size_t KesbtTest::calls(const std::string& member) {
-    control("ClearFaults"); // its answer comes after the signals of all calls before
-    return countOf(peer->signals().events(), member);
 }
 
 } // namespace Bluetooth::Test

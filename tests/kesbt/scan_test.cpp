@@ -6,8 +6,6 @@
 
 namespace Bluetooth::Test {
 
-namespace {
-
 class ScanVerbs : public KesbtTest {
 protected:
     PrivateBus session{PrivateBus::Kind::Session, SESSION_BUS_CONFIGURATION};
@@ -16,23 +14,21 @@ protected:
 TEST_F(ScanVerbs, TwoProgramsShareOneScan) {
     EXPECT_EQ(run({"scan", "stop"}), (Result{0, "No scan is running on hci0\n", ""}));
     const auto watch = start({"scan", "watch", "--json"}); // the bus starts the service
-    const Json found = awaitEvent(*watch, "address", gps);
+    const Json found = awaitEvent(*watch, "address", pinReceiver);
     EXPECT_EQ(found["properties"]["RSSI"], -70);
 
-    const Json list = run({"scan", "list", "--json"}).json();
+    const Json list = json({"scan", "list"});
     ASSERT_FALSE(list.empty());
     EXPECT_EQ(list[0]["address"], headset);
     EXPECT_NE(run({"scan", "list"}).out.find("00:11:22:33:44:04  -70 dBm  0x001f00  GPS Receiver"),
               std::string::npos);
     EXPECT_EQ(calls("StartDiscovery"), 1U);
 
-    control("SetDevice", [](Writer& w) {
-        w(gps).dict("sv", [](Writer& d) { d.entry("RSSI", Var{std::int32_t{-20}}); });
-    });
-    while (awaitEvent(*watch, "event", "changed")["address"] != gps && !HasFailure()) {
+    simulation.setDevice(pinReceiver, "RSSI", "-20");
+    while (awaitEvent(*watch, "event", "changed")["address"] != pinReceiver && !HasFailure()) {
     }
     watch->signal(SIGINT);
-    EXPECT_EQ(finish(*watch).status, 0);
+    EXPECT_EQ(watch->finish().status, 0);
     EXPECT_EQ(run({"scan", "stop"}).out, "Stopped the scan on hci0\n");
     awaitCall("StopDiscovery");
 }
@@ -50,7 +46,5 @@ TEST_F(ScanVerbsAlone, WithoutTheServiceTheLineSaysSo) {
     EXPECT_EQ(failure({"scan", "list"}), "the session bus cannot be reached; log in, or try: "
                                          "dbus-run-session -- kesbt scan list\n");
 }
-
-} // namespace
 
 } // namespace Bluetooth::Test

@@ -7,12 +7,10 @@
 
 namespace Bluetooth::Test {
 
-namespace {
-
 class Streams : public KesbtTest {
 protected:
     static void expectEnd(ChildProcess& program, int status, const std::string& line) {
-        const Result result = finish(program);
+        const Result result = program.finish();
         EXPECT_EQ(result.status, status) << result;
         EXPECT_EQ(result.err, line);
     }
@@ -26,13 +24,11 @@ TEST_F(Streams, DiscoverTellsWhatAppearsChangesAndVanishes) {
     EXPECT_EQ(adapterProperties()["Discovering"], true);
 
     const Json vanished = awaitEvent(*discover, "event", "vanished");
-    EXPECT_EQ(vanished["address"], speaker);
+    EXPECT_EQ(vanished["address"], vanishingSpeaker);
     EXPECT_EQ(vanished["properties"]["Name"], "Passing Speaker");
 
-    control("SetDevice", [](Writer& w) {
-        w(gps).dict("sv", [](Writer& d) { d.entry("RSSI", Var{std::int32_t{-20}}); });
-    });
-    const Json changed = awaitEvent(*discover, "address", gps);
+    simulation.setDevice(pinReceiver, "RSSI", "-20");
+    const Json changed = awaitEvent(*discover, "address", pinReceiver);
     EXPECT_EQ(changed["event"], "changed");
     EXPECT_EQ(changed["changed"], Json::array({"RSSI"}));
     EXPECT_EQ(changed["properties"]["RSSI"], -20);
@@ -58,15 +54,15 @@ TEST_F(Streams, DiscoverFailsWhenItCannotGoOn) {
 
     discover = start({"--adapter", "hci1", "discover"});
     EXPECT_NE(discover->readLine(), "");
-    control("RemoveAdapter", [](Writer& w) { w("hci1"); });
-    const Result removed = finish(*discover);
+    simulation.control("RemoveAdapter", with("hci1"));
+    const Result removed = discover->finish();
     EXPECT_EQ(removed.status, 1); // switched off first, then removed
     EXPECT_EQ(removed.err.substr(0, 9), "hci1 was ");
 
     run({"adapter", "set", "Powered", "on"});
     discover = start({"discover"});
     EXPECT_NE(discover->readLine(), "");
-    daemon->kill();
+    simulation.process().kill();
     expectEnd(*discover, 1,
               "bluetoothd has left the system bus; start it again and repeat the command\n");
 }
@@ -80,17 +76,15 @@ TEST_F(Streams, MonitorShowsEverySignalAlsoOfWhatComesLater) {
     EXPECT_EQ(changed["interface"], "org.bluez.Adapter");
     EXPECT_EQ(changed["member"], "PropertyChanged");
 
-    control("AddAdapter", [](Writer& w) {
-        w.dict("sv", [](Writer& d) { d.entry("Address", Var{"00:1A:7D:DA:71:12"}); });
-    });
+    simulation.control("AddAdapter", with(Settings{{"Address", "00:1A:7D:DA:71:12"}}));
     const Json added = awaitEvent(*monitor, "member", "AdapterAdded");
     run({"--adapter", "hci2", "adapter", "set", "Name", "new"});
     EXPECT_EQ(awaitEvent(*monitor, "arguments", {"Name", "new"})["path"], added["arguments"][0]);
 
-    control("Restart");
+    simulation.control("Restart");
     awaitEvent(*monitor, "event", "daemon-gone");
     awaitEvent(*monitor, "event", "daemon-came");
-    run({"create", gps});
+    run({"create", pinReceiver});
     const Json created = awaitEvent(*monitor, "member", "DeviceCreated");
     EXPECT_NE(created["path"], changed["path"]);
     awaitEvent(*monitor, "path", created["arguments"][0]); // a device's own signal
@@ -116,18 +110,18 @@ TEST_F(Streams, ForPeopleTheyAreReadable) {
 }
 
 TEST_F(Streams, WaitEndsWhenItIsSoAndFailsWhenTimeIsOver) {
-    EXPECT_EQ(run({"wait", "found", gps}), (Result{0, "00:11:22:33:44:04 is found\n", ""}));
-    EXPECT_EQ(failure({"--timeout", "0.2", "wait", "connected", mouse}),
+    EXPECT_EQ(run({"wait", "found", pinReceiver}), (Result{0, "00:11:22:33:44:04 is found\n", ""}));
+    EXPECT_EQ(failure({"--timeout", "0.2", "wait", "connected", knownMouse}),
               "00:11:22:33:44:06 was not connected within the time-out; try again or give a longer "
               "--timeout\n");
 
-    const auto waiting = start({"wait", "paired", gps}); // not even known yet
+    const auto waiting = start({"wait", "paired", pinReceiver}); // not even known yet
     awaitCall("FindDevice");
-    EXPECT_EQ(run({"pair", gps, "--pin", "1234"}).status, 0);
+    EXPECT_EQ(run({"pair", pinReceiver, "--pin", "1234"}).status, 0);
     expectEnd(*waiting, 0, "");
 
     const std::size_t asked = calls("FindDevice");
-    const auto interrupted = start({"wait", "paired", laptop});
+    const auto interrupted = start({"wait", "paired", unreachableLaptop});
     awaitCall("FindDevice", asked + 1);
     interrupted->signal(SIGINT);
     expectEnd(*interrupted, 1,
@@ -143,10 +137,8 @@ TEST_F(Streams, WaitEndsWhenItIsSoAndFailsWhenTimeIsOver) {
     const std::size_t read = calls("GetProperties");
     const auto pulledOut = start({"wait", "powered"});
     awaitCall("GetProperties", read + 1);
-    control("RemoveAdapter", [](Writer& w) { w("hci0"); });
+    simulation.control("RemoveAdapter", with("hci0"));
     expectEnd(*pulledOut, 1, "hci0 was removed; plug it in and repeat the command\n");
 }
-
-} // namespace
 
 } // namespace Bluetooth::Test

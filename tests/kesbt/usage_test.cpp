@@ -4,10 +4,8 @@
 
 namespace Bluetooth::Test {
 
-namespace {
-
 TEST(Usage, WrongUsageIsOneLineThatSaysWhereToReadOnAndStatus2) {
-    const std::vector<std::pair<Arguments, std::string>> wrong = {
+    const std::vector<std::pair<Texts, std::string>> wrong = {
         {{}, "a verb is missing; see: kesbt --help\n"},
         {{"help"}, "there is no verb \"help\"; see: kesbt --help\n"},
         {{"adaptres"},
@@ -44,32 +42,31 @@ TEST(Usage, WrongUsageIsOneLineThatSaysWhereToReadOnAndStatus2) {
 
 TEST(Usage, ResultsThatCannotBeWrittenAreAFailureAndGoNowhereElse) {
     EXPECT_EQ(run({"--version"}), (Result{0, "kesbt " KESBT_VERSION "\n", ""}));
-    EXPECT_EQ(runCommand({"sh", "-c", std::string(KESBT) + " --help >/dev/full"}),
+    EXPECT_EQ(runShell(KESBT " --help >/dev/full"),
               (Result{1, "",
                       "cannot write the results: No space left on device; check where "
                       "standard output goes\n"}));
     const PrivateBus bus(PrivateBus::Kind::System);
-    EXPECT_EQ(runCommand({"sh", "-c", std::string(KESBT) + " names >&-"}),
+    EXPECT_EQ(runShell(KESBT " names >&-"),
               (Result{1, "", "standard output is closed; give results somewhere to go\n"}));
 }
 
 TEST(Usage, WithoutASystemBusTheLineSaysSo) {
     PrivateBus::address(PrivateBus::Kind::System); // where none runs
-    for (const Arguments& arguments :
-         {Arguments{"names"}, Arguments{"adapters"}, Arguments{"monitor"}, Arguments{"agent"}})
+    for (const Texts& arguments :
+         {Texts{"names"}, Texts{"adapters"}, Texts{"monitor"}, Texts{"agent"}})
         EXPECT_EQ(failure(arguments), "the system bus cannot be reached; start dbus-daemon, or "
                                       "try: bluez4-sim -- kesbt adapters\n");
 }
 
 TEST(Usage, WithoutADaemonOrWithAnotherTheLineSaysSo) {
     const PrivateBus bus(PrivateBus::Kind::System);
-    for (const Arguments& arguments :
-         {Arguments{"adapters"}, Arguments{"adapter", "set", "Powered", "on"}, Arguments{"devices"},
-          Arguments{"device", mouse}, Arguments{"create", headset}, Arguments{"remove", mouse},
-          Arguments{"services", mouse}, Arguments{"discover"}, Arguments{"monitor"},
-          Arguments{"cancel", headset}, Arguments{"agent"}, Arguments{"audio", "connect", headset},
-          Arguments{"volume", "up", headset}, Arguments{"scan", "list"},
-          Arguments{"autoconnect", "targets"}})
+    for (const Texts& arguments :
+         {Texts{"adapters"}, Texts{"adapter", "set", "Powered", "on"}, Texts{"devices"},
+          Texts{"device", knownMouse}, Texts{"create", headset}, Texts{"remove", knownMouse},
+          Texts{"services", knownMouse}, Texts{"discover"}, Texts{"monitor"},
+          Texts{"cancel", headset}, Texts{"agent"}, Texts{"audio", "connect", headset},
+          Texts{"volume", "up", headset}, Texts{"scan", "list"}, Texts{"autoconnect", "targets"}})
         EXPECT_EQ(failure(arguments), absentDaemon);
     EXPECT_EQ(run({"names"}).out.substr(0, 21), "org.freedesktop.DBus\n");
 
@@ -85,7 +82,7 @@ TEST(Usage, WithoutADaemonOrWithAnotherTheLineSaysSo) {
 }
 
 TEST(Usage, TheSimulatedDaemonRunsItAndPassesItsStatusOn) {
-    const Result result = runCommand({BLUEZ4_SIM, "--", KESBT, "adapters"});
+    const Result result = runShell(BLUEZ4_SIM " -- " KESBT " adapters");
     EXPECT_EQ(result, (Result{0,
                               "ADAPTER  ADDRESS            POWERED  DISCOVERABLE  DEFAULT  NAME\n"
                               "hci0     00:1A:7D:DA:71:10  yes      no            yes      "
@@ -93,9 +90,7 @@ TEST(Usage, TheSimulatedDaemonRunsItAndPassesItsStatusOn) {
                               "hci1     00:1A:7D:DA:71:11  yes      no            no       "
                               "kestrine-1\n",
                               ""}));
-    EXPECT_EQ(runCommand({BLUEZ4_SIM, "--", KESBT, "--adapter", "hci7", "devices"}).status, 1);
+    EXPECT_EQ(runShell(BLUEZ4_SIM " -- " KESBT " --adapter hci7 devices").status, 1);
 }
-
-} // namespace
 
 } // namespace Bluetooth::Test
