@@ -16,15 +16,10 @@ namespace Bluetooth::Test {
 
 namespace {
 
-void newAdapter(Writer& w) {
-    w(Path{"/new"});
-}
-void newDevice(Writer& w) {
-    w(Path{devicePath});
-}
-void powered(Writer& w) {
-    w("Powered")(Var{true});
-}
+const Writer::Build newAdapter = with(Path{"/new"});
+const Writer::Build newDevice = with(Path{devicePath});
+const Writer::Build powered = with("Powered", Var{true});
+
 void foundDevice(Writer& w) {
     w(address).dict("sv", [](Writer& d) {
         d.entry("Name", Var{"Phone"}).entry("RSSI", Var{std::int16_t{-60}});
@@ -78,10 +73,9 @@ TEST_F(HandlerTest, EachSetterSubscribesToItsSignal) {
     check(adapter, "DeviceFound", &Adapter::setDeviceFoundHandler, onDict, foundDevice,
           "dict" + onAdapter + " 00:11:22:33:44:55 Name: Phone;RSSI: -60;",
           "00:11:22:33:44:55 was found by" + onAdapter + "\nName: Phone\nRSSI: -60\n\n");
-    check(
-        adapter, "DeviceDisappeared", &Adapter::setDeviceDisappearedHandler, onString,
-        [](Writer& w) { w(address); }, "string" + onAdapter + " 00:11:22:33:44:55",
-        "00:11:22:33:44:55 was disappeared in" + onAdapter + "\n");
+    check(adapter, "DeviceDisappeared", &Adapter::setDeviceDisappearedHandler, onString,
+          with(address), "string" + onAdapter + " 00:11:22:33:44:55",
+          "00:11:22:33:44:55 was disappeared in" + onAdapter + "\n");
     check(adapter, "DeviceCreated", &Adapter::setDeviceCreatedHandler, onPath, newDevice,
           "path" + onAdapter + onDevice, "POINTER was created by" + onAdapter + "\n");
     check(adapter, "DeviceRemoved", &Adapter::setDeviceRemovedHandler, onPath, newDevice,

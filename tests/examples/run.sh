@@ -5,13 +5,14 @@
 # a root that is thrown away and KESBLUETOOTH_TEST_NAMESPACE=1 to say so.
 set -euo pipefail
 
+# Devices of sim/scenarios/default.conf.
 headset=00:11:22:33:44:01
 phone=00:11:22:33:44:03
 receiver=00:11:22:33:44:04
-passing=00:11:22:33:44:05
+speaker=00:11:22:33:44:05
 mouse=00:11:22:33:44:06
 laptop=00:11:22:33:44:07
-silent=00:11:22:33:44:10
+silent=00:11:22:33:44:99 # in no scenario but this test's
 list=/etc/bluetooth/autoconnect/00:1A:7D:DA:71:10
 
 die() {
@@ -86,7 +87,7 @@ part_adapters() {
 part_discovery() {
     start find_devices 1000
     expect "found $headset  -[0-9]+ dBm  Kestrine Headset" "found $phone  -[0-9]+ dBm  Phone" \
-        "gone  $passing"
+        "gone  $speaker"
     stop 0
     called 1 StopDiscovery
     check 0 "found .*" find_devices 1 # ends by itself

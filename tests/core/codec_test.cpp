@@ -86,27 +86,11 @@ TEST(CodecTest, ValuesAreFoundByExactNameTheFirstFirst) {
     EXPECT_EQ(find(&twice, "a"), "1");
 }
 
-TEST(CodecTest, EntriesAreSplitAtTheFirstColonAndTrimmed) {
-    const std::tuple<const char*, const char*, const char*> cases[] = {
-        {"k: v: w", "k", "v: w"},
-        {":v", "", "v"},
-        {"z:", "z", ""},
-        {" \t\n\v\f\r a b \t: \v 1 2 \r\n", "a b", "1 2"},
-        {":", "", ""},
-        {"n: -60", "n", "-60"}};
-    for (const auto& [item, name, value] : cases) {
-        const std::unique_ptr<DictEntry> entry(stringToEntry(item));
-        ASSERT_TRUE(entry) << item;
-        EXPECT_EQ(entry->first, name);
-        ASSERT_EQ(entry->second.which(), 3);
-        EXPECT_EQ(boost::get<std::string>(entry->second), value);
-    }
-    EXPECT_EQ(stringToEntry("nocolon"), nullptr);
-    EXPECT_EQ(stringToEntry(""), nullptr);
-}
-
-TEST(CodecTest, OnlyTerminatedItemsWithAColonAreParsed) {
-    const std::tuple<const char*, const char*, const char*> cases[] = {
+TEST(CodecTest, OnlyTerminatedItemsWithAColonAreParsedSplitAtTheFirstAndTrimmed) {
+    const std::tuple<std::string, const char*, std::string> cases[] = {
+        {"k: v: w;", ";", "k=v: w;"},
+        {":v;z:;:;", ";", "=v;z=;=;"},
+        {" \t\n\v\f\r a b \t: \v 1 2 \r\n;", ";", "a b=1 2;"},
         {"a: 1;b: 2", ";", "a=1;"},
         {"a: 1", ";", "null"},
         {";;", ";", "null"},
@@ -116,11 +100,17 @@ TEST(CodecTest, OnlyTerminatedItemsWithAColonAreParsed) {
         {"  x : y ;junk;z:;", ";", "x=y;z=;"},
         {"a: 1\nb: 2;c: 3|", ";\n", "a=1;b=2;"},
         {";a:1;;a:2;", ";", "a=1;a=2;"},
+        {std::string("a: \0x;", 6), ";", std::string("a=\0x;", 5)},
     };
     for (const auto& [input, separators, result] : cases)
         EXPECT_EQ(parsed(input, separators), result) << input;
-    const std::string withNul("a: \0x;", 6);
-    EXPECT_EQ(parsed(withNul, ";"), std::string("a=\0x;", 5));
+
+    const std::unique_ptr<DictEntry> entry(stringToEntry("n: -60"));
+    ASSERT_TRUE(entry);
+    EXPECT_EQ(entry->first, "n");
+    EXPECT_TRUE(entry->second == text("-60"));
+    EXPECT_EQ(stringToEntry("nocolon"), nullptr);
+    EXPECT_EQ(stringToEntry(""), nullptr);
 }
 
 } // namespace Bluetooth::Test
