@@ -61,7 +61,7 @@ Subscriptions::Walk<Callback>::Walk(DBusMessage* signal)
 }
 
 template <class Callback>
-Subscriptions::Walk<Callback>::~Walk() {
+void Subscriptions::Walk<Callback>::leave() {
     endCall();
     Walk** link = &m_kind.walks;
     while (*link != this)

@@ -111,7 +111,7 @@ class Subscriptions::Walk {
 public:
     /// @param signal anything else matches nothing, null too
     explicit Walk(DBusMessage* signal);
-    ~Walk();
+    ~Walk() { leave(); }
     Walk(const Walk&) = delete;
     Walk& operator=(const Walk&) = delete;
 
@@ -126,6 +126,7 @@ private:
 
     bool matches(const SignalHandler<Callback>& record) const;
     void endCall();
+    void leave();
 
     std::unique_lock<std::mutex> m_lock; // not held while a callback runs
     Kind<Callback>& m_kind;
