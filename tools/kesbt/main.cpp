@@ -1,6 +1,7 @@
 // kesbt: works with Bluetooth from the command line, through BlueZ 4's bluetoothd.
 
 #include "command/command_line.h"
+#include "daemon/objects.h"
 #include "show/failure.h"
 #include "show/output.h"
 #include "show/text.h"
@@ -29,7 +30,7 @@ void checkDescriptors() {
 
 void run(int argc, char** argv) {
 #define KESBT_ENTRY(name) &name##Verb,
-    CommandLine({KESBT_VERBS(KESBT_ENTRY)}).run(argc, argv);
+    CommandLine({KESBT_VERBS(KESBT_ENTRY)}, adapterNames).run(argc, argv);
 #undef KESBT_ENTRY
     flushOutput();
 }

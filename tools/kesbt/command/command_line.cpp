@@ -3,6 +3,7 @@
 #include "command/usage.h"
 #include "show/text.h"
 
+#include <iostream>
 #include <sstream>
 
 namespace Kesbt {
@@ -25,7 +26,7 @@ std::string checkAdapter(const std::string& text) {
 
 } // namespace
 
-CommandLine::CommandLine(const std::vector<const Verb*>& verbs)
+CommandLine::CommandLine(const std::vector<const Verb*>& verbs, Offer adapters)
     : m_program("Works with Bluetooth through bluetoothd (BlueZ 4).", "kesbt") {
     m_program.fallthrough(); // global options may stand behind the verb too
     m_program.require_subcommand(1);
@@ -34,12 +35,16 @@ CommandLine::CommandLine(const std::vector<const Verb*>& verbs)
     m_program.get_formatter()->label("SUBCOMMAND", "VERB ...");
     m_program.footer("kesbt VERB --help tells more about a verb and gives examples.\n"
                      "Exit status: 0 success, 1 failure, 2 wrong usage.\n");
-    addOptions();
+    addOptions(adapters);
     for (const Verb* verb : verbs)
         add(*verb);
 }
 
 void CommandLine::run(int argc, const char* const* argv) {
+    if (argc > 1 && argv[1] == std::string("--complete")) {
+        printCompletions({argv + 2, argv + argc});
+        return;
+    }
     try {
         m_program.parse(argc, argv);
     } catch (const CLI::ParseError& error) {
@@ -49,11 +54,21 @@ void CommandLine::run(int argc, const char* const* argv) {
     }
 }
 
-void CommandLine::addOptions() {
-    m_program.add_option("--adapter", m_options.adapter, "The adapter: hci0, or its address")
-        ->type_name("ADAPTER")
-        ->transform(addressInCapitals)
-        ->check(checkAdapter);
+void CommandLine::printCompletions(const std::vector<std::string>& words) {
+    try {
+        for (const std::string& word : m_completion.complete(m_program, words))
+            std::cout << printable(word) << '\n';
+    } catch (const Failure&) { // without a daemon there is nothing to offer
+    }
+}
+
+void CommandLine::addOptions(Offer adapters) {
+    const CLI::Option* adapter =
+        m_program.add_option("--adapter", m_options.adapter, "The adapter: hci0, or its address")
+            ->type_name("ADAPTER")
+            ->transform(addressInCapitals)
+            ->check(checkAdapter);
+    m_completion.offer(adapter, [this, adapters](const auto&) { return adapters(m_options); });
     m_program.add_flag("--json", m_options.json,
                        "Results for programs: one document, or one line an event");
     m_program
@@ -83,7 +98,8 @@ void CommandLine::add(const Verb& verb) {
 }
 
 void CommandLine::setAction(CLI::App& app, const Form& form) {
-    app.callback([this, &app, limit = form.limit, action = form.build({app, m_options})] {
+    app.callback([this, &app, limit = form.limit,
+                  action = form.build({app, m_options, m_completion})] {
         if (app.get_subcommands().empty()) // otherwise the word behind the verb tells what to do
             m_options.limit.run(limit, action);
     });

@@ -3,6 +3,7 @@
 
 #include "command/verb.h"
 
+#include <string>
 #include <vector>
 
 namespace Kesbt {
@@ -10,19 +11,22 @@ namespace Kesbt {
 /// The program's command line: the options of every verb, the verbs and the help.
 class CommandLine {
 public:
-    explicit CommandLine(const std::vector<const Verb*>& verbs);
+    /// @param adapters what is offered for --adapter
+    CommandLine(const std::vector<const Verb*>& verbs, Offer adapters);
 
     /// Runs the verb that is named, within the limit that it declares. A Failure when the words
-    /// cannot be meant so, or the verb fails.
+    /// cannot be meant so, or the verb fails. Hidden: behind "--complete" the words are completed.
     void run(int argc, const char* const* argv);
 
 private:
-    void addOptions();
+    void addOptions(Offer adapters);
+    void printCompletions(const std::vector<std::string>& words);
     void add(const Verb& verb);
     void setAction(CLI::App& app, const Form& form);
 
     Options m_options;
     CLI::App m_program;
+    Completion m_completion;
 };
 
 } // namespace Kesbt

@@ -12,24 +12,28 @@ Build noArguments(void (*action)(const Options&)) {
     };
 }
 
-Build oneDevice(DeviceAction action) {
-    return [action](const Syntax& syntax) {
-        return [action, &options = syntax.options, address = addAddress(syntax)] {
+Build oneDevice(DeviceAction action, Offer offer) {
+    return [action, offer](const Syntax& syntax) {
+        return [action, &options = syntax.options, address = addAddress(syntax, offer)] {
             action(options, *address);
         };
     };
 }
 
-std::shared_ptr<std::string> addAddress(const Syntax& syntax) {
+std::shared_ptr<std::string> addAddress(const Syntax& syntax, Offer offer) {
     auto address = std::make_shared<std::string>();
-    syntax.app.add_option("ADDRESS", *address, "The device, e.g. 00:11:22:33:44:55")
-        ->required()
-        ->type_name("")
-        ->transform(addressInCapitals)
-        ->check([](const std::string& text) {
-            return isAddress(text) ? std::string()
-                                   : quoted(text) + " is no address such as 00:11:22:33:44:55";
-        });
+    const CLI::Option* argument =
+        syntax.app.add_option("ADDRESS", *address, "The device, e.g. 00:11:22:33:44:55")
+            ->required()
+            ->type_name("")
+            ->transform(addressInCapitals)
+            ->check([](const std::string& text) {
+                return isAddress(text) ? std::string()
+                                       : quoted(text) + " is no address such as 00:11:22:33:44:55";
+            });
+    if (offer)
+        syntax.completion.offer(
+            argument, [offer, &options = syntax.options](const auto&) { return offer(options); });
     return address;
 }
 

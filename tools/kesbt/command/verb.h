@@ -1,6 +1,7 @@
 #ifndef KESBT_COMMAND_VERB_H
 #define KESBT_COMMAND_VERB_H
 
+#include "command/completion.h"
 #include "command/options.h"
 
 #include <CLI/CLI.hpp>
@@ -17,6 +18,7 @@ namespace Kesbt {
 struct Syntax {
     CLI::App& app;
     const Options& options;
+    Completion& completion;
 };
 
 /// What a form of a verb does once the command line is parsed.
@@ -45,14 +47,17 @@ struct Verb {
     std::vector<Form> forms;
 };
 
+/// What can be offered for an argument, e.g. knownDevices(); it may ask the daemon.
+using Offer = std::vector<std::string> (*)(const Options&);
+
 /// Forms that take nothing, or a device.
 Build noArguments(void (*action)(const Options&));
 using DeviceAction = void (*)(const Options&, const std::string& address);
-Build oneDevice(DeviceAction action);
+Build oneDevice(DeviceAction action, Offer offer = nullptr);
 
 /// Arguments that several verbs have. What is returned holds the value once the command line is
 /// parsed; actions keep it alive by copying it.
-std::shared_ptr<std::string> addAddress(const Syntax& syntax);
+std::shared_ptr<std::string> addAddress(const Syntax& syntax, Offer offer = nullptr);
 std::shared_ptr<double> addSeconds(const Syntax& syntax, const std::string& name,
                                    const std::string& description);
 

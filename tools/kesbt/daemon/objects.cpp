@@ -4,6 +4,7 @@
 #include "show/table.h"
 #include "show/text.h"
 
+#include <bluetooth/adapter_list.h>
 #include <bluetooth/commandlib.h>
 
 #include <cstdlib>
@@ -20,6 +21,16 @@ std::string addressOf(const Device& device) {
     const std::unique_ptr<char, decltype(&std::free)> address(
         Bluetooth::getAddressFromPath(device.getPath()), std::free);
     return address ? address.get() : "";
+}
+
+template <class List, class Name>
+std::vector<std::string> namesOf(const List& objects, const Name& name) {
+    std::vector<std::string> names;
+    for (const auto* object : objects) {
+        if (object)
+            names.push_back(name(*object));
+    }
+    return names;
 }
 
 } // namespace
@@ -49,6 +60,20 @@ std::unique_ptr<Adapter> openAdapter(Manager& manager, const Options& options) {
 
 std::unique_ptr<Adapter> openAdapter(const Options& options) {
     return openAdapter(*openManager(), options);
+}
+
+std::vector<std::string> adapterNames(const Options&) {
+    const auto manager = openManager();
+    const std::unique_ptr<Bluetooth::AdapterList> adapters(
+        withinLimit([&manager] { return manager->listAdapters(); }));
+    return adapters ? namesOf(*adapters, adapterName) : std::vector<std::string>();
+}
+
+std::vector<std::string> knownDevices(const Options& options) {
+    const auto adapter = openAdapter(options);
+    const std::unique_ptr<Bluetooth::DeviceList> devices(
+        withinLimit([&adapter] { return adapter->listDevices(); }));
+    return devices ? namesOf(*devices, addressOf) : std::vector<std::string>();
 }
 
 std::string defaultAdapterPath(Manager& manager) {

@@ -12,6 +12,7 @@
 
 #include <memory>
 #include <string>
+#include <vector>
 
 /// @file
 /// The daemon's objects as the verbs need them: there, or a Failure that says what to do.
@@ -24,6 +25,10 @@ std::unique_ptr<Bluetooth::Manager> openManager();
 std::unique_ptr<Bluetooth::Adapter> openAdapter(const Options& options);
 std::unique_ptr<Bluetooth::Adapter> openAdapter(Bluetooth::Manager& manager,
                                                 const Options& options);
+
+/// What can be offered where an adapter or a known device of the chosen adapter is to be named.
+std::vector<std::string> adapterNames(const Options& options);
+std::vector<std::string> knownDevices(const Options& options);
 
 /// The path of the daemon's default adapter; "" without one.
 std::string defaultAdapterPath(Bluetooth::Manager& manager);

@@ -8,10 +8,27 @@
 #include <bluetooth/commandlib.h>
 
 #include <cstdlib>
+#include <vector>
 
 namespace Kesbt {
 
 namespace {
+
+std::vector<std::string> capabilities() {
+    using Bluetooth::Agent;
+    return {Agent::PSZ_DISPLAY_YES_NO, Agent::PSZ_DISPLAY_ONLY, Agent::PSZ_KEYBOARD_ONLY,
+            Agent::PSZ_NO_INPUT_NO_OUTPUT};
+}
+
+std::string checkCapability(const std::string& text) {
+    std::string all;
+    for (const std::string& known : capabilities()) {
+        if (text == known)
+            return "";
+        all.append(all.empty() ? "" : ", ").append(known);
+    }
+    return quoted(text) + " is none of " + all;
+}
 
 std::string checkPin(const std::string& text) {
     constexpr std::size_t longest = 16;
@@ -50,21 +67,14 @@ std::shared_ptr<AgentSettings> addAgentOptions(const Syntax& syntax) {
                     "The answer to a request for a PIN code or a\npasskey (default: 5820)")
         ->type_name("TEXT")
         ->check(checkPin);
-    syntax.app
-        .add_option("--capability", settings->capability,
-                    "What this side can do: DisplayYesNo (default),\nDisplayOnly, KeyboardOnly or "
-                    "NoInputNoOutput")
-        ->type_name("NAME")
-        ->check([](const std::string& text) {
-            using Bluetooth::Agent;
-            for (const char* known : {Agent::PSZ_DISPLAY_YES_NO, Agent::PSZ_DISPLAY_ONLY,
-                                      Agent::PSZ_KEYBOARD_ONLY, Agent::PSZ_NO_INPUT_NO_OUTPUT}) {
-                if (text == known)
-                    return std::string();
-            }
-            return quoted(text) + " is none of DisplayYesNo, DisplayOnly, KeyboardOnly, "
-                                  "NoInputNoOutput";
-        });
+    const CLI::Option* capability =
+        syntax.app
+            .add_option("--capability", settings->capability,
+                        "What this side can do: DisplayYesNo (default),\nDisplayOnly, KeyboardOnly "
+                        "or NoInputNoOutput")
+            ->type_name("NAME")
+            ->check(checkCapability);
+    syntax.completion.offer(capability, [](const auto&) { return capabilities(); });
     syntax.app.add_option("--delay", settings->delay, "Wait so long before each answer")
         ->type_name("SECONDS")
         ->check([](const std::string& text) {

@@ -71,6 +71,17 @@ std::size_t columns(const std::string& text) {
     }));
 }
 
+std::string wrapped(std::string text, std::size_t width) {
+    for (std::size_t begin = 0; text.size() - begin > width;) {
+        const std::size_t blank = text.rfind(' ', begin + width);
+        if (blank == std::string::npos || blank < begin)
+            break;
+        text[blank] = '\n';
+        begin = blank + 1;
+    }
+    return text;
+}
+
 std::string padded(const std::string& text, std::size_t width) {
     const std::size_t length = columns(text);
     return text + std::string(length < width ? width - length : 0, ' ');

@@ -16,6 +16,9 @@ std::string printable(const std::string& text);
 /// How many columns a text takes on a terminal, with one for each character.
 std::size_t columns(const std::string& text);
 
+/// With line breaks in place of blanks, so that no line is wider where words allow it.
+std::string wrapped(std::string text, std::size_t width);
+
 /// The text with blanks after it, at least so many columns wide.
 std::string padded(const std::string& text, std::size_t width);
 

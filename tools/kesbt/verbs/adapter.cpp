@@ -13,6 +13,18 @@ namespace {
 
 using Bluetooth::Variant;
 
+/// What the daemon lets be set, for the help and for completion.
+struct Settable {
+    const char* name;
+    bool isBoolean;
+};
+constexpr Settable settable[] = {{"Name", false},
+                                 {"Powered", true},
+                                 {"Discoverable", true},
+                                 {"Pairable", true},
+                                 {"DiscoverableTimeout", false},
+                                 {"PairableTimeout", false}};
+
 constexpr std::size_t longestName = 248; // bytes; the controller cuts what is longer
 
 void showAdapter(const Options& options) {
@@ -124,17 +136,46 @@ void setProperty(const Options& options, const std::string& givenName,
                   << printable(display(now)) << '\n';
 }
 
+std::string settableText() {
+    std::string text = "Can be set:";
+    for (const Settable& property : settable)
+        text.append(&property == settable ? " " : ", ").append(property.name);
+    constexpr std::size_t terminalWidth = 80;
+    return wrapped(text + ". Booleans are true or false, time-outs are seconds.", terminalWidth);
+}
+
+using Words = std::vector<std::string>;
+
+Words propertyNames(const Words&) {
+    Words names;
+    for (const Settable& property : settable)
+        names.emplace_back(property.name);
+    return names;
+}
+
+Words propertyValues(const Words& before) {
+    for (const Settable& property : settable) {
+        if (property.isBoolean && upperCase(property.name) == upperCase(before.front()))
+            return {"true", "false"};
+    }
+    return {};
+}
+
 Action buildSet(const Syntax& syntax) {
     const std::string ofVerb = syntax.app.get_footer(); // as that of the verb alone
-    syntax.app.footer("Can be set: Name, Powered, Discoverable, Pairable, DiscoverableTimeout,\n"
-                      "PairableTimeout. Booleans are true or false, time-outs are seconds.\n\n"
-                      "Examples:\n  kesbt adapter set Powered true\n"
+    syntax.app.footer(settableText() +
+                      "\n\nExamples:\n  kesbt adapter set Powered true\n"
                       "  kesbt --adapter hci1 adapter set Name \"Living room\"\n\n" +
                       ofVerb.substr(ofVerb.rfind("\n\n") + 2));
     auto name = std::make_shared<std::string>();
     auto value = std::make_shared<std::string>();
-    syntax.app.add_option("NAME", *name, "The property, e.g. Powered")->required()->type_name("");
-    syntax.app.add_option("VALUE", *value, "Its new value")->required()->type_name("");
+    const auto add = [&syntax](const char* argument, std::string& text, const char* what,
+                               const Choices& choices) {
+        syntax.completion.offer(
+            syntax.app.add_option(argument, text, what)->required()->type_name(""), choices);
+    };
+    add("NAME", *name, "The property, e.g. Powered", propertyNames);
+    add("VALUE", *value, "Its new value", propertyValues);
     return [&options = syntax.options, name, value] { setProperty(options, *name, *value); };
 }
 

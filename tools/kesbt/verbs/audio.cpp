@@ -90,8 +90,9 @@ const Verb audioVerb = {
     "kesbt audio connect 00:11:22:33:44:55\n"
     "kesbt audio status 00:11:22:33:44:55 --json\n"
     "kesbt audio disconnect 00:11:22:33:44:55",
-    {{"connect", "Connect all audio profiles of a known device", Limit::Steps, oneDevice(connect)},
-     {"disconnect", "Disconnect them", Limit::Steps, oneDevice(disconnect)},
-     {"status", "Show what is connected", Limit::Whole, oneDevice(showStatus)}}};
+    {{"connect", "Connect all audio profiles of a known device", Limit::Steps,
+      oneDevice(connect, knownDevices)},
+     {"disconnect", "Disconnect them", Limit::Steps, oneDevice(disconnect, knownDevices)},
+     {"status", "Show what is connected", Limit::Whole, oneDevice(showStatus, knownDevices)}}};
 
 } // namespace Kesbt

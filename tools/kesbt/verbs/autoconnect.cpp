@@ -41,6 +41,10 @@ void showList(const Options& options) {
     show(options, AutoConnectList(adapter), adapter);
 }
 
+std::vector<std::string> listedDevices(const Options& options) {
+    return AutoConnectList(adapterAddress(options)).devices();
+}
+
 void enable(const Options& options, bool enabled) {
     const std::string adapter = adapterAddress(options);
     AutoConnectList list(adapter);
@@ -124,8 +128,9 @@ const Verb autoconnectVerb = {
       noArguments([](const Options& options) { enable(options, true); })},
      {"disable", "Connect none of them automatically; the list stays", Limit::Steps,
       noArguments([](const Options& options) { enable(options, false); })},
-     {"add", "Put a device into the adapter's list", Limit::Steps, oneDevice(addDevice)},
-     {"remove", "Take a device out of it", Limit::Steps, oneDevice(removeDevice)},
+     {"add", "Put a device into the adapter's list", Limit::Steps,
+      oneDevice(addDevice, knownDevices)},
+     {"remove", "Take a device out of it", Limit::Steps, oneDevice(removeDevice, listedDevices)},
      {"list", "Show the listed devices that the adapter knows;\nothers leave an enabled list",
       Limit::Whole, noArguments(listKnown)},
      {"targets", "Show all devices that are to be connected, of all adapters", Limit::Whole,

@@ -17,6 +17,6 @@ const Verb deviceVerb = {"device",
                          "Show a known device's properties",
                          "kesbt device 00:11:22:33:44:55\n"
                          "kesbt device 00:11:22:33:44:55 --json",
-                         {{Limit::Whole, oneDevice(showDevice)}}};
+                         {{Limit::Whole, oneDevice(showDevice, knownDevices)}}};
 
 } // namespace Kesbt

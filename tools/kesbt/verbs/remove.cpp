@@ -34,6 +34,6 @@ const Verb removeVerb = {"remove",
                          "Devices",
                          "Forget a device and its pairing",
                          "kesbt remove 00:11:22:33:44:55",
-                         {{Limit::Steps, oneDevice(removeDevice)}}};
+                         {{Limit::Steps, oneDevice(removeDevice, knownDevices)}}};
 
 } // namespace Kesbt

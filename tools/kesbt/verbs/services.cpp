@@ -57,7 +57,7 @@ void listServices(const Options& options, const std::string& address, const std:
 }
 
 Action build(const Syntax& syntax) {
-    const auto address = addAddress(syntax);
+    const auto address = addAddress(syntax, knownDevices);
     auto pattern = std::make_shared<std::string>();
     syntax.app
         .add_option("PATTERN", *pattern,

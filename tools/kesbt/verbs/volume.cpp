@@ -59,12 +59,13 @@ void makeQuieter(const Options& options, const std::string& address) {
 
 } // namespace
 
-const Verb volumeVerb = {"volume",
-                         "Audio",
-                         "Press a connected headset's volume key",
-                         "kesbt volume up 00:11:22:33:44:55\n"
-                         "kesbt volume down 00:11:22:33:44:55",
-                         {{"up", "Make it louder", Limit::Steps, oneDevice(makeLouder)},
-                          {"down", "Make it quieter", Limit::Steps, oneDevice(makeQuieter)}}};
+const Verb volumeVerb = {
+    "volume",
+    "Audio",
+    "Press a connected headset's volume key",
+    "kesbt volume up 00:11:22:33:44:55\n"
+    "kesbt volume down 00:11:22:33:44:55",
+    {{"up", "Make it louder", Limit::Steps, oneDevice(makeLouder, knownDevices)},
+     {"down", "Make it quieter", Limit::Steps, oneDevice(makeQuieter, knownDevices)}}};
 
 } // namespace Kesbt

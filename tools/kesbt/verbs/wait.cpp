@@ -112,8 +112,9 @@ const Verb waitVerb = {
     "kesbt --adapter hci1 wait powered",
     {{"found", "Until a device is within reach (with a discovery)", Limit::OnlyGiven,
       oneDevice(awaitFound)},
-     {"connected", "Until a device is connected", Limit::OnlyGiven, oneDevice(awaitConnected)},
-     {"paired", "Until a device is paired", Limit::OnlyGiven, oneDevice(awaitPaired)},
+     {"connected", "Until a device is connected", Limit::OnlyGiven,
+      oneDevice(awaitConnected, knownDevices)},
+     {"paired", "Until a device is paired", Limit::OnlyGiven, oneDevice(awaitPaired, knownDevices)},
      {"powered", "Until the adapter is on", Limit::OnlyGiven, noArguments(awaitPower)}}};
 
 } // namespace Kesbt
