@@ -75,9 +75,9 @@ protected:
 
 TEST_F(AutoConnectDaemonTest, ConnectsAtStartBySinkOrAllAudio) {
     setConfig(adapter0, "1,"s + headset + "," + carKit + "," + keyboard);
-    setConfig(adapter1, "1,"s + speaker);
+    setConfig(adapter1, "1,"s + otherDevice);
     Daemon daemon;
-    for (const char* device : {headset, carKit, speaker}) {
+    for (const char* device : {headset, carKit, otherDevice}) {
         const std::string connected = device + " connected"s;
         EXPECT_TRUE(daemon.count(connected) || daemon.waitFor(connected)) << device;
     }
@@ -94,7 +94,7 @@ TEST_F(AutoConnectDaemonTest, ADeviceThatIsAwayIsConnectedWhenItAppears) {
     EXPECT_TRUE(daemon.waitFor("connecting "s + headset));
     simulation.setDevice(headset, "Connectable", true);
     EXPECT_TRUE(daemon.waitFor(headsetConnected));
-    simulation.control("DropLink", [&](Writer& w) { w("hci0")(headset); });
+    simulation.control("DropLink", with("hci0", headset));
     EXPECT_TRUE(daemon.waitFor(headset + " disconnected"s));
     EXPECT_TRUE(daemon.waitFor(headsetConnected)) << "and again when it comes back";
     EXPECT_EQ(daemon.stop(SIGINT), 0);
@@ -146,14 +146,14 @@ TEST_F(AutoConnectDaemonTest, FollowsTheBluetoothDaemonAndItsAdapters) {
     EXPECT_TRUE(daemon.waitFor(headsetConnected));
 
     setConfig(adapter0, "0");
-    setConfig(adapter1, "1,"s + speaker);
-    simulation.control("RemoveAdapter", [](Writer& w) { w("hci1"); });
+    setConfig(adapter1, "1,"s + otherDevice);
+    simulation.control("RemoveAdapter", with("hci1"));
     EXPECT_TRUE(autoConnect.reload());
     simulation.control("Restart"); // every path is new
     simulation.control("AddAdapter", [](Writer& w) {
         w.dict("sv", [](Writer& e) { e.entry("Address", Var{std::string(adapter1)}); });
     });
-    EXPECT_TRUE(daemon.waitFor(speaker + " connected"s));
+    EXPECT_TRUE(daemon.waitFor(otherDevice + " connected"s));
 }
 
 TEST_F(AutoConnectDaemonTest, GoesIntoTheBackgroundOnceItIsReady) {

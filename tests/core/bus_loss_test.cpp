@@ -34,7 +34,7 @@ protected:
     void restartBus() {
         bus.start();
         again = std::make_unique<RawPeer>(bus.address(), peerName);
-        again->reply("Ask", [](Writer& w) { w("again"); });
+        again->reply("Ask", with("again"));
     }
 
     std::unique_ptr<RawPeer> again;
@@ -72,7 +72,7 @@ TEST_F(BusLossTest, TheLoopNeitherSpinsNorHangsAndSubscriptionsCanBeMadeAnew) {
     auto subscribed = std::make_unique<RemoteObject>(peerName, peerPath, peerInterface, busType);
     ASSERT_EQ(subscribed->setSignalHandlerString("Changed", onString), 0);
     ASSERT_EQ(loop.startLoop(), 0);
-    peer.emit(peerPath, peerInterface, "Changed", [](Writer& w) { w("before"); });
+    peer.emit(peerPath, peerInterface, "Changed", with("before"));
     ASSERT_TRUE(seen().waitFor(1));
     bus.kill();
     EXPECT_EQ(call("Ask"), -1);
@@ -89,7 +89,7 @@ TEST_F(BusLossTest, TheLoopNeitherSpinsNorHangsAndSubscriptionsCanBeMadeAnew) {
     ASSERT_EQ(renewed.setSignalHandlerString("Changed", onString), 0);
     {
         const RunningLoop running(renewed); // a thread for the new connection, beside the old one
-        again->emit(peerPath, peerInterface, "Changed", [](Writer& w) { w("after"); });
+        again->emit(peerPath, peerInterface, "Changed", with("after"));
         ASSERT_TRUE(seen().waitFor(2));
     }
     EXPECT_EQ(seen().events(),

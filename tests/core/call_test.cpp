@@ -143,7 +143,7 @@ TEST_F(CallTest, AFailedCallRecordsTheServicesOwnText) {
 }
 
 TEST_F(CallTest, CallsWithoutReplyAreWrittenAtOnceAndLeaveNoReply) {
-    peer.reply("Ask", [](Writer& w) { w("old"); });
+    peer.reply("Ask", with("old"));
     peer.reply("Take");
     ASSERT_EQ(call("Ask"), 0);
     ASSERT_EQ(proxy.newMessage("Take"), 0);
@@ -158,9 +158,8 @@ TEST_F(CallTest, CallsWithoutReplyAreWrittenAtOnceAndLeaveNoReply) {
 }
 
 TEST_F(CallTest, TimeOutsAreKeptAndALateReplyIsNobodys) {
-    peer.reply(
-        "Slow", [](Writer& w) { w("late"); }, Milliseconds(400));
-    peer.reply("Quick", [](Writer& w) { w("mine"); });
+    peer.reply("Slow", with("late"), Milliseconds(400));
+    peer.reply("Quick", with("mine"));
     const auto begin = std::chrono::steady_clock::now();
     EXPECT_EQ(outcome(call("Slow", 100)).substr(0, 29), "-1 11 Did not receive a reply");
     EXPECT_GE(std::chrono::steady_clock::now() - begin, Milliseconds(100));

@@ -17,7 +17,7 @@ using Clock = std::chrono::steady_clock;
 MessagePtr echo(DBusMessage* call) {
     const char* text = "";
     dbus_message_get_args(call, nullptr, DBUS_TYPE_STRING, &text, DBUS_TYPE_INVALID);
-    return replyTo(call, [text](Writer& w) { w(text); });
+    return replyTo(call, with(text));
 }
 
 struct Echoes {
@@ -89,8 +89,7 @@ TEST_F(ConcurrencyTest, NoReplyAndNoSignalIsLostWhenFourThreadsCallAndCallbacksC
     std::thread emitter([&] {
         do {
             for (int i = 0; i < signalsPerBurst; ++i, ++emitted)
-                source.emit(peerPath, peerInterface, "Number",
-                            [&](Writer& w) { w(std::to_string(emitted)); });
+                source.emit(peerPath, peerInterface, "Number", with(std::to_string(emitted)));
         } while (!callsDone.wait(Milliseconds(5)));
     });
     inThreads(4, [](int caller) {

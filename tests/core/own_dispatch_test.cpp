@@ -11,7 +11,7 @@ namespace Bluetooth::Test {
 class OwnDispatchTest : public LoopTest {
 protected:
     OwnDispatchTest() {
-        peer.reply("Ask", [](Writer& w) { w("answer"); });
+        peer.reply("Ask", with("answer"));
         peer.reply("Take");
     }
 
@@ -69,7 +69,7 @@ TEST_F(OwnDispatchTest, CallsAndSignalsOfOtherThreadsAreNotLostToIt) {
         RemoteObject object(peerName, peerPath, peerInterface, busType);
         for (int i = 0; i < count; ++i) {
             EXPECT_EQ(ask(object, "Ask"), "answer");
-            peer.emit(peerPath, peerInterface, "Changed", [i](Writer& w) { w(std::to_string(i)); });
+            peer.emit(peerPath, peerInterface, "Changed", with(std::to_string(i)));
         }
         callsDone = true;
     });

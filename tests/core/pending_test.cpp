@@ -25,7 +25,7 @@ class PendingTest : public LoopTest {
 protected:
     PendingTest() {
         // The first call installs the handlers: no interruption of the tests ends the process.
-        peer.reply("Quick", [](Writer& w) { w("now"); });
+        peer.reply("Quick", with("now"));
         EXPECT_EQ(callPending("Quick"), 0);
         peer.forgetCalls();
     }
@@ -80,8 +80,7 @@ protected:
 };
 
 TEST_F(PendingTest, TheReplyIsHeldWhateverItIs) {
-    peer.reply(
-        "Pair", [](Writer& w) { w(Path{"/dev"}); }, Milliseconds(150));
+    peer.reply("Pair", with(Path{"/dev"}), Milliseconds(150));
     ObjectPath path;
     EXPECT_EQ(callPending("Pair"), 0);
     EXPECT_EQ(proxy.getReplyValue(path), 0);
@@ -122,7 +121,7 @@ TEST_F(PendingTest, ALateReplyAfterAnInterruptionChangesNothing) {
         peer.forgetCalls();
         MessagePtr late;
         peer.handle("Slow", [&](DBusMessage* request) {
-            late = replyTo(request, [](Writer& w) { w("late"); });
+            late = replyTo(request, with("late"));
             return MessagePtr();
         });
         const auto interrupter = onceSlowWaits([signal = number] { kill(getpid(), signal); });
@@ -137,7 +136,7 @@ TEST_F(PendingTest, ALateReplyAfterAnInterruptionChangesNothing) {
             "Next",
             [&](DBusMessage* request) {
                 peer.send(std::move(late));
-                return replyTo(request, [](Writer& w) { w("mine"); });
+                return replyTo(request, with("mine"));
             },
             Milliseconds(50));
         EXPECT_EQ(textFrom("Next"), "mine");

@@ -212,7 +212,7 @@ TEST_F(SignalTest, SignalsThatComeBeforeTheLoopStartsAreDelivered) {
 TEST_F(SignalTest, CallbacksMayCallAndSubscribe) {
     static std::unique_ptr<RemoteObject> inner;
     inner = std::make_unique<RemoteObject>(peerName, "/inner", peerInterface, busType);
-    peer.reply("Ask", [](Writer& w) { w("answer"); });
+    peer.reply("Ask", with("answer"));
     ASSERT_EQ(proxy.setSignalHandlerString("Changed",
                                            [](RemoteObject*, const char* text) {
                                                seen().add(text + (" " + ask(*inner, "Ask")));

@@ -2,6 +2,7 @@
 #define KESBLUETOOTH_TESTS_AUTO_CONNECT_FIXTURE_H
 
 #include "host/namespace_test.h"
+#include "support/devices.h"
 #include "support/simulation.h"
 
 #include <bluetooth/auto_connect.h>
@@ -10,13 +11,10 @@ namespace Bluetooth::Test {
 
 inline constexpr const char* adapter0 = "00:1A:7D:DA:71:10";
 inline constexpr const char* adapter1 = "00:1A:7D:DA:71:11";
-inline constexpr const char* headset = "00:11:22:33:44:01";  // hci0, with a sink
-inline constexpr const char* carKit = "00:11:22:33:44:02";   // hci0, without a sink
-inline constexpr const char* keyboard = "00:11:22:33:44:03"; // hci0, no audio
-inline constexpr const char* speaker = "00:11:22:33:44:04";  // hci1, with a sink
 inline constexpr const char* stranger = "DE:AD:BE:EF:00:01"; // known to none
 
-/// The simulated daemon knows four devices; there are no lists of devices to connect yet.
+/// The simulated daemon knows four devices, of which the headset and the other device have a sink
+/// and the keyboard has no audio; there are no lists of devices to connect yet.
 class AutoConnectFixture : public NamespaceTest {
 protected:
     AutoConnectFixture() {
@@ -36,9 +34,9 @@ protected:
     Simulation simulation{
         "[Adapter hci0]\nAddress=00:1A:7D:DA:71:10\n[Adapter hci1]\nAddress=00:1A:7D:DA:71:11\n"
         "[Device 00:11:22:33:44:01]\nAdapter=hci0\nKnown=true\nUUIDs=110b;110e\n"
-        "[Device 00:11:22:33:44:02]\nAdapter=hci0\nKnown=true\nUUIDs=1108;111e\n"
-        "[Device 00:11:22:33:44:03]\nAdapter=hci0\nKnown=true\nUUIDs=1124\n"
-        "[Device 00:11:22:33:44:04]\nAdapter=hci1\nKnown=true\nUUIDs=110b\n"};
+        "[Device 00:11:22:33:44:08]\nAdapter=hci0\nKnown=true\nUUIDs=1108;111e\n"
+        "[Device 00:11:22:33:44:02]\nAdapter=hci0\nKnown=true\nUUIDs=1124\n"
+        "[Device 00:11:22:33:44:66]\nAdapter=hci1\nKnown=true\nUUIDs=110b\n"};
     AutoConnect autoConnect;
 };
 

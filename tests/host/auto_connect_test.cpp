@@ -16,7 +16,7 @@ namespace {
 using namespace std::string_literals;
 
 const std::string unknownLine = "adapter.cpp Does Not Exist";
-const Texts both{"hci0/01", "hci0/02"};
+const Texts both{"hci0/01", "hci0/08"};
 
 /// The devices' adapters with the last part of their addresses, e.g. "hci0/01".
 Texts namesOf(DeviceList* list) {
@@ -47,8 +47,8 @@ protected:
 };
 
 TEST_F(AutoConnectTest, ListsKnownDevicesAndPrunesStaleEntriesOfAnEnabledList) {
-    setConfig(adapter0,
-              "1,"s + headset + "," + stranger + "," + carKit + ",," + speaker + "," + stranger);
+    setConfig(adapter0, "1,"s + headset + "," + stranger + "," + carKit + ",," + otherDevice + "," +
+                            stranger);
     EXPECT_EQ(listOf(adapter0), both) << "in the file's order";
     EXPECT_EQ(config(adapter0), "1,"s + headset + "," + carKit);
     EXPECT_EQ(pipe.take(), "1111") << "one for each stale entry";
@@ -94,19 +94,19 @@ TEST_F(AutoConnectTest, FailuresOfGetDeviceListAreLogged) {
 
 TEST_F(AutoConnectTest, TargetsAreThoseOfPoweredAndEnabledAdapters) {
     setConfig(adapter0, "1,"s + headset + "," + stranger);
-    setConfig(adapter1, "1,"s + speaker);
-    EXPECT_EQ(targets(), (Texts{"hci0/01", "hci1/04"}));
+    setConfig(adapter1, "1,"s + otherDevice);
+    EXPECT_EQ(targets(), (Texts{"hci0/01", "hci1/66"}));
     EXPECT_EQ(config(adapter0), "1,"s + headset);
     EXPECT_EQ(pipe.take(), "1");
     EXPECT_EQ(log.take(), Texts{unknownLine});
 
     for (const char* noFlag : {"0,", "2,", "x,", ""}) {
         setConfig(adapter0, std::string(noFlag) + headset);
-        EXPECT_EQ(targets(), Texts{"hci1/04"}) << noFlag;
+        EXPECT_EQ(targets(), Texts{"hci1/66"}) << noFlag;
     }
     setConfig(adapter0, "111:22,"s + headset);
     EXPECT_TRUE(autoConnect.getEnable(adapter0)) << "a number is not 0 ...";
-    EXPECT_EQ(targets(), Texts{"hci1/04"}) << "... and yet not a flag";
+    EXPECT_EQ(targets(), Texts{"hci1/66"}) << "... and yet not a flag";
 
     setConfig(adapter0, "1,"s + headset);
     power(adapter1, false);
@@ -138,7 +138,7 @@ TEST_F(AutoConnectTest, OnlyWhatTheDaemonDeniesIsPruned) {
           std::pair("Invalid arguments in method call", true), std::pair("Does Not Exist", true)}) {
         setConfig(adapter0, content);
         simulation.failNext("org.bluez.Adapter", "FindDevice", "org.bluez.Error.Any", text);
-        EXPECT_EQ(listOf(adapter0), Texts{"hci0/02"}) << text;
+        EXPECT_EQ(listOf(adapter0), Texts{"hci0/08"}) << text;
         EXPECT_EQ(config(adapter0), isPruned ? "1,"s + carKit : content) << text;
         EXPECT_EQ(pipe.take(), isPruned ? "1" : "") << text;
         EXPECT_EQ(log.take(), Texts{"adapter.cpp "s + text});

@@ -5,40 +5,38 @@ namespace Bluetooth::Test {
 class AdapterVerbs : public KesbtTest {};
 
 TEST_F(AdapterVerbs, AdaptersAreListedAndChosenByNameOrAddress) {
-    const Json adapters = json({"adapters"});
+    const Json adapters = json("adapters");
     ASSERT_EQ(adapters.size(), 2U);
     EXPECT_EQ(adapters[0]["default"], true);
     EXPECT_EQ(adapters[1]["default"], false);
-    EXPECT_EQ(Json::parse(run({"--json", "adapter", "info"}).out)["path"], adapters[0]["path"]);
+    EXPECT_EQ(Json::parse(run("--json adapter info").out)["path"], adapters[0]["path"]);
     for (const char* choice : {"hci1", "00:1A:7D:DA:71:11", "00:1a:7d:da:71:11"})
-        EXPECT_EQ(json({"--adapter", choice, "adapter"})["adapter"], "hci1");
-    EXPECT_EQ(failure({"adapter", "--adapter", "hci9"}),
+        EXPECT_EQ(json("--adapter "s + choice + " adapter")["adapter"], "hci1");
+    EXPECT_EQ(failure("adapter --adapter hci9"),
               "there is no adapter hci9; see which there are: kesbt adapters\n");
 }
 
 TEST_F(AdapterVerbs, SetTellsOldAndNewValueInThePropertysOwnType) {
-    EXPECT_EQ(run({"adapter", "set", "powered", "off"}), (Result{0, "Powered: yes -> no\n", ""}));
-    EXPECT_EQ(run({"adapter", "set", "Powered", "true"}).out, "Powered: no -> yes\n");
-    EXPECT_EQ(run({"adapter", "set", "DiscoverableTimeout", "60"}).out,
-              "DiscoverableTimeout: 180 -> 60\n");
+    EXPECT_EQ(run("adapter set powered off"), (Result{0, "Powered: yes -> no\n", ""}));
+    EXPECT_EQ(run("adapter set Powered true").out, "Powered: no -> yes\n");
+    EXPECT_EQ(run("adapter set DiscoverableTimeout 60").out, "DiscoverableTimeout: 180 -> 60\n");
     EXPECT_EQ(
-        json({"adapter", "set", "Name", "42"}),
+        json("adapter set Name 42"),
         (Json{{"adapter", "hci0"}, {"property", "Name"}, {"old", "kestrine-0"}, {"new", "42"}}));
     EXPECT_EQ(adapterProperties()["Name"], "42");
 }
 
 TEST_F(AdapterVerbs, SetRefusesWhatCannotBeSet) {
     const std::string see = "; see what can be set: kesbt adapter set --help\n";
-    EXPECT_EQ(failure({"adapter", "set", "Address", "x"}),
+    EXPECT_EQ(failure("adapter set Address x"),
               "the daemon does not let Address of hci0 be set to \"x\"" + see);
-    EXPECT_EQ(failure({"adapter", "set", "UUIDs", "x"}),
+    EXPECT_EQ(failure("adapter set UUIDs x"),
               "UUIDs cannot be set; see what can: kesbt adapter set --help\n");
-    EXPECT_EQ(failure({"adapter", "set", "Colour", "red"}),
-              "hci0 has no property \"Colour\"" + see);
-    failure({"adapter", "set", "Powered", "perhaps"}, 2);
-    failure({"adapter", "set", "PairableTimeout", "-1"}, 2);
-    failure({"adapter", "set", "PairableTimeout", "4294967296"}, 2);
-    failure({"adapter", "set", "Name", std::string(249, 'n')}, 2);
+    EXPECT_EQ(failure("adapter set Colour red"), "hci0 has no property \"Colour\"" + see);
+    failure("adapter set Powered perhaps", 2);
+    failure("adapter set PairableTimeout -1", 2);
+    failure("adapter set PairableTimeout 4294967296", 2);
+    failure("adapter set Name "s + std::string(249, 'n'), 2);
     EXPECT_EQ(adapterProperties()["PairableTimeout"], 0);
 }
 
@@ -50,7 +48,7 @@ TEST_F(AdapterVerbs, ACallThatDoesNothingOrIsNotAnsweredIsAFailure) {
     liar.reply("SetProperty");
     liar.reply("GetProperties",
                [](Writer& w) { w.dict("sv", [](Writer& d) { d.entry("Powered", Var{true}); }); });
-    const Texts switchOff = {"--timeout", "0.3", "adapter", "set", "Powered", "off"};
+    const char* const switchOff = "--timeout 0.3 adapter set Powered off";
     EXPECT_EQ(failure(switchOff),
               "Powered of hci0 is still \"yes\" within the time-out; try again or give a longer "
               "--timeout\n");
@@ -60,12 +58,12 @@ TEST_F(AdapterVerbs, ACallThatDoesNothingOrIsNotAnsweredIsAFailure) {
     liar.neverReply("GetProperties");
     EXPECT_EQ(failure(switchOff),
               "no answer within the time-out; try again or give a longer --timeout\n");
-    failure({"adapter", "info", "--timeout", "0.3"});
+    failure("adapter info --timeout 0.3");
 }
 
 TEST_F(AdapterVerbs, NamesFromOutsideCannotControlTheTerminal) {
-    run({"adapter", "set", "Name", "a\x1b[2J\nb\xc3\xa9"});
-    EXPECT_NE(run({"adapters"}).out.find("a\\x1b[2J\\nb\xc3\xa9\n"), std::string::npos);
+    run("adapter set Name a\x1b[2J\nb\xc3\xa9");
+    EXPECT_NE(run("adapters").out.find("a\\x1b[2J\\nb\xc3\xa9\n"), std::string::npos);
     EXPECT_EQ(adapterProperties()["Name"], "a\x1b[2J\nb\xc3\xa9");
 }
 
@@ -81,7 +79,7 @@ TEST_F(AdapterVerbs, ColoursAreForTerminalsOnlyAndNoColorEndsThem) {
     EXPECT_NE(onTerminal("NO_COLOR=").find("\033["), std::string::npos);  // not empty, to count
     EXPECT_EQ(onTerminal("NO_COLOR=1").find("\033["), std::string::npos);
     EXPECT_EQ(onTerminal("TERM=dumb").find("\033["), std::string::npos);
-    EXPECT_EQ(run({"adapters"}).out.find("\033["), std::string::npos);
+    EXPECT_EQ(run("adapters").out.find("\033["), std::string::npos);
 }
 
 } // namespace Bluetooth::Test

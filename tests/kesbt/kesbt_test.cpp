@@ -1,5 +1,7 @@
 #include "kesbt/kesbt_test.h"
 
+#include <sstream>
+
 namespace Bluetooth::Test {
 
 namespace {
@@ -10,29 +12,37 @@ std::unique_ptr<ChildProcess> startCommand(const Texts& command) {
 
 } // namespace
 
-std::unique_ptr<ChildProcess> start(Texts arguments) {
-    arguments.insert(arguments.begin(), KESBT);
-    return startCommand(arguments);
+std::unique_ptr<ChildProcess> start(const std::string& arguments) {
+    Texts command{KESBT};
+    std::istringstream words(arguments);
+    for (std::string word; std::getline(words, word, ' ');)
+        command.push_back(word);
+    return startCommand(command);
 }
 
-Result run(const Texts& arguments) {
+Result run(const std::string& arguments) {
     return start(arguments)->finish();
 }
 
-Json json(Texts arguments) {
-    arguments.emplace_back("--json");
-    return Json::parse(run(arguments).out);
+Json json(const std::string& arguments) {
+    return Json::parse(run(arguments + " --json").out);
 }
 
 Result runShell(const std::string& command) {
     return startCommand({"sh", "-c", command})->finish();
 }
 
-std::string failure(const Texts& arguments, int status) {
+std::string failure(const std::string& arguments, int status) {
     const Result result = run(arguments);
     EXPECT_EQ(result.status, status) << result;
     EXPECT_EQ(result.out, "");
     EXPECT_EQ(result.err.find('\n'), result.err.size() - 1) << result;
+    return result.err;
+}
+
+std::string errorsOf(ChildProcess& program, int status) {
+    const Result result = program.finish();
+    EXPECT_EQ(result.status, status) << result;
     return result.err;
 }
 

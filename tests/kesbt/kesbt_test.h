@@ -18,18 +18,23 @@ using Json = nlohmann::ordered_json;
 inline constexpr const char* absentDaemon =
     "bluetoothd is not running on the system bus; start it, or try: bluez4-sim -- kesbt adapters\n";
 
+using namespace std::string_literals;
+
 /// Starts the program with its output captured.
-std::unique_ptr<ChildProcess> start(Texts arguments);
+/// @param arguments  with a blank between each two
+std::unique_ptr<ChildProcess> start(const std::string& arguments);
 /// Runs it to its end.
-Result run(const Texts& arguments);
+Result run(const std::string& arguments);
 /// Runs it with --json. @return the document that it prints
-Json json(Texts arguments);
+Json json(const std::string& arguments);
 /// Runs something else: a command of the shell.
 Result runShell(const std::string& command);
 
 /// Runs the program, which must fail with this status, one line on standard error and nothing on
 /// standard output. @return the line
-std::string failure(const Texts& arguments, int status = 1);
+std::string failure(const std::string& arguments, int status = 1);
+/// Waits for the end of a started one, with this status. @return what it wrote to standard error
+std::string errorsOf(ChildProcess& program, int status = 1);
 
 /// The next event of a stream for which `member` is `value`.
 Json awaitEvent(ChildProcess& program, const std::string& member, const Json& value);
@@ -47,7 +52,7 @@ protected:
     std::size_t calls(const std::string& member) {
         return simulation.countCalls("s:" + member + " ");
     }
-    static Json adapterProperties() { return json({"adapter"})["properties"]; }
+    static Json adapterProperties() { return json("adapter")["properties"]; }
 
     Simulation simulation;
 };

@@ -10,7 +10,7 @@ protected:
         return "Pairing with " + address + " on hci0 (Ctrl-C stops it)\n";
     }
     static Json pairedProperty(const std::string& address) {
-        return json({"device", address})["properties"]["Paired"];
+        return json("device "s + address)["properties"]["Paired"];
     }
     void comeIn(const char* address) {
         simulation.control("StartIncomingPairing", with("hci0", address));
@@ -18,47 +18,47 @@ protected:
 };
 
 TEST_F(Pairing, APinIsGivenAndAWrongOneFails) {
-    EXPECT_EQ(run({"pair", pinReceiver}),
+    EXPECT_EQ(run("pair "s + pinReceiver),
               (Result{1, "",
                       begun(pinReceiver) +
                           "00:11:22:33:44:04 asks for a PIN code: 5820\n"
                           "cannot pair with 00:11:22:33:44:04: Authentication Failed; check the "
                           "PIN or passkey, and confirm on the device\n"}));
-    const Result paired = run({"pair", pinReceiver, "--pin", "1234", "--json"});
+    const Result paired = run("pair "s + pinReceiver + " --pin 1234 --json");
     EXPECT_EQ(paired.status, 0);
     EXPECT_EQ(paired.err, begun(pinReceiver) + "00:11:22:33:44:04 asks for a PIN code: 1234\n");
     EXPECT_EQ(Json::parse(paired.out)["properties"]["Paired"], true);
-    EXPECT_NE(run({"pair", pinReceiver}).err.find("Already Exists"), std::string::npos);
+    EXPECT_NE(run("pair "s + pinReceiver).err.find("Already Exists"), std::string::npos);
 }
 
 TEST_F(Pairing, PasskeysAreConfirmedRefusedShownAndEntered) {
-    const Result refused = run({"pair", phone, "--reject"});
+    const Result refused = run("pair "s + phone + " --reject");
     EXPECT_EQ(refused.status, 1);
     EXPECT_NE(refused.err.find(": rejected\n"), std::string::npos) << refused;
-    const Result confirmed = run({"pair", phone});
+    const Result confirmed = run("pair "s + phone);
     EXPECT_EQ(confirmed.status, 0);
     EXPECT_NE(confirmed.err.find(": accepted\n"), std::string::npos) << confirmed;
 
-    const Result shown = run({"pair", keyboard});
+    const Result shown = run("pair "s + keyboard);
     EXPECT_EQ(shown.status, 0);
     EXPECT_EQ(shown.err.substr(begun(keyboard).size(), 5), "Type ");
     EXPECT_NE(shown.err.find(" on 00:11:22:33:44:02\n"), std::string::npos);
 
     const Result entered =
-        run({"pair", carKit, "--capability", "KeyboardOnly", "--pin", "424242", "--delay", "1"});
+        run("pair "s + carKit + " --capability KeyboardOnly --pin 424242 --delay 1");
     EXPECT_EQ(entered.status, 0);
     EXPECT_NE(entered.err.find("asks for a passkey: 424242\n"), std::string::npos) << entered;
-    EXPECT_EQ(run({"pair", headset, "--capability", "NoInputNoOutput"}).err, begun(headset));
+    EXPECT_EQ(run("pair "s + headset + " --capability NoInputNoOutput").err, begun(headset));
 }
 
 TEST_F(Pairing, OnlyItsProgramCancelsItAndADaemonThatLeavesEndsIt) {
-    EXPECT_EQ(failure({"cancel", unreachableLaptop}),
+    EXPECT_EQ(failure("cancel "s + unreachableLaptop),
               "no creation of 00:11:22:33:44:07 is under way on hci0; see what happens with: kesbt "
               "monitor\n");
     setTimeScale(1);
-    const auto pairing = start({"pair", unreachableLaptop});
+    const auto pairing = start("pair "s + unreachableLaptop);
     awaitCall("CreatePairedDevice");
-    EXPECT_EQ(failure({"cancel", unreachableLaptop}),
+    EXPECT_EQ(failure("cancel "s + unreachableLaptop),
               "cannot cancel the creation of 00:11:22:33:44:07: Operation Not Authorized; only the "
               "program that began it can do this\n");
     simulation.process().kill();
@@ -66,9 +66,9 @@ TEST_F(Pairing, OnlyItsProgramCancelsItAndADaemonThatLeavesEndsIt) {
 }
 
 TEST_F(Pairing, TheAgentAnswersDevicesThatComeAndTellsSo) {
-    const auto agent = start({"agent", "--pin", "1234", "--json"});
+    const auto agent = start("agent --pin 1234 --json");
     EXPECT_EQ(awaitEvent(*agent, "event", "registered")["adapter"], "hci0");
-    EXPECT_EQ(failure({"agent"}), "hci0 has an agent of another program; end that program first\n");
+    EXPECT_EQ(failure("agent"), "hci0 has an agent of another program; end that program first\n");
 
     comeIn(pinReceiver);
     const Json pin = awaitEvent(*agent, "event", "request");
@@ -83,16 +83,14 @@ TEST_F(Pairing, TheAgentAnswersDevicesThatComeAndTellsSo) {
     EXPECT_EQ(confirmation["answer"], "accepted");
 
     agent->signal(SIGINT);
-    const Result result = agent->finish();
-    EXPECT_EQ(result.status, 0);
-    EXPECT_EQ(result.err, "");
+    EXPECT_EQ(errorsOf(*agent, 0), "");
     EXPECT_EQ(calls("UnregisterAgent"), 1U);
     while (pairedProperty(phone) != true) { // the pairing goes on without the agent
     }
 }
 
 TEST_F(Pairing, TheAgentIsReadableByPeopleAndEndsWithTheDaemon) {
-    const auto agent = start({"agent", "--reject"});
+    const auto agent = start("agent --reject");
     EXPECT_EQ(agent->readLine().substr(12),
               "  Agent registered on hci0, waiting for requests (Ctrl-C ends it)");
     comeIn(phone);
@@ -101,9 +99,8 @@ TEST_F(Pairing, TheAgentIsReadableByPeopleAndEndsWithTheDaemon) {
               "  00:11:22:33:44:03 asks to confirm the passkey " + line.substr(60, 4));
     EXPECT_EQ(line.substr(line.size() - 10), ": rejected");
     simulation.control("Restart");
-    const Result result = agent->finish();
-    EXPECT_EQ(result.status, 1);
-    EXPECT_EQ(result.err, "bluetoothd has released the agent; register it again: kesbt agent\n");
+    EXPECT_EQ(errorsOf(*agent),
+              "bluetoothd has released the agent; register it again: kesbt agent\n");
 }
 
 } // namespace Bluetooth::Test

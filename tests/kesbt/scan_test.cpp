@@ -12,15 +12,15 @@ protected:
 };
 
 TEST_F(ScanVerbs, TwoProgramsShareOneScan) {
-    EXPECT_EQ(run({"scan", "stop"}), (Result{0, "No scan is running on hci0\n", ""}));
-    const auto watch = start({"scan", "watch", "--json"}); // the bus starts the service
+    EXPECT_EQ(run("scan stop"), (Result{0, "No scan is running on hci0\n", ""}));
+    const auto watch = start("scan watch --json"); // the bus starts the service
     const Json found = awaitEvent(*watch, "address", pinReceiver);
     EXPECT_EQ(found["properties"]["RSSI"], -70);
 
-    const Json list = json({"scan", "list"});
+    const Json list = json("scan list");
     ASSERT_FALSE(list.empty());
     EXPECT_EQ(list[0]["address"], headset);
-    EXPECT_NE(run({"scan", "list"}).out.find("00:11:22:33:44:04  -70 dBm  0x001f00  GPS Receiver"),
+    EXPECT_NE(run("scan list").out.find("00:11:22:33:44:04  -70 dBm  0x001f00  GPS Receiver"),
               std::string::npos);
     EXPECT_EQ(calls("StartDiscovery"), 1U);
 
@@ -29,7 +29,7 @@ TEST_F(ScanVerbs, TwoProgramsShareOneScan) {
     }
     watch->signal(SIGINT);
     EXPECT_EQ(watch->finish().status, 0);
-    EXPECT_EQ(run({"scan", "stop"}).out, "Stopped the scan on hci0\n");
+    EXPECT_EQ(run("scan stop").out, "Stopped the scan on hci0\n");
     awaitCall("StopDiscovery");
 }
 
@@ -40,11 +40,11 @@ protected:
 
 TEST_F(ScanVerbsAlone, WithoutTheServiceTheLineSaysSo) {
     for (const char* verb : {"list", "watch"})
-        EXPECT_EQ(failure({"scan", verb}),
+        EXPECT_EQ(failure("scan "s + verb),
                   "the scanner service is not running; start it: kesbt-scannerd\n");
     session.kill();
-    EXPECT_EQ(failure({"scan", "list"}), "the session bus cannot be reached; log in, or try: "
-                                         "dbus-run-session -- kesbt scan list\n");
+    EXPECT_EQ(failure("scan list"), "the session bus cannot be reached; log in, or try: "
+                                    "dbus-run-session -- kesbt scan list\n");
 }
 
 } // namespace Bluetooth::Test

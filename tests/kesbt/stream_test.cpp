@@ -7,17 +7,10 @@
 
 namespace Bluetooth::Test {
 
-class Streams : public KesbtTest {
-protected:
-    static void expectEnd(ChildProcess& program, int status, const std::string& line) {
-        const Result result = program.finish();
-        EXPECT_EQ(result.status, status) << result;
-        EXPECT_EQ(result.err, line);
-    }
-};
+class Streams : public KesbtTest {};
 
 TEST_F(Streams, DiscoverTellsWhatAppearsChangesAndVanishes) {
-    const auto discover = start({"discover", "--json"});
+    const auto discover = start("discover --json");
     std::set<std::string> found;
     while (found.size() < 8)
         found.insert(awaitEvent(*discover, "event", "found")["address"].get<std::string>());
@@ -34,72 +27,70 @@ TEST_F(Streams, DiscoverTellsWhatAppearsChangesAndVanishes) {
     EXPECT_EQ(changed["properties"]["RSSI"], -20);
 
     discover->signal(SIGINT);
-    expectEnd(*discover, 0, "");
+    EXPECT_EQ(errorsOf(*discover, 0), "");
     EXPECT_EQ(calls("StopDiscovery"), 1U);
     EXPECT_EQ(adapterProperties()["Discovering"], false);
 }
 
 TEST_F(Streams, DiscoverFailsWhenItCannotGoOn) {
-    run({"adapter", "set", "Powered", "off"});
-    EXPECT_EQ(failure({"discover"}),
+    run("adapter set Powered off");
+    EXPECT_EQ(failure("discover"),
               "cannot start a discovery on hci0: Resource Not Ready; the adapter is off, switch it "
               "on: kesbt adapter set Powered true\n");
-    run({"adapter", "set", "Powered", "on"});
+    run("adapter set Powered on");
 
-    auto discover = start({"discover"});
+    auto discover = start("discover");
     EXPECT_NE(discover->readLine(), "");
-    run({"adapter", "set", "Powered", "off"});
-    expectEnd(*discover, 1,
+    run("adapter set Powered off");
+    EXPECT_EQ(errorsOf(*discover),
               "hci0 was switched off; switch it on: kesbt adapter set Powered true\n");
 
-    discover = start({"--adapter", "hci1", "discover"});
+    discover = start("--adapter hci1 discover");
     EXPECT_NE(discover->readLine(), "");
     simulation.control("RemoveAdapter", with("hci1"));
-    const Result removed = discover->finish();
-    EXPECT_EQ(removed.status, 1); // switched off first, then removed
-    EXPECT_EQ(removed.err.substr(0, 9), "hci1 was ");
+    EXPECT_EQ(errorsOf(*discover).substr(0, 9), "hci1 was "); // switched off first, then removed
 
-    run({"adapter", "set", "Powered", "on"});
-    discover = start({"discover"});
+    run("adapter set Powered on");
+    discover = start("discover");
     EXPECT_NE(discover->readLine(), "");
     simulation.process().kill();
-    expectEnd(*discover, 1,
+    EXPECT_EQ(errorsOf(*discover),
               "bluetoothd has left the system bus; start it again and repeat the command\n");
 }
 
 TEST_F(Streams, MonitorShowsEverySignalAlsoOfWhatComesLater) {
-    const auto monitor = start({"monitor", "--json"});
+    const auto monitor = start("monitor --json");
     awaitEvent(*monitor, "event", "daemon-came"); // from now on nothing is missed
 
-    run({"adapter", "set", "Discoverable", "on"});
+    run("adapter set Discoverable on");
     const Json changed = awaitEvent(*monitor, "arguments", {"Discoverable", true});
     EXPECT_EQ(changed["interface"], "org.bluez.Adapter");
     EXPECT_EQ(changed["member"], "PropertyChanged");
 
     simulation.control("AddAdapter", with(Settings{{"Address", "00:1A:7D:DA:71:12"}}));
     const Json added = awaitEvent(*monitor, "member", "AdapterAdded");
-    run({"--adapter", "hci2", "adapter", "set", "Name", "new"});
+    run("--adapter hci2 adapter set Name new");
     EXPECT_EQ(awaitEvent(*monitor, "arguments", {"Name", "new"})["path"], added["arguments"][0]);
 
     simulation.control("Restart");
     awaitEvent(*monitor, "event", "daemon-gone");
     awaitEvent(*monitor, "event", "daemon-came");
-    run({"create", pinReceiver});
+    run("create "s + pinReceiver);
     const Json created = awaitEvent(*monitor, "member", "DeviceCreated");
     EXPECT_NE(created["path"], changed["path"]);
     awaitEvent(*monitor, "path", created["arguments"][0]); // a device's own signal
 
     monitor->signal(SIGTERM);
-    expectEnd(*monitor, 0, "");
+    EXPECT_EQ(errorsOf(*monitor, 0), "");
 }
 
 TEST_F(Streams, ForPeopleTheyAreReadable) {
-    const auto monitor = start({"monitor"});
+    const auto monitor = start("monitor");
     EXPECT_EQ(monitor->readLine().substr(12), "  bluetoothd              is on the bus");
-    run({"adapter", "set", "Discoverable", "on"});
+    run("adapter set Discoverable on");
     EXPECT_EQ(monitor->readLine().substr(12),
               "  hci0                    Adapter.PropertyChanged    Discoverable = yes");
-    const Result result = run({"--adapter", "hci1", "discover", "--seconds", "1"});
+    const Result result = run("--adapter hci1 discover --seconds 1");
     EXPECT_EQ(result.status, 0);
     EXPECT_NE(
         result.out.find("found     00:11:22:33:44:04  -70 dBm   0x001f00                  GPS "
@@ -110,35 +101,35 @@ TEST_F(Streams, ForPeopleTheyAreReadable) {
 }
 
 TEST_F(Streams, WaitEndsWhenItIsSoAndFailsWhenTimeIsOver) {
-    EXPECT_EQ(run({"wait", "found", pinReceiver}), (Result{0, "00:11:22:33:44:04 is found\n", ""}));
-    EXPECT_EQ(failure({"--timeout", "0.2", "wait", "connected", knownMouse}),
+    EXPECT_EQ(run("wait found "s + pinReceiver), (Result{0, "00:11:22:33:44:04 is found\n", ""}));
+    EXPECT_EQ(failure("--timeout 0.2 wait connected "s + knownMouse),
               "00:11:22:33:44:06 was not connected within the time-out; try again or give a longer "
               "--timeout\n");
 
-    const auto waiting = start({"wait", "paired", pinReceiver}); // not even known yet
+    const auto waiting = start("wait paired "s + pinReceiver); // not even known yet
     awaitCall("FindDevice");
-    EXPECT_EQ(run({"pair", pinReceiver, "--pin", "1234"}).status, 0);
-    expectEnd(*waiting, 0, "");
+    EXPECT_EQ(run("pair "s + pinReceiver + " --pin 1234").status, 0);
+    EXPECT_EQ(errorsOf(*waiting, 0), "");
 
     const std::size_t asked = calls("FindDevice");
-    const auto interrupted = start({"wait", "paired", unreachableLaptop});
+    const auto interrupted = start("wait paired "s + unreachableLaptop);
     awaitCall("FindDevice", asked + 1);
     interrupted->signal(SIGINT);
-    expectEnd(*interrupted, 1,
+    EXPECT_EQ(errorsOf(*interrupted),
               "interrupted before 00:11:22:33:44:07 was paired; repeat the command to go on "
               "waiting\n");
 
     // What cannot come true any more is not waited for.
-    const auto searching = start({"wait", "found", "00:11:22:33:44:99"});
+    const auto searching = start("wait found 00:11:22:33:44:99");
     awaitCall("StartDiscovery", 2);
-    run({"adapter", "set", "Powered", "off"});
-    expectEnd(*searching, 1,
+    run("adapter set Powered off");
+    EXPECT_EQ(errorsOf(*searching),
               "hci0 was switched off; switch it on: kesbt adapter set Powered true\n");
     const std::size_t read = calls("GetProperties");
-    const auto pulledOut = start({"wait", "powered"});
+    const auto pulledOut = start("wait powered");
     awaitCall("GetProperties", read + 1);
     simulation.control("RemoveAdapter", with("hci0"));
-    expectEnd(*pulledOut, 1, "hci0 was removed; plug it in and repeat the command\n");
+    EXPECT_EQ(errorsOf(*pulledOut), "hci0 was removed; plug it in and repeat the command\n");
 }
 
 } // namespace Bluetooth::Test

@@ -1,6 +1,7 @@
 #ifndef KESBLUETOOTH_TESTS_SCANNER_TEST_H
 #define KESBLUETOOTH_TESTS_SCANNER_TEST_H
 
+#include "support/devices.h"
 #include "support/private_bus.h"
 #include "support/raw_peer.h"
 #include "support/simulation.h"
@@ -16,10 +17,6 @@ namespace Bluetooth::Test {
 
 inline constexpr const char* serviceName = "com.kestrine.bluetooth";
 inline constexpr const char* serviceInterface = "com.kestrine.bluetooth.Scanner";
-
-inline constexpr const char* mouse = "00:11:22:33:44:01"; // paired with hci0
-inline constexpr const char* phone = "00:11:22:33:44:02";
-inline constexpr const char* speaker = "00:11:22:33:44:03"; // in reach of hci1 only
 
 /// An answer that tells of no device, as argumentsOf() writes it.
 inline constexpr const char* emptyAnswer = "a(e(s: s:))";
@@ -47,17 +44,16 @@ protected:
     }
     /// @return the path of an adapter
     std::string pathOf(const char* adapter) {
-        const auto pattern = [adapter](Writer& w) { w(adapter); };
         const MessagePtr reply =
-            system.call("org.bluez", "/", "org.bluez.Manager", "FindAdapter", pattern).get();
+            system.call("org.bluez", "/", "org.bluez.Manager", "FindAdapter", with(adapter)).get();
         return argumentsOf(reply.get()).substr(std::string("o:").size());
     }
 
     /// Calls the service and awaits its answer.
     /// @return its arguments as text; for an error its text after "ERROR "
     std::string call(const char* method, const char* adapterId) {
-        const auto id = [adapterId](Writer& w) { w(adapterId); };
-        const MessagePtr reply = session.call(serviceName, "/", serviceInterface, method, id).get();
+        const MessagePtr reply =
+            session.call(serviceName, "/", serviceInterface, method, with(adapterId)).get();
         if (!reply)
             return "ERROR no reply";
         const std::string arguments = argumentsOf(reply.get());
@@ -84,10 +80,10 @@ protected:
     Simulation simulation{
         // Nothing is in reach until a test says so.
         "[Adapter hci0]\nAddress=00:1A:7D:DA:71:10\n[Adapter hci1]\nAddress=00:1A:7D:DA:71:11\n"
-        "[Device 00:11:22:33:44:01]\nName=Mouse\nAdapter=hci0\nBehaviour=AlreadyPaired\n"
+        "[Device 00:11:22:33:44:06]\nName=Mouse\nAdapter=hci0\nBehaviour=AlreadyPaired\n"
         "Present=false\n"
-        "[Device 00:11:22:33:44:02]\nName=Phone\nClass=360\nRSSI=-60\nPresent=false\n"
-        "[Device 00:11:22:33:44:03]\nName=Speaker\nAdapter=hci1\nPresent=false\n"};
+        "[Device 00:11:22:33:44:03]\nName=Phone\nClass=360\nRSSI=-60\nPresent=false\n"
+        "[Device 00:11:22:33:44:66]\nName=Speaker\nAdapter=hci1\nPresent=false\n"};
     RawPeer& system = simulation.peer();
     PrivateBus sessionBus{PrivateBus::Kind::Session, SESSION_BUS_CONFIGURATION};
     RawPeer session{sessionBus.address()};

@@ -92,7 +92,7 @@ TEST_F(ServerTest, FrameTellsAboutTheBus) {
 
 TEST_F(ServerTest, OnlyReachingZeroEndsTheLoop) {
     ScannerServer server;
-    EXPECT_TRUE(server.isInFilterSet(mouse));
+    EXPECT_TRUE(server.isInFilterSet(knownMouse));
     EXPECT_FALSE(server.isInFilterSet(phone));
     EXPECT_EQ(server.getInfoFromMap(phone), "");
     server.putInfoToMap(phone, "a: 1;");
@@ -142,9 +142,9 @@ TEST_F(ServerTest, SignalMakesAFinderWhileOneLoopRuns) {
     EXPECT_EQ(starts("hci0"), 2u);
 
     EXPECT_EQ(call("RemoveFinder", "hci0"), "");
-    simulation.setDevice("00:11:22:33:44:99", "Name", "New", "AddDevice");
+    simulation.setDevice(newDevice, "Name", "New", "AddDevice");
     ASSERT_TRUE(awaitStarts("hci0", 3)); // nobody asked
-    askUntilListed("hci0", "00:11:22:33:44:99");
+    askUntilListed("hci0", newDevice);
     EXPECT_EQ(starts("hci0"), 3u);
     running.server.quitLoop();
     EXPECT_TRUE(running.waitForEnd());
@@ -178,7 +178,7 @@ TEST_F(ServerTest, HandlersTellWhatIsMissing) {
         daemon.handle("FindAdapter", [&isGone](DBusMessage* message) {
             if (isGone.exchange(true))
                 return MessagePtr(dbus_message_new_error(message, "org.bluez.Error", "gone"));
-            return replyTo(message, [](Writer& w) { w(Path{"/org/bluez/1/hci0"}); });
+            return replyTo(message, with(Path{"/org/bluez/1/hci0"}));
         });
         EXPECT_EQ(listDevices(object.get()), "3/0 Set hci0 not found");
     }
@@ -225,8 +225,8 @@ TEST_F(ServerTest, FindersComeAndGoWhileDevicesAreFound) {
             EXPECT_EQ(call(method, adapter).find("ERROR"), std::string::npos);
         }
     });
-    comeInReach(speaker);
-    askUntilListed("hci1", speaker);
+    comeInReach(otherDevice);
+    askUntilListed("hci1", otherDevice);
 }
 
 } // namespace Bluetooth::Test

@@ -65,7 +65,7 @@ protected:
         const MessagePtr reply =
             system
                 .call(DBUS_SERVICE_DBUS, DBUS_PATH_DBUS, "org.freedesktop.DBus.Debug.Stats",
-                      "GetConnectionStats", [&](Writer& w) { w(caller); })
+                      "GetConnectionStats", with(caller))
                 .get();
         const std::string text = argumentsOf(reply.get());
         const std::string key = "e(s:MatchRules v(u:";
@@ -92,7 +92,7 @@ TEST_F(ServiceTest, DevicesAreListedWithTheirPropertiesFromTheSecondAnswerOn) {
     EXPECT_EQ(starts("hci1"), 0u);
     comeInReach(phone);
     const std::string properties =
-        "Address: 00:11:22:33:44:02;Class: 360;Icon: computer;RSSI: -60;Name: Phone;";
+        "Address: 00:11:22:33:44:03;Class: 360;Icon: computer;RSSI: -60;Name: Phone;";
     const std::string answer = askUntilListed("hci0", phone);
     EXPECT_NE(answer.find("s:" + properties), std::string::npos) << answer;
     EXPECT_NE(answer.find("Trusted: 0;)"), std::string::npos) << answer;
@@ -111,36 +111,36 @@ TEST_F(ServiceTest, DevicesAreListedWithTheirPropertiesFromTheSecondAnswerOn) {
 }
 
 TEST_F(ServiceTest, DevicesThatTheDaemonKnowsAreLeftOut) {
-    comeInReach(mouse); // is found before the phone in each round, and is known
+    comeInReach(knownMouse); // is found before the phone in each round, and is known
     comeInReach(phone);
-    EXPECT_FALSE(lists(askUntilListed("hci0", phone), mouse));
+    EXPECT_FALSE(lists(askUntilListed("hci0", phone), knownMouse));
 
     const auto onAdapter = [&](const char* method, const RawPeer::Build& arguments) {
         return system.call("org.bluez", pathOf("hci0"), "org.bluez.Adapter", method, arguments)
             .get();
     };
-    const MessagePtr created = onAdapter("CreateDevice", [](Writer& w) { w(phone); });
+    const MessagePtr created = onAdapter("CreateDevice", with(phone));
     const std::string devicePath = argumentsOf(created.get()).substr(2);
     EXPECT_FALSE(lists(ask("hci0"), phone));
-    onAdapter("RemoveDevice", [&](Writer& w) { w(Path{devicePath}); });
+    onAdapter("RemoveDevice", with(Path{devicePath}));
     askUntilListed("hci0", phone);
 }
 
 TEST_F(ServiceTest, AdaptersHaveFindersOfTheirOwn) {
     ask("hci0");
-    comeInReach(speaker);
-    askUntilListed("hci1", speaker);
+    comeInReach(otherDevice);
+    askUntilListed("hci1", otherDevice);
     EXPECT_EQ(starts("hci0"), 1u);
     EXPECT_EQ(starts("hci1"), 1u);
     // Signals reach the proxies of all adapters: what one finds is told by the others too.
-    askUntilListed("hci0", speaker);
+    askUntilListed("hci0", otherDevice);
 
     EXPECT_EQ(call("RemoveFinder", "hci0"), "");
     EXPECT_EQ(stops("hci0"), 1u);
     EXPECT_EQ(stops("hci1"), 0u);
     // The removed finder does not come back with what the other adapter finds.
-    simulation.setDevice("00:11:22:33:44:99", "Adapter", "hci1", "AddDevice");
-    askUntilListed("hci1", "00:11:22:33:44:99");
+    simulation.setDevice(newDevice, "Adapter", "hci1", "AddDevice");
+    askUntilListed("hci1", newDevice);
     EXPECT_EQ(starts("hci0"), 1u);
 
     // The next question begins anew.
@@ -213,8 +213,7 @@ TEST_F(ServiceTest, GoesOnWhenAClientLeavesWithoutItsAnswer) {
     simulation.delayNext("org.bluez.Manager", "FindAdapter", 50);
     {
         RawPeer leaving(sessionBus.address());
-        leaving.call(serviceName, "/", serviceInterface, "ListDevices",
-                     [](Writer& w) { w("hci0"); });
+        leaving.call(serviceName, "/", serviceInterface, "ListDevices", with("hci0"));
         ASSERT_TRUE(simulation.awaitCalls("s:FindAdapter "));
     }
     EXPECT_EQ(ask("hci1"), emptyAnswer);
@@ -304,7 +303,7 @@ TEST_F(ScannerClientTest, TellsWhatTheServiceRefuses) {
 TEST_F(ScannerClientTest, ReadsAnyAnswer) {
     RawPeer standIn(sessionBus.address(), serviceName);
     Scanner scanner;
-    standIn.reply("ListDevices", [](Writer& w) { w(std::int32_t{1}); });
+    standIn.reply("ListDevices", with(std::int32_t{1}));
     EXPECT_EQ(list(scanner, "hci0", false), noList);
     EXPECT_EQ(scanner.getErrorMessage(), "Invalid reply format");
 

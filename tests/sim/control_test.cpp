@@ -9,21 +9,21 @@ const Writer::Build nothing = [](Writer& w) { w.variant("av", [](Writer& v) { v.
 
 TEST_F(ControlTest, TheNextCallFailsOnceOrWaits) {
     simulation.failNext("org.bluez.Adapter", "ListDevices", "org.example.Error.Made", "up");
-    EXPECT_EQ(client->call({"Adapter.FindDevice", "x"}), "error DoesNotExist: Does Not Exist");
-    EXPECT_EQ(client->call("Adapter.ListDevices"), "error org.example.Error.Made: up");
-    EXPECT_EQ(client->call("Adapter.ListDevices"), "a()");
+    EXPECT_EQ(call({"Adapter.FindDevice", "x"}), "error DoesNotExist: Does Not Exist");
+    EXPECT_EQ(call("Adapter.ListDevices"), "error org.example.Error.Made: up");
+    EXPECT_EQ(call("Adapter.ListDevices"), "a()");
     simulation.delayNext("org.bluez.Adapter", "ListDevices", 30);
-    client->start("Adapter.ListDevices");
-    client->start({"Manager.FindAdapter", "hci1"});
-    EXPECT_EQ(client->until("answer ListDevices"),
+    start("Adapter.ListDevices");
+    start({"Manager.FindAdapter", "hci1"});
+    EXPECT_EQ(until("answer ListDevices"),
               lines("answer FindAdapter o:hci1", "answer ListDevices a()"));
 }
 
 TEST_F(ControlTest, AnySignalCanBeEmittedAndComesBeforeTheAnswer) {
     const auto emit = [&](const char* member, const auto& arguments) {
-        client->call({"com.kestrine.bluetooth.Sim.EmitSignal", Path{base + "hci0"},
-                      "org.bluez.Adapter", member, arguments});
-        return client->taken();
+        call({"com.kestrine.bluetooth.Sim.EmitSignal", Path{base + "hci0"}, "org.bluez.Adapter",
+              member, arguments});
+        return taken();
     };
     const auto tuple = [](Writer& w) {
         w.variant("(uab)",
@@ -36,10 +36,10 @@ TEST_F(ControlTest, AnySignalCanBeEmittedAndComesBeforeTheAnswer) {
 }
 
 TEST_F(ControlTest, CallsAreRecordedInOrder) {
-    client->control("ClearCalls");
-    client->start({"Adapter.SetProperty", "Pairable", Var{true}});
-    client->start({"Manager.FindAdapter", "hci1"});
-    EXPECT_EQ(client->control("GetCalls"),
+    control("ClearCalls");
+    start({"Adapter.SetProperty", "Pairable", Var{true}});
+    start({"Manager.FindAdapter", "hci1"});
+    EXPECT_EQ(control("GetCalls"),
               "a(r(o:hci0 s:org.bluez.Adapter s:SetProperty a(v(s:Pairable) v(v(b:1)))) "
               "r(o:/ s:org.bluez.Manager s:FindAdapter a(v(s:hci1))))");
 }
@@ -65,8 +65,7 @@ TEST(ScenarioTest, WhatIsSetShowsInTheProperties) {
 
 TEST_F(ControlTest, WrongSettingsChangeNothing) {
     const auto refused = [&](const char* key, const char* value) {
-        return client->call(
-            {"com.kestrine.bluetooth.Sim.AddDevice", newDevice, Settings{{key, value}}});
+        return call({"com.kestrine.bluetooth.Sim.AddDevice", newDevice, Settings{{key, value}}});
     };
     const std::string failed = "error com.kestrine.bluetooth.Sim.Error.Failed: ";
     EXPECT_EQ(refused("Nothing", "x"), failed + "Nothing: there is no such key");
@@ -79,15 +78,14 @@ TEST_F(ControlTest, WrongSettingsChangeNothing) {
 
 TEST_F(ControlTest, AgentsCanBeCalledWithAnything) {
     registerAgent();
-    client->peer().reply("RequestPinCode", with("1234"));
-    client->peer().replyError("Nonsense", DBUS_ERROR_UNKNOWN_METHOD, "said no");
+    peer().reply("RequestPinCode", with("1234"));
+    peer().replyError("Nonsense", DBUS_ERROR_UNKNOWN_METHOD, "said no");
     const auto tuple = [](Writer& w) {
         w.variant("(ns)", [](Writer& v) { v.structure(with(std::int16_t{5}, "x")); });
     };
-    EXPECT_EQ(client->control({"CallAgent", "hci0", "", "RequestPinCode", tuple}),
-              "s: s: a(v(s:1234))");
-    EXPECT_EQ(client->taken().back(), "agent RequestPinCode n:5 s:x");
-    EXPECT_EQ(client->control({"CallAgent", "hci0", "org.bluez.Other", "Nonsense", nothing}),
+    EXPECT_EQ(control({"CallAgent", "hci0", "", "RequestPinCode", tuple}), "s: s: a(v(s:1234))");
+    EXPECT_EQ(taken().back(), "agent RequestPinCode n:5 s:x");
+    EXPECT_EQ(control({"CallAgent", "hci0", "org.bluez.Other", "Nonsense", nothing}),
               "s:org.freedesktop.DBus.Error.UnknownMethod s:said no a()");
 }
 

@@ -11,23 +11,21 @@ const std::string noObject = "error org.freedesktop.DBus.Error.UnknownObject: Me
 const std::string noAdapter = "error NoSuchAdapter: No such adapter";
 
 TEST_F(SimDaemonTest, PropertiesHaveTheirOrderAndTypesAndWhatIsMissingTheErrorsOfLibdbus) {
-    EXPECT_EQ(client->call("Adapter.GetProperties"),
+    EXPECT_EQ(call("Adapter.GetProperties"),
               "a(e(s:Address v(s:00:1A:7D:DA:71:10)) e(s:Name v(s:first)) e(s:Class v(u:7209216)) "
               "e(s:Powered v(b:1)) e(s:Discoverable v(b:0)) e(s:Pairable v(b:1)) "
               "e(s:DiscoverableTimeout v(u:180)) e(s:PairableTimeout v(u:0)) "
               "e(s:Discovering v(b:0)) e(s:Devices v(a())) e(s:UUIDs v(a())))");
-    EXPECT_EQ(client->call("Manager.GetProperties"), "a(e(s:Adapters v(a(o:hci0 o:hci1))))");
+    EXPECT_EQ(call("Manager.GetProperties"), "a(e(s:Adapters v(a(o:hci0 o:hci1))))");
     const auto missing = [](const char* method, const char* signature, const char* interface) {
         return std::string("\"") + method + "\" with signature \"" + signature +
                "\" on interface \"org.bluez." + interface + "\" doesn't exist\n";
     };
-    EXPECT_EQ(client->call({"Manager.FindAdapter", 1U}),
-              noMethod + missing("FindAdapter", "u", "Manager"));
-    EXPECT_EQ(client->call("Manager.Nothing"), noMethod + missing("Nothing", "", "Manager"));
-    EXPECT_EQ(client->call("Device.GetProperties", base + "hci0"),
+    EXPECT_EQ(call({"Manager.FindAdapter", 1U}), noMethod + missing("FindAdapter", "u", "Manager"));
+    EXPECT_EQ(call("Manager.Nothing"), noMethod + missing("Nothing", "", "Manager"));
+    EXPECT_EQ(call("Device.GetProperties", base + "hci0"),
               noMethod + missing("GetProperties", "", "Device"));
-    EXPECT_EQ(client->call("Device.GetProperties"),
-              noObject + missing("GetProperties", "", "Device"));
+    EXPECT_EQ(call("Device.GetProperties"), noObject + missing("GetProperties", "", "Device"));
 }
 
 TEST_F(SimDaemonTest, FindAdapterKnowsNamesAndAddressesButNoPaths) {
@@ -36,8 +34,8 @@ TEST_F(SimDaemonTest, FindAdapterKnowsNamesAndAddressesButNoPaths) {
         {"any", "o:any"},    {base + "hci0", noAdapter},
         {"hci9", noAdapter}, {"", noAdapter}};
     for (const auto& [pattern, answer] : cases)
-        EXPECT_EQ(client->call({"Manager.FindAdapter", pattern}), answer) << pattern;
-    EXPECT_EQ(client->call("Adapter.GetProperties", base + "any").rfind(noMethod, 0), 0U);
+        EXPECT_EQ(call({"Manager.FindAdapter", pattern}), answer) << pattern;
+    EXPECT_EQ(call("Adapter.GetProperties", base + "any").rfind(noMethod, 0), 0U);
 }
 
 TEST_F(SimDaemonTest, PropertiesSayWhatTheyBecameBeforeOrAfterTheReply) {
@@ -66,14 +64,13 @@ TEST_F(SimDaemonTest, PropertiesSayWhatTheyBecameBeforeOrAfterTheReply) {
 TEST_F(SimDaemonTest, DiscoverableTurnsTheAdapterOnAndEndsByItself) {
     set("Powered", false);
     set("DiscoverableTimeout", 2U);
-    EXPECT_EQ(
-        client->trace({"Adapter.SetProperty", "Discoverable", Var{true}}, "hci0 Class=u:7209216"),
-        lines("hci0 Powered=b:1", "hci0 Pairable=b:1", "hci0 Discoverable=b:1",
-              "answer SetProperty", "hci0 Class=u:7217408", "hci0 Discoverable=b:0",
-              "hci0 Class=u:7209216"));
+    EXPECT_EQ(trace({"Adapter.SetProperty", "Discoverable", Var{true}}, "hci0 Class=u:7209216"),
+              lines("hci0 Powered=b:1", "hci0 Pairable=b:1", "hci0 Discoverable=b:1",
+                    "answer SetProperty", "hci0 Class=u:7217408", "hci0 Discoverable=b:0",
+                    "hci0 Class=u:7209216"));
     set("Pairable", false);
     set("PairableTimeout", 2U); // so does Pairable
-    EXPECT_EQ(client->trace({"Adapter.SetProperty", "Pairable", Var{true}}, "hci0 Pairable=b:0"),
+    EXPECT_EQ(trace({"Adapter.SetProperty", "Pairable", Var{true}}, "hci0 Pairable=b:0"),
               lines("hci0 Pairable=b:1", "answer SetProperty", "hci0 Pairable=b:0"));
 }
 
@@ -83,53 +80,51 @@ TEST_F(SimDaemonTest, AnAdapterThatIsOffIsNotReadyForTheAir) {
          {Question("Adapter.StartDiscovery"), Question("Adapter.StopDiscovery"),
           Question("Adapter.CreateDevice", newDevice),
           Question("Adapter.CreatePairedDevice", newDevice, agent, "")})
-        EXPECT_EQ(client->call(question), "error NotReady: Resource Not Ready") << question.method;
-    EXPECT_EQ(client->call("Adapter.ListDevices"), "a()");
+        EXPECT_EQ(call(question), "error NotReady: Resource Not Ready") << question.method;
+    EXPECT_EQ(call("Adapter.ListDevices"), "a()");
 }
 
 TEST_F(SimDaemonTest, AdaptersComeAndGoInTheOrderOfTheDaemon) {
-    EXPECT_EQ(client->control({"AddAdapter", Settings{{"Name", "third"}}}), "s:hci2");
-    EXPECT_EQ(client->taken(),
-              lines("hci0 UUIDs=a()", "hci0 UUIDs=a()", "hci1 UUIDs=a()", "hci1 UUIDs=a()",
-                    "/ AdapterAdded o:hci2", "/ Adapters=a(o:hci0 o:hci1 o:hci2)",
-                    "hci2 Powered=b:1", "hci2 Pairable=b:1", "hci2 Class=u:7209216",
-                    "hci2 Name=s:third", "hci2 Pairable=b:1", "hci2 Discoverable=b:0"));
-    client->control({"RemoveAdapter", "hci0"});
-    EXPECT_EQ(client->taken(),
-              lines("hci0 Pairable=b:0", "hci0 Powered=b:0", "/ Adapters=a(o:hci1 o:hci2)",
-                    "/ DefaultAdapterChanged o:hci1", "/ AdapterRemoved o:hci0"));
-    client->control({"RemoveAdapter", "hci1"});
-    client->control({"RemoveAdapter", "hci2"});
-    EXPECT_EQ(client->taken().back(), "/ AdapterRemoved o:hci2");
-    EXPECT_EQ(client->call("Manager.DefaultAdapter"), noAdapter);
-    EXPECT_EQ(client->call("Manager.ListAdapters"), "a()");
+    EXPECT_EQ(control({"AddAdapter", Settings{{"Name", "third"}}}), "s:hci2");
+    EXPECT_EQ(taken(), lines("hci0 UUIDs=a()", "hci0 UUIDs=a()", "hci1 UUIDs=a()", "hci1 UUIDs=a()",
+                             "/ AdapterAdded o:hci2", "/ Adapters=a(o:hci0 o:hci1 o:hci2)",
+                             "hci2 Powered=b:1", "hci2 Pairable=b:1", "hci2 Class=u:7209216",
+                             "hci2 Name=s:third", "hci2 Pairable=b:1", "hci2 Discoverable=b:0"));
+    control({"RemoveAdapter", "hci0"});
+    EXPECT_EQ(taken(), lines("hci0 Pairable=b:0", "hci0 Powered=b:0", "/ Adapters=a(o:hci1 o:hci2)",
+                             "/ DefaultAdapterChanged o:hci1", "/ AdapterRemoved o:hci0"));
+    control({"RemoveAdapter", "hci1"});
+    control({"RemoveAdapter", "hci2"});
+    EXPECT_EQ(taken().back(), "/ AdapterRemoved o:hci2");
+    EXPECT_EQ(call("Manager.DefaultAdapter"), noAdapter);
+    EXPECT_EQ(call("Manager.ListAdapters"), "a()");
 }
 
 TEST_F(SimDaemonTest, ARestartChangesAllPathsAndKeepsStoredDevices) {
     create();
     registerAgent();
-    client->taken();
-    client->control("Restart");
-    const Texts came = client->taken();
+    taken();
+    control("Restart");
+    const Texts came = taken();
     EXPECT_EQ(came[0], "agent Release");
     EXPECT_EQ(came[1], "/ AdapterAdded o:hci0");
-    EXPECT_NE(client->base(), base);
-    EXPECT_EQ(client->call("Adapter.ListDevices", base + "hci0").rfind(noObject, 0), 0U);
-    EXPECT_EQ(client->call("Adapter.ListDevices"), "a(o:device)");
+    EXPECT_NE(findBase(), base);
+    EXPECT_EQ(call("Adapter.ListDevices", base + "hci0").rfind(noObject, 0), 0U);
+    EXPECT_EQ(call("Adapter.ListDevices"), "a(o:device)");
 }
 
 TEST_F(SimDaemonTest, ADroppedNameTakesCallsUnderWayWithItAndComesBack) {
     simulation.delayNext("org.bluez.Adapter", "ListDevices", 60000);
-    client->start("Adapter.ListDevices");
-    client->control("DropName");
-    EXPECT_EQ(client->until("answer"),
+    start("Adapter.ListDevices");
+    control("DropName");
+    EXPECT_EQ(until("answer"),
               lines("answer ListDevices error org.freedesktop.DBus.Error.NoReply: Message "
                     "recipient disconnected from message bus without replying"));
-    EXPECT_EQ(client->call("Manager.ListAdapters"),
+    EXPECT_EQ(call("Manager.ListAdapters"),
               "error org.freedesktop.DBus.Error.ServiceUnknown: The name org.bluez was not "
               "provided by any .service files");
-    client->control("RegainName");
-    EXPECT_EQ(client->base(), base);
+    control("RegainName");
+    EXPECT_EQ(findBase(), base);
 }
 
 TEST_F(SimDaemonTest, SigtermReleasesTheAgentsAndASecondDaemonIsRefused) {
@@ -140,29 +135,27 @@ TEST_F(SimDaemonTest, SigtermReleasesTheAgentsAndASecondDaemonIsRefused) {
               "bluez4-sim: com.kestrine.bluetooth.Sim is already owned on this bus; stop its owner "
               "first; or give it buses of its own: bluez4-sim -- COMMAND\n");
     registerAgent();
-    client->taken();
+    taken();
     simulation.process().signal(SIGTERM);
     EXPECT_EQ(simulation.process().wait(), 0);
-    EXPECT_EQ(client->until("agent"), lines("agent Release"));
-    client->call("org.freedesktop.DBus.GetId");
-    EXPECT_EQ(client->taken(), Texts{});
+    EXPECT_EQ(until("agent"), lines("agent Release"));
+    call("org.freedesktop.DBus.GetId");
+    EXPECT_EQ(taken(), Texts{});
 }
 
 TEST_F(SimDaemonTest, SessionsPowerTheAdapterWithTheAgentsConsent) {
-    EXPECT_EQ(client->call("Adapter.RequestSession"),
-              "error AgentNotAvailable: Agent Not Available");
+    EXPECT_EQ(call("Adapter.RequestSession"), "error AgentNotAvailable: Agent Not Available");
     registerAgent();
-    EXPECT_EQ(client->call("Adapter.RequestSession"), ""); // it is on
-    EXPECT_EQ(client->call("Adapter.ReleaseSession"), "");
+    EXPECT_EQ(call("Adapter.RequestSession"), ""); // it is on
+    EXPECT_EQ(call("Adapter.ReleaseSession"), "");
     set("Powered", false);
-    client->peer().replyError("ConfirmModeChange", "org.bluez.Error.Rejected", "said no");
-    EXPECT_EQ(client->call("Adapter.RequestSession"), "error Rejected: said no");
-    client->peer().reply("ConfirmModeChange");
-    EXPECT_EQ(client->trace("Adapter.RequestSession").front(),
-              "agent ConfirmModeChange s:connectable");
-    EXPECT_EQ(client->trace("Adapter.ReleaseSession", "hci0 Powered=b:0"),
+    peer().replyError("ConfirmModeChange", "org.bluez.Error.Rejected", "said no");
+    EXPECT_EQ(call("Adapter.RequestSession"), "error Rejected: said no");
+    peer().reply("ConfirmModeChange");
+    EXPECT_EQ(trace("Adapter.RequestSession").front(), "agent ConfirmModeChange s:connectable");
+    EXPECT_EQ(trace("Adapter.ReleaseSession", "hci0 Powered=b:0"),
               lines("answer ReleaseSession", "hci0 Pairable=b:0", "hci0 Powered=b:0"));
-    EXPECT_EQ(client->call("Adapter.ReleaseSession"), "error Failed: Invalid Session");
+    EXPECT_EQ(call("Adapter.ReleaseSession"), "error Failed: Invalid Session");
 }
 
 TEST_F(SimDaemonTest, OneAgentForEachAdapterUntilItsOwnerUnregistersItOrLeaves) {
@@ -172,12 +165,11 @@ TEST_F(SimDaemonTest, OneAgentForEachAdapterUntilItsOwnerUnregistersItOrLeaves) 
     };
     EXPECT_EQ(registers(*other, "Telepathy"), badArguments);
     EXPECT_EQ(registers(*other, "KeyboardDisplay"), "");
-    EXPECT_EQ(registers(*client, ""), "error AlreadyExists: Already Exists");
-    EXPECT_EQ(client->call({"Adapter.UnregisterAgent", agent}),
-              "error DoesNotExist: Does Not Exist");
+    EXPECT_EQ(registers(*this, ""), "error AlreadyExists: Already Exists");
+    EXPECT_EQ(call({"Adapter.UnregisterAgent", agent}), "error DoesNotExist: Does Not Exist");
     leave(other);
-    EXPECT_EQ(registers(*client, "KeyboardOnly"), "");
-    EXPECT_EQ(client->trace({"Adapter.UnregisterAgent", agent}),
+    EXPECT_EQ(registers(*this, "KeyboardOnly"), "");
+    EXPECT_EQ(trace({"Adapter.UnregisterAgent", agent}),
               lines("agent Release", "answer UnregisterAgent"));
 }
 

@@ -11,77 +11,73 @@ const std::string notConnected = "error NotConnected: Not Connected";
 
 TEST_F(DeviceTest, CreatingADeviceAnnouncesItAndAnswersAfterTheSearch) {
     add({{"Name", "Phone"}, {"UUIDs", "1101"}, {"Vendor", "15"}});
-    EXPECT_EQ(client->trace({"Adapter.CreateDevice", newDevice}),
+    EXPECT_EQ(trace({"Adapter.CreateDevice", newDevice}),
               created + lines("device Connected=b:1", "device Name=s:Phone", "device Alias=s:Phone",
                               "device Vendor=q:15", "device Product=q:0", "device Version=q:0",
                               "device UUIDs=" + serialPort, "answer CreateDevice o:device"));
-    EXPECT_EQ(client->call("Device.GetProperties"),
+    EXPECT_EQ(call("Device.GetProperties"),
               "a(e(s:Address v(s:00:11:22:33:44:55)) e(s:Name v(s:Phone)) e(s:Alias v(s:Phone)) "
               "e(s:Vendor v(q:15)) e(s:Product v(q:0)) e(s:Version v(q:0)) e(s:Paired v(b:0)) "
               "e(s:Trusted v(b:0)) e(s:Blocked v(b:0)) e(s:Connected v(b:1)) e(s:UUIDs v(" +
                   serialPort + ")) e(s:Services v(a())) e(s:Adapter v(o:hci0)))");
-    EXPECT_EQ(client->call({"Adapter.FindDevice", newDevice}), "o:device");
-    EXPECT_EQ(client->call({"Adapter.CreateDevice", newDevice}),
-              "error AlreadyExists: Already Exists");
+    EXPECT_EQ(call({"Adapter.FindDevice", newDevice}), "o:device");
+    EXPECT_EQ(call({"Adapter.CreateDevice", newDevice}), "error AlreadyExists: Already Exists");
     add({}, "00:aa:bb:cc:dd:ee");
-    EXPECT_EQ(client->call({"Adapter.CreateDevice", "00:aa:bb:cc:dd:ee"}),
-              "o:hci0/dev_00_AA_BB_CC_DD_EE");
+    EXPECT_EQ(call({"Adapter.CreateDevice", "00:aa:bb:cc:dd:ee"}), "o:hci0/dev_00_AA_BB_CC_DD_EE");
 }
 
 TEST_F(DeviceTest, ADeviceThatDoesNotAnswerIsTakenBack) {
     add({{"Behaviour", "Unconnectable"}});
-    EXPECT_EQ(client->trace({"Adapter.CreateDevice", newDevice}, removed[1]),
+    EXPECT_EQ(trace({"Adapter.CreateDevice", newDevice}, removed[1]),
               created + lines("answer CreateDevice error Failed: Host is down") + removed);
-    EXPECT_EQ(client->call({"Adapter.CreateDevice", "00:11:22:33:44"}), badArguments);
-    EXPECT_EQ(client->call({"Adapter.FindDevice", "junk"}), unknownDevice);
+    EXPECT_EQ(call({"Adapter.CreateDevice", "00:11:22:33:44"}), badArguments);
+    EXPECT_EQ(call({"Adapter.FindDevice", "junk"}), unknownDevice);
 }
 
 TEST_F(DeviceTest, ACreationEndsWithItsCallerWhoAloneCancelsIt) {
     const Question cancel("Adapter.CancelDeviceCreation", newDevice);
-    EXPECT_EQ(client->call(cancel), unknownDevice);
-    EXPECT_EQ(client->call({"Adapter.CancelDeviceCreation", "x"}), badArguments);
+    EXPECT_EQ(call(cancel), unknownDevice);
+    EXPECT_EQ(call({"Adapter.CancelDeviceCreation", "x"}), badArguments);
     setTime("PageTimeout", "60000000");
-    client->start({"Adapter.CreateDevice", newDevice});
-    client->until(created[1]);
+    start({"Adapter.CreateDevice", newDevice});
+    until(created[1]);
     auto other = std::make_unique<SimClient>();
     EXPECT_EQ(other->call(cancel), "error NotAuthorized: Operation Not Authorized");
     EXPECT_EQ(other->call({"Adapter.RemoveDevice", device}),
               "error DoesNotExist: Device creation in progress");
-    EXPECT_EQ(client->trace(cancel),
-              removed + lines("answer CreateDevice error Failed: Operation canceled",
-                              "answer CancelDeviceCreation"));
+    EXPECT_EQ(trace(cancel), removed + lines("answer CreateDevice error Failed: Operation canceled",
+                                             "answer CancelDeviceCreation"));
 
     other->start({"Adapter.CreateDevice", newDevice});
-    client->until(created[1]);
+    until(created[1]);
     other.reset();
-    EXPECT_EQ(client->until(removed[1]), removed);
+    EXPECT_EQ(until(removed[1]), removed);
 }
 
 TEST_F(DeviceTest, ARemovedDeviceIsGone) {
     const Question remove("Adapter.RemoveDevice", device);
     create();
-    EXPECT_EQ(client->trace(remove, removed[1]),
+    EXPECT_EQ(trace(remove, removed[1]),
               lines("device DisconnectRequested", "answer RemoveDevice", "device Connected=b:0") +
                   removed);
-    EXPECT_EQ(client->call(remove), unknownDevice);
-    EXPECT_EQ(client->call("Device.Disconnect")
-                  .rfind("error org.freedesktop.DBus.Error.UnknownObject:", 0),
+    EXPECT_EQ(call(remove), unknownDevice);
+    EXPECT_EQ(call("Device.Disconnect").rfind("error org.freedesktop.DBus.Error.UnknownObject:", 0),
               0U);
-    client->call({"Adapter.CreateDevice", newDevice});
-    client->control({"DropLink", "hci0", newDevice});
-    EXPECT_EQ(client->trace(remove), removed + lines("answer RemoveDevice"));
+    call({"Adapter.CreateDevice", newDevice});
+    control({"DropLink", "hci0", newDevice});
+    EXPECT_EQ(trace(remove), removed + lines("answer RemoveDevice"));
 }
 
 TEST_F(DeviceTest, LinksEndByThemselvesOrAfterAnAnnouncement) {
     create();
-    EXPECT_EQ(client->trace("Device.Disconnect", "device Connected"),
+    EXPECT_EQ(trace("Device.Disconnect", "device Connected"),
               lines("device DisconnectRequested", "answer Disconnect", "device Connected=b:0"));
-    EXPECT_EQ(client->call("Device.Disconnect"), notConnected);
-    EXPECT_EQ(client->call({"Adapter.RemoveDevice", device}), "");
+    EXPECT_EQ(call("Device.Disconnect"), notConnected);
+    EXPECT_EQ(call({"Adapter.RemoveDevice", device}), "");
     setTime("IdleDisconnect", "4000");
-    client->call({"Adapter.CreateDevice", newDevice});
-    client->until("device Connected=b:0");
-    EXPECT_EQ(client->call("Adapter.ListDevices"), "a(o:device)");
+    call({"Adapter.CreateDevice", newDevice});
+    until("device Connected=b:0");
+    EXPECT_EQ(call("Adapter.ListDevices"), "a(o:device)");
 }
 
 TEST_F(DeviceTest, PropertiesAreSaidBeforeTheReply) {
@@ -90,7 +86,7 @@ TEST_F(DeviceTest, PropertiesAreSaidBeforeTheReply) {
     EXPECT_EQ(setOfDevice("Alias", "Mine"), lines("device Alias=s:Mine", answer));
     EXPECT_EQ(setOfDevice("Alias", "Mine"), lines(answer));
     EXPECT_EQ(setOfDevice("Alias", ""), lines("device Alias=s:", answer));
-    EXPECT_NE(client->call("Device.GetProperties").find("(s:Alias v(s:Phone))"), std::string::npos);
+    EXPECT_NE(call("Device.GetProperties").find("(s:Alias v(s:Phone))"), std::string::npos);
     EXPECT_EQ(setOfDevice("Trusted", true), lines("device Trusted=b:1", answer));
     EXPECT_EQ(setOfDevice("Blocked", true),
               lines("device Connected=b:0", "device Blocked=b:1", answer));
@@ -101,7 +97,7 @@ TEST_F(DeviceTest, PropertiesAreSaidBeforeTheReply) {
 TEST_F(DeviceTest, ServicesAreFoundByAnyFormOfTheirClass) {
     create({{"UUIDs", "1101;110b"}});
     const auto discover = [&](const char* pattern) {
-        return client->call({"Device.DiscoverServices", pattern});
+        return call({"Device.DiscoverServices", pattern});
     };
     const std::string serial = discover("0x1101");
     EXPECT_EQ(serial.rfind("a(e(u:65536 s:<?xml version=\"1.0\" encoding=\"UTF-8\" ?>\n\n<record>"
@@ -118,49 +114,47 @@ TEST_F(DeviceTest, ServicesAreFoundByAnyFormOfTheirClass) {
 TEST_F(DeviceTest, ASearchCanBeCancelledByItsCaller) {
     create();
     const Question search("Device.DiscoverServices", "");
-    EXPECT_EQ(client->call("Device.CancelDiscovery"), unknownDevice);
+    EXPECT_EQ(call("Device.CancelDiscovery"), unknownDevice);
     setTime("ServiceSearch", "60000000");
-    client->start(search);
-    EXPECT_EQ(client->call(search), "error InProgress: In Progress");
-    EXPECT_EQ(client->trace("Device.CancelDiscovery"),
+    start(search);
+    EXPECT_EQ(call(search), "error InProgress: In Progress");
+    EXPECT_EQ(trace("Device.CancelDiscovery"),
               lines("answer DiscoverServices error Failed: Operation canceled",
                     "answer CancelDiscovery"));
-    client->start(search);
-    client->control({"DropLink", "hci0", newDevice});
-    EXPECT_EQ(client->until("answer").back(),
+    start(search);
+    control({"DropLink", "hci0", newDevice});
+    EXPECT_EQ(until("answer").back(),
               "answer DiscoverServices error ConnectionAttemptFailed: Host is down");
     set("Powered", false);
-    EXPECT_EQ(client->call(search), "error Failed: No route to host");
+    EXPECT_EQ(call(search), "error Failed: No route to host");
 }
 
 TEST_F(DeviceTest, AudioConnectsWithAllItsInterfacesAndDisconnects) {
     create(audioDevice);
-    EXPECT_EQ(client->call("Control.VolumeUp"), notConnected);
+    EXPECT_EQ(call("Control.VolumeUp"), notConnected);
     const Texts connected{"device Connected", "device Connected=b:1"};
     const std::string connecting = "device State=s:connecting";
     const std::string isConnected = "device State=s:connected";
-    EXPECT_EQ(client->trace("AudioSink.Connect"),
-              lines(connecting, connecting) + connected +
-                  lines(isConnected, isConnected, "answer Connect"));
-    EXPECT_EQ(client->until(connected[1]), connected);
-    EXPECT_EQ(client->call("Control.VolumeUp"), "");
-    EXPECT_EQ(client->call("AudioSink.Connect"), "error AlreadyConnected: Already Connected");
-    client->control({"SetPlaying", "hci0", newDevice, true});
-    EXPECT_EQ(client->taken(),
-              lines("device Playing", "device Playing=b:1", "device State=s:playing"));
-    EXPECT_EQ(client->call("AudioSink.IsConnected"), "b:1");
-    EXPECT_EQ(client->call("Control.IsConnected"), "b:1");
-    EXPECT_EQ(client->call("Control.GetProperties"), "a(e(s:Connected v(b:1)))");
-    EXPECT_EQ(client->call("AudioSink.GetProperties"),
+    EXPECT_EQ(trace("AudioSink.Connect"), lines(connecting, connecting) + connected +
+                                              lines(isConnected, isConnected, "answer Connect"));
+    EXPECT_EQ(until(connected[1]), connected);
+    EXPECT_EQ(call("Control.VolumeUp"), "");
+    EXPECT_EQ(call("AudioSink.Connect"), "error AlreadyConnected: Already Connected");
+    control({"SetPlaying", "hci0", newDevice, true});
+    EXPECT_EQ(taken(), lines("device Playing", "device Playing=b:1", "device State=s:playing"));
+    EXPECT_EQ(call("AudioSink.IsConnected"), "b:1");
+    EXPECT_EQ(call("Control.IsConnected"), "b:1");
+    EXPECT_EQ(call("Control.GetProperties"), "a(e(s:Connected v(b:1)))");
+    EXPECT_EQ(call("AudioSink.GetProperties"),
               "a(e(s:State v(s:playing)) e(s:Connected v(b:1)) e(s:Playing v(b:1)))");
-    EXPECT_EQ(client->trace("Audio.Disconnect").front(), "device Stopped");
-    EXPECT_EQ(client->call("Audio.GetProperties"), "a(e(s:State v(s:disconnected)))");
-    EXPECT_EQ(client->call("Audio.Disconnect"), notConnected);
-    EXPECT_EQ(client->call("AudioSink.Disconnect"), notConnected);
-    EXPECT_EQ(client->call("AudioSink.Connect"), "");
-    EXPECT_EQ(client->call("AudioSink.Disconnect"), "");
-    client->control({"SetDevice", newDevice, Settings{{"Connectable", "false"}}});
-    EXPECT_EQ(client->call("Audio.Connect"), "error Failed: Connect Failed");
+    EXPECT_EQ(trace("Audio.Disconnect").front(), "device Stopped");
+    EXPECT_EQ(call("Audio.GetProperties"), "a(e(s:State v(s:disconnected)))");
+    EXPECT_EQ(call("Audio.Disconnect"), notConnected);
+    EXPECT_EQ(call("AudioSink.Disconnect"), notConnected);
+    EXPECT_EQ(call("AudioSink.Connect"), "");
+    EXPECT_EQ(call("AudioSink.Disconnect"), "");
+    control({"SetDevice", newDevice, Settings{{"Connectable", "false"}}});
+    EXPECT_EQ(call("Audio.Connect"), "error Failed: Connect Failed");
 }
 
 TEST_F(DeviceTest, AServiceOfAnUntrustedDeviceNeedsTheAgentsConsent) {
@@ -169,26 +163,26 @@ TEST_F(DeviceTest, AServiceOfAnUntrustedDeviceNeedsTheAgentsConsent) {
     create(settings);
     registerAgent();
     const std::string asked = "agent Authorize o:device s:0000110d-0000-1000-8000-00805f9b34fb";
-    client->peer().replyError("Authorize", "org.bluez.Error.Rejected", "said no");
-    EXPECT_EQ(client->call("AudioSink.Connect"), "error Failed: Stream setup failed");
-    client->until(asked);
-    client->peer().reply("Authorize");
-    client->control({"ConnectService", "hci0", newDevice, "110d"});
-    client->until(asked);
-    client->until("device State=s:connected");
-    client->call("Audio.Disconnect");
+    peer().replyError("Authorize", "org.bluez.Error.Rejected", "said no");
+    EXPECT_EQ(call("AudioSink.Connect"), "error Failed: Stream setup failed");
+    until(asked);
+    peer().reply("Authorize");
+    control({"ConnectService", "hci0", newDevice, "110d"});
+    until(asked);
+    until("device State=s:connected");
+    call("Audio.Disconnect");
     setOfDevice("Trusted", true);
-    for (const std::string& line : client->trace("Audio.Connect"))
+    for (const std::string& line : trace("Audio.Connect"))
         EXPECT_EQ(line.find("agent"), std::string::npos) << line;
 }
 
 TEST_F(DeviceTest, ADeviceThatConnectsByItselfStaysOnlyAsLongAsItsLink) {
     add({{"UUIDs", "1101"}});
-    client->control({"ConnectDevice", "hci0", newDevice});
-    EXPECT_EQ(client->until("device UUIDs"),
+    control({"ConnectDevice", "hci0", newDevice});
+    EXPECT_EQ(until("device UUIDs"),
               created + lines("device Connected=b:1", "device UUIDs=" + serialPort));
-    client->control({"DropLink", "hci0", newDevice});
-    EXPECT_EQ(client->taken(), lines("device Connected=b:0") + removed);
+    control({"DropLink", "hci0", newDevice});
+    EXPECT_EQ(taken(), lines("device Connected=b:0") + removed);
 }
 
 } // namespace Bluetooth::Test

@@ -5,30 +5,30 @@ namespace Bluetooth::Test {
 class SimPairingTest : public SimTest {
 protected:
     void startPairing(const char* capability = "") {
-        client->taken();
-        client->start({"Adapter.CreatePairedDevice", newDevice, agent, capability});
+        taken();
+        start({"Adapter.CreatePairedDevice", newDevice, agent, capability});
     }
     /// What comes between the new connection and the end of a pairing with this agent.
     Texts pair(const char* capability = "") {
         startPairing(capability);
-        client->until("device Connected=b:1");
-        Texts came = client->until("agent Release");
-        client->control("ClearFaults");
+        until("device Connected=b:1");
+        Texts came = until("agent Release");
+        control("ClearFaults");
         return came;
     }
     void comeToPair(const char* address = newDevice) {
-        client->control({"StartIncomingPairing", "hci0", address});
+        control({"StartIncomingPairing", "hci0", address});
     }
     /// A pairing whose agent has been asked and stays silent.
     void startWaiting(const Settings& settings = {{"Passkey", "7"}}) {
         add(settings);
-        client->peer().neverReply("RequestConfirmation");
+        peer().neverReply("RequestConfirmation");
         startPairing();
-        client->until("agent RequestConfirmation");
+        until("agent RequestConfirmation");
     }
     void forgetDevice() {
-        client->control({"DropLink", "hci0", newDevice});
-        client->call({"Adapter.RemoveDevice", device});
+        control({"DropLink", "hci0", newDevice});
+        call({"Adapter.RemoveDevice", device});
     }
 
     const std::string answer = "answer CreatePairedDevice";
@@ -42,22 +42,22 @@ protected:
 TEST_F(SimPairingTest, SuccessComesInTheOrderOfTheDaemon) {
     add({{"Name", "Phone"}, {"Passkey", "42"}, {"UUIDs", "1101"}});
     startPairing();
-    EXPECT_EQ(client->until(answer),
+    EXPECT_EQ(until(answer),
               created + lines(connected, "device Name=s:Phone", "device Alias=s:Phone",
                               "agent RequestConfirmation o:device u:42", paired, "agent Release",
                               uuids, answer + " o:device"));
     startPairing();
-    EXPECT_EQ(client->until(answer), lines(failed + "AlreadyExists: Already Exists"));
+    EXPECT_EQ(until(answer), lines(failed + "AlreadyExists: Already Exists"));
 }
 
 TEST_F(SimPairingTest, ADeviceThatExistsIsOnlyPaired) {
     create({{"Behaviour", "JustWorks"}});
     startPairing();
-    EXPECT_EQ(client->until(answer), lines(paired, "agent Release", answer + " o:device"));
+    EXPECT_EQ(until(answer), lines(paired, "agent Release", answer + " o:device"));
 }
 
 TEST_F(SimPairingTest, TheTwoCapabilitiesDecideWhatTheAgentIsAsked) {
-    client->peer().reply("RequestPasskey", with(7U));
+    peer().reply("RequestPasskey", with(7U));
     const std::string confirmation = "agent RequestConfirmation o:device u:7";
     const std::string passkey = "agent RequestPasskey o:device";
     const std::string display = "agent DisplayPasskey o:device u:7 y:0";
@@ -77,13 +77,13 @@ TEST_F(SimPairingTest, TheTwoCapabilitiesDecideWhatTheAgentIsAsked) {
             const Texts came = pair(capability);
             EXPECT_EQ(came.front(), *++expected) << row[0] << " and " << capability;
             EXPECT_EQ(came[came.size() - 2], paired);
-            client->until(answer + " o:");
+            until(answer + " o:");
             forgetDevice();
-            client->control({"RemoveDevice", newDevice});
+            control({"RemoveDevice", newDevice});
         }
     }
     startPairing("Telepathy");
-    EXPECT_EQ(client->until(answer).back(), answer + " " + badArguments);
+    EXPECT_EQ(until(answer).back(), answer + " " + badArguments);
 }
 
 TEST_F(SimPairingTest, APasskeyIsShownWhileItIsTypedThere) {
@@ -96,8 +96,8 @@ TEST_F(SimPairingTest, APasskeyIsShownWhileItIsTypedThere) {
 
 TEST_F(SimPairingTest, APinIsShownToAnAgentThatCanAndAskedOfOneThatCannot) {
     add({{"Behaviour", "DisplayPin"}, {"PIN", "0000"}, {"Passkey", "42"}});
-    client->peer().replyError("DisplayPinCode", DBUS_ERROR_UNKNOWN_METHOD, "");
-    client->peer().reply("RequestPinCode", with("0000"));
+    peer().replyError("DisplayPinCode", DBUS_ERROR_UNKNOWN_METHOD, "");
+    peer().reply("RequestPinCode", with("0000"));
     EXPECT_EQ(pair(), lines("agent DisplayPinCode o:device s:000042",
                             "agent RequestPinCode o:device", paired, "agent Release"));
 }
@@ -130,29 +130,29 @@ TEST_F(SimPairingTest, FailuresHaveTheErrorOfTheirCauseAndTakeTheDeviceBack) {
         add({{"Behaviour", failure.behaviour}});
         Texts expected = lines(connected);
         if (failure.request) {
-            client->peer().reply(failure.request, failure.answer);
+            peer().reply(failure.request, failure.answer);
             expected.push_back(std::string("agent ") + failure.request + " o:device");
         }
         if (failure.refusal)
-            client->peer().replyError(failure.request, failure.refusal, "");
+            peer().replyError(failure.request, failure.refusal, "");
         startPairing();
-        client->until(created[1]);
-        Texts came = client->until(removed[1]);
+        until(created[1]);
+        Texts came = until(removed[1]);
         for (std::string& line : came)
             line = line.substr(0, line.find(" u:")); // the passkey to confirm
         EXPECT_EQ(came, expected +
                             lines(failed + "Authentication" + failure.error, "agent Release") +
                             disconnected)
             << failure.behaviour << " and " << failure.error;
-        client->control({"RemoveDevice", newDevice});
+        control({"RemoveDevice", newDevice});
     }
     add({{"Behaviour", "RepeatedAttempts"}});
     startPairing();
-    EXPECT_EQ(client->until(answer).back(), failed + "RepeatedAttempts: Repeated Attempts");
-    client->until(removed[1]);
-    client->control({"RemoveDevice", newDevice});
+    EXPECT_EQ(until(answer).back(), failed + "RepeatedAttempts: Repeated Attempts");
+    until(removed[1]);
+    control({"RemoveDevice", newDevice});
     startPairing(); // and nobody there is a page timeout
-    EXPECT_EQ(client->until(removed[1]),
+    EXPECT_EQ(until(removed[1]),
               created + lines(failed + "ConnectionAttemptFailed: Page Timeout", "agent Release") +
                   removed);
 }
@@ -160,7 +160,7 @@ TEST_F(SimPairingTest, FailuresHaveTheErrorOfTheirCauseAndTakeTheDeviceBack) {
 TEST_F(SimPairingTest, SilenceTimesOutWithCancel) {
     setTime("PairingTimeout", "100");
     startWaiting();
-    EXPECT_EQ(client->until(removed[1]),
+    EXPECT_EQ(until(removed[1]),
               lines("agent Cancel", failed + "AuthenticationTimeout: Authentication Timeout",
                     "agent Release") +
                   disconnected);
@@ -168,7 +168,7 @@ TEST_F(SimPairingTest, SilenceTimesOutWithCancel) {
 
 TEST_F(SimPairingTest, ALostLinkIsToldToAgentAndCaller) {
     startWaiting({{"Behaviour", "VanishesWhilePairing"}});
-    EXPECT_EQ(client->until("agent Release"),
+    EXPECT_EQ(until("agent Release"),
               lines("agent Cancel", failed + "ConnectionAttemptFailed: Connection Timeout",
                     "agent Release"));
 }
@@ -176,13 +176,12 @@ TEST_F(SimPairingTest, ALostLinkIsToldToAgentAndCaller) {
 TEST_F(SimPairingTest, CancellingByItsOwnerKeepsTheDaemonsOrder) {
     startWaiting();
     startPairing();
-    EXPECT_EQ(client->until(answer), lines(failed + "InProgress: In Progress"));
-    EXPECT_EQ(client->call({"Adapter.CreateDevice", newDevice}),
-              "error AlreadyExists: Already Exists");
+    EXPECT_EQ(until(answer), lines(failed + "InProgress: In Progress"));
+    EXPECT_EQ(call({"Adapter.CreateDevice", newDevice}), "error AlreadyExists: Already Exists");
     SimClient other;
     const Question cancel("Adapter.CancelDeviceCreation", newDevice);
     EXPECT_EQ(other.call(cancel), "error NotAuthorized: Operation Not Authorized");
-    EXPECT_EQ(client->trace(cancel, answer),
+    EXPECT_EQ(trace(cancel, answer),
               lines("device DisconnectRequested", "answer CancelDeviceCreation",
                     "device Connected=b:0", "agent Cancel") +
                   removed +
@@ -190,7 +189,7 @@ TEST_F(SimPairingTest, CancellingByItsOwnerKeepsTheDaemonsOrder) {
 }
 
 TEST_F(SimPairingTest, PowerOffCancels) {
-    client->call("Adapter.StartDiscovery"); // suspended; it does not come back either
+    call("Adapter.StartDiscovery"); // suspended; it does not come back either
     startWaiting();
     EXPECT_EQ(set("Powered", false),
               lines("agent Cancel", failed + "AuthenticationCanceled: Authentication Canceled",
@@ -205,36 +204,36 @@ TEST_F(SimPairingTest, ThePairingEndsWithItsClient) {
     other->peer().neverReply("RequestConfirmation");
     other->start({"Adapter.CreatePairedDevice", newDevice, agent, ""});
     other->until("agent RequestConfirmation");
-    client->until(connected);
+    until(connected);
     other.reset();
-    EXPECT_EQ(client->until(removed[1]), lines("device DisconnectRequested") + disconnected);
+    EXPECT_EQ(until(removed[1]), lines("device DisconnectRequested") + disconnected);
 }
 
 TEST_F(SimPairingTest, AnUnregisteredAgentNoLongerAnswers) {
     add();
-    client->peer().neverReply("RequestConfirmation");
+    peer().neverReply("RequestConfirmation");
     registerAgent();
     comeToPair();
-    client->until("agent RequestConfirmation");
-    EXPECT_EQ(client->trace({"Adapter.UnregisterAgent", agent}),
+    until("agent RequestConfirmation");
+    EXPECT_EQ(trace({"Adapter.UnregisterAgent", agent}),
               lines("agent Cancel", "agent Release", "answer UnregisterAgent"));
-    EXPECT_EQ(client->until(removed[1]), disconnected);
+    EXPECT_EQ(until(removed[1]), disconnected);
 }
 
 TEST_F(SimPairingTest, IncomingPairingsAskTheRegisteredAgentAndJustWorkWithoutOne) {
     add({{"Passkey", "7"}, {"UUIDs", "1101"}});
     comeToPair();
-    client->until(uuids);
+    until(uuids);
     forgetDevice();
     registerAgent();
-    client->taken();
+    taken();
     comeToPair();
-    EXPECT_EQ(client->until(uuids),
+    EXPECT_EQ(until(uuids),
               created + lines(connected, "agent RequestConfirmation o:device u:7", paired, uuids));
     set("Pairable", false);
     add({}, otherDevice);
     comeToPair(otherDevice);
-    client->until("hci0 DeviceRemoved o:hci0/dev_00_11_22_33_44_66");
+    until("hci0 DeviceRemoved o:hci0/dev_00_11_22_33_44_66");
 }
 
 } // namespace Bluetooth::Test

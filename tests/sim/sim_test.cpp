@@ -37,7 +37,7 @@ SimClient::SimClient()
           "DisplayPinCode", "Authorize", "ConfirmModeChange", "Cancel", "Release"})
         m_peer.reply(request);
     m_peer.addMatch("type='signal',sender='org.bluez'");
-    base();
+    findBase();
 }
 
 SimClient::Target SimClient::targetOf(const Question& question) const {
@@ -112,7 +112,7 @@ Texts SimClient::take(std::size_t end) {
     return {place(std::exchange(m_taken, end)), place(end)};
 }
 
-std::string SimClient::base() {
+std::string SimClient::findBase() {
     const MessagePtr reply =
         m_peer.call("org.bluez", "/", "org.bluez.Manager", "FindAdapter", with("any")).get();
     const std::string path = reply ? argumentsOf(reply.get()) : "";
@@ -141,23 +141,23 @@ void SimClient::write(DBusMessage* message) {
 
 void SimTest::create(const Settings& settings) {
     add(settings);
-    EXPECT_EQ(client->call({"Adapter.CreateDevice", newDevice}), "o:device");
-    client->taken();
+    EXPECT_EQ(call({"Adapter.CreateDevice", newDevice}), "o:device");
+    taken();
 }
 
 Texts SimTest::effectOf(const Question& question) {
-    client->taken();
-    client->start(question);
-    client->control("ClearFaults"); // answered after all that the call brought about
-    return client->taken();
+    taken();
+    start(question);
+    control("ClearFaults"); // answered after all that the call brought about
+    return taken();
 }
 
 void SimTest::leave(std::unique_ptr<SimClient>& other) {
     std::string name;
     other->peer().run([&](DBusConnection* bus) { name = dbus_bus_get_unique_name(bus); });
     other.reset();
-    EXPECT_TRUE(client->peer().waitForOwner(name, false));
-    client->control("ClearFaults");
+    EXPECT_TRUE(peer().waitForOwner(name, false));
+    control("ClearFaults");
 }
 
 } // namespace Bluetooth::Test

@@ -52,7 +52,7 @@ public:
     Texts taken() { return take(m_lines.count()); }
 
     /// Where the daemon's paths begin at present, with a slash at the end.
-    std::string base();
+    std::string findBase();
     /// The participant itself. As the agent it says yes to everything until it is told otherwise.
     RawPeer& peer() { return m_peer; }
 
@@ -73,16 +73,24 @@ private:
 };
 
 /// The daemon with two adapters and no devices.
-class SimTest : public testing::Test {
+class TwoAdapters {
+protected:
+    Simulation simulation{"[Times]\nIdleDisconnect=4000000\n"
+                          "[Adapter hci0]\nAddress=00:1A:7D:DA:71:10\nName=first\n"
+                          "[Adapter hci1]\nAddress=00:1A:7D:DA:71:11\nName=second\n"};
+};
+
+/// Each test is a client of it.
+class SimTest : public testing::Test, protected TwoAdapters, protected SimClient {
 protected:
     /// A device in range.
     void add(const Settings& settings = {}, const char* address = newDevice) {
-        client->control({"AddDevice", address, settings});
+        control({"AddDevice", address, settings});
     }
     /// The same, known to hci0 and connected; what was written down of it is forgotten.
     void create(const Settings& settings = {});
     void setTime(const char* name, const char* milliseconds) {
-        client->control({"SetTimes", Settings{{name, milliseconds}}});
+        control({"SetTimes", Settings{{name, milliseconds}}});
     }
     /// Sets a property of hci0. @return all that this brought about, after its answer too
     template <class Value>
@@ -95,15 +103,11 @@ protected:
         return effectOf({"Device.SetProperty", name, Var{value}});
     }
     Texts effectOf(const Question& question);
-    void registerAgent() { client->call({"Adapter.RegisterAgent", agent, ""}); }
+    void registerAgent() { call({"Adapter.RegisterAgent", agent, ""}); }
     /// Another client leaves the bus, and the daemon has been told so.
     void leave(std::unique_ptr<SimClient>& other);
 
-    Simulation simulation{"[Times]\nIdleDisconnect=4000000\n"
-                          "[Adapter hci0]\nAddress=00:1A:7D:DA:71:10\nName=first\n"
-                          "[Adapter hci1]\nAddress=00:1A:7D:DA:71:11\nName=second\n"};
-    std::unique_ptr<SimClient> client = std::make_unique<SimClient>();
-    const std::string base = client->base();
+    const std::string base = findBase();
     const Path device{base + "hci0/dev_00_11_22_33_44_55"};
     const Path agent{"/agent"};
 };

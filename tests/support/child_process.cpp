@@ -31,8 +31,7 @@ std::vector<std::string> fullEnvironment(std::vector<std::string> added) {
     return added;
 }
 
-} // namespace
-
+/// Appends what can be read. @return false at the end or in time-out
 bool readMore(int descriptor, std::string& buffer, Milliseconds limit) {
     pollfd input{descriptor, POLLIN, 0};
     char bytes[4096];
@@ -45,14 +44,7 @@ bool readMore(int descriptor, std::string& buffer, Milliseconds limit) {
     return true;
 }
 
-bool takeLine(std::string& buffer, std::string& line) {
-    const std::size_t end = buffer.find('\n');
-    if (end == std::string::npos)
-        return false;
-    line = buffer.substr(0, end);
-    buffer.erase(0, end + 1);
-    return true;
-}
+} // namespace
 
 ChildProcess::ChildProcess(std::vector<std::string> command, Output output,
                            std::vector<std::string> environment) {
@@ -130,11 +122,13 @@ Result ChildProcess::finish() {
 }
 
 std::string ChildProcess::readLine(Milliseconds limit) {
-    std::string line;
-    while (!takeLine(m_buffer, line)) {
+    std::size_t end = 0;
+    while ((end = m_buffer.find('\n')) == std::string::npos) {
         if (!readMore(m_output, m_buffer, limit))
             return std::exchange(m_buffer, {});
     }
+    const std::string line = m_buffer.substr(0, end);
+    m_buffer.erase(0, end + 1);
     return line;
 }
 

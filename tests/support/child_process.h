@@ -64,12 +64,6 @@ private:
     std::string m_buffer;
 };
 
-/// Appends what can be read from a descriptor. @return false at its end or in time-out
-bool readMore(int descriptor, std::string& buffer, Milliseconds limit);
-
-/// Takes the first line out of a buffer. @return false when it holds no whole line
-bool takeLine(std::string& buffer, std::string& line);
-
 } // namespace Bluetooth::Test
 
 #endif

@@ -29,7 +29,7 @@ inline void serveObject(DBusConnection* connection) {
     static const DBusObjectPathVTable handlers = [] {
         DBusObjectPathVTable table{};
         table.message_function = [](DBusConnection* bus, DBusMessage* request, void*) {
-            const MessagePtr reply = replyTo(request, [](Writer& w) { w(onRequest()()); });
+            const MessagePtr reply = replyTo(request, with(onRequest()()));
             dbus_connection_send(bus, reply.get(), nullptr);
             return DBUS_HANDLER_RESULT_HANDLED;
         };

@@ -61,11 +61,11 @@ MessagePtr Simulation::control(const std::string& method, const Build& arguments
 
 void Simulation::failNext(const char* interface, const char* method, const char* name,
                           const char* text) {
-    control("FailNext", [&](Writer& w) { w(interface)(method)(name)(text); });
+    control("FailNext", with(interface, method, name, text));
 }
 
 void Simulation::delayNext(const char* interface, const char* method, std::uint32_t milliseconds) {
-    control("DelayNext", [&](Writer& w) { w(interface)(method)(milliseconds); });
+    control("DelayNext", with(interface, method, milliseconds));
 }
 
 Texts Simulation::calls() {
