@@ -2,6 +2,8 @@
 
 #include <bluetooth/remote_object.h>
 
+#include <utility>
+
 namespace Bluetooth {
 
 Subscriptions::Subscriptions() = default;
@@ -52,17 +54,16 @@ bool Subscriptions::isCalling(const RemoteObject* proxy) const {
 
 template <class Callback>
 Subscriptions::Walk<Callback>::Walk(DBusMessage* signal)
-    : m_lock(all().m_mutex),
-      m_kind(all().of<Callback>()),
+    : m_lock(m_all.m_mutex),
+      m_kind(m_all.of<Callback>()),
       m_signal(signal),
-      m_next(m_kind.records.begin()),
-      m_other(m_kind.walks) {
-    m_kind.walks = this;
-}
+      m_next(m_kind.records.begin()) {}
 
 template <class Callback>
 void Subscriptions::Walk<Callback>::leave() {
     endCall();
+    if (m_thread == std::thread::id())
+        return;
     Walk** link = &m_kind.walks;
     while (*link != this)
         link = &(*link)->m_other;
@@ -74,12 +75,10 @@ bool Subscriptions::Walk<Callback>::next() {
     endCall();
     while (m_next != m_kind.records.end()) {
         const SignalHandler<Callback>& record = *m_next++;
-        if (!matches(record))
-            continue;
-        m_proxy = record.object;
-        m_callback = record.callback;
-        m_lock.unlock();
-        return true;
+        if (matches(record)) {
+            beginCall(record);
+            return true;
+        }
     }
     return false;
 }
@@ -90,14 +89,24 @@ bool Subscriptions::Walk<Callback>::matches(const SignalHandler<Callback>& recor
            dbus_message_is_signal(m_signal, record.object->getInterface(), record.member.c_str());
 }
 
-/// Afterwards the mutex is held.
+template <class Callback>
+void Subscriptions::Walk<Callback>::beginCall(const SignalHandler<Callback>& record) {
+    if (m_thread == std::thread::id()) {
+        m_thread = std::this_thread::get_id();
+        m_other = std::exchange(m_kind.walks, this);
+    }
+    m_proxy = record.object;
+    m_callback = record.callback;
+    m_lock.unlock();
+}
+
 template <class Callback>
 void Subscriptions::Walk<Callback>::endCall() {
     if (m_lock.owns_lock())
         return;
     m_lock.lock();
     m_proxy = nullptr;
-    all().m_callbackDone.notify_all();
+    m_all.m_callbackDone.notify_all();
 }
 
 template class Subscriptions::Walk<NoArgumentCallback>;

@@ -125,17 +125,19 @@ private:
     friend class Subscriptions;
 
     bool matches(const SignalHandler<Callback>& record) const;
+    void beginCall(const SignalHandler<Callback>& record);
     void endCall();
     void leave();
 
+    Subscriptions& m_all = all();
     std::unique_lock<std::mutex> m_lock; // not held while a callback runs
     Kind<Callback>& m_kind;
     DBusMessage* const m_signal;
-    const std::thread::id m_thread = std::this_thread::get_id();
     typename Records<Callback>::iterator m_next;
     RemoteObject* m_proxy = nullptr; // whose callback runs; null: none
     Callback m_callback = nullptr;
-    Walk* m_other = nullptr; // another walk along the same records
+    std::thread::id m_thread; // none before the first callback; then the walk is one of m_kind
+    Walk* m_other = nullptr;  // another walk along the same records
 };
 
 } // namespace Bluetooth
