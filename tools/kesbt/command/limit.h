@@ -10,7 +10,7 @@ using Clock = std::chrono::steady_clock;
 
 /// What the time-out (25 s, or what the user gave with --timeout) means for a verb: each form of a
 /// verb declares one of these. Except in a whole one each step has the time-out for itself: an
-/// answer of the daemon, and a change to show.
+/// answer of the daemon, and a change to show; such verbs read through daemon/, which sees to it.
 enum class Limit {
     Whole,     ///< it only reads: a time-out that was given is for all of it together
     Steps,     ///< it has nothing but steps
