@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // Blocking method calls, each library on its own connection to the same peer. No receive thread
 // runs: that is measured beside the signals.
 

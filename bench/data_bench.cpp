@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // What happens inside the process: decoding dictionaries, their text form, and dispatch.
 
 #include "bus.h"

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // Listing devices with all that it takes: ListDevices, and for each device the factory's question
 // to the bus whether the daemon is there. Raw libdbus sends the very same messages.
 

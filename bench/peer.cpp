@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // The other side of every measurement: a process that answers calls and emits signals through raw
 // libdbus, with replies that were made beforehand, so that its own cost is small and always the
 // same.

@@ -1,4 +1,5 @@
 #!/usr/bin/env python3
+# SPDX-License-Identifier: LGPL-2.1-or-later
 """Makes FOLDER/performance.md and performance.svg from the figures in FOLDER/performance.json.
 
     bench/report.py FOLDER [RESULTS-FOLDER]

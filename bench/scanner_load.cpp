@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // The scanner service under load: 8 client programs ask on 2 adapters as fast as they are answered,
 // while 1,000 devices are found again and again at about 500 signals a second.
 //

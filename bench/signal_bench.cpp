@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // Signals: from emission to callback, and what a thread that waits for them costs. The time of a
 // result is the median latency of its signals.
 //

@@ -1,3 +1,4 @@
+# SPDX-License-Identifier: LGPL-2.1-or-later
 # What an installation holds. Components: runtime (the library), dev, doc, sim, and
 # one for each program: kesbt, scannerd, autoconnectd.
 include(CMakePackageConfigHelpers)

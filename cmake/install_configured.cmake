@@ -1,3 +1,4 @@
+# SPDX-License-Identifier: LGPL-2.1-or-later
 # Installs packaging/FILE.in with @program@ as the path of an installed program. Made when
 # installing, for the prefix may be chosen then.
 function(kesbluetooth_install_configured file program destination component)

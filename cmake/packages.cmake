@@ -1,3 +1,4 @@
+# SPDX-License-Identifier: LGPL-2.1-or-later
 # Debian packages, one for each component: `cpack` in a build folder that was configured for /usr,
 # or scripts/packages.sh. Names and versions follow from the project's version.
 set(CPACK_GENERATOR DEB)

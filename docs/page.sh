@@ -1,4 +1,5 @@
 #!/usr/bin/env bash
+# SPDX-License-Identifier: LGPL-2.1-or-later
 # What Doxygen reads in place of a page; runs in the project's folder.
 #   docs/page.sh PAGE
 classes=$(sed -n 's/^\(class\|struct\) KESBLUETOOTH_API \([A-Za-z]*\).*/\2/p' include/bluetooth/*.h |

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // Puts a device on the default adapter's auto-connect list: kesbt-autoconnectd then connects it
 // whenever it is in range. Needs permission to write below /etc/bluetooth.
 //   auto_connect ADDRESS

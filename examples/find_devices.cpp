@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // Shows the devices in range as they come and go, for a time or until Ctrl-C.
 //   find_devices [SECONDS]     10 by default
 #include <bluetooth/adapter.h>

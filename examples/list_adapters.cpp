@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // Lists the Bluetooth adapters of this host.
 #include <bluetooth/adapter.h>
 #include <bluetooth/adapter_list.h>

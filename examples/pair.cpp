@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // Pairs with a device. The command line may have the PIN code or passkey; a passkey that both sides
 // show is confirmed.
 //   pair ADDRESS [PIN]

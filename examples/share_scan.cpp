@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // Shows the devices that the shared scan finds. Any number of programs may run at once: the adapter
 // runs one discovery for all of them.
 //   share_scan [SECONDS]     10 by default

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // Connects a headset and shows the changes of its audio until Ctrl-C, which disconnects it.
 //   watch_headset ADDRESS
 #include <bluetooth/adapter.h>

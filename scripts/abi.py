@@ -1,3 +1,4 @@
+# SPDX-License-Identifier: LGPL-2.1-or-later
 """Compares the symbols that a library exports with what its headers declare.
 
 abi.py CASTXML_OUTPUT EXPORTED_SYMBOLS HEADER_FOLDER

@@ -1,4 +1,5 @@
 #!/usr/bin/env bash
+# SPDX-License-Identifier: LGPL-2.1-or-later
 # Checks the library's binary interface: its name, and that it exports what the public headers
 # declare, nothing more, and nothing else than the last release did (src/kesbluetooth.symbols).
 #   scripts/abi.sh [--update]    --update: writes the list anew, for a change that is meant

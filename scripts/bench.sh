@@ -1,4 +1,5 @@
 #!/usr/bin/env bash
+# SPDX-License-Identifier: LGPL-2.1-or-later
 # Measures the library against raw libdbus and against other D-Bus libraries, all on private buses
 # in one run, and writes docs/performance.md with its chart and its figures. Installs the Debian
 # packages that are missing.

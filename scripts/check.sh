@@ -1,4 +1,5 @@
 #!/usr/bin/env bash
+# SPDX-License-Identifier: LGPL-2.1-or-later
 # Builds everything and passes the tests. Installs the Debian packages that are missing.
 #   scripts/check.sh [--sanitize address,undefined | --sanitize thread] [ctest option...]
 source "$(dirname "$0")/lib.sh"

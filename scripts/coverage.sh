@@ -1,4 +1,5 @@
 #!/usr/bin/env bash
+# SPDX-License-Identifier: LGPL-2.1-or-later
 # Measures which lines and branches the tests reach, folder by folder.
 #   scripts/coverage.sh [ctest option...]      build-coverage/coverage.txt then has every file
 source "$(dirname "$0")/lib.sh"

@@ -1,4 +1,5 @@
 #!/usr/bin/env bash
+# SPDX-License-Identifier: LGPL-2.1-or-later
 # Writes the documentation of the classes and the pages to build/docs/html. Any warning is a failure,
 # and so is an operation that does not name its D-Bus method or signal, and a place in CONTRIBUTING.md
 # that is not there. Installs the Debian package that is missing.

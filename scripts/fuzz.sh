@@ -1,4 +1,5 @@
 #!/usr/bin/env bash
+# SPDX-License-Identifier: LGPL-2.1-or-later
 # Fuzzes the decoders, the dispatchers, the text codec and the file readers with libFuzzer, under
 # the address and undefined-behaviour sanitizers. Fails on the first finding, and says where the
 # input lies that shows it.

@@ -1,4 +1,5 @@
 #!/usr/bin/env bash
+# SPDX-License-Identifier: LGPL-2.1-or-later
 # Checks the layout with clang-format and the code with clang-tidy; --fix lays the files out,
 # --layout checks the layout only.
 source "$(dirname "$0")/lib.sh"

@@ -1,4 +1,5 @@
 #!/usr/bin/env bash
+# SPDX-License-Identifier: LGPL-2.1-or-later
 # Makes the Debian packages and checks them with lintian; they are in build-packages/ then.
 #   scripts/packages.sh [--test]   --test: installs them in a new Debian system in a folder as well,
 #                                  uses them there as a new user would, and removes them (as root)

@@ -1,4 +1,5 @@
 #!/usr/bin/env bash
+# SPDX-License-Identifier: LGPL-2.1-or-later
 # Takes the tour on a terminal and draws some of its sections, as they came, to docs/tour.svg.
 source "$(dirname "$0")/lib.sh"
 

@@ -1,4 +1,5 @@
 #!/usr/bin/env bash
+# SPDX-License-Identifier: LGPL-2.1-or-later
 # Uses the library for long and checks that nothing is left behind: 100,000 calls, 1,000,000
 # signals, and a daemon that goes and comes back 1,000 times.
 #   scripts/soak.sh [--minute]    --minute: two fifths of all that

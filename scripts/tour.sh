@@ -1,4 +1,5 @@
 #!/usr/bin/env bash
+# SPDX-License-Identifier: LGPL-2.1-or-later
 # A tour of what the programs do, against the simulated daemon on private buses. It expects the
 # programs in PATH and needs no Bluetooth. Where that is possible it runs in a mount namespace of its
 # own: what it writes to /etc and /tmp is then seen by nobody else.

@@ -1,4 +1,5 @@
 #!/usr/bin/env bash
+# SPDX-License-Identifier: LGPL-2.1-or-later
 # Builds the programs and shows what they do, against the simulated daemon on private buses.
 source "$(dirname "$0")/lib.sh"
 

@@ -1,4 +1,5 @@
 #!/usr/bin/env bash
+# SPDX-License-Identifier: LGPL-2.1-or-later
 # Runs tests that decode, call, answer and clean up under valgrind's memcheck, each in a process of
 # its own: invalid reads and writes, uninitialised values and leaks fail it.
 #   scripts/valgrind.sh [GTEST_FILTER]    the filter holds for each of the programs

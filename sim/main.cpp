@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #include "options.h"
 #include "run/command.h"
 #include "run/foreground.h"

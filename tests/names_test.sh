@@ -1,4 +1,5 @@
 #!/bin/sh
+# SPDX-License-Identifier: LGPL-2.1-or-later
 # Every test that a document names is there:
 #   names_test.sh BUILD_FOLDER DOCUMENT
 set -fu

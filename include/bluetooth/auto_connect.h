@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #ifndef KESBLUETOOTH_AUTO_CONNECT_H
 #define KESBLUETOOTH_AUTO_CONNECT_H
 

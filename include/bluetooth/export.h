@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #ifndef KESBLUETOOTH_EXPORT_H
 #define KESBLUETOOTH_EXPORT_H
 

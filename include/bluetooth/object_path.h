@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #ifndef KESBLUETOOTH_OBJECT_PATH_H
 #define KESBLUETOOTH_OBJECT_PATH_H
 

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #ifndef KESBLUETOOTH_SIGNAL_HANDLER_H
 #define KESBLUETOOTH_SIGNAL_HANDLER_H
 

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #ifndef KESBLUETOOTH_VARIANT_H
 #define KESBLUETOOTH_VARIANT_H
 

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #ifndef KESBLUETOOTH_SERVING_BLUEZ4_ICON_H
 #define KESBLUETOOTH_SERVING_BLUEZ4_ICON_H
 

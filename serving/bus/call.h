@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #ifndef KESBLUETOOTH_SERVING_BUS_CALL_H
 #define KESBLUETOOTH_SERVING_BUS_CALL_H
 

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #include "serving/session/process.h"
 
 #include "serving/bus/glib_ptr.h"

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #include "serving/session/signal_relay.h"
 
 #include <glib-unix.h>

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #ifndef KESBLUETOOTH_SIM_CONTROL_CALL_LOG_H
 #define KESBLUETOOTH_SIM_CONTROL_CALL_LOG_H
 

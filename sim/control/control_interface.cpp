@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #include "control/control_interface.h"
 
 #include "control/arguments.h"

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #include "control/world_control.h"
 
 #include "control/arguments.h"

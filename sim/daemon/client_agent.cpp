@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #include "daemon/client_agent.h"
 
 #include "serving/bluez4/errors.h"

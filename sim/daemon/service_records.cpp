@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #include "daemon/service_records.h"
 
 #include "world/settings.h"

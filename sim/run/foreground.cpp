@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #include "run/foreground.h"
 
 #include "control/control_interface.h"

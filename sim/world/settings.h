@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #ifndef KESBLUETOOTH_SIM_WORLD_SETTINGS_H
 #define KESBLUETOOTH_SIM_WORLD_SETTINGS_H
 

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #include <bluetooth/bluez_object.h>
 
 #include <bluetooth/dbus_object.h>

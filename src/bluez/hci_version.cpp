@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #include "bluez/hci_version.h"
 
 #include "core/process.h"

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #include <bluetooth/dbus_object.h>
 
 #include "core/method_call.h"

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #ifndef KESBLUETOOTH_CORE_PROCESS_H
 #define KESBLUETOOTH_CORE_PROCESS_H
 

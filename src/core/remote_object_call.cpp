@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // Method calls, their replies and errors.
 
 #include "core/bus_link.h"

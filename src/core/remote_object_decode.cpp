@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // How replies, signals and variants become values of the library, and back.
 
 #include "core/dbus_ptr.h"

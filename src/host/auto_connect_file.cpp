@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #include "host/auto_connect_file.h"
 
 #include <locale>

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #ifndef KESBLUETOOTH_HOST_PID_FILE_H
 #define KESBLUETOOTH_HOST_PID_FILE_H
 

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #ifndef KESBLUETOOTH_SCANNER_NAMES_H
 #define KESBLUETOOTH_SCANNER_NAMES_H
 

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // The pairing agent: what it answers to each request, and how.
 
 #include "support/peer_test.h"

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // Signals of the daemon: the callbacks that a program sets, and what the default ones print.
 
 #include "support/callbacks.h"

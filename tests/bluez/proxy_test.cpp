@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // What each operation of the proxies asks the daemon, and what becomes of the answer.
 
 #include "support/peer_test.h"

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // The proxies with the simulated daemon, from its start to its end.
 
 #include "support/callbacks.h"

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // The bus goes away, and comes back.
 
 #include "support/callbacks.h"

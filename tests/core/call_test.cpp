@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // Method calls: how they are built and sent, what failures record.
 
 #include "support/peer_test.h"

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // The text form of values and dictionaries.
 
 #include <bluetooth/dict_codec.h>

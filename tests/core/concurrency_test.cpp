@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // Many threads, one connection: no reply and no signal is lost, and no call waits for another's.
 
 #include "support/peer_test.h"

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // How replies become values of the library.
 
 #include "core/message_text.h"

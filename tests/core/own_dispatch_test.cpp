@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // Programs that dispatch the shared connection themselves, as those with a main loop do.
 
 #include "support/peer_test.h"

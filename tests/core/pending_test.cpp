@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // Calls without a time limit: what ends the wait, and who is served during it.
 
 #include "support/peer_test.h"

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // Subscriptions: who is told of which signal, in which order, and what bad signals do.
 
 #include "core/message_text.h"

@@ -1,4 +1,5 @@
 #!/usr/bin/env bash
+# SPDX-License-Identifier: LGPL-2.1-or-later
 # Installs everything to a fresh prefix and builds the installed examples with it, through CMake and
 # through pkg-config:
 #   build.sh BUILD_FOLDER LIBRARY_FOLDER WORK_FOLDER     LIBRARY_FOLDER as below the prefix: lib

@@ -1,4 +1,5 @@
 #!/usr/bin/env bash
+# SPDX-License-Identifier: LGPL-2.1-or-later
 # Runs each example against the simulated daemon and checks what it prints and does.
 #   run.sh FOLDER     FOLDER holds the built examples; bluez4-sim and kesbt are in PATH
 # It writes to /etc/bluetooth, and so wants a namespace of its own (tests/host/in_namespace.sh), or

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // The Bluetooth daemon goes and comes back, over and over, and the bus goes in the middle of a
 // scan. What the library does then is used meanwhile by other threads.
 

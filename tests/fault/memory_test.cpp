@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // Memory runs out: each allocation of an operation is made to fail in turn, in the library, in
 // libdbus and in the C++ library. The operation then reports an error or throws std::bad_alloc,
 // works the next time, and has leaked nothing.

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // Long use leaves nothing behind. scripts/soak.sh runs these at full length.
 
 #include "fault/soak.h"

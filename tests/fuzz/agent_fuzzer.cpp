@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // Any message to the pairing agent. Its answers go to a connection that is closed.
 
 #include "fuzz/message_source.h"

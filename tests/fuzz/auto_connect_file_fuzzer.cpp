@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // Any content of an auto-connect file, read in each way.
 
 #include "host/auto_connect_file.h"

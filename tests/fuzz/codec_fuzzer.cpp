@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // The text form of dictionaries: what was parsed once is formatted and parsed without change.
 
 #include <bluetooth/dict_codec.h>

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // Any reply, read as each of the types that a reply can be read as.
 
 #include "fuzz/message_source.h"

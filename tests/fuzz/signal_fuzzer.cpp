@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // Any signal, offered to a dispatcher that has subscribers; the input's first byte chooses which.
 
 #include "fuzz/message_source.h"

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // Which devices are to be connected: the lists in the files, and what the daemon knows of them.
 
 #include "host/auto_connect_fixture.h"

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #include "host/namespace_test.h"
 #include "host/process_lookup.h"
 #include "support/child_process.h"

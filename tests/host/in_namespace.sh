@@ -1,4 +1,5 @@
 #!/bin/sh
+# SPDX-License-Identifier: LGPL-2.1-or-later
 # Runs a command in a mount and PID namespace of its own, where the library's fixed paths are free
 # to be written:
 #   in_namespace.sh BUILD_FOLDER COMMAND [ARGUMENT...]

@@ -1,3 +1,4 @@
+# SPDX-License-Identifier: LGPL-2.1-or-later
 # Installs a program to a prefix that is chosen only then, and checks that the file that starts it
 # names it there.
 #   cmake -Dscript=CMAKE_INSTALL_SCRIPT -Dcomponent=NAME -Dprefix=FOLDER -P THIS

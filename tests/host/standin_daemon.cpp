@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // Stands in for bluetoothd: puts itself into the background and waits to be killed.
 
 #include <unistd.h>

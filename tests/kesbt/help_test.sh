@@ -1,4 +1,5 @@
 #!/usr/bin/env bash
+# SPDX-License-Identifier: LGPL-2.1-or-later
 # Holds a program's manual page and bash completion against its --help: every verb and option is in
 # both, and nothing else is.
 #   help_test.sh PROGRAM COMPLETION [PAGE]

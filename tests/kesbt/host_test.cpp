@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // The verbs that use the machine's fixed paths; ctest runs them in a namespace of their own.
 
 #include "kesbt/kesbt_test.h"

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // What the help and docs/kesbt.md promise: that the examples work, and the members of the JSON
 // documents. The host's verbs are among them: ctest runs this in a namespace.
 

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // The verbs on the scanner service, with the real service on a session bus of the test's own.
 
 #include "kesbt/kesbt_test.h"

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // The verbs that print until they are interrupted: discover and monitor.
 
 #include "kesbt/kesbt_test.h"

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // What the program says before there is anything to do, and when nothing can be done.
 
 #include "kesbt/kesbt_test.h"

@@ -1,4 +1,5 @@
 #!/bin/bash
+# SPDX-License-Identifier: LGPL-2.1-or-later
 # What a new user does with the packages beside this file, in a Debian system that has nothing else:
 # installs them, takes the tour, reads a manual page, builds the examples, removes everything.
 set -euo pipefail

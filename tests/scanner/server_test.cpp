@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // The server inside the test's process, where its parts can be reached.
 
 #include "scanner/scanner_test.h"

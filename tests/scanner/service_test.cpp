@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // The service in its own process (kesbt-scannerd), asked over the bus and by its client.
 
 #include "scanner/scanner_test.h"

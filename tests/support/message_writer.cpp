@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #include "support/message_writer.h"
 
 namespace Bluetooth::Test {

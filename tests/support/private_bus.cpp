@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #include "support/private_bus.h"
 
 #include <sys/wait.h>

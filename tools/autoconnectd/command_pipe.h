@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #ifndef KESBT_AUTOCONNECTD_COMMAND_PIPE_H
 #define KESBT_AUTOCONNECTD_COMMAND_PIPE_H
 

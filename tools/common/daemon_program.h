@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #ifndef KESBT_COMMON_DAEMON_PROGRAM_H
 #define KESBT_COMMON_DAEMON_PROGRAM_H
 

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 // kesbt: works with Bluetooth from the command line, through BlueZ 4's bluetoothd.
 
 #include "command/command_line.h"

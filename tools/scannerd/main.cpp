@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #include "service_name.h"
 
 #include "common/daemon_program.h"

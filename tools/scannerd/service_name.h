@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #ifndef KESBT_SCANNERD_SERVICE_NAME_H
 #define KESBT_SCANNERD_SERVICE_NAME_H
 

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #ifndef KESBT_COMMAND_OPTIONS_H
 #define KESBT_COMMAND_OPTIONS_H
 

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #ifndef KESBT_DAEMON_SHOWN_AGENT_H
 #define KESBT_DAEMON_SHOWN_AGENT_H
 

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #ifndef KESBT_DAEMON_SIGNAL_DELIVERY_H
 #define KESBT_DAEMON_SIGNAL_DELIVERY_H
 

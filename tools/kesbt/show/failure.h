@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #ifndef KESBT_SHOW_FAILURE_H
 #define KESBT_SHOW_FAILURE_H
 

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #include "daemon/objects.h"
 #include "verbs/list.h"
 

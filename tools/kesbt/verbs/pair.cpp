@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #include "daemon/creation.h"
 #include "daemon/objects.h"
 #include "daemon/shown_agent.h"

@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #include "show/failure.h"
 #include "show/output.h"
 #include "verbs/list.h"

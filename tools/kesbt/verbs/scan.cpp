@@ -1,3 +1,4 @@
+// SPDX-License-Identifier: LGPL-2.1-or-later
 #include "daemon/objects.h"
 #include "daemon/scan_service.h"
 #include "show/device_watch.h"
