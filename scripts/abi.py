@@ -23,7 +23,7 @@ def readable(symbols):
 def declared(path, folder):
     """Readable names of the routines that the headers declare without defining, and all classes."""
     elements = {element.get("id"): element for element in ElementTree.parse(path).getroot()}
-    files = {id for id, element in elements.items()
+    files = {id: open(element.get("name")).read().splitlines() for id, element in elements.items()
              if element.tag == "File" and element.get("name").startswith(folder + "/")}
 
     def full_name(element):
@@ -40,6 +40,10 @@ def declared(path, folder):
         if element.tag in ("Class", "Struct") and element.get("incomplete") != "1":
             classes.add(full_name(element))
         if any(element.get(made, "0") != "0" for made in MADE):
+            continue
+        # castxml does not say what is hidden.
+        line = element.get("line")
+        if line and "KESBLUETOOTH_LOCAL" in files[element.get("file")][int(line) - 1]:
             continue
         if element.tag in ("Constructor", "Destructor"):
             tilde = "~" if element.tag == "Destructor" else ""
