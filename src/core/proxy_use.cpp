@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: LGPL-2.1-or-later
 #include "core/proxy_use.h"
 
-#ifndef NDEBUG
+#ifdef KESBLUETOOTH_CHECK_THREADS
 
 #include <cstdio>
 #include <cstdlib>

@@ -11,11 +11,11 @@ namespace Bluetooth {
 /// While it lives, this thread uses a proxy. One thread at a time may: a debug build ends the
 /// program when two do at once. Threads that use a proxy one after the other are fine.
 ///
-/// What other threads may do meanwhile is no use: reading what never changes; startLoop(), whose
-/// thread may be in a callback before it returns, stopLoop() and waitLoop(); running the proxy's
-/// callbacks; recording in the loop's proxy that a signal could not be decoded. Nor is the part of
-/// the destructor that waits for callbacks, which may still use the proxy.
-#ifdef NDEBUG
+/// What other threads may do meanwhile is no use: reading what never changes; startLoop() and
+/// subscribing, whose callbacks may run before they return, stopLoop() and waitLoop(); running the
+/// proxy's callbacks; recording in the loop's proxy that a signal could not be decoded. Nor is the
+/// part of the destructor that waits for callbacks, which may still use the proxy.
+#ifndef KESBLUETOOTH_CHECK_THREADS
 
 class [[maybe_unused]] ProxyUse {
 public:

@@ -99,7 +99,6 @@ std::string RemoteObject::matchRule(const std::string& member) const {
 
 template <class Callback>
 int RemoteObject::subscribe(const char* member, Callback callback) {
-    const ProxyUse use(*this);
     ScopedError error;
     if (member && callback && dbus_validate_member(member, error)) {
         // Before AddMatch: without memory for the record the bus must not be left with a rule, and

@@ -9,7 +9,7 @@
 
 namespace Bluetooth {
 
-/// Programs know these by their numbers; getErrorMessage() tells each as text.
+/// Programs know these by their numbers; getErrorMessage() gives each as a string.
 enum RemoteObject::ErrorNumber : int {
     errorNullParameter = 1,
     errorNullReply,

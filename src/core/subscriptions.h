@@ -69,7 +69,8 @@ public:
     /// thread runs one of its callbacks.
     RecordsOfAllKinds remove(const RemoteObject* proxy);
 
-    /// The list itself: not to be touched, for it is guarded.
+    /// The list itself, which programs know by RemoteObject's static members: not to be touched,
+    /// for it is guarded.
     template <class Callback>
     Records<Callback>& records() {
         return of<Callback>().records;

@@ -136,7 +136,7 @@ TEST_F(ConcurrencyTest, ASlowCallDelaysNeitherOtherCallsNorTheirTimeOuts) {
     }
 }
 
-#ifndef NDEBUG
+#ifdef KESBLUETOOTH_CHECK_THREADS
 TEST_F(ConcurrencyTest, ADebugBuildEndsAProgramInWhichTwoThreadsUseAProxyAtOnce) {
     GTEST_FLAG_SET(death_test_style, "threadsafe");
     peer.neverReply("Never");
