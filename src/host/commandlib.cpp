@@ -97,9 +97,11 @@ int restartBluetoothd() {
     return 0;
 }
 
-char* getAddressFromPath(const char* path) {
+char* getAddressFromPath(const char* path) try {
     const auto address = path ? addressInPath(path) : std::nullopt;
     return address ? strdup(address->c_str()) : nullptr;
+} catch (const std::bad_alloc&) {
+    return nullptr;
 }
 
 } // namespace Bluetooth
