@@ -20,14 +20,14 @@ struct GFree {
 template <class Type>
 using GPtr = std::unique_ptr<Type, GFree>;
 
-class Connection {
+class GdbusConnection {
 public:
-    Connection() : m_connection(g_bus_get_sync(G_BUS_TYPE_SYSTEM, nullptr, nullptr)) {
+    GdbusConnection() : m_connection(g_bus_get_sync(G_BUS_TYPE_SYSTEM, nullptr, nullptr)) {
         require(m_connection, "GDBus: no connection");
     }
-    ~Connection() { g_object_unref(m_connection); }
-    Connection(const Connection&) = delete;
-    Connection& operator=(const Connection&) = delete;
+    ~GdbusConnection() { g_object_unref(m_connection); }
+    GdbusConnection(const GdbusConnection&) = delete;
+    GdbusConnection& operator=(const GdbusConnection&) = delete;
     operator GDBusConnection*() const { return m_connection; }
 
     GPtr<GVariant> call(const char* method, const char* replyType,
@@ -75,7 +75,7 @@ public:
     }
 
 private:
-    Connection m_connection;
+    GdbusConnection m_connection;
 };
 
 class GDBusListener : public Listener {
@@ -105,7 +105,7 @@ private:
         reinterpret_cast<Handler>(handler)(text);
     }
 
-    Connection m_connection;
+    GdbusConnection m_connection;
     GPtr<GMainContext> m_context;
     GPtr<GMainLoop> m_loop;
     guint m_subscription = 0;
@@ -135,7 +135,7 @@ public:
     }
 
 private:
-    Connection m_connection;
+    GdbusConnection m_connection;
     GPtr<GVariant> m_reply;
 };
 

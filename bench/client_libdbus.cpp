@@ -16,18 +16,18 @@ using Bluetooth::MessagePtr;
 using Bluetooth::ScopedError;
 
 /// A connection of its own, apart from the one that kesbluetooth uses.
-class Connection {
+class LibdbusConnection {
 public:
-    Connection() : m_connection(dbus_bus_get_private(DBUS_BUS_SYSTEM, nullptr)) {
+    LibdbusConnection() : m_connection(dbus_bus_get_private(DBUS_BUS_SYSTEM, nullptr)) {
         require(m_connection, "libdbus: no connection");
         dbus_connection_set_exit_on_disconnect(m_connection, false);
     }
-    ~Connection() {
+    ~LibdbusConnection() {
         dbus_connection_close(m_connection);
         dbus_connection_unref(m_connection);
     }
-    Connection(const Connection&) = delete;
-    Connection& operator=(const Connection&) = delete;
+    LibdbusConnection(const LibdbusConnection&) = delete;
+    LibdbusConnection& operator=(const LibdbusConnection&) = delete;
     operator DBusConnection*() const { return m_connection; }
 
     MessagePtr call(const char* method, const char* path = peerPath) const {
@@ -86,7 +86,7 @@ public:
     }
 
 private:
-    Connection m_connection;
+    LibdbusConnection m_connection;
 };
 
 class RawListener : public Listener {
@@ -118,8 +118,9 @@ private:
         return DBUS_HANDLER_RESULT_HANDLED;
     }
 
-    Connection m_connection;
-    Connection m_callConnection; // a thread that reads would keep calls on its connection waiting
+    LibdbusConnection m_connection;
+    LibdbusConnection
+        m_callConnection; // a thread that reads would keep calls on its connection waiting
     std::atomic<bool> m_stop{false};
     std::thread m_thread;
 };
@@ -131,7 +132,7 @@ public:
     std::size_t decode() override { return readThrough(m_reply.get()); }
 
 private:
-    Connection m_connection;
+    LibdbusConnection m_connection;
     MessagePtr m_reply;
 };
 
@@ -149,7 +150,7 @@ const Library libdbus = {
 };
 
 void emitTicks(unsigned int count, unsigned int interval) {
-    static const Connection& connection = *new Connection;
+    static const LibdbusConnection& connection = *new LibdbusConnection;
     const MessagePtr call(dbus_message_new_method_call(peerName, peerPath, peerInterface, "Emit"));
     dbus_message_append_args(call.get(), DBUS_TYPE_UINT32, &count, DBUS_TYPE_UINT32, &interval,
                              DBUS_TYPE_INVALID);

@@ -18,14 +18,14 @@ namespace {
 constexpr const char* agentInterface = "org.bluez.Agent";
 
 /// What an answer carries.
-enum class Value { None, PinCode, Passkey };
+enum class Answered { None, PinCode, Passkey };
 
 /// What the daemon may ask, and where the handlers differ.
 struct Request {
     const char* method;
     const char* name; ///< in log lines
     int arguments[2]; ///< D-Bus types
-    Value value;
+    Answered value;
     bool obeysReject; ///< not for PIN codes: a program may reject and still let old devices pair
     bool isDelayed;
     bool needsReply;                ///< false: the delay is taken even when no reply could be made
@@ -44,12 +44,12 @@ enum { pinCodeRow, passkeyRow, confirmationRow, authorizeRow, cancelRow, release
 // clang-format off
 constexpr Request requests[] = {
     // method              name                    arguments       value           reject delay  reply  bad arguments
-    {"RequestPinCode",      "request pin code",     {path},         Value::PinCode, false, true,  true,  handled},
-    {"RequestPasskey",      "request passkey",      {path},         Value::Passkey, true,  true,  false, notYetHandled},
-    {"RequestConfirmation", "request confirmation", {path, number}, Value::None,    true,  true,  true,  notYetHandled},
-    {"Authorize",           "authorize",            {path, text},   Value::None,    true,  false, true,  notYetHandled},
-    {"Cancel",              "cancel",               {},             Value::None,    false, false, true,  notYetHandled},
-    {"Release",             "release",              {},             Value::None,    false, false, true,  notYetHandled},
+    {"RequestPinCode",      "request pin code",     {path},         Answered::PinCode, false, true,  true,  handled},
+    {"RequestPasskey",      "request passkey",      {path},         Answered::Passkey, true,  true,  false, notYetHandled},
+    {"RequestConfirmation", "request confirmation", {path, number}, Answered::None,    true,  true,  true,  notYetHandled},
+    {"Authorize",           "authorize",            {path, text},   Answered::None,    true,  false, true,  notYetHandled},
+    {"Cancel",              "cancel",               {},             Answered::None,    false, false, true,  notYetHandled},
+    {"Release",             "release",              {},             Answered::None,    false, false, true,  notYetHandled},
 };
 // clang-format on
 
@@ -70,10 +70,10 @@ DBusMessage* makeReply(DBusMessage* message, bool rejected) {
 }
 
 /// Without a reply nothing is appended, which is no failure of its own.
-bool appendValue(DBusMessage* reply, Value value, const char* passkey) {
-    if (!reply || value == Value::None)
+bool appendValue(DBusMessage* reply, Answered value, const char* passkey) {
+    if (!reply || value == Answered::None)
         return true;
-    if (value == Value::PinCode)
+    if (value == Answered::PinCode)
         return dbus_validate_utf8(passkey, nullptr) &&
                dbus_message_append_args(reply, DBUS_TYPE_STRING, &passkey, DBUS_TYPE_INVALID);
     const auto asNumber = static_cast<dbus_uint32_t>(std::strtoul(passkey, nullptr, 10));

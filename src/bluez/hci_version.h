@@ -6,7 +6,7 @@
 
 namespace Bluetooth {
 
-/// What tells a controller's HCI version, which the daemon does not.
+/// What reports a controller's HCI version, which the daemon does not.
 extern const char* const hciconfigProgram;
 
 /// @return the last component of an adapter's object path, e.g. "hci0"

@@ -41,7 +41,7 @@ SimClient::SimClient()
     findBase();
 }
 
-SimClient::Target SimClient::targetOf(const Question& question) const {
+SimClient::Callee SimClient::calleeOf(const Question& question) const {
     const std::size_t dot = question.method.rfind('.');
     const std::string interface = question.method.substr(0, dot);
     const std::string member = question.method.substr(dot + 1);
@@ -57,7 +57,7 @@ SimClient::Target SimClient::targetOf(const Question& question) const {
 }
 
 void SimClient::start(const Question& question) {
-    const auto [destination, path, interface, member] = targetOf(question);
+    const auto [destination, path, interface, member] = calleeOf(question);
     const MessagePtr message(dbus_message_new_method_call(destination.c_str(), path.c_str(),
                                                           interface.c_str(), member.c_str()));
     Writer(message.get(), question.arguments);
@@ -69,10 +69,10 @@ void SimClient::start(const Question& question) {
 }
 
 std::string SimClient::call(const Question& question, const std::string& path) {
-    const Target target = targetOf(question);
+    const Callee callee = calleeOf(question);
     const MessagePtr reply = m_peer
-                                 .call(target.destination, path.empty() ? target.path : path,
-                                       target.interface, target.member, question.arguments)
+                                 .call(callee.destination, path.empty() ? callee.path : path,
+                                       callee.interface, callee.member, question.arguments)
                                  .get();
     return reply ? shorten(answerOf(reply.get())) : "no answer to " + question.method;
 }
@@ -86,7 +86,7 @@ std::string SimClient::control(Question question) {
 
 Texts SimClient::trace(const Question& question, std::string last) {
     if (last.empty())
-        last = "answer " + targetOf(question).member;
+        last = "answer " + calleeOf(question).member;
     taken();
     start(question);
     return until(last);

@@ -58,11 +58,11 @@ public:
     RawPeer& peer() { return m_peer; }
 
 private:
-    struct Target {
+    struct Callee {
         std::string destination, path, interface, member;
     };
 
-    Target targetOf(const Question& question) const;
+    Callee calleeOf(const Question& question) const;
     void write(DBusMessage* message);
     Texts take(std::size_t end);
 

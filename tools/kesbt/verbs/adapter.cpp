@@ -15,16 +15,16 @@ namespace {
 using Bluetooth::Variant;
 
 /// What the daemon lets be set, for the help and for completion.
-struct Settable {
+struct SettableProperty {
     const char* name;
     bool isBoolean;
 };
-constexpr Settable settable[] = {{"Name", false},
-                                 {"Powered", true},
-                                 {"Discoverable", true},
-                                 {"Pairable", true},
-                                 {"DiscoverableTimeout", false},
-                                 {"PairableTimeout", false}};
+constexpr SettableProperty settable[] = {{"Name", false},
+                                         {"Powered", true},
+                                         {"Discoverable", true},
+                                         {"Pairable", true},
+                                         {"DiscoverableTimeout", false},
+                                         {"PairableTimeout", false}};
 
 constexpr std::size_t longestName = 248; // bytes; the controller cuts what is longer
 
@@ -139,7 +139,7 @@ void setProperty(const Options& options, const std::string& givenName,
 
 std::string settableText() {
     std::string text = "Can be set:";
-    for (const Settable& property : settable)
+    for (const SettableProperty& property : settable)
         text.append(&property == settable ? " " : ", ").append(property.name);
     constexpr std::size_t terminalWidth = 80;
     return wrapped(text + ". Booleans are true or false, time-outs are seconds.", terminalWidth);
@@ -149,13 +149,13 @@ using Words = std::vector<std::string>;
 
 Words propertyNames(const Words&) {
     Words names;
-    for (const Settable& property : settable)
+    for (const SettableProperty& property : settable)
         names.emplace_back(property.name);
     return names;
 }
 
 Words propertyValues(const Words& before) {
-    for (const Settable& property : settable) {
+    for (const SettableProperty& property : settable) {
         if (property.isBoolean && upperCase(property.name) == upperCase(before.front()))
             return {"true", "false"};
     }

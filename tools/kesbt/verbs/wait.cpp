@@ -12,7 +12,7 @@ namespace Kesbt {
 namespace {
 
 /// What is waited for. A state is looked at first and after each signal of the daemon.
-struct Goal {
+struct Awaited {
     const char* name;    ///< e.g. "paired"
     std::string subject; ///< an address or an adapter
     std::function<bool()> isReached;
@@ -25,7 +25,7 @@ bool isRemoval(const BusSignal& signal, const Bluetooth::Adapter& adapter) {
 }
 
 void await(const Options& options, BusFeed& feed, const Bluetooth::Adapter& adapter,
-           const Goal& goal) {
+           const Awaited& goal) {
     Interrupt interrupt;
     const auto deadline = options.limit.end();
     bool isTold = false;
@@ -61,7 +61,7 @@ void awaitFound(const Options& options, const std::string& address) {
     BusFeed feed = openFeed();
     const auto adapter = openAdapter(options);
     bool isFound = false;
-    Goal goal = {"found", address, [&isFound] { return isFound; }};
+    Awaited goal = {"found", address, [&isFound] { return isFound; }};
     goal.observe = [&](const BusSignal& signal) {
         if (signal.path != adapter->getPath())
             return;
