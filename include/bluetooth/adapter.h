@@ -111,8 +111,8 @@ public:
     /// kept until one does. One thread of the process at a time may be here.
     Device* createPairedDevice(const char* address, const Agent& agent);
 
-    /// Ends a createDevice() or createPairedDevice() of this process that is under way, from
-    /// another thread or after an interruption.
+    /// Ends a createDevice() or createPairedDevice() of this process that is under way: after an
+    /// interruption, or from another thread by another Adapter of the same path.
     /// @dbus CancelDeviceCreation(s address)
     /// @param address see findDevice()
     /// @return 0 when the call was handed to the bus, otherwise -1

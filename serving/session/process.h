@@ -22,7 +22,7 @@ std::string ownProgram();
 
 /// Tells whoever started this program as a helper that it serves now.
 /// @param fd  the descriptor that the helper was given for it
-/// @param program  this program's name, for the message on stderr when nobody can be told
+/// @param program  this program's name, for the message on stderr when nobody else can show it
 void tellReady(int fd, const char* program);
 
 /// Asks a child to end, waits, kills it after a while, and reaps it.

@@ -28,7 +28,7 @@ inline constexpr BusKind sessionBus = {"session", "DBUS_SESSION_BUS_ADDRESS"};
 /// left running. A process has one session at a time, since it becomes the parent of all orphans.
 class Session {
 public:
-    /// The descriptor on which a helper tells that it is ready.
+    /// The descriptor on which a helper reports that it is ready.
     static constexpr int readyFd = 3;
 
     /// @param program  our name, for messages and for the folder with the sockets
@@ -43,7 +43,7 @@ public:
     /// @throw std::runtime_error  with a text for the user
     void startBus(const BusKind& kind, const std::vector<std::string>& serviceFolders = {});
 
-    /// Starts a program that serves on the buses, and waits until it has told that it is ready.
+    /// Starts a program that serves on the buses, and waits until it has reported that it is ready.
     /// @param arguments  its command line, by which it learns of `readyFd`
     /// @param description  what it is, for the user
     /// @throw std::runtime_error  with a text for the user

@@ -6,7 +6,7 @@
 
 namespace Bluetooth {
 
-/// The method table of ScannerObject and what introspection tells of it.
+/// The method table of ScannerObject and what introspection shows of it.
 const DBusGObjectInfo& scannerObjectInfo();
 
 } // namespace Bluetooth

@@ -27,7 +27,7 @@ protected:
 
 TEST_F(OwnDispatchTest, HandlersOfTheProgramMayCall) {
     serveObject(proxy.getConnection());
-    onRequest() = [this] {
+    onRequest() = [] {
         RemoteObject inner(peerName, peerPath, peerInterface, busType);
         std::string answer;
         EXPECT_EQ(ask(inner, "Ask"), "answer");

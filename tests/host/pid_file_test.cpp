@@ -67,8 +67,8 @@ TEST_F(PidFileTest, EachFailureHasItsOwnLineAndLeavesNothingOpen) {
     };
     writeFile("/small/x.pid", "");
     writeFile("/small/filler", std::string(100000, 'x'));
-    for (const auto& [path, message] : cases) {
-        EXPECT_EQ(createPidFile(path, closeOnExec, true), -1);
+    for (const auto& [file, message] : cases) {
+        EXPECT_EQ(createPidFile(file, closeOnExec, true), -1);
         EXPECT_EQ(log.take(), Texts{inAutoConnect(message)});
     }
     std::filesystem::remove("/small/filler");

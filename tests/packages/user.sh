@@ -17,7 +17,7 @@ say "The programs"
 install "$(package libkesbluetooth1)" "$(package kesbt)" "$(package kesbt-scannerd)" \
     "$(package kesbt-autoconnectd)" "$(package bluez4-sim)"
 for program in kesbt kesbt-scannerd kesbt-autoconnectd bluez4-sim; do
-    "$program" --version | grep -q '[0-9]\.[0-9]' || fail "$program tells no version"
+    "$program" --version | grep -q '[0-9]\.[0-9]' || fail "$program prints no version"
     ! ldd "$(command -v "$program")" | grep 'not found' || fail "$program lacks a library"
     man "$program" | grep -q 'EXIT STATUS' || fail "$program has no manual page"
 done
