@@ -131,10 +131,8 @@ TEST_F(AutoConnectDaemonTest, EveryCommandOfManySendersArrivesAlsoThroughAPipeMa
     EXPECT_EQ(daemon.count("paused"), senders * each);
 
     std::filesystem::remove(commandPipe);
-    while (!std::filesystem::is_fifo(commandPipe))
-        usleep(10000);
-    while (!autoConnect.pause()) // made, and not yet opened
-        usleep(1000);
+    ASSERT_TRUE(becomesTrue([] { return std::filesystem::is_fifo(commandPipe); }));
+    ASSERT_TRUE(becomesTrue([this] { return autoConnect.pause(); })) << "made, and opened";
     EXPECT_TRUE(daemon.waitFor("paused"));
 }
 
@@ -169,8 +167,8 @@ TEST_F(AutoConnectDaemonTest, GoesIntoTheBackgroundOnceItIsReady) {
               "kesbt-autoconnectd: already running (/tmp/test.pid is locked); stop the other one, "
               "or choose another file with --pid-file\n");
     EXPECT_EQ(kill(pid, SIGTERM), 0);
-    while (std::filesystem::exists("/proc/" + std::to_string(pid)))
-        usleep(1000);
+    EXPECT_TRUE(
+        becomesTrue([&] { return !std::filesystem::exists("/proc/" + std::to_string(pid)); }));
     EXPECT_EQ(readFile(pidFile), std::to_string(pid) + "\n");
 }
 

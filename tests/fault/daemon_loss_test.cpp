@@ -54,13 +54,7 @@ long scan() {
 }
 
 bool scanUntilFound() {
-    const auto end = std::chrono::steady_clock::now() + patience;
-    while (scan() <= 0) {
-        if (std::chrono::steady_clock::now() > end)
-            return false;
-        std::this_thread::sleep_for(Milliseconds(10)); // the service tells nobody
-    }
-    return true;
+    return becomesTrue([] { return scan() > 0; }, Milliseconds(10)); // the service tells nobody
 }
 
 } // namespace

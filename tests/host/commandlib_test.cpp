@@ -43,8 +43,7 @@ protected:
         for (int pid; (pid = getPidFromName("bluetoothd")) > 0;) {
             kill(pid, SIGKILL);
             // Gone when its executable is: it is not a child of this process.
-            while (std::filesystem::exists(inProc(pid, "exe")))
-                usleep(1000);
+            EXPECT_TRUE(becomesTrue([&] { return !std::filesystem::exists(inProc(pid, "exe")); }));
         }
         std::filesystem::remove(daemonProgram);
     }

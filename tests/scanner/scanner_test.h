@@ -67,13 +67,12 @@ protected:
     /// something.
     /// @return the last answer
     std::string askUntilListed(const char* adapterId, const char* address, bool listed = true) {
-        const auto end = std::chrono::steady_clock::now() + patience;
-        std::string answer = ask(adapterId);
-        while (lists(answer, address) != listed && std::chrono::steady_clock::now() < end) {
-            std::this_thread::sleep_for(Milliseconds(10));
+        std::string answer;
+        const auto isAsWanted = [&] {
             answer = ask(adapterId);
-        }
-        EXPECT_EQ(lists(answer, address), listed) << address << ": " << answer;
+            return lists(answer, address) == listed;
+        };
+        EXPECT_TRUE(becomesTrue(isAsWanted, Milliseconds(10))) << address << ": " << answer;
         return answer;
     }
 

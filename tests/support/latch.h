@@ -26,6 +26,18 @@ using Texts = std::vector<std::string>;
 /// How long tests wait for what must come. Only a failing test waits this long.
 inline constexpr Milliseconds patience{20000};
 
+/// Asks again and again, for what nobody reports. @return whether it became true in time
+template <class Condition>
+bool becomesTrue(Condition isTrue, Milliseconds pause = Milliseconds(1)) {
+    const auto end = std::chrono::steady_clock::now() + patience;
+    while (!isTrue()) {
+        if (std::chrono::steady_clock::now() >= end)
+            return false;
+        std::this_thread::sleep_for(pause);
+    }
+    return true;
+}
+
 /// What callbacks report, in order, awaited by the test. Plain function pointers carry no data, so
 /// the tests' callbacks write into one of these with static lifetime.
 template <class Event>
