@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: LGPL-2.1-or-later
 // The auto-connect daemon in its own process.
 
-#include "host/auto_connect_fixture.h"
+#include "support/auto_connect_fixture.h"
 
 #include <bluetooth/commandlib.h>
 

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: LGPL-2.1-or-later
 // The HCI version that an adapter's properties get from hciconfig, which is a script of each test.
 
-#include "host/namespace_test.h"
+#include "support/namespace_test.h"
 #include "support/peer_test.h"
 
 #include <bluetooth/adapter.h>

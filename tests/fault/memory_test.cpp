@@ -5,7 +5,7 @@
 
 #include "core/process.h"
 #include "host/auto_connect_file.h"
-#include "host/namespace_test.h"
+#include "support/namespace_test.h"
 #include "support/peer_test.h"
 #include "support/simulation.h"
 

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: LGPL-2.1-or-later
 // Which devices are to be connected: the lists in the files, and what the daemon knows of them.
 
-#include "host/auto_connect_fixture.h"
+#include "support/auto_connect_fixture.h"
 
 #include <bluetooth/adapter.h>
 #include <bluetooth/device.h>

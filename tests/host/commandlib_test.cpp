@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: LGPL-2.1-or-later
-#include "host/namespace_test.h"
 #include "host/process_lookup.h"
 #include "support/child_process.h"
+#include "support/namespace_test.h"
 
 #include <bluetooth/commandlib.h>
 

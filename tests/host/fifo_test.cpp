@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: LGPL-2.1-or-later
-#include "host/namespace_test.h"
+#include "support/namespace_test.h"
 
 #include <bluetooth/auto_connect.h>
 #include <bluetooth/fifo.h>

@@ -2,8 +2,8 @@
 #ifndef KESBLUETOOTH_TESTS_KESBT_TEST_H
 #define KESBLUETOOTH_TESTS_KESBT_TEST_H
 
-#include "host/namespace_test.h"
 #include "support/devices.h"
+#include "support/namespace_test.h"
 #include "support/simulation.h"
 
 #include <gtest/gtest.h>

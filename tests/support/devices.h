@@ -4,6 +4,10 @@
 
 namespace Bluetooth::Test {
 
+// The adapters of the scenarios.
+inline constexpr const char* adapter0 = "00:1A:7D:DA:71:10";
+inline constexpr const char* adapter1 = "00:1A:7D:DA:71:11";
+
 // The devices of sim/scenarios/default.conf, which defines them, named by how they behave.
 inline constexpr const char* headset = "00:11:22:33:44:01";  // pairs unasked; audio sink, control
 inline constexpr const char* keyboard = "00:11:22:33:44:02"; // our passkey is typed on it

@@ -2,16 +2,14 @@
 #ifndef KESBLUETOOTH_TESTS_AUTO_CONNECT_FIXTURE_H
 #define KESBLUETOOTH_TESTS_AUTO_CONNECT_FIXTURE_H
 
-#include "host/namespace_test.h"
 #include "support/devices.h"
+#include "support/namespace_test.h"
 #include "support/simulation.h"
 
 #include <bluetooth/auto_connect.h>
 
 namespace Bluetooth::Test {
 
-inline constexpr const char* adapter0 = "00:1A:7D:DA:71:10";
-inline constexpr const char* adapter1 = "00:1A:7D:DA:71:11";
 inline constexpr const char* stranger = "DE:AD:BE:EF:00:01"; // known to none
 
 /// The simulated daemon knows four devices, of which the headset and the other device have a sink
