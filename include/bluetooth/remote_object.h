@@ -170,6 +170,11 @@ public:
     /// | 10     | "Failed to send message"           |
     /// | 11     | the D-Bus error's own message      |
     std::string getErrorMessage();
+    /// The D-Bus error's name, e.g. "org.bluez.Error.Rejected": what a program decides by, since
+    /// messages are for people and change.
+    /// @return "" for an error that is not a D-Bus error, and for none; valid until the next
+    ///         operation of this proxy
+    const char* getErrorName() const;
 
     /// The destination, the object path and the interface, in three lines.
     std::string getInfo() const;
@@ -236,6 +241,7 @@ private:
 
     int recordError(ErrorNumber number);
     int recordError(ErrorNumber number, const char* text);
+    KESBLUETOOTH_LOCAL int recordDBusError(const char* name, const char* text);
     int appendBasic(int type, const void* value);
     DictResult parseDictionary(DBusMessageIter& iter, Dict& dict);
     KESBLUETOOTH_LOCAL DBusMessage* takeReply(DBusMessageIter& first);
@@ -257,8 +263,8 @@ private:
     DBusBusType m_busType;
     pthread_t m_loopThread = 0;
     std::atomic<int> m_errorNumber{0}; // a loop proxy's is also set by the receive thread
-    std::string m_errorText;
-    bool m_usable; // destination, path and interface are valid names
+    std::string m_errorText;           // a D-Bus error's name follows its message after a NUL
+    bool m_usable;                     // destination, path and interface are valid names
 
     // The subscriptions of all proxies, by kind.
     static std::list<SignalHandler<NoArgumentCallback>>& signalHandlerVectorNoArgument;

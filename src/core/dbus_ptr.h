@@ -34,6 +34,8 @@ public:
     }
     /// The message, "" when none is set.
     const char* message() const { return m_error.message ? m_error.message : ""; }
+    /// The error's name, likewise.
+    const char* name() const { return m_error.name ? m_error.name : ""; }
 
 private:
     DBusError m_error;

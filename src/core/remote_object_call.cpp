@@ -9,6 +9,8 @@
 
 #include <signal.h>
 
+#include <cstring>
+
 namespace Bluetooth {
 
 namespace {
@@ -110,12 +112,12 @@ int RemoteObject::sendMessage(bool wantReply, int timeoutMs) {
     if (!message)
         return recordError(errorDBus, "There is no message to send");
     if (!link)
-        return recordError(errorDBus, "Not connected to the bus");
+        return recordDBusError(DBUS_ERROR_DISCONNECTED, "Not connected to the bus");
     if (timeoutMs < -1)
         return recordError(errorDBus, "Invalid time-out");
     ScopedError error;
     m_reply = link->call(message.get(), timeoutMs, error.get()).release();
-    return m_reply ? 0 : recordError(errorDBus, error.message());
+    return m_reply ? 0 : recordDBusError(error.name(), error.message());
 }
 
 int RemoteObject::sendMessagePending() {
@@ -156,7 +158,14 @@ std::string RemoteObject::getErrorMessage() {
         m_errorText = errorTexts[number - 1];
     else if (number > errorDBus)
         m_errorText = "Unknown error";
-    return m_errorText;
+    return m_errorText.c_str(); // without the name
+}
+
+const char* RemoteObject::getErrorName() const {
+    const ProxyUse use(*this);
+    const char* const text = m_errorText.c_str();
+    const std::size_t length = std::strlen(text);
+    return m_errorNumber == errorDBus && length < m_errorText.size() ? text + length + 1 : "";
 }
 
 int RemoteObject::recordError(ErrorNumber number) {
@@ -167,6 +176,13 @@ int RemoteObject::recordError(ErrorNumber number) {
 int RemoteObject::recordError(ErrorNumber number, const char* text) {
     m_errorText = text;
     return recordError(number);
+}
+
+int RemoteObject::recordDBusError(const char* name, const char* text) {
+    recordError(errorDBus, text);
+    if (name)
+        m_errorText.append(1, '\0').append(name);
+    return -1;
 }
 
 } // namespace Bluetooth

@@ -265,14 +265,15 @@ int RemoteObject::getReplyValue(ObjectPath& path) {
     if (!reply)
         return -1;
     const int type = dbus_message_iter_get_arg_type(&iter);
-    if (!isText(type))
-        return recordError(errorDBus); // on purpose not the error of the other overloads
+    const char* error = dbus_message_get_error_name(reply.get()); // null unless it is one
+    if (!isText(type)) // on purpose not the error of the other overloads, and the message stays
+        return recordDBusError(error, std::string(m_errorText.c_str()).c_str());
     const char* text = basicAt<const char*>(iter);
     path = ObjectPath(text);
     if (type == DBUS_TYPE_OBJECT_PATH)
         return 0;
     // A text where a path was asked for is the service's error message.
-    recordError(errorDBus, text);
+    recordDBusError(error, text);
     return -2;
 }
 

@@ -134,9 +134,16 @@ TEST_F(CallTest, ProxiesShareTheConnectionOfTheirBusAndTellWhatTheyAre) {
                              "Interface: com.example.Peer\n");
 }
 
-TEST_F(CallTest, AFailedCallRecordsTheServicesOwnText) {
+TEST_F(CallTest, AFailedCallRecordsTheServicesOwnNameAndText) {
     peer.replyError("Refuse", "com.example.Error.No", "not today");
-    EXPECT_EQ(ask(proxy, "Refuse"), "-1 11 not today");
+    EXPECT_EQ(call("Refuse"), -1);
+    EXPECT_STREQ(proxy.getErrorName(), "com.example.Error.No");
+    EXPECT_EQ(outcome(-1), "-1 11 not today");
+    EXPECT_STREQ(proxy.getErrorName(), "") << "forgotten with the error";
+    EXPECT_EQ(call("Refuse"), -1);
+    EXPECT_EQ(proxy.newMessage(nullptr), -1);
+    EXPECT_STREQ(proxy.getErrorName(), "") << "the last error is none of D-Bus's";
+    proxy.resetError();
     EXPECT_EQ(ask(proxy, "NoSuchMethod"), "-1 11 No such method");
     RemoteObject absent("com.example.Absent", peerPath, peerInterface, busType);
     EXPECT_EQ(ask(absent, "Take"),

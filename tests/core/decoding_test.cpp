@@ -74,6 +74,7 @@ TEST_F(DecodingTest, ATextWhereAPathWasAskedForIsTheServicesError) {
         proxy.setReplyMessage(replyWith(reply).release());
         EXPECT_LT(proxy.getReplyValue(path), 0);
         EXPECT_EQ(proxy.getErrorMessage(), "older text");
+        EXPECT_STREQ(proxy.getErrorName(), "");
     }
     // The second takes the place of the first; the proxy's destructor releases it.
     proxy.setReplyMessage(replyWith("()").release());
