@@ -51,7 +51,7 @@ int lockPidFile(const char* path, int flags, PidFileFailure& failure) {
         errno = EINVAL;
         return -1;
     }
-    const int descriptor = open(path, O_RDWR | O_CREAT, pidFileMode);
+    const int descriptor = open(path, O_RDWR | O_CREAT | O_NOFOLLOW, pidFileMode);
     if (descriptor < 0)
         return -1;
     const bool closeOnExec = (flags & closeOnExecFlag) != 0;

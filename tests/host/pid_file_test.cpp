@@ -62,10 +62,13 @@ TEST_F(PidFileTest, EachFailureHasItsOwnLineAndLeavesNothingOpen) {
         {nullptr, "Could not open PID file (null)"},
         {"/tmp", "Could not open PID file /tmp"},
         {"/nowhere/x.pid", "Could not open PID file /nowhere/x.pid"},
+        {path, "Could not open PID file /tmp/test.pid"}, // a link
         {"/dev/null", "Could not truncate PID file '/dev/null'"},
         {"/small/x.pid", "Writing to PID file '/small/x.pid'"},
     };
     writeFile("/small/x.pid", "");
+    writeFile("/tmp/precious", "kept");
+    std::filesystem::create_symlink("/tmp/precious", path);
     writeFile("/small/filler", std::string(100000, 'x'));
     for (const auto& [file, message] : cases) {
         EXPECT_EQ(createPidFile(file, closeOnExec, true), -1);
@@ -73,6 +76,7 @@ TEST_F(PidFileTest, EachFailureHasItsOwnLineAndLeavesNothingOpen) {
     }
     std::filesystem::remove("/small/filler");
     EXPECT_EQ(countOpenDescriptors(), before);
+    EXPECT_EQ(readFile("/tmp/precious"), "kept");
 }
 
 } // namespace Bluetooth::Test
