@@ -80,7 +80,9 @@ public:
     /// Writes a command to the auto-connect daemon's pipe, as it is, without a line end. Never
     /// waits.
     /// @param command e.g. "pause"
-    /// @return true when all of it was written; false also when no daemon reads the pipe
+    /// @return true when all of it was written; false with errno set otherwise: ENXIO when no
+    ///         daemon reads the pipe, EAGAIN when it is full, and as Fifo::getWriteFifo() sets it
+    ///         without permission, or when what stands there is not a pipe of root's or one's own
     bool sendCommand(const char* command) const;
     /// Makes the auto-connect daemon read the files again: sends "1". @return as sendCommand()
     bool reload() const;

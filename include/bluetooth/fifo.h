@@ -7,23 +7,26 @@
 namespace Bluetooth {
 
 /// One end of a named pipe (FIFO). A missing pipe is created, with mode 0666 less the process's
-/// umask, and never removed. The kind of file is not checked: an ordinary file is read or written
-/// like a pipe.
+/// umask, and never removed. Only a pipe that belongs to root or to the effective user of the
+/// process is used: anything else at the path (a symbolic link, a file, a folder, a device, another
+/// user's pipe) is refused before anything is read, written or waited for.
 ///
 /// Threads: one thread at a time may use a Fifo. Its descriptor is private and close-on-exec; the
 /// destructor closes it.
 class KESBLUETOOTH_API Fifo {
 public:
-    /// Opens the reading end. Blocks until some process opens the pipe for writing.
-    /// @param path must not be null
-    /// @return a new Fifo, deleted by the caller; null with errno set on failure (logged), also
-    ///         when a signal handler interrupts the wait (EINTR) and for a null path (EINVAL)
+    /// Opens the reading end. Blocks until some process opens the pipe for writing. Needs /proc.
+    /// @param path null fails
+    /// @return a new Fifo, deleted by the caller; null with errno set on failure (logged): EACCES
+    ///         or ELOOP for what is refused, EINTR when a signal handler interrupts the wait. A
+    ///         null path leaves errno as it was.
     static Fifo* getReadFifo(const char* path);
 
     /// Opens the writing end. Never waits.
-    /// @param path must not be null
+    /// @param path null fails
     /// @return a new Fifo, deleted by the caller; null with errno set on failure (logged): ENXIO
-    ///         when no process has the pipe open for reading, EINVAL for a null path
+    ///         when no process has the pipe open for reading; EACCES, ELOOP for a symbolic link or
+    ///         EISDIR for what is refused. A null path leaves errno as it was.
     static Fifo* getWriteFifo(const char* path);
 
     Fifo(const Fifo&) = delete;

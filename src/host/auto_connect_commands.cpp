@@ -3,6 +3,7 @@
 
 #include <bluetooth/fifo.h>
 
+#include <cerrno>
 #include <cstring>
 #include <memory>
 
@@ -10,7 +11,13 @@ namespace Bluetooth {
 
 bool AutoConnect::sendCommand(const char* command) const {
     const std::unique_ptr<Fifo> pipe(Fifo::getWriteFifo("/tmp/kes_bluetooth_autoconnect"));
-    return pipe && command && pipe->writeData(command, static_cast<int>(strlen(command))) == 0;
+    if (!pipe)
+        return false;
+    if (!command) {
+        errno = EINVAL;
+        return false;
+    }
+    return pipe->writeData(command, static_cast<int>(strlen(command))) == 0;
 }
 
 bool AutoConnect::reload() const {

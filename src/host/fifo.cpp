@@ -10,6 +10,7 @@
 
 #include <cerrno>
 #include <ctime>
+#include <string>
 
 namespace Bluetooth {
 
@@ -17,15 +18,42 @@ namespace {
 
 constexpr mode_t pipeMode = 0666;
 
-/// @return the descriptor, or -1 with errno set
-int openPipe(const char* path, int flags) {
-    if (!path) {
-        errno = EINVAL;
+/// What another user made may be anything, and whoever made a pipe reads what is written to it.
+bool isTrustedPipe(const struct stat& status) {
+    return S_ISFIFO(status.st_mode) && (status.st_uid == 0 || status.st_uid == geteuid());
+}
+
+/// Opens what stands at the path, waiting for nothing, and a pipe only.
+/// @param access O_WRONLY, or O_PATH for a descriptor that can do nothing yet
+/// @return the descriptor; -1 with errno set, except for a null path
+int openPipe(const char* path, int access) {
+    if (!path)
         return -1;
-    }
     if (mkfifo(path, pipeMode) != 0 && errno != EEXIST)
         return -1;
-    return open(path, flags | O_CLOEXEC);
+    const int descriptor = open(path, access | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC);
+    if (descriptor < 0)
+        return -1;
+    struct stat status {};
+    if (fstat(descriptor, &status) == 0 && isTrustedPipe(status))
+        return descriptor;
+    close(descriptor);
+    errno = S_ISLNK(status.st_mode) ? ELOOP : EACCES; // O_PATH opens links
+    return -1;
+}
+
+/// Opens the reading end of the very pipe that was looked at, and waits for a writer. Had it been
+/// open for reading while it was looked at, a writer could have come and gone unnoticed.
+int openForReading(const char* path) {
+    const int pipe = openPipe(path, O_PATH);
+    if (pipe < 0)
+        return -1;
+    const int descriptor =
+        open(("/proc/self/fd/" + std::to_string(pipe)).c_str(), O_RDONLY | O_CLOEXEC);
+    const int error = errno;
+    close(pipe);
+    errno = error;
+    return descriptor;
 }
 
 /// write() for a pipe whose reader may have gone: EPIPE instead of a signal that ends the process.
@@ -54,7 +82,7 @@ ssize_t writeOnce(int descriptor, const void* data, std::size_t length) {
 } // namespace
 
 Fifo* Fifo::getReadFifo(const char* path) {
-    const int descriptor = openPipe(path, O_RDONLY);
+    const int descriptor = openForReading(path);
     if (descriptor >= 0)
         return new Fifo(descriptor);
 
@@ -65,7 +93,7 @@ Fifo* Fifo::getReadFifo(const char* path) {
 }
 
 Fifo* Fifo::getWriteFifo(const char* path) {
-    const int descriptor = openPipe(path, O_WRONLY | O_NONBLOCK);
+    const int descriptor = openPipe(path, O_WRONLY);
     if (descriptor >= 0)
         return new Fifo(descriptor);
 
@@ -88,7 +116,9 @@ int Fifo::writeData(const void* data, int length) {
     if (!data || m_descriptor < 0)
         return -1;
     if (length < 0 || writeOnce(m_descriptor, data, static_cast<std::size_t>(length)) != length) {
+        const int error = errno;
         logError(KES_HERE, "Error writing the data to the pipe file.");
+        errno = error;
         return -1;
     }
     return 0;

@@ -75,41 +75,76 @@ TEST_F(FifoTest, FailedWritesAreLoggedAndRaiseNoSignal) {
 }
 
 TEST_F(FifoTest, FailuresToOpenHaveTheirOwnWords) {
-    const std::tuple<const char*, int, const char*> cases[] = {
-        {nullptr, EINVAL, " (null), errno is 22."},
-        {"/nowhere/pipe", ENOENT, " /nowhere/pipe, errno is 2."},
-        {"/tmp", EISDIR, " /tmp, errno is 21."},
+    writeFile("/tmp/file", "text");
+    std::filesystem::create_symlink("/tmp/file", "/tmp/link");
+    std::filesystem::create_symlink("/nowhere", "/tmp/dangling");
+    const std::tuple<const char*, int, int> cases[] = {
+        {nullptr, 7, 7}, // errno stays
+        {"/nowhere/pipe", ENOENT, ENOENT},
+        {"/tmp", EISDIR, EACCES},
+        {"/tmp/file", EACCES, EACCES},
+        {"/dev/null", EACCES, EACCES},
+        {"/tmp/link", ELOOP, ELOOP},
+        {"/tmp/dangling", ELOOP, ELOOP},
     };
-    for (const auto& [bad, error, line] : cases) {
-        errno = 0;
+    const auto before = countOpenDescriptors();
+    for (const auto& [bad, writing, reading] : cases) {
+        errno = 7;
         EXPECT_EQ(Fifo::getWriteFifo(bad), nullptr);
-        EXPECT_EQ(errno, error);
-        EXPECT_EQ(log.take(), (Texts{notOpened + line, notOpened + "."}));
-        if (error == EISDIR)
-            continue; // a folder can be opened for reading
-        errno = 0;
+        EXPECT_EQ(errno, writing) << bad;
+        EXPECT_EQ(log.take(), (Texts{notOpened + " " + (bad ? bad : "(null)") + ", errno is " +
+                                         std::to_string(writing) + ".",
+                                     notOpened + "."}));
+        errno = 7;
         EXPECT_EQ(Fifo::getReadFifo(bad), nullptr);
-        EXPECT_EQ(errno, error);
+        EXPECT_EQ(errno, reading) << bad;
         EXPECT_EQ(log.take(), Texts{notOpened + "."});
+    }
+    EXPECT_EQ(readFile("/tmp/file"), "text");
+    EXPECT_EQ(countOpenDescriptors(), before);
+}
+
+TEST_F(FifoTest, OnlyPipesOfRootAndOfTheOwnUserAreUsed) {
+    if (geteuid() != 0)
+        GTEST_SKIP() << "only root can act for other users";
+    constexpr uid_t user = 1234;
+    constexpr uid_t other = 1235;
+    for (const auto& [owner, caller, isUsed] :
+         {std::tuple(user, 0U, false), std::tuple(user, user, true), std::tuple(0U, user, true),
+          std::tuple(other, user, false)}) {
+        std::filesystem::remove(path);
+        const PipeReader reader(path);
+        std::filesystem::permissions(path, std::filesystem::perms(0666));
+        ASSERT_EQ(chown(path, owner, owner), 0);
+        const PipeReader keeper(path, O_RDWR); // so that nobody waits
+        ASSERT_EQ(seteuid(caller), 0);
+        for (auto* open : {&Fifo::getWriteFifo, &Fifo::getReadFifo}) {
+            errno = 0;
+            EXPECT_EQ(FifoPtr(open(path)) != nullptr, isUsed) << owner << ' ' << caller;
+            EXPECT_EQ(errno == EACCES, !isUsed);
+        }
+        ASSERT_EQ(seteuid(0), 0);
     }
 }
 
 TEST_F(FifoTest, ReadErrorsAreLogged) {
-    writeFile(path, "text");
-    const FifoPtr file(Fifo::getReadFifo(path)); // what stands at the path is not looked at
-    ASSERT_NE(file, nullptr);
-    EXPECT_EQ(file->readData(nullptr, 5), -1);
+    const PipeReader keeper(path, O_RDWR);
+    const FifoPtr reader(Fifo::getReadFifo(path));
+    ASSERT_NE(reader, nullptr);
+    ASSERT_EQ(FifoPtr(Fifo::getWriteFifo(path))->writeData("text", 4), 0);
+    EXPECT_EQ(reader->readData(nullptr, 5), -1);
     char buffer[8] = {};
-    EXPECT_EQ(file->readData(buffer, -1), -1);
+    EXPECT_EQ(reader->readData(buffer, -1), -1);
     EXPECT_EQ(log.take(), Texts(2, "fifo.cpp Error reading the data to the pipe file."));
-    EXPECT_EQ(file->readData(buffer, 2), 0);
+    EXPECT_EQ(reader->readData(buffer, 2), 0);
     EXPECT_STREQ(buffer, "te");
 }
 
-TEST_F(FifoTest, CommandsAreWrittenWithoutAnyEndToWhateverStandsThere) {
+TEST_F(FifoTest, CommandsAreWrittenWithoutAnyEndToAPipeOnly) {
     const AutoConnect autoConnect;
     const mode_t mask = umask(0);
-    EXPECT_FALSE(autoConnect.reload()) << "nobody reads it";
+    EXPECT_FALSE(autoConnect.reload());
+    EXPECT_EQ(errno, ENXIO) << "nobody reads it";
     umask(mask);
     EXPECT_EQ(log.take(), Texts{notOpened + " /tmp/kes_bluetooth_autoconnect, errno is 6."});
     EXPECT_TRUE(std::filesystem::is_fifo(commandPipe)) << "but it stays";
@@ -121,13 +156,17 @@ TEST_F(FifoTest, CommandsAreWrittenWithoutAnyEndToWhateverStandsThere) {
     EXPECT_TRUE(autoConnect.resume());
     EXPECT_TRUE(autoConnect.sendCommand("x"));
     EXPECT_FALSE(autoConnect.sendCommand(nullptr));
+    EXPECT_EQ(errno, EINVAL);
     EXPECT_EQ(reader.take(), "1pauseresumex");
-
-    std::filesystem::remove(commandPipe);
-    writeFile(commandPipe, "old text");
-    EXPECT_TRUE(autoConnect.pause());
-    EXPECT_EQ(readFile(commandPipe), "pauseext");
     EXPECT_EQ(log.take(), Texts());
+
+    // Where an ordinary user laid a link to a file of root's.
+    std::filesystem::remove(commandPipe);
+    writeFile("/tmp/secret", "old text");
+    std::filesystem::create_symlink("/tmp/secret", commandPipe);
+    EXPECT_FALSE(autoConnect.pause());
+    EXPECT_EQ(errno, ELOOP);
+    EXPECT_EQ(readFile("/tmp/secret"), "old text");
 }
 
 } // namespace Bluetooth::Test

@@ -49,9 +49,9 @@ inline std::string inAutoConnect(const std::string& message) {
 /// A daemon's end of a pipe, which does not wait for a writer.
 class PipeReader {
 public:
-    explicit PipeReader(const char* pipe) {
+    explicit PipeReader(const char* pipe, int access = O_RDONLY) {
         mkfifo(pipe, 0600);
-        m_descriptor = open(pipe, O_RDONLY | O_NONBLOCK | O_CLOEXEC);
+        m_descriptor = open(pipe, access | O_NONBLOCK | O_CLOEXEC);
     }
     ~PipeReader() { close(m_descriptor); }
     PipeReader(const PipeReader&) = delete;
