@@ -29,7 +29,12 @@ set -- --unshare-pid --die-with-parent \
     /real-bin/sh -c '
         /real-bin/ln -s /real-bin/* /usr/bin/
         /real-bin/rm -f /usr/bin/hciconfig
-        exec "$@"' sh "$@"
+        build=$1 # other users may run what was built
+        while build=$(/real-bin/dirname "$build") && [ "$build" != / ]; do
+            /real-bin/chmod go+rx "$build"
+        done
+        shift
+        exec "$@"' sh "$build" "$@"
 for path in /etc/passwd /etc/group /etc/nsswitch.conf /etc/ld.so.cache /etc/machine-id \
     /etc/alternatives; do
     [ ! -e "$path" ] || set -- --ro-bind "$path" "$path" "$@"

@@ -67,13 +67,24 @@ TEST_F(HostVerbs, AFileThatCannotBeUsedIsAFailureAndStays) {
     EXPECT_TRUE(std::filesystem::is_directory(file));
 }
 
-TEST_F(HostVerbs, CommandsNeedTheAutoConnectDaemon) {
+TEST_F(HostVerbs, CommandsNeedTheAutoConnectDaemonAndItsPipe) {
     for (const char* verb : {"reload", "pause", "resume"})
         EXPECT_EQ(failure("autoconnect "s + verb),
                   "no auto-connect daemon takes commands; start it: kesbt-autoconnectd\n");
     const PipeReader daemon(commandPipe);
     EXPECT_EQ(run("autoconnect pause").status, 0);
     EXPECT_EQ(daemon.take(), "pause");
+    if (geteuid() == 0) {
+        EXPECT_EQ(
+            runShell("exec setpriv --reuid 1234 --clear-groups " KESBT " autoconnect pause"),
+            (Result{1, "", "no permission to command the auto-connect daemon; run it as root\n"}));
+    }
+
+    std::filesystem::remove(commandPipe);
+    std::filesystem::create_symlink("/dev/full", commandPipe);
+    EXPECT_EQ(failure("autoconnect reload"),
+              "/tmp/kes_bluetooth_autoconnect is not the auto-connect daemon's pipe; remove it and "
+              "start the auto-connect daemon again: kesbt-autoconnectd\n");
 }
 
 TEST_F(HostVerbs, ARestartedDaemonHasToComeToTheBus) {
