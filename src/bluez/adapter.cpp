@@ -6,6 +6,7 @@
 #include <bluetooth/device_list.h>
 #include <bluetooth/dict_codec.h>
 
+#include "bluez/device_paths.h"
 #include "bluez/factory.h"
 #include "bluez/hci_version.h"
 #include "bluez/print.h"
@@ -27,6 +28,10 @@ std::string pointerText(const ObjectPath* path) {
 }
 
 } // namespace
+
+bool readDevicePaths(Adapter& adapter, std::vector<ObjectPath>& paths) {
+    return readMethod(KES_HERE, adapter, "ListDevices", paths);
+}
 
 Adapter::Adapter(const char* path) : BluezObject(path, "org.bluez.Adapter") {}
 
@@ -77,15 +82,13 @@ Device* Adapter::findDevice(const char* address, bool logError) {
 
 Device* Adapter::getDeviceByIndex(unsigned int index) {
     std::vector<ObjectPath> paths;
-    const bool read = readMethod(KES_HERE, *this, "ListDevices", paths);
-    return read && index < paths.size() ? Device::getDevice(paths[index]) : nullptr;
+    return readDevicePaths(*this, paths) && index < paths.size() ? Device::getDevice(paths[index])
+                                                                 : nullptr;
 }
 
 DeviceList* Adapter::listDevices() {
     std::vector<ObjectPath> paths;
-    return readMethod(KES_HERE, *this, "ListDevices", paths)
-               ? makeList<DeviceList>(paths, Device::getDevice)
-               : nullptr;
+    return readDevicePaths(*this, paths) ? makeList<DeviceList>(paths, Device::getDevice) : nullptr;
 }
 
 Device* Adapter::createDevice(const char* address) {

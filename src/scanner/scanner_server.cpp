@@ -3,11 +3,10 @@
 
 #include <bluetooth/adapter.h>
 #include <bluetooth/adapter_list.h>
-#include <bluetooth/device.h>
-#include <bluetooth/device_list.h>
 #include <bluetooth/manager.h>
 
 #include "bluez/device_address.h"
+#include "bluez/device_paths.h"
 #include "core/log.h"
 #include "scanner/finders.h"
 #include "scanner/names.h"
@@ -27,11 +26,10 @@ std::atomic<Finders*> current{nullptr};
 
 /// Adds the addresses of the devices that the daemon knows on an adapter.
 void addKnownDevices(Adapter& adapter, AddressSet& addresses) {
-    const std::unique_ptr<DeviceList> devices(adapter.listDevices());
-    if (!devices)
-        return;
-    for (const Device* device : *devices) {
-        const auto address = device ? addressInPath(device->getPath()) : std::nullopt;
+    std::vector<ObjectPath> paths;
+    readDevicePaths(adapter, paths); // not listDevices(): each proxy would look for the daemon
+    for (const ObjectPath& path : paths) {
+        const auto address = addressInPath(path);
         if (address && !address->empty())
             addresses.insert(*address);
     }
