@@ -215,7 +215,7 @@ TEST_F(ServerTest, WithoutSessionBusNothingIsServed) {
 }
 
 TEST_F(ServerTest, FindersComeAndGoWhileDevicesAreFound) {
-    for (int device = 10; device < 60; ++device)
+    for (int device = 10; device < 20; ++device)
         simulation.setDevice(("00:11:22:33:55:" + std::to_string(device)).c_str(), "RSSIVariation",
                              std::uint32_t{20}, "AddDevice");
     RunningServer running;
