@@ -63,10 +63,13 @@ KESBLUETOOTH_API GType scanner_object_get_type();
 /// @param object    the exported object; null is an error
 /// @param adapterId the adapter's name or address
 /// @param devices   receives a new table, freed with its strings by g_hash_table_unref(): address
-///                  -> properties as dictConquerToString() formats them with ";". Without a device
-///                  it holds the one pair "" -> "".
+///                  -> properties as dictConquerToString() formats them with ";", each ";" that a
+///                  device has in its texts replaced by ",", each control character by a blank;
+///                  entries beyond 4 KiB are left out. Without a device it holds the one pair
+///                  "" -> "".
 /// @param error     receives "Object %s not found", "Server %s not found", "Adapter %s not found"
-///                  or "Set %s not found", with the adapterId
+///                  or "Set %s not found", with the adapterId, of which the first 255 bytes are
+///                  told. Longer ones are no adapter, nor is "any".
 /// @return FALSE with `error` set on failure
 ///
 /// Blocks until the daemon has replied.

@@ -36,8 +36,9 @@ struct StartedDiscovery;
 /// its adapters have other object paths, and so other finders; those of the old paths stay, without
 /// effect, until the service ends.
 ///
-/// MEMORY. The properties of each device ever found are kept until the service ends: about 0.5 KiB
-/// a device.
+/// MEMORY. The properties of the 4,096 devices that were found last are kept until the service ends,
+/// at most 4 KiB a device and commonly 0.5 KiB. When there are more, the device that was not heard
+/// of for longest is forgotten and listed no more; the first time is logged.
 ///
 /// TWO ADAPTERS. The signals of one adapter reach the finders of all: a device that one adapter
 /// found is returned for the others too.
@@ -75,7 +76,7 @@ public:
     /// @return whether the daemon knew the device when updateFilterSet() was called last
     bool isInFilterSet(const std::string& address);
 
-    /// Keeps the formatted properties of a found device, in place of earlier ones.
+    /// Keeps the formatted properties of a found device as they are, in place of earlier ones.
     void putInfoToMap(const std::string& address, const std::string& text);
     /// Returns the formatted properties of a found device.
     /// @return the string kept; "" for an unknown address, for which an empty entry is kept from

@@ -2,37 +2,52 @@
 #include "scanner/finders.h"
 
 #include <bluetooth/adapter.h>
-#include <bluetooth/dict_codec.h>
 #include <bluetooth/manager.h>
 #include <bluetooth/scanner_server.h>
+
+#include "bluez/device_address.h"
+#include "core/log.h"
+#include "scanner/scan_text.h"
+
+#include <cstring>
 
 namespace Bluetooth {
 
 namespace {
 
 void onDeviceFound(RemoteObject* sender, const char* address, const Dict* properties) {
-    if (Finders* finders = currentFinders())
-        finders->deviceFound(sender, address, dictConquerToString(*properties, ";"));
+    Finders* finders = currentFinders();
+    if (finders && isAddress(address))
+        finders->deviceFound(sender, address, scanText(*properties));
 }
 
 void onDeviceDisappeared(RemoteObject* sender, const char* address) {
-    if (Finders* finders = currentFinders())
+    Finders* finders = currentFinders();
+    if (finders && isAddress(address))
         finders->deviceDisappeared(sender, address);
+}
+
+std::string lastComponent(const std::string& path) {
+    return path.substr(path.rfind('/') + 1);
 }
 
 /// What the daemon knows the adapter by: "hci0" for an object path, which it does not look up.
 std::string patternOf(const std::string& adapterId) {
-    return adapterId.rfind('/', 0) == 0 ? adapterId.substr(adapterId.rfind('/') + 1) : adapterId;
+    return adapterId.rfind('/', 0) == 0 ? lastComponent(adapterId) : adapterId;
 }
 
 } // namespace
 
 std::unique_ptr<Adapter> Finders::findAdapter(const char* pattern) {
-    if (!m_server.fetchManager())
+    const bool isTooLong = pattern && std::strlen(pattern) > longestAdapterId;
+    if (isTooLong || !m_server.fetchManager())
         return nullptr;
     // A proxy of its own: finders are made on two threads, and a proxy serves one at a time.
     Manager manager;
-    return std::unique_ptr<Adapter>(manager.findAdapter(pattern));
+    std::unique_ptr<Adapter> adapter(manager.findAdapter(pattern));
+    if (adapter && lastComponent(adapter->getPath()) == "any")
+        return nullptr;
+    return adapter;
 }
 
 Finders::Set Finders::add(ScannerObject& object, const std::string& adapterId) {
@@ -75,8 +90,10 @@ std::vector<std::pair<std::string, std::string>> Finders::unknownDevices(const A
 
 void Finders::deviceFound(const RemoteObject* sender, const std::string& address,
                           const std::string& text) {
-    if (m_state.isListening(sender))
-        m_state.addDevice(of(m_served, sender->getPath()), address, text);
+    if (m_state.isListening(sender) &&
+        m_state.addDevice(of(m_served, sender->getPath()), address, text))
+        logError(KES_HERE, "More than %zu devices were found, the oldest are left out from now on",
+                 FoundDevices::mostDevices);
 }
 
 void Finders::deviceDisappeared(const RemoteObject* sender, const std::string& address) {

@@ -22,10 +22,16 @@ class Finders {
 public:
     using Set = ScannerState::Set;
 
+    /// In bytes. A client may name an adapter by a string that the system bus would not carry: it
+    /// disconnects who tries.
+    static constexpr std::size_t longestAdapterId = 255;
+
     Finders(ScannerServer& server, ScannerState& state, ScannerObject& served)
         : m_server(server), m_state(state), m_served(served) {}
 
-    /// @return null when there is no Bluetooth daemon or it does not know the adapter
+    /// @return null when there is no Bluetooth daemon or it does not know the adapter; also for
+    ///         "any", which the daemon knows, but cannot discover with, and for what is too long
+    ///         to be passed on
     std::unique_ptr<Adapter> findAdapter(const char* pattern);
 
     /// See ScannerObject::addFinder().

@@ -35,8 +35,20 @@ void initInstance(GTypeInstance* instance, gpointer) {
     new (&object->finders) decltype(object->finders);
 }
 
+/// As much of a client's text as is told back to it.
+std::string beginningOf(const char* adapterId) {
+    std::string text = adapterId ? adapterId : "(null)";
+    std::size_t end = Finders::longestAdapterId;
+    if (text.size() <= end)
+        return text;
+    while (end > 0 && (static_cast<unsigned char>(text[end]) & 0xc0) == 0x80)
+        --end; // not inside a character: libdbus ends the process on invalid UTF-8
+    return text.substr(0, end);
+}
+
 gboolean notFound(GError** error, const char* what, const char* adapterId) {
-    g_set_error(error, errorDomain, errorCode, "%s %s not found", what, adapterId);
+    g_set_error(error, errorDomain, errorCode, "%s %s not found", what,
+                beginningOf(adapterId).c_str());
     return FALSE;
 }
 

@@ -4,6 +4,7 @@
 #include <bluetooth/adapter.h>
 
 #include <algorithm>
+#include <utility>
 
 namespace Bluetooth {
 
@@ -60,11 +61,21 @@ bool ScannerState::isListening(const RemoteObject* sender) const {
     });
 }
 
-void ScannerState::addDevice(const Set& set, const std::string& address, const std::string& text) {
+bool ScannerState::addDevice(const Set& set, const std::string& address, const std::string& text) {
     const Lock lock(m_mutex);
-    m_texts[address] = text;
     if (set)
         set->insert(address);
+    return keep(address, text);
+}
+
+/// Under the lock. @return whether a device had to go for the first time
+bool ScannerState::keep(const std::string& address, const std::string& text) {
+    const std::optional<std::string> gone = m_devices.put(address, text);
+    if (!gone)
+        return false;
+    for (const StartedDiscovery& discovery : m_discoveries)
+        discovery.found->erase(*gone);
+    return !std::exchange(m_hadTooMany, true);
 }
 
 void ScannerState::removeDevice(const Set& set, const std::string& address) {
@@ -78,20 +89,24 @@ ScannerState::unknownDevices(const AddressSet& set) {
     std::vector<std::pair<std::string, std::string>> devices;
     const Lock lock(m_mutex);
     for (const std::string& address : set) {
-        if (m_filter.count(address) == 0)
-            devices.emplace_back(address, m_texts[address]);
+        const std::string* text = m_devices.find(address);
+        if (text && m_filter.count(address) == 0)
+            devices.emplace_back(address, *text);
     }
     return devices;
 }
 
 void ScannerState::putText(const std::string& address, const std::string& text) {
     const Lock lock(m_mutex);
-    m_texts[address] = text;
+    keep(address, text);
 }
 
 std::string ScannerState::text(const std::string& address) {
     const Lock lock(m_mutex);
-    return m_texts[address];
+    if (const std::string* text = m_devices.find(address))
+        return *text;
+    keep(address, "");
+    return "";
 }
 
 void ScannerState::setFilter(AddressSet known) {

@@ -4,7 +4,8 @@
 
 #include <bluetooth/scanner_object.h>
 
-#include <map>
+#include "scanner/found_devices.h"
+
 #include <memory>
 #include <mutex>
 #include <string>
@@ -53,9 +54,11 @@ public:
     /// taken may still call; it must not act any more, nor be looked at: it is being destroyed.
     bool isListening(const RemoteObject* sender) const;
 
-    /// A device came into reach of a finder, or its properties changed.
+    /// A device came into reach of a finder, or its properties changed. One that was found longest
+    /// ago goes from all finders when there are too many.
     /// @param set null when there is no finder: the properties are kept all the same
-    void addDevice(const Set& set, const std::string& address, const std::string& text);
+    /// @return whether that was the first one to go
+    bool addDevice(const Set& set, const std::string& address, const std::string& text);
     /// A device left the reach of a finder. Its properties are kept.
     void removeDevice(const Set& set, const std::string& address);
     /// @return address and properties of the devices in the set that the daemon does not know
@@ -76,10 +79,13 @@ public:
 private:
     static constexpr int ticksToLive = 30;
 
+    bool keep(const std::string& address, const std::string& text);
+
     mutable std::mutex m_mutex; // guards what follows, and the finders of scanner objects
     std::vector<StartedDiscovery> m_discoveries;
     AddressSet m_filter;
-    std::map<std::string, std::string> m_texts; // by address
+    FoundDevices m_devices; // those in the finders' sets among them
+    bool m_hadTooMany = false;
     int m_idleCountdown = ticksToLive;
 };
 

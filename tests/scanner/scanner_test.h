@@ -85,7 +85,9 @@ protected:
         "[Device 00:11:22:33:44:03]\nName=Phone\nClass=360\nRSSI=-60\nPresent=false\n"
         "[Device 00:11:22:33:44:66]\nName=Speaker\nAdapter=hci1\nPresent=false\n"};
     RawPeer& system = simulation.peer();
-    PrivateBus sessionBus{PrivateBus::Kind::Session, SESSION_BUS_CONFIGURATION};
+    // As sessions have it, it carries messages that the system bus does not.
+    PrivateBus sessionBus{PrivateBus::Kind::Session, SESSION_BUS_CONFIGURATION
+                          "<limit name=\"max_message_size\">100000000</limit>"};
     RawPeer session{sessionBus.address()};
 };
 

@@ -214,6 +214,50 @@ TEST_F(ServerTest, WithoutSessionBusNothingIsServed) {
     server.startLoop(); // ends by itself all the same
 }
 
+TEST_F(ServerTest, WhatStrangersTellIsBoundedAndForgesNothing) {
+    const Path adapter{"/org/bluez/1/hci0"};
+    simulation.control("DropName");
+    RawPeer daemon(simulation.bus().address(), "org.bluez");
+    daemon.reply("FindAdapter", with(adapter));
+    daemon.reply("StartDiscovery");
+    daemon.reply("StopDiscovery");
+    const auto find = [&](const std::string& address, const Settings& properties) {
+        daemon.emit(adapter.text, "org.bluez.Adapter", "DeviceFound", with(address, properties));
+    };
+    const RunningServer running;
+    EXPECT_EQ(ask("hci0"), emptyAnswer);
+    for (const char* noAddress : {"", "x", "00:11:22:33:44", "00:11:22:33:44:5g",
+                                  "00-11-22-33-44-55", "00:11:22:33:44:555"})
+        find(noAddress, {{"Name", "x"}});
+    find(phone, {{"Name", "x;Paired: 1"},
+                 {"Alias\n;Trusted: 1", "\x1b[2J\u009bK\u00e4\x7f"},
+                 {"Long", std::string(4096, 'l')},
+                 {"Icon", "phone"}});
+    const std::string answer = askUntilListed("hci0", phone);
+    EXPECT_EQ(answer, std::string("a(e(s:") + phone +
+                          " s:Name: x,Paired: 1;Alias ,Trusted: 1:  [2J K\u00e4 ;Icon: phone;))");
+
+    log.take();
+    const auto invented = [](int number) {
+        const std::string digits = std::to_string(1000 + number);
+        return "00:66:66:66:" + digits.substr(0, 2) + ":" + digits.substr(2);
+    };
+    constexpr int most = 4096;
+    for (int number = 0; number < most; ++number) {
+        if (number == most / 2)
+            find(phone, {{"Name", "heard of again"}});
+        find(invented(number), {{"Name", "x"}});
+    }
+    const std::string full = askUntilListed("hci0", invented(most - 1).c_str());
+    EXPECT_FALSE(lists(full, invented(0).c_str()));
+    EXPECT_TRUE(lists(full, invented(1).c_str()));
+    EXPECT_TRUE(lists(full, phone));
+    find(invented(most), {{"Name", "x"}});
+    EXPECT_FALSE(lists(askUntilListed("hci0", invented(most).c_str()), invented(1).c_str()));
+    EXPECT_EQ(log.take(), Texts{"finders.cpp More than 4096 devices were found, the oldest are "
+                                "left out from now on"});
+}
+
 TEST_F(ServerTest, FindersComeAndGoWhileDevicesAreFound) {
     for (int device = 10; device < 20; ++device)
         simulation.setDevice(("00:11:22:33:55:" + std::to_string(device)).c_str(), "RSSIVariation",

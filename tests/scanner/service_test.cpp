@@ -40,6 +40,13 @@ std::pair<std::string, std::string> run(const std::string& argument, int status)
     return {output, program.readErrors()};
 }
 
+std::string umlauts(int count) {
+    std::string text;
+    while (count-- > 0)
+        text += "\u00e4";
+    return text;
+}
+
 } // namespace
 
 class ServiceTest : public ScannerTest {
@@ -155,6 +162,8 @@ TEST_F(ServiceTest, AnswersToWrongAndNeedlessCalls) {
     EXPECT_EQ(ask("hci9"), "ERROR Adapter hci9 not found");
     EXPECT_EQ(ask("/org/bluez/1/hci0"), "ERROR Adapter /org/bluez/1/hci0 not found");
     EXPECT_EQ(ask(""), "ERROR Adapter  not found");
+    EXPECT_EQ(ask("any"), "ERROR Adapter any not found"); // the daemon has a path for it
+    EXPECT_EQ(ask(umlauts(20000000).c_str()), "ERROR Adapter " + umlauts(127) + " not found");
     EXPECT_EQ(call("RemoveFinder", "hci0"), ""); // without a finder
     EXPECT_EQ(call("RemoveFinder", "hci9"),
               "ERROR Method invoked for RemoveFinder returned FALSE but did not set error");
