@@ -240,6 +240,23 @@ TEST_F(ServiceTest, EndsWithDiscoveryStoppedEverywhere) {
     }
     EXPECT_EQ(stops("hci0"), 2u);
     EXPECT_EQ(stops("hci1"), 2u);
+
+    // The daemon hangs, and three calls wait for it.
+    ask("hci0");
+    simulation.delayNext("org.bluez.Manager", "FindAdapter", 60000);
+    const std::size_t asked = simulation.countCalls("s:FindAdapter ");
+    for (int caller = 0; caller < 3; ++caller)
+        session.call(serviceName, "/", serviceInterface, "ListDevices", with("hci0"));
+    ASSERT_TRUE(simulation.awaitCalls("s:FindAdapter ", asked + 1));
+    const std::string path = pathOf("hci0");
+    simulation.process().signal(SIGSTOP);
+    service->signal(SIGTERM);
+    EXPECT_EQ(service->wait(Milliseconds(2000)), 0);
+    simulation.process().signal(SIGCONT);
+    const MessagePtr properties =
+        system.call("org.bluez", path, "org.bluez.Adapter", "GetProperties").get();
+    EXPECT_NE(argumentsOf(properties.get()).find("s:Discovering v(b:0)"), std::string::npos)
+        << argumentsOf(properties.get());
 }
 
 TEST_F(ServiceTest, RunsOnceInASessionAndTellsItsUsage) {

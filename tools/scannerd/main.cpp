@@ -2,14 +2,16 @@
 #include "service_name.h"
 
 #include "common/daemon_program.h"
+#include "common/stop_request.h"
 
 #include <bluetooth/connection.h>
 #include <bluetooth/scanner_server.h>
 
 #include <glib-unix.h>
 
-#include <csignal>
+#include <cerrno>
 #include <cstdlib>
+#include <cstring>
 #include <memory>
 #include <string>
 
@@ -23,7 +25,11 @@ using Tools::DaemonProgram;
 /// Runs in the loop, so there is one to quit, and a server.
 gboolean quit(void* server) {
     static_cast<std::unique_ptr<ScannerServer>*>(server)->get()->quitLoop();
-    return G_SOURCE_CONTINUE;
+    return G_SOURCE_REMOVE;
+}
+
+gboolean quitOnStop(int /*descriptor*/, GIOCondition, void* server) {
+    return quit(server);
 }
 
 /// Ends the loop when the connection to a bus is lost. The connection does not come back.
@@ -43,12 +49,8 @@ private:
     /// Runs on whichever thread reads the connection.
     static DBusHandlerResult filter(DBusConnection*, DBusMessage* message, void* data) {
         if (dbus_message_is_signal(message, DBUS_INTERFACE_LOCAL, "Disconnected"))
-            g_idle_add(quitOnce, &static_cast<BusWatch*>(data)->m_server);
+            g_idle_add(quit, &static_cast<BusWatch*>(data)->m_server);
         return DBUS_HANDLER_RESULT_NOT_YET_HANDLED;
-    }
-    static gboolean quitOnce(void* server) {
-        quit(server);
-        return G_SOURCE_REMOVE;
     }
 
     DBusConnection* m_connection;
@@ -60,8 +62,7 @@ int serve(const DaemonProgram& program, ServiceName& name, DBusConnection* syste
     std::unique_ptr<ScannerServer> server;
     const BusWatch session(name.getConnection(), server);
     const BusWatch system(systemBus, server);
-    g_unix_signal_add(SIGTERM, quit, &server);
-    g_unix_signal_add(SIGINT, quit, &server);
+    g_unix_fd_add(Tools::stopDescriptor(), G_IO_IN, quitOnStop, &server);
 
     server = std::make_unique<ScannerServer>();
     if (name.owner() == server->getConnectionName())
@@ -83,6 +84,8 @@ int serve(const DaemonProgram& program, ServiceName& name, DBusConnection* syste
 }
 
 int work(const DaemonProgram& program) {
+    if (!Tools::stopOnSignals())
+        return program.fail(std::string("cannot make a timer: ") + strerror(errno));
     ServiceName name;
     if (!name.getConnection())
         return program.fail(
