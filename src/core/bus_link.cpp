@@ -2,6 +2,7 @@
 #include "core/bus_link.h"
 
 #include <poll.h>
+#include <sched.h>
 #include <sys/eventfd.h>
 #include <unistd.h>
 
@@ -13,13 +14,18 @@ namespace Bluetooth {
 
 namespace {
 
-/// The longest sleep, and so the longest time in which a stop or an interruption is noticed.
-constexpr std::chrono::milliseconds longestWait{100};
+/// The longest sleep of who reads. What a blocking call of the program itself, on the shared
+/// connection, has read past this file is noticed then at the latest.
+constexpr std::chrono::milliseconds longestWait{1000};
+/// The same for a thread that waits for a reply and has not waited longer; and for a receive thread
+/// that no descriptor tells of a stop.
+constexpr std::chrono::milliseconds shortWait{100};
 /// How soon output that the socket did not take is tried again. Waiting for the socket to become
 /// writable would spin while another thread holds libdbus's I/O.
 constexpr std::chrono::milliseconds outputRetry{2};
 /// How long after a call the receive thread leaves the lead to the next one.
 constexpr std::chrono::milliseconds callBurst{1};
+constexpr int defaultTimeoutMs = 25000; // libdbus's
 /// What libdbus may hold unread of a flood of signals, in bytes, before it stops reading replies.
 constexpr long receiveLimit = 1L << 30;
 
@@ -65,8 +71,7 @@ thread_local const LeadingScope* LeadingScope::innermost = nullptr;
 
 } // namespace
 
-std::atomic<bool> BusLink::stopRequested{false};
-static_assert(std::atomic<bool>::is_always_lock_free, "set in signal handlers");
+WakingFlag BusLink::stop;
 
 /// A thread that waits for something that dispatching brings about.
 struct BusLink::Waiter {
@@ -74,23 +79,47 @@ struct BusLink::Waiter {
 
     Goal goal;
     DBusConnection* connection;
-    dbus_uint32_t serial = 0; // Reply: of the call
-    MessagePtr reply;         // Reply: what the filter found for it
+    Exchange* exchanges = nullptr; // Reply: what to wait for
+    std::size_t count = 0;
+    std::size_t missing = 0; // replies
+    const Clock::time_point begin = Clock::now();
     Clock::time_point deadline = Clock::time_point::max();
-    const std::atomic<bool>* interrupted = nullptr;
+    WakingFlag* interrupted = nullptr;
     bool leadsAlways = false;
     bool woken = false;
     std::condition_variable wake;
 
     Waiter(Goal what, DBusConnection* where) : goal(what), connection(where) {}
+    Waiter(Exchange* first, std::size_t number, DBusConnection* where)
+        : goal(Goal::Reply), connection(where), exchanges(first), count(number), missing(number) {}
 
     bool isFinished() const {
-        return (goal == Goal::Reply && reply) ||
+        return (goal == Goal::Reply && missing == 0) ||
                (goal == Goal::Output && !dbus_connection_has_messages_to_send(connection));
+    }
+    /// Takes a reply to one of the calls.
+    bool take(dbus_uint32_t serial, DBusMessage* reply) {
+        Exchange* const end = exchanges + count;
+        Exchange* const exchange = std::find_if(
+            exchanges, end, [serial](const Exchange& each) { return each.serial == serial; });
+        if (exchange == end || exchange->reply)
+            return false;
+        exchange->reply.reset(dbus_message_ref(reply));
+        --missing;
+        return true;
+    }
+    /// How long to sleep next. Longer the longer it has waited: a reply that was read past this
+    /// file at most doubles the time of its call.
+    Milliseconds nextWait() const {
+        const auto now = Clock::now();
+        const auto wait = std::clamp<Clock::duration>(now - begin, shortWait, longestWait);
+        const auto left =
+            std::max(deadline - now, Clock::duration::zero()); // poll() takes -1 as for ever
+        return std::chrono::ceil<Milliseconds>(std::min<Clock::duration>(wait, left));
     }
     /// Whether to leave without having reached the goal. Needs no lock.
     bool isOver() const {
-        return (interrupted && *interrupted) ||
+        return (interrupted && interrupted->isRaised()) ||
                (deadline != Clock::time_point::max() && Clock::now() >= deadline);
     }
 };
@@ -133,40 +162,69 @@ bool BusLink::attach() {
 }
 
 MessagePtr BusLink::call(DBusMessage* message, int timeoutMs, DBusError& error) {
-    if (dispatchesHere())
-        return MessagePtr(
-            dbus_connection_send_with_reply_and_block(m_connection, message, timeoutMs, &error));
-    if (!dbus_connection_get_is_connected(m_connection)) {
-        dbus_set_error_const(&error, DBUS_ERROR_DISCONNECTED, "Connection is closed");
+    Exchange exchange{MessagePtr(dbus_message_ref(message))};
+    exchangeAll(&exchange, 1, timeoutMs);
+    if (!exchange.reply)
+        setNoReply(error, exchange);
+    else if (dbus_set_error_from_message(&error, exchange.reply.get()))
         return nullptr;
-    }
-    Waiter waiter(Waiter::Goal::Reply, m_connection);
-    if (timeoutMs != std::numeric_limits<int>::max()) {
-        constexpr int defaultTimeoutMs = 25000;
-        waiter.deadline = Clock::now() + Milliseconds(timeoutMs < 0 ? defaultTimeoutMs : timeoutMs);
-    }
-    {
-        // Sent without a pending call, which is a third of the work of a raw call: libdbus makes an
-        // error message for each beforehand. Locked from here on, so that the filter finds the
-        // waiter however soon the reply comes; sending neither dispatches nor waits.
-        Lock lock(m_mutex);
-        m_waiters.reserve(m_waiters.size() + 1); // nothing is thrown once the call is on its way
-        if (!dbus_connection_send(m_connection, message, &waiter.serial)) {
-            dbus_set_error_const(&error, DBUS_ERROR_NO_MEMORY, "Not enough memory");
-            return nullptr;
-        }
-        join(waiter);
-        wait(waiter, lock);
-    }
-    if (!waiter.reply)
-        setNoReply(error);
-    else if (dbus_set_error_from_message(&error, waiter.reply.get()))
-        return nullptr;
-    return std::move(waiter.reply);
+    return std::move(exchange.reply);
 }
 
-void BusLink::setNoReply(DBusError& error) const {
-    if (dbus_connection_get_is_connected(m_connection))
+void BusLink::callAll(std::vector<Exchange>& exchanges) {
+    exchangeAll(exchanges.data(), exchanges.size(), -1);
+}
+
+void BusLink::exchangeAll(Exchange* first, std::size_t count, int timeoutMs) {
+    if (dispatchesHere()) {
+        exchangeInsideDispatch(m_connection, first, count, timeoutMs);
+        return;
+    }
+    if (!dbus_connection_get_is_connected(m_connection))
+        return;
+    Waiter waiter(first, count, m_connection);
+    if (timeoutMs != std::numeric_limits<int>::max())
+        waiter.deadline = waiter.begin + Milliseconds(timeoutMs < 0 ? defaultTimeoutMs : timeoutMs);
+    // Sent without pending calls, which are a third of the work of a raw call: libdbus makes an
+    // error message for each beforehand. Locked from here on, so that the filter finds the waiter
+    // however soon a reply comes; sending neither dispatches nor waits.
+    Lock lock(m_mutex);
+    m_waiters.reserve(m_waiters.size() + 1); // nothing is thrown once a call is on its way
+    for (Exchange* exchange = first; exchange != first + count; ++exchange)
+        if (!dbus_connection_send(m_connection, exchange->call.get(), &exchange->serial))
+            --waiter.missing;
+    join(waiter);
+    wait(waiter, lock);
+}
+
+/// libdbus's dispatch cannot be entered twice: inside it only libdbus's own wait works, in which
+/// no requests are answered.
+void BusLink::exchangeInsideDispatch(DBusConnection* connection, Exchange* first, std::size_t count,
+                                     int timeoutMs) {
+    std::vector<PendingPtr> pending(count);
+    for (std::size_t i = 0; i < count; ++i) {
+        DBusPendingCall* begun = nullptr;
+        if (!dbus_connection_send_with_reply(connection, first[i].call.get(), &begun, timeoutMs) ||
+            !begun)
+            continue;
+        first[i].serial = dbus_message_get_serial(first[i].call.get());
+        pending[i].reset(begun);
+    }
+    for (std::size_t i = 0; i < count; ++i) {
+        if (!pending[i])
+            continue;
+        dbus_pending_call_block(pending[i].get());
+        first[i].reply.reset(dbus_pending_call_steal_reply(pending[i].get()));
+    }
+}
+
+void BusLink::setNoReply(DBusError& error, const Exchange& exchange) const {
+    const bool isOpen = dbus_connection_get_is_connected(m_connection);
+    if (exchange.serial == 0 && isOpen)
+        dbus_set_error_const(&error, DBUS_ERROR_NO_MEMORY, "Not enough memory");
+    else if (exchange.serial == 0)
+        dbus_set_error_const(&error, DBUS_ERROR_DISCONNECTED, "Connection is closed");
+    else if (isOpen)
         dbus_set_error_const(
             &error, DBUS_ERROR_NO_REPLY,
             "Did not receive a reply. Possible causes include: the remote application did not "
@@ -186,15 +244,18 @@ bool BusLink::send(DBusMessage* message) {
     return true;
 }
 
-bool BusLink::converse(DBusMessage* message, const std::atomic<bool>& interrupted, void (*sent)(),
+bool BusLink::converse(DBusMessage* message, WakingFlag& interrupted, void (*sent)(),
                        MessagePtr& reply) {
+    Exchange exchange{MessagePtr(dbus_message_ref(message))};
     if (dispatchesHere()) {
         sent();
-        reply = callInsideDispatch(message);
+        exchangeInsideDispatch(m_connection, &exchange, 1, DBUS_TIMEOUT_INFINITE);
+        reply = std::move(exchange.reply);
         return true;
     }
     const ReceivingScope answersRequests(nullptr);
-    Waiter waiter(Waiter::Goal::Reply, m_connection);
+    interrupted.open(); // without it an interruption is noticed at the next look
+    Waiter waiter(&exchange, 1, m_connection);
     waiter.interrupted = &interrupted;
     waiter.leadsAlways = true;
 
@@ -204,29 +265,17 @@ bool BusLink::converse(DBusMessage* message, const std::atomic<bool>& interrupte
     join(waiter);
     while (m_reading)
         waiter.wake.wait_for(lock, longestWait);
-    const bool queued = dbus_connection_send(m_connection, message, &waiter.serial);
+    const bool queued = dbus_connection_send(m_connection, message, &exchange.serial);
     while (queued && dbus_connection_has_messages_to_send(m_connection) &&
            lead(lock, longestWait, &waiter)) {
     }
     if (queued)
         sent();
     else
-        waiter.deadline = Clock::now();
+        waiter.deadline = waiter.begin;
     wait(waiter, lock);
-    reply = std::move(waiter.reply);
+    reply = std::move(exchange.reply);
     return queued;
-}
-
-/// libdbus's dispatch cannot be entered twice: inside it only libdbus's own wait works, in which
-/// no requests are answered.
-MessagePtr BusLink::callInsideDispatch(DBusMessage* message) {
-    DBusPendingCall* begun = nullptr;
-    if (!dbus_connection_send_with_reply(m_connection, message, &begun, DBUS_TIMEOUT_INFINITE) ||
-        !begun)
-        return nullptr;
-    const PendingPtr pending(begun);
-    dbus_pending_call_block(begun);
-    return MessagePtr(dbus_pending_call_steal_reply(begun));
 }
 
 /// Waits until everything sent is written or the connection closes.
@@ -250,7 +299,7 @@ bool BusLink::checkOpen() {
     if (hungUp && !dispatchesHere()) {
         // libdbus hands out a dead connection until its end has been dispatched.
         Waiter waiter(Waiter::Goal::Disconnect, m_connection);
-        waiter.deadline = Clock::now() + longestWait;
+        waiter.deadline = waiter.begin + shortWait;
         Lock lock(m_mutex);
         join(waiter);
         wait(waiter, lock);
@@ -268,16 +317,14 @@ void BusLink::join(Waiter& waiter) {
 /// waiter has joined; afterwards it has left.
 void BusLink::wait(Waiter& waiter, Lock& lock) {
     while (!waiter.isFinished() && !waiter.isOver()) {
-        const auto left = waiter.deadline - Clock::now();
-        const auto limit =
-            std::chrono::ceil<Milliseconds>(std::min<Clock::duration>(longestWait, left));
         if (mayLead(waiter)) {
-            if (!lead(lock, limit, &waiter))
+            if (!lead(lock, waiter.nextWait(), &waiter))
                 break;
         } else {
             passLead();
             waiter.woken = false;
-            waiter.wake.wait_for(lock, limit);
+            if (waiter.wake.wait_for(lock, waiter.nextWait()) == std::cv_status::timeout)
+                wakeLeader(); // to look at what was read past it
         }
     }
     m_waiters.erase(std::find(m_waiters.begin(), m_waiters.end(), &waiter));
@@ -303,33 +350,55 @@ bool BusLink::lead(Lock& lock, Milliseconds limit, const Waiter* waiter) {
     lock.lock();
     m_reading = false;
     wakeFinished();
+    passOnStop();
     return open;
+}
+
+/// A receive thread that leaves the lead to the callers sleeps where no descriptor wakes it.
+void BusLink::passOnStop() {
+    if (m_stopPassedOn || !stop.isRaised())
+        return;
+    m_stopPassedOn = true;
+    m_receiverWake.notify_all();
 }
 
 /// Waits for input, reads it and dispatches it. The mutex is not held.
 bool BusLink::step(Milliseconds limit, const Waiter* waiter) {
     const LeadingScope scope(this);
     if (dbus_connection_get_dispatch_status(m_connection) != DBUS_DISPATCH_DATA_REMAINS)
-        awaitInput(limit);
+        awaitInput(limit, waiter ? waiter->interrupted : nullptr);
     const bool open = dbus_connection_read_write(m_connection, 0);
     // What a handler's delay has left is for the next leader when this one has to go.
     while (dbus_connection_dispatch(m_connection) == DBUS_DISPATCH_DATA_REMAINS &&
-           !(waiter ? waiter->isOver() : stopRequested.load())) {
+           !(waiter ? waiter->isOver() : stop.isRaised())) {
     }
+    const bool handedOver = m_handedOver.exchange(false, std::memory_order_relaxed);
+    if (waiter && handedOver)
+        sched_yield(); // where processors are few it is the receive thread's turn
     return open;
 }
 
-void BusLink::awaitInput(Milliseconds limit) {
-    pollfd fds[] = {{-1, POLLIN, 0}, {m_wakeFd, POLLIN, 0}};
+void BusLink::awaitInput(Milliseconds limit, WakingFlag* interrupted) {
+    // Once passed on, the stop would only keep callers from sleeping.
+    pollfd fds[] = {{-1, POLLIN, 0},
+                    {m_wakeFd, POLLIN, 0},
+                    {m_stopPassedOn ? -1 : stop.descriptor(), POLLIN, 0},
+                    {interrupted ? interrupted->descriptor() : -1, POLLIN, 0}};
     // Asked anew each time: the descriptor of a closed connection may belong to somebody else.
     if (!dbus_connection_get_unix_fd(m_connection, &fds[0].fd))
         return;
     if (dbus_connection_has_messages_to_send(m_connection))
         limit = std::min(limit, outputRetry);
-    if (poll(fds, 2, static_cast<int>(limit.count())) > 0 && fds[1].revents != 0) {
+    if (poll(fds, interrupted ? 4 : 3, static_cast<int>(limit.count())) <= 0)
+        return;
+    if (fds[1].revents != 0) {
         eventfd_t count = 0;
         eventfd_read(m_wakeFd, &count);
     }
+    if (fds[2].revents != 0)
+        stop.calm();
+    if (fds[3].revents != 0)
+        interrupted->calm();
 }
 
 /// Wakes whoever leads next: the thread that always leads, else any that still waits, else the
@@ -387,11 +456,12 @@ void BusLink::removeSubscription() {
 
 void BusLink::receive(Deliver deliver, void* context) {
     const ReceivingScope scope(this);
+    const Milliseconds limit = stop.open() ? longestWait : shortWait;
     Lock lock(m_mutex);
     ++m_receivers;
-    while (!stopRequested) {
+    while (!stop.isRaised()) {
         if (m_inbox.empty()) {
-            receiveMore(lock);
+            receiveMore(lock, limit);
             continue;
         }
         const MessagePtr message = std::move(m_inbox.front());
@@ -403,17 +473,22 @@ void BusLink::receive(Deliver deliver, void* context) {
     --m_receivers;
 }
 
-/// Leads, or lets the callers lead, until something may have come in; at most longestWait.
-void BusLink::receiveMore(Lock& lock) {
+/// Leads, or lets the callers lead, until something may have come in; at most `limit`.
+void BusLink::receiveMore(Lock& lock, Milliseconds limit) {
     const auto sinceCall = Clock::now() - m_lastCall;
     if (m_reading || !m_waiters.empty() || sinceCall < callBurst) {
-        // In a burst of calls nobody has to wake this thread: it looks again soon enough.
+        // In a burst of calls nobody has to wake this thread, which would take a third of the time
+        // of each call: it looks again soon enough.
         m_receiverParked = sinceCall >= 2 * callBurst;
-        m_receiverWake.wait_for(lock, m_receiverParked ? longestWait : callBurst);
+        m_receiverWake.wait_for(lock, m_receiverParked ? limit : callBurst);
         m_receiverParked = false;
-    } else if (!lead(lock, longestWait, nullptr)) {
+    } else if (!lead(lock, limit, nullptr)) {
         passLead();
-        m_receiverWake.wait_for(lock, longestWait); // closed: nothing will come
+        lock.unlock(); // closed: nothing will come
+        pollfd stopped{stop.descriptor(), POLLIN, 0};
+        poll(&stopped, 1, static_cast<int>(limit.count()));
+        stop.calm();
+        lock.lock();
     } else {
         passLead();
     }
@@ -445,21 +520,19 @@ DBusHandlerResult BusLink::sort(DBusMessage* message) {
 DBusHandlerResult BusLink::giveReply(DBusMessage* message) {
     const dbus_uint32_t serial = dbus_message_get_reply_serial(message);
     const Lock lock(m_mutex);
-    const auto waiter =
-        std::find_if(m_waiters.begin(), m_waiters.end(), [serial](const Waiter* candidate) {
-            return candidate->goal == Waiter::Goal::Reply && candidate->serial == serial;
-        });
-    if (waiter == m_waiters.end() || serial == 0)
+    const bool taken =
+        serial != 0 && std::any_of(m_waiters.begin(), m_waiters.end(),
+                                   [&](Waiter* waiter) { return waiter->take(serial, message); });
+    if (!taken)
         return DBUS_HANDLER_RESULT_NOT_YET_HANDLED;
-    (*waiter)->reply.reset(dbus_message_ref(message));
     if (!LeadingScope::has(this))
         wakeLeader();
     return DBUS_HANDLER_RESULT_HANDLED;
 }
 
 DBusHandlerResult BusLink::keepSignal(DBusMessage* message) {
-    const Lock lock(m_mutex);
-    if ((m_receivers == 0 && m_subscriptions == 0) || stopRequested)
+    Lock lock(m_mutex);
+    if ((m_receivers == 0 && m_subscriptions == 0) || stop.isRaised())
         return DBUS_HANDLER_RESULT_NOT_YET_HANDLED;
     // Without a receive thread the signal may be meant for handlers of the program as well, and
     // libdbus itself has to see the end of the connection.
@@ -473,6 +546,8 @@ DBusHandlerResult BusLink::keepSignal(DBusMessage* message) {
     } catch (const std::bad_alloc&) {
         return DBUS_HANDLER_RESULT_NEED_MEMORY;
     }
+    lock.unlock(); // or the receive thread would wake only to wait for it
+    m_handedOver.store(true, std::memory_order_relaxed);
     m_receiverWake.notify_one();
     if (!LeadingScope::has(this))
         wakeLeader(); // the receive thread may be waiting for the socket

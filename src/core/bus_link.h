@@ -4,12 +4,14 @@
 
 #include "core/dbus_ptr.h"
 #include "core/own_dispatch.h"
+#include "core/waking_flag.h"
 
 #include <dbus/dbus.h>
 
 #include <atomic>
 #include <chrono>
 #include <condition_variable>
+#include <cstddef>
 #include <deque>
 #include <mutex>
 #include <vector>
@@ -30,6 +32,13 @@ class BusLink {
 public:
     using Deliver = void (*)(void* context, DBusMessage* signal);
 
+    /// A method call and its reply.
+    struct Exchange {
+        MessagePtr call;
+        MessagePtr reply = nullptr; // a D-Bus error counts; null when none came
+        dbus_uint32_t serial = 0;   // 0 when the call could not be sent
+    };
+
     /// The link of a connection, made when first asked for and living as long as the connection.
     /// @return null for a null connection or without memory
     static BusLink* of(DBusConnection* connection);
@@ -42,19 +51,23 @@ public:
     /// @return the reply; null with `error` set, also when the reply is a D-Bus error
     MessagePtr call(DBusMessage* message, int timeoutMs, DBusError& error);
 
+    /// Sends all calls before it waits for their replies, at most as long as one call may take.
+    void callAll(std::vector<Exchange>& exchanges);
+    /// Says why an exchange has no reply.
+    void setNoReply(DBusError& error, const Exchange& exchange) const;
+
     /// Sends a message that gets no reply and waits until it is written, without a time limit.
     /// @return false when the connection is closed or refuses it
     bool send(DBusMessage* message);
 
     /// Sends a method call and waits for its reply without a time limit, as the leader all the
     /// while: requests to objects of this process are answered on this thread.
-    /// @param interrupted ends the wait when it is set
+    /// @param interrupted ends the wait when it is raised
     /// @param sent        called when the call has been written, before the wait
     /// @param reply       receives the reply, a D-Bus error among them; null when none came, and
     ///                    none will any more
     /// @return false when the call could not be sent for want of memory
-    bool converse(DBusMessage* message, const std::atomic<bool>& interrupted, void (*sent)(),
-                  MessagePtr& reply);
+    bool converse(DBusMessage* message, WakingFlag& interrupted, void (*sent)(), MessagePtr& reply);
 
     /// Signals are kept for the receive thread while there are subscriptions, even before it runs.
     void addSubscription();
@@ -64,8 +77,8 @@ public:
     void receive(Deliver deliver, void* context);
 
     /// Ends every receive() of the process, for good. Safe in a signal handler.
-    static void requestStop() { stopRequested = true; }
-    static bool isStopRequested() { return stopRequested; }
+    static void requestStop() { stop.raise(); }
+    static bool isStopRequested() { return stop.isRaised(); }
 
     /// Takes notice of a bus that has gone. @return whether the connection is open
     bool checkOpen();
@@ -85,31 +98,35 @@ private:
     bool mayLead(const Waiter& waiter) const;
     bool lead(Lock& lock, Milliseconds limit, const Waiter* waiter);
     bool step(Milliseconds limit, const Waiter* waiter);
-    void awaitInput(Milliseconds limit);
+    void awaitInput(Milliseconds limit, WakingFlag* interrupted);
+    void passOnStop();
     void flush();
     void passLead();
     void wakeFinished();
     void wakeLeader();
-    void receiveMore(Lock& lock);
+    void receiveMore(Lock& lock, Milliseconds limit);
     bool dispatchesHere() const;
-    void setNoReply(DBusError& error) const;
-    MessagePtr callInsideDispatch(DBusMessage* message);
+    void exchangeAll(Exchange* first, std::size_t count, int timeoutMs);
+    static void exchangeInsideDispatch(DBusConnection* connection, Exchange* first,
+                                       std::size_t count, int timeoutMs);
 
     static DBusHandlerResult filter(DBusConnection*, DBusMessage* message, void* link);
     DBusHandlerResult sort(DBusMessage* message);
     DBusHandlerResult keepSignal(DBusMessage* message);
     DBusHandlerResult giveReply(DBusMessage* message);
 
-    static std::atomic<bool> stopRequested;
+    static WakingFlag stop;
 
     DBusConnection* const m_connection; // not referenced: the link is the connection's data
     int m_wakeFd = -1;                  // interrupts the leader's wait for the socket
     OwnDispatch m_ownDispatch;
+    std::atomic<bool> m_handedOver{false}; // a signal, to the receive thread, by who leads
 
     // Guards what follows. Not held while waiting for the socket, in reading and dispatching, or in
     // callbacks. libdbus's own locks may be taken under it, and a call is sent under it.
     std::mutex m_mutex;
-    bool m_reading = false; // some thread leads
+    bool m_reading = false;      // some thread leads
+    bool m_stopPassedOn = false; // a leader has seen the stop
     std::vector<Waiter*> m_waiters;
     Clock::time_point m_lastCall;
     std::condition_variable m_receiverWake;

@@ -16,10 +16,10 @@ namespace Bluetooth {
 namespace {
 
 /// Set by SIGTERM and SIGINT once sendMessagePending() has run; ends its wait, or the next one's.
-std::atomic<bool> interrupted{false};
+WakingFlag interrupted;
 
 void handleInterrupt(int) {
-    interrupted = true;
+    interrupted.raise();
 }
 
 void installInterruptHandlers() {
@@ -131,7 +131,7 @@ int RemoteObject::sendMessagePending() {
                       link->converse(message.get(), interrupted, installInterruptHandlers, reply);
     if (reply)
         setReplyMessage(reply.release());
-    interrupted = false;
+    interrupted.lower();
     return sent ? 0 : recordError(errorDBus, "");
 }
 
