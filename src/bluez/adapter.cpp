@@ -88,7 +88,7 @@ Device* Adapter::getDeviceByIndex(unsigned int index) {
 
 DeviceList* Adapter::listDevices() {
     std::vector<ObjectPath> paths;
-    return readDevicePaths(*this, paths) ? makeList<DeviceList>(paths, Device::getDevice) : nullptr;
+    return readDevicePaths(*this, paths) ? makeList<Device, DeviceList>(paths) : nullptr;
 }
 
 Device* Adapter::createDevice(const char* address) {

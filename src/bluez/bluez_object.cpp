@@ -1,20 +1,13 @@
 // SPDX-License-Identifier: LGPL-2.1-or-later
 #include <bluetooth/bluez_object.h>
 
-#include <bluetooth/dbus_object.h>
 #include <bluetooth/dict_codec.h>
 
+#include "bluez/factory.h"
 #include "bluez/print.h"
 #include "core/method_call.h"
 
-#include <algorithm>
-#include <memory>
-
 namespace Bluetooth {
-
-namespace {
-constexpr const char* daemonName = "org.bluez";
-}
 
 BluezObject::BluezObject(const char* path, const char* interface)
     : RemoteObject(daemonName, path, interface, DBUS_BUS_SYSTEM) {}
@@ -40,9 +33,7 @@ void BluezObject::propertyChangedHandler(RemoteObject* sender, const char* name,
 }
 
 bool BluezObject::hasBluetoothd() {
-    DBusObject bus;
-    const std::unique_ptr<std::vector<std::string>> names(bus.listNames());
-    return names && std::find(names->begin(), names->end(), daemonName) != names->end();
+    return askWhetherOwned(daemonName, 1).front();
 }
 
 } // namespace Bluetooth

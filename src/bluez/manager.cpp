@@ -48,8 +48,7 @@ AdapterList* Manager::listAdapters() {
     // Neither forgets nor logs errors: a program may list between a failed call and the reading of
     // its error, and poll without filling the log.
     std::vector<ObjectPath> paths;
-    return askFor(*this, "ListAdapters", paths) ? makeList<AdapterList>(paths, Adapter::getAdapter)
-                                                : nullptr;
+    return askFor(*this, "ListAdapters", paths) ? makeList<Adapter, AdapterList>(paths) : nullptr;
 }
 
 int Manager::setAdapterAddedHandler(ObjectPathCallback callback) {
