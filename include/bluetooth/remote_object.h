@@ -208,7 +208,7 @@ public:
     /// @return 0, or pthread_create's error number
     int startLoop();
     /// Makes every receive thread of the process end, for good: none can run afterwards. A thread
-    /// ends after the callback that it runs, within 100 ms when idle; signals not delivered by then
+    /// ends after the callback that it runs, at once when it is idle; signals not delivered by then
     /// stay undelivered. Safe in a signal handler.
     void stopLoop();
     /// Waits for this proxy's receive thread to end.

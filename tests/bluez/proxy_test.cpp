@@ -281,6 +281,46 @@ TEST_F(ProxyTest, ListingAdaptersNeitherLogsNorForgetsAnEarlierError) {
     EXPECT_EQ(adapter.getErrorMessage(), "Does Not Exist");
 }
 
+TEST_F(ProxyTest, ListsAskForEachElementWhetherTheDaemonIsThere) {
+    constexpr std::size_t count = 130; // more than are asked for at a time
+    daemon.reply("ListDevices", [](Writer& w) {
+        w.array("o", [](Writer& paths) {
+            for (std::size_t i = 0; i < count; ++i)
+                with(Path{"/d" + std::to_string(i)})(paths);
+        });
+    });
+    RawPeer monitor(bus.address());
+    monitor.becomeMonitor();
+    const std::unique_ptr<DeviceList> devices(adapter.listDevices());
+    ASSERT_TRUE(devices && devices->size() == count);
+    for (std::size_t i = 0; i < count; ++i)
+        EXPECT_EQ((*devices)[i]->getPath(), "/d" + std::to_string(i));
+    ASSERT_TRUE(monitor.waitForCalls("ListNames", count));
+    Texts calls;
+    for (const SeenCall& seen : monitor.calls())
+        calls.push_back(seen.destination + " " + seen.text());
+    Texts expected(count + 1, "org.freedesktop.DBus ListNames");
+    expected.front() = "org.bluez ListDevices";
+    EXPECT_EQ(calls, expected);
+}
+
+TEST(ListTest, EachQuestionThatTheBusRefusesIsLogged) {
+    SyslogCapture log;
+    const PrivateBus bus(
+        PrivateBus::Kind::System,
+        "<policy context=\"mandatory\"><deny send_interface=\"org.freedesktop.DBus\" "
+        "send_member=\"ListNames\"/></policy>");
+    RawPeer daemon(bus.address(), "org.bluez");
+    daemon.reply("ListDevices", twoPaths);
+    const std::unique_ptr<DeviceList> devices(Adapter(adapterPath).listDevices());
+    ASSERT_TRUE(devices);
+    EXPECT_EQ(std::count(devices->begin(), devices->end(), nullptr), 2);
+    const Texts lines = log.take();
+    ASSERT_EQ(lines.size(), 2u);
+    for (const std::string& line : lines)
+        EXPECT_EQ(line.rfind("dbus_object.cpp Rejected send message", 0), 0u) << line;
+}
+
 TEST_F(ProxyTest, ListsHoldNullsForADaemonThatLeftAndSkipThemWhenDeleted) {
     const auto leaving = [&](DBusMessage* request) {
         daemon.disown("org.bluez");

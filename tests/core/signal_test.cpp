@@ -320,16 +320,32 @@ TEST_F(SignalTest, StoppingLeavesTheRestUndeliveredForGood) {
     EXPECT_TRUE(BusLink::isStopRequested());
 }
 
-TEST_F(SignalTest, AnIdleLoopStopsAtOnceAndCallsGoOnAfterwards) {
+/// @param whileCalling whether another thread waits for a reply, and so reads in the loop's place
+class StopTest : public SignalTest, public testing::WithParamInterface<bool> {};
+
+TEST_P(StopTest, EndsASleepingLoopAtOnceAndCallsGoOnAfterwards) {
+    const bool whileCalling = GetParam();
     peer.reply("Ask");
+    peer.reply("AskSlowly", {}, Milliseconds(2000));
     ASSERT_EQ(loop.startLoop(), 0);
-    ASSERT_EQ(call("Ask"), 0);
+    std::thread caller;
+    if (whileCalling) {
+        caller = std::thread([&] { EXPECT_EQ(call("AskSlowly"), 0); });
+        EXPECT_TRUE(peer.waitForCalls("AskSlowly", 1));
+    }
+    settle(); // it sleeps again soon
     const auto begin = std::chrono::steady_clock::now();
     loop.stopLoop();
     EXPECT_EQ(loop.waitLoop(), 0);
-    EXPECT_LT(std::chrono::steady_clock::now() - begin, Milliseconds(1000)); // 100 and a busy host
+    EXPECT_LT(std::chrono::steady_clock::now() - begin, Milliseconds(500)); // 1 and a busy host
+    if (caller.joinable())
+        caller.join();
     EXPECT_EQ(call("Ask"), 0);
 }
+
+INSTANTIATE_TEST_SUITE_P(, StopTest, testing::Bool(), [](const auto& row) {
+    return row.param ? "WhileAnotherThreadCalls" : "WhenIdle";
+});
 
 /// A bus that lets a connection have one match rule.
 TEST(SignalLimitTest, TheBusRefusalOfARuleIsTold) {
