@@ -34,6 +34,21 @@ public:
 
     /// Drops one reference. @param connection may be null
     static void unref(DBusConnection* connection);
+
+    /// Whether signals are delivered only when they come from the service that the subscribed proxy
+    /// names, or from the bus itself. Off at first: signals are then told apart by interface and
+    /// name only, whoever sends them, on which programs with a bus or peers of their own may rely.
+    /// Turn it on unless every process on your buses is trusted: on the system bus any user can
+    /// send signals that look like the Bluetooth daemon's, to all or to one process.
+    /// @param on for all proxies on all buses of the process, from the next signal on
+    /// @dbus org.freedesktop.DBus.GetNameOwner(s name) -> s, when a proxy subscribes to a service
+    ///       whose owner is not known, and once for each new sender
+    ///
+    /// A service that is restarted is known again by its first signal. A process that sends signals
+    /// before it owns the service's name is believed a second later at the latest.
+    ///
+    /// May be called at any time and from any thread, best before the first proxy.
+    static void checkSenders(bool on);
 };
 
 } // namespace Bluetooth

@@ -29,18 +29,18 @@ constexpr int defaultTimeoutMs = 25000; // libdbus's
 /// What libdbus may hold unread of a flood of signals, in bytes, before it stops reading replies.
 constexpr long receiveLimit = 1L << 30;
 
-thread_local const BusLink* receiving = nullptr; // its receive() runs on this thread
+thread_local BusLink* receiving = nullptr; // its receive() runs on this thread
 
 /// While it lives, no link's receive() counts as running on this thread, or `link`'s does.
 class ReceivingScope {
 public:
-    explicit ReceivingScope(const BusLink* link) : m_outer(receiving) { receiving = link; }
+    explicit ReceivingScope(BusLink* link) : m_outer(receiving) { receiving = link; }
     ~ReceivingScope() { receiving = m_outer; }
     ReceivingScope(const ReceivingScope&) = delete;
     ReceivingScope& operator=(const ReceivingScope&) = delete;
 
 private:
-    const BusLink* m_outer;
+    BusLink* m_outer;
 };
 
 /// While it lives, `link`'s step() runs on this thread. Steps of several links nest when a handler
@@ -98,13 +98,14 @@ struct BusLink::Waiter {
                (goal == Goal::Output && !dbus_connection_has_messages_to_send(connection));
     }
     /// Takes a reply to one of the calls.
-    bool take(dbus_uint32_t serial, DBusMessage* reply) {
+    bool take(dbus_uint32_t serial, DBusMessage* reply, std::uint64_t signalsBefore) {
         Exchange* const end = exchanges + count;
         Exchange* const exchange = std::find_if(
             exchanges, end, [serial](const Exchange& each) { return each.serial == serial; });
         if (exchange == end || exchange->reply)
             return false;
         exchange->reply.reset(dbus_message_ref(reply));
+        exchange->signalsBefore = signalsBefore;
         --missing;
         return true;
     }
@@ -161,9 +162,12 @@ bool BusLink::attach() {
     return dbus_connection_add_filter(m_connection, filter, this, nullptr) && m_wakeFd >= 0;
 }
 
-MessagePtr BusLink::call(DBusMessage* message, int timeoutMs, DBusError& error) {
+MessagePtr BusLink::call(DBusMessage* message, int timeoutMs, DBusError& error,
+                         std::uint64_t* signalsBefore) {
     Exchange exchange{MessagePtr(dbus_message_ref(message))};
-    exchangeAll(&exchange, 1, timeoutMs);
+    exchangeAll(&exchange, 1, timeoutMs, signalsBefore && receiving == this ? &stop : nullptr);
+    if (signalsBefore)
+        *signalsBefore = exchange.signalsBefore;
     if (!exchange.reply)
         setNoReply(error, exchange);
     else if (dbus_set_error_from_message(&error, exchange.reply.get()))
@@ -172,17 +176,22 @@ MessagePtr BusLink::call(DBusMessage* message, int timeoutMs, DBusError& error) 
 }
 
 void BusLink::callAll(std::vector<Exchange>& exchanges) {
-    exchangeAll(exchanges.data(), exchanges.size(), -1);
+    exchangeAll(exchanges.data(), exchanges.size(), -1, nullptr);
 }
 
-void BusLink::exchangeAll(Exchange* first, std::size_t count, int timeoutMs) {
+void BusLink::exchangeAll(Exchange* first, std::size_t count, int timeoutMs,
+                          WakingFlag* interrupted) {
     if (dispatchesHere()) {
         exchangeInsideDispatch(m_connection, first, count, timeoutMs);
+        const Lock lock(m_mutex);
+        for (Exchange* exchange = first; exchange != first + count; ++exchange)
+            exchange->signalsBefore = keptSignals(lock); // without what libdbus read meanwhile
         return;
     }
     if (!dbus_connection_get_is_connected(m_connection))
         return;
     Waiter waiter(first, count, m_connection);
+    waiter.interrupted = interrupted;
     if (timeoutMs != std::numeric_limits<int>::max())
         waiter.deadline = waiter.begin + Milliseconds(timeoutMs < 0 ? defaultTimeoutMs : timeoutMs);
     // Sent without pending calls, which are a third of the work of a raw call: libdbus makes an
@@ -195,6 +204,9 @@ void BusLink::exchangeAll(Exchange* first, std::size_t count, int timeoutMs) {
             --waiter.missing;
     join(waiter);
     wait(waiter, lock);
+    for (Exchange* exchange = first; exchange != first + count; ++exchange)
+        if (!exchange->reply)
+            exchange->signalsBefore = keptSignals(lock);
 }
 
 /// libdbus's dispatch cannot be entered twice: inside it only libdbus's own wait works, in which
@@ -446,12 +458,31 @@ void BusLink::removeSubscription() {
     Lock lock(m_mutex);
     --m_subscriptions;
     while (m_subscriptions == 0 && m_receivers == 0 && !m_inbox.empty()) {
-        MessagePtr unwanted = std::move(m_inbox.front()); // one by one: another deque takes memory
-        m_inbox.pop_front();
+        MessagePtr unwanted = takeSignal(); // one by one: another deque takes memory
         lock.unlock();
         unwanted.reset();
         lock.lock();
     }
+}
+
+MessagePtr BusLink::takeSignal() {
+    MessagePtr signal = std::move(m_inbox.front());
+    m_inbox.pop_front();
+    ++m_taken;
+    return signal;
+}
+
+std::uint64_t BusLink::keptSignals(const Lock&) const {
+    return m_taken + m_inbox.size();
+}
+
+std::uint64_t BusLink::takenSignals() {
+    const Lock lock(m_mutex);
+    return m_taken;
+}
+
+BusLink* BusLink::receivingHere() {
+    return receiving;
 }
 
 void BusLink::receive(Deliver deliver, void* context) {
@@ -464,8 +495,7 @@ void BusLink::receive(Deliver deliver, void* context) {
             receiveMore(lock, limit);
             continue;
         }
-        const MessagePtr message = std::move(m_inbox.front());
-        m_inbox.pop_front();
+        const MessagePtr message = takeSignal();
         lock.unlock();
         deliver(context, message.get());
         lock.lock();
@@ -521,8 +551,9 @@ DBusHandlerResult BusLink::giveReply(DBusMessage* message) {
     const dbus_uint32_t serial = dbus_message_get_reply_serial(message);
     const Lock lock(m_mutex);
     const bool taken =
-        serial != 0 && std::any_of(m_waiters.begin(), m_waiters.end(),
-                                   [&](Waiter* waiter) { return waiter->take(serial, message); });
+        serial != 0 && std::any_of(m_waiters.begin(), m_waiters.end(), [&](Waiter* waiter) {
+            return waiter->take(serial, message, keptSignals(lock));
+        });
     if (!taken)
         return DBUS_HANDLER_RESULT_NOT_YET_HANDLED;
     if (!LeadingScope::has(this))

@@ -4,6 +4,7 @@
 
 #include "core/dbus_ptr.h"
 #include "core/own_dispatch.h"
+#include "core/sender_check.h"
 #include "core/waking_flag.h"
 
 #include <dbus/dbus.h>
@@ -12,6 +13,7 @@
 #include <chrono>
 #include <condition_variable>
 #include <cstddef>
+#include <cstdint>
 #include <deque>
 #include <mutex>
 #include <vector>
@@ -37,6 +39,8 @@ public:
         MessagePtr call;
         MessagePtr reply = nullptr; // a D-Bus error counts; null when none came
         dbus_uint32_t serial = 0;   // 0 when the call could not be sent
+        std::uint64_t signalsBefore =
+            0; // how many signals had been kept when it came, or when none had
     };
 
     /// The link of a connection, made when first asked for and living as long as the connection.
@@ -48,8 +52,11 @@ public:
 
     /// Sends a method call and waits for its reply.
     /// @param timeoutMs milliseconds, or -1 for libdbus's default
+    /// @param signalsBefore unless null, receives how many signals had been kept when the reply
+    ///                      came; on the receive thread requestStop() then ends the wait
     /// @return the reply; null with `error` set, also when the reply is a D-Bus error
-    MessagePtr call(DBusMessage* message, int timeoutMs, DBusError& error);
+    MessagePtr call(DBusMessage* message, int timeoutMs, DBusError& error,
+                    std::uint64_t* signalsBefore = nullptr);
 
     /// Sends all calls before it waits for their replies, at most as long as one call may take.
     void callAll(std::vector<Exchange>& exchanges);
@@ -73,8 +80,16 @@ public:
     void addSubscription();
     void removeSubscription();
 
+    /// How many signals have been taken out of those kept: what receive() delivers is the last.
+    std::uint64_t takenSignals();
+
     /// The receive thread's work: delivers signals, one after the other, until requestStop().
     void receive(Deliver deliver, void* context);
+
+    /// The link whose receive() runs on this thread; null for none.
+    static BusLink* receivingHere();
+    bool isOf(const DBusConnection* connection) const { return connection == m_connection; }
+    SenderCheck& senders() { return m_senders; }
 
     /// Ends every receive() of the process, for good. Safe in a signal handler.
     static void requestStop() { stop.raise(); }
@@ -93,6 +108,8 @@ private:
     ~BusLink();
     bool attach();
 
+    MessagePtr takeSignal();
+    std::uint64_t keptSignals(const Lock&) const;
     void join(Waiter& waiter);
     void wait(Waiter& waiter, Lock& lock);
     bool mayLead(const Waiter& waiter) const;
@@ -106,7 +123,7 @@ private:
     void wakeLeader();
     void receiveMore(Lock& lock, Milliseconds limit);
     bool dispatchesHere() const;
-    void exchangeAll(Exchange* first, std::size_t count, int timeoutMs);
+    void exchangeAll(Exchange* first, std::size_t count, int timeoutMs, WakingFlag* interrupted);
     static void exchangeInsideDispatch(DBusConnection* connection, Exchange* first,
                                        std::size_t count, int timeoutMs);
 
@@ -121,6 +138,7 @@ private:
     int m_wakeFd = -1;                  // interrupts the leader's wait for the socket
     OwnDispatch m_ownDispatch;
     std::atomic<bool> m_handedOver{false}; // a signal, to the receive thread, by who leads
+    SenderCheck m_senders{*this};
 
     // Guards what follows. Not held while waiting for the socket, in reading and dispatching, or in
     // callbacks. libdbus's own locks may be taken under it, and a call is sent under it.
@@ -134,6 +152,7 @@ private:
     int m_receivers = 0;
     int m_subscriptions = 0;
     std::deque<MessagePtr> m_inbox;
+    std::uint64_t m_taken = 0; // signals that have left it
 };
 
 } // namespace Bluetooth

@@ -22,6 +22,10 @@ DBusConnection* Connection::get(DBusBusType type) {
     return connection;
 }
 
+void Connection::checkSenders(bool on) {
+    SenderCheck::turn(on);
+}
+
 void Connection::unref(DBusConnection* connection) {
     if (connection)
         dbus_connection_unref(connection);

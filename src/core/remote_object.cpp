@@ -9,6 +9,7 @@
 #include "core/match_rule.h"
 #include "core/proxy_use.h"
 #include "core/remote_object_private.h"
+#include "core/sender_check.h"
 #include "core/subscriptions.h"
 
 #include <cerrno>
@@ -111,6 +112,7 @@ int RemoteObject::subscribe(const char* member, Callback callback) {
             link->addSubscription();
         if (addMatch(link, rule, error)) {
             Subscriptions::all().add(record);
+            SenderCheck::prepare(*this);
             return 0;
         }
         if (link)

@@ -3,6 +3,8 @@
 
 #include <bluetooth/remote_object.h>
 
+#include "core/sender_check.h"
+
 #include <utility>
 
 namespace Bluetooth {
@@ -76,10 +78,12 @@ bool Subscriptions::Walk<Callback>::next() {
     endCall();
     while (m_next != m_kind.records.end()) {
         const SignalHandler<Callback>& record = *m_next++;
-        if (matches(record)) {
-            beginCall(record);
+        if (!matches(record))
+            continue;
+        beginCall(record); // before the check, which may ask the bus: so the proxy stays meanwhile
+        if (SenderCheck::lets(*m_proxy, m_signal) && m_proxy)
             return true;
-        }
+        endCall();
     }
     return false;
 }

@@ -20,8 +20,9 @@ namespace Bluetooth {
 /// a list of records for each of the five kinds of callbacks, the newest in front.
 ///
 /// WALKS. To deliver a signal is to walk each list from front to back and to call what matches by
-/// interface and name. Neither path nor sender is compared, on purpose: a signal of one object
-/// reaches the subscribed proxies of all objects of its interface. Several threads may walk a list
+/// interface and name. The path is not compared, on purpose: a signal of one object reaches the
+/// subscribed proxies of all objects of its interface. Nor is the sender, unless the program has
+/// asked for that (SenderCheck). Several threads may walk a list
 /// at once (each bus has its receive thread), and a callback may begin a walk inside the one that
 /// called it. Records come and go meanwhile:
 /// - One that is added is put in front of every walk: it sees the next signal, not this one.
