@@ -3,12 +3,12 @@
 
 #include "support/auto_connect_fixture.h"
 
-#include <bluetooth/commandlib.h>
+#include <bluetooth/adapter.h>
+#include <bluetooth/manager.h>
 
 #include <signal.h>
 
 #include <memory>
-#include <thread>
 
 namespace Bluetooth::Test {
 
@@ -63,12 +63,31 @@ struct Daemon : ChildProcess {
     Texts passed;
 };
 
+using Clock = std::chrono::steady_clock;
+using Moment = Clock::time_point;
+
+std::size_t wholeSecondsSince(Moment start) {
+    const auto seconds = std::chrono::ceil<std::chrono::seconds>(Clock::now() - start);
+    return static_cast<std::size_t>(seconds.count());
+}
+
 } // namespace
 
 class AutoConnectDaemonTest : public AutoConnectFixture {
 protected:
     std::size_t connectCalls(const char* interface) {
         return simulation.countCalls("s:org.bluez."s + interface + " s:Connect ");
+    }
+    /// How often the daemon has read the files: each time it lists the adapters twice.
+    std::size_t reloads() { return simulation.countCalls("s:ListAdapters ") / 2; }
+    void setPower(const std::string& adapter, bool isOn) {
+        EXPECT_TRUE(simulation.peer()
+                        .call("org.bluez", adapter, "org.bluez.Adapter", "SetProperty",
+                              with("Powered", Var{isOn}))
+                        .get());
+    }
+    std::string pathOf(const char* adapter) {
+        return std::unique_ptr<Adapter>(Manager().findAdapter(adapter))->getPath();
     }
 
     const std::string headsetConnected = headset + " connected"s;
@@ -153,6 +172,61 @@ TEST_F(AutoConnectDaemonTest, FollowsTheBluetoothDaemonAndItsAdapters) {
         w.dict("sv", [](Writer& e) { e.entry("Address", Var{std::string(adapter1)}); });
     });
     EXPECT_TRUE(daemon.waitFor(otherDevice + " connected"s));
+}
+
+TEST_F(AutoConnectDaemonTest, HoweverManySignalsComeADeviceIsTriedOncePerInterval) {
+    setConfig(adapter0, "1,"s + headset);
+    simulation.setDevice(headset, "Connectable", false);
+    const std::string hci0 = pathOf(adapter0);
+    const std::string hci1 = pathOf(adapter1);
+    Daemon daemon("--interval 60");
+    ASSERT_TRUE(daemon.waitFor("connecting "s + headset));
+    const Moment start = Clock::now();
+    const std::size_t before = reloads();
+    for (int count = 0; count < 2000; ++count) {
+        simulation.peer().emit("/", "org.bluez.Manager", "AdapterAdded", with(Path{hci0}));
+        simulation.peer().emit(hci0, "org.bluez.Adapter", "PropertyChanged",
+                               with("Powered", Var{false}));
+    }
+    for (int count = 0; count < 100; ++count) // not forged
+        setPower(hci1, count % 2 != 0);
+    setConfig(adapter1, "1,"s + otherDevice);
+    setPower(hci1, false);
+    setPower(hci1, true);
+    EXPECT_TRUE(daemon.waitFor("watching "s + otherDevice)) << "nothing is missed";
+    EXPECT_LE(reloads() - before, wholeSecondsSince(start) + 1);
+    const std::string attempt = "44_01 s:org.bluez.AudioSink s:Connect ";
+    EXPECT_EQ(simulation.countCalls(attempt), 1u);
+
+    setPower(hci0, false);
+    EXPECT_TRUE(becomesTrue([&] {
+        const Texts calls = simulation.calls();
+        const auto isOf = [&](const char* method) {
+            return [call = hci0 + " s:org.bluez.Adapter s:" + method](const std::string& text) {
+                return text.find(call) != std::string::npos;
+            };
+        };
+        const auto off = std::find_if(calls.begin(), calls.end(), isOf("SetProperty "));
+        return std::any_of(off, calls.end(), isOf("GetProperties "));
+    })) << "read again";
+    setPower(hci0, true);
+    EXPECT_TRUE(simulation.awaitCalls(attempt, 2)) << "at once";
+}
+
+TEST_F(AutoConnectDaemonTest, EndsInTimeWhateverHangs) {
+    setConfig(adapter0, "1,"s + headset);
+    for (const bool isTool : {true, false}) {
+        writeProgram("/usr/bin/hciconfig", isTool ? "touch /tmp/hangs; exec sleep 60" : "");
+        simulation.process().signal(isTool ? SIGCONT : SIGSTOP);
+        Daemon daemon;
+        ASSERT_TRUE(daemon.waitFor("started"));
+        EXPECT_TRUE(!isTool || becomesTrue([] { return std::filesystem::exists("/tmp/hangs"); }));
+        const Moment start = Clock::now();
+        EXPECT_EQ(daemon.stop(isTool ? SIGINT : SIGTERM), 0) << isTool;
+        EXPECT_LT(Clock::now() - start, std::chrono::seconds(2)) << isTool;
+    }
+    simulation.process().signal(SIGCONT);
+    EXPECT_TRUE(Daemon().waitFor(headsetConnected)) << "nothing is left locked";
 }
 
 TEST_F(AutoConnectDaemonTest, GoesIntoTheBackgroundOnceItIsReady) {

@@ -1,8 +1,6 @@
 // SPDX-License-Identifier: LGPL-2.1-or-later
 #include "auto_connector.h"
 
-#include "wakeup.h"
-
 #include <bluetooth/adapter.h>
 #include <bluetooth/device.h>
 #include <bluetooth/dict_codec.h>
@@ -19,15 +17,17 @@ namespace AutoConnectd {
 
 namespace {
 
+constexpr std::chrono::seconds newsPause{1};
+
 void onAdapterAddedOrRemoved(Bluetooth::RemoteObject* /*sender*/,
                              const Bluetooth::ObjectPath* /*adapter*/) {
-    requestReload();
+    tellAdapters();
 }
 
 void onAdapterChanged(Bluetooth::RemoteObject* /*sender*/, const char* name,
                       const Bluetooth::Variant* /*value*/) {
     if (strcmp(name, "Powered") == 0)
-        requestReload();
+        tellPower();
 }
 
 } // namespace
@@ -54,6 +54,7 @@ bool AutoConnector::start() {
 void AutoConnector::handle(Command command) {
     switch (command) {
     case Command::Reload:
+        hurryAll();
         reload();
         break;
     case Command::Pause:
@@ -63,10 +64,23 @@ void AutoConnector::handle(Command command) {
     case Command::Resume:
         m_paused = false;
         syslog(LOG_NOTICE, "resumed");
-        for (const auto& target : m_targets)
-            target->hurry();
+        hurryAll();
         break;
     }
+}
+
+void AutoConnector::handle(News news) {
+    if (news.power) {
+        for (const auto& target : m_targets)
+            target->beginAgain();
+    }
+    if (news.adapters)
+        reloadAt(m_reloaded + newsPause);
+}
+
+void AutoConnector::hurryAll() {
+    for (const auto& target : m_targets)
+        target->hurry();
 }
 
 /// Asked first, since every call to a daemon that is absent is logged as a failure.
@@ -89,18 +103,20 @@ void AutoConnector::watchAdapters() {
     }
 }
 
-void AutoConnector::retryLater() {
+void AutoConnector::reloadAt(Clock::time_point when) {
+    m_reloadAt = m_reloadDue ? std::min(m_reloadAt, when) : when;
     m_reloadDue = true;
-    m_retryAt = Clock::now() + m_retryDelay;
+}
+
+void AutoConnector::retryLater() {
+    reloadAt(Clock::now() + m_retryDelay);
     m_retryDelay = std::min(m_retryDelay * 2, m_pace.longest);
 }
 
 std::unique_ptr<Target> AutoConnector::takeOrCreate(Bluetooth::Device& device) {
     for (auto& target : m_targets) {
-        if (target && target->path() == device.getPath()) {
-            target->hurry();
+        if (target && target->path() == device.getPath())
             return std::move(target);
-        }
     }
     auto target = Target::create(device, m_pace);
     if (target)
@@ -112,6 +128,7 @@ std::unique_ptr<Target> AutoConnector::takeOrCreate(Bluetooth::Device& device) {
 
 void AutoConnector::reload() {
     m_reloadDue = false;
+    m_reloaded = Clock::now();
     if (!hasDaemon()) {
         m_targets.clear();
         m_adapters.reset();
@@ -141,7 +158,7 @@ void AutoConnector::reload() {
 
 void AutoConnector::work() {
     const Clock::time_point now = Clock::now();
-    if (m_reloadDue ? now >= m_retryAt : !hasDaemon())
+    if (m_reloadDue ? now >= m_reloadAt : !hasDaemon())
         reload();
     const auto lost = std::remove_if(
         m_targets.begin(), m_targets.end(),
@@ -159,7 +176,7 @@ void AutoConnector::work() {
 Clock::time_point AutoConnector::nextDue() const {
     Clock::time_point due = Clock::now() + m_pace.longest;
     if (m_reloadDue)
-        due = std::min(due, m_retryAt);
+        due = std::min(due, m_reloadAt);
     for (const auto& target : m_targets) {
         if (!target->isConnected() && !m_paused)
             due = std::min(due, target->due());

@@ -4,6 +4,7 @@
 
 #include "command_splitter.h"
 #include "target.h"
+#include "wakeup.h"
 
 #include <bluetooth/adapter_list.h>
 #include <bluetooth/auto_connect.h>
@@ -19,7 +20,9 @@ namespace AutoConnectd {
 /// The main loop calls work() when wakeup or nextDue() says so. A restart of the Bluetooth daemon,
 /// an adapter that comes or goes or is switched on, and a connection that begins or ends are
 /// learnt from signals; where one is missed, the longest pause between two attempts bounds the
-/// delay.
+/// delay. Signals are hints only, for many may come, and from anyone: what they are about is asked
+/// of the Bluetooth daemon, about the adapters once a second at most, and no device is tried
+/// before its interval is over because of them.
 class AutoConnector {
 public:
     explicit AutoConnector(Pace pace) : m_pace(pace), m_retryDelay(pace.first) {}
@@ -31,7 +34,8 @@ public:
     bool hasBus() const;
 
     void handle(Command command);
-    /// Reads the files again and connects what is not connected.
+    void handle(News news);
+    /// Reads the files again. A device that is still listed keeps its pace.
     void reload();
     /// Looks at all targets and makes the attempts that are due.
     void work();
@@ -40,6 +44,8 @@ public:
 private:
     bool hasDaemon();
     void watchAdapters();
+    void hurryAll();
+    void reloadAt(Clock::time_point when);
     void retryLater();
     std::unique_ptr<Target> takeOrCreate(Bluetooth::Device& device);
 
@@ -50,7 +56,8 @@ private:
     bool m_paused = false;
     bool m_daemonMissed = false;
     bool m_reloadDue = false;
-    Clock::time_point m_retryAt{};
+    Clock::time_point m_reloadAt{};
+    Clock::time_point m_reloaded{};
     std::chrono::seconds m_retryDelay;
     std::unique_ptr<Bluetooth::AdapterList> m_adapters;
     std::vector<std::unique_ptr<Target>> m_targets;

@@ -5,6 +5,7 @@
 #include "wakeup.h"
 
 #include "common/daemon_program.h"
+#include "common/stop_request.h"
 
 #include <bluetooth/commandlib.h>
 
@@ -82,22 +83,24 @@ void renewPipe(std::unique_ptr<CommandPipe>& pipe) {
 /// Waits for a command, for news, or until an attempt is due.
 /// @return whether there are commands to read
 bool wait(const CommandPipe& pipe, Clock::time_point until) {
-    pollfd watched[] = {{pipe.descriptor(), POLLIN, 0}, {wakeupDescriptor(), POLLIN, 0}};
+    pollfd watched[] = {{pipe.descriptor(), POLLIN, 0},
+                        {wakeupDescriptor(), POLLIN, 0},
+                        {Tools::stopDescriptor(), POLLIN, 0}};
     const auto left = std::chrono::ceil<std::chrono::milliseconds>(until - Clock::now()).count();
-    const int ready = poll(watched, 2, static_cast<int>(std::max<std::int64_t>(left, 0)));
+    const int ready =
+        poll(watched, std::size(watched), static_cast<int>(std::max<std::int64_t>(left, 0)));
     return ready > 0 && (watched[0].revents & POLLIN) != 0;
 }
 
 int run(AutoConnector& connector, std::unique_ptr<CommandPipe>& pipe) {
     connector.reload();
-    while (!stopRequested()) {
+    while (!Tools::stopRequested()) {
         connector.work();
         if (wait(*pipe, connector.nextDue())) {
             for (const Command command : pipe->read())
                 connector.handle(command);
         }
-        if (takeReload())
-            connector.reload();
+        connector.handle(takeNews());
         if (!pipe->isCurrent())
             renewPipe(pipe);
         if (!connector.hasBus()) {
@@ -120,9 +123,8 @@ int work(const DaemonProgram& program, const StartOptions& options) {
     auto pipe = CommandPipe::open(pipePath, problem);
     if (!pipe)
         return program.fail(problem);
-    if (!openWakeup())
+    if (!openWakeup() || !Tools::stopOnSignals())
         return program.fail(std::string("cannot make an event descriptor: ") + strerror(errno));
-    stopOnSignals();
     AutoConnector connector(
         {std::chrono::seconds(options.interval), std::chrono::seconds(options.maxInterval)});
     if (!connector.start())

@@ -35,12 +35,12 @@ bool hasSink(Bluetooth::Device& device) {
 }
 
 void onSinkChanged(Bluetooth::RemoteObject* /*sender*/) {
-    requestCheck();
+    tellConnection();
 }
 
 void onAudioChanged(Bluetooth::RemoteObject* /*sender*/, const char* /*name*/,
                     const Bluetooth::Variant* /*value*/) {
-    requestCheck();
+    tellConnection();
 }
 
 } // namespace
@@ -96,6 +96,7 @@ void Target::connect(Clock::time_point now) {
     if (!m_announced)
         syslog(LOG_INFO, "connecting %s", m_address.c_str());
     m_announced = true;
+    m_tried = now;
     // Whether it came to a connection is seen at the next check: the call does not wait for it.
     if (m_sink)
         m_sink->connect();
@@ -108,6 +109,11 @@ void Target::connect(Clock::time_point now) {
 void Target::hurry() {
     m_delay = m_pace.first;
     m_due = {};
+}
+
+void Target::beginAgain() {
+    m_delay = m_pace.first;
+    m_due = std::min(m_due, m_tried + m_pace.first);
 }
 
 } // namespace AutoConnectd

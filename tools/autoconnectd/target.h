@@ -38,8 +38,11 @@ public:
     /// @return false when the daemon does not know the device any more
     bool check(Clock::time_point now, bool mayConnect);
 
-    /// Makes an attempt due at once.
+    /// Makes an attempt due at once: the user asks for it.
     void hurry();
+    /// Goes back to the first interval, reckoned from the last attempt: signals ask for it, and
+    /// however many come, the device is not tried more often than that.
+    void beginAgain();
 
     bool isConnected() const { return m_connected; }
     /// When the next attempt is due; meaningless while connected.
@@ -58,6 +61,7 @@ private:
     std::unique_ptr<Bluetooth::Audio> m_audio;
     bool m_connected = false;
     bool m_announced = false; // that it is being waited for
+    Clock::time_point m_tried{};
     Clock::time_point m_due{};
     std::chrono::seconds m_delay;
 };

@@ -1,35 +1,18 @@
 // SPDX-License-Identifier: LGPL-2.1-or-later
 #include "wakeup.h"
 
-#include <signal.h>
 #include <sys/eventfd.h>
 #include <unistd.h>
 
 #include <atomic>
-#include <cerrno>
 #include <cstdint>
 
 namespace AutoConnectd {
 
 namespace {
-
-static_assert(std::atomic<bool>::is_always_lock_free, "a signal handler sets them");
-std::atomic<bool> stopWanted{false};
-std::atomic<bool> reloadWanted{false};
+std::atomic<bool> adaptersChanged{false};
+std::atomic<bool> powerChanged{false};
 int eventDescriptor = -1;
-
-void wake() {
-    const int error = errno; // a signal handler leaves it alone
-    const std::uint64_t one = 1;
-    // It fails only when the counter is at its limit, and then the loop wakes anyway.
-    [[maybe_unused]] const ssize_t written = write(eventDescriptor, &one, sizeof(one));
-    errno = error;
-}
-
-void stopHandler(int /*signal*/) {
-    requestStop();
-}
-
 } // namespace
 
 bool openWakeup() {
@@ -37,41 +20,30 @@ bool openWakeup() {
     return eventDescriptor >= 0;
 }
 
-void stopOnSignals() {
-    struct sigaction action {};
-    action.sa_handler = stopHandler;
-    sigemptyset(&action.sa_mask);
-    action.sa_flags = 0; // no SA_RESTART: a read that blocks is to be interrupted
-    sigaction(SIGTERM, &action, nullptr);
-    sigaction(SIGINT, &action, nullptr);
-}
-
 int wakeupDescriptor() {
     return eventDescriptor;
 }
 
-void requestStop() {
-    stopWanted = true;
-    wake();
+void tellAdapters() {
+    adaptersChanged = true;
+    tellConnection();
 }
 
-void requestReload() {
-    reloadWanted = true;
-    wake();
+void tellPower() {
+    powerChanged = true;
+    tellAdapters();
 }
 
-void requestCheck() {
-    wake();
+void tellConnection() {
+    const std::uint64_t one = 1;
+    // It fails only when the counter is at its limit, and then the loop wakes anyway.
+    [[maybe_unused]] const ssize_t written = write(eventDescriptor, &one, sizeof(one));
 }
 
-bool stopRequested() {
-    return stopWanted;
-}
-
-bool takeReload() {
+News takeNews() {
     std::uint64_t count = 0;
     [[maybe_unused]] const ssize_t taken = read(eventDescriptor, &count, sizeof(count));
-    return reloadWanted.exchange(false);
+    return {adaptersChanged.exchange(false), powerChanged.exchange(false)};
 }
 
 } // namespace AutoConnectd

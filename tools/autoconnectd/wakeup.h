@@ -3,29 +3,31 @@
 #define KESBT_AUTOCONNECTD_WAKEUP_H
 
 /// @file
-/// What wakes the main loop besides commands: a signal to end, and news from the Bluetooth daemon.
-/// There is one for the process, because neither signal handlers nor the library's callbacks carry
-/// a pointer of ours. The request functions may be called from any thread; requestStop() in a
-/// signal handler too.
+/// News from the Bluetooth daemon wakes the main loop. There is one wakeup for the process, because
+/// the library's callbacks carry no pointer of ours. The tell functions may be called from any
+/// thread.
 
 namespace AutoConnectd {
 
+/// What has been told since the last look.
+struct News {
+    bool adapters; ///< they changed: the files are to be read again
+    bool power;    ///< an adapter was switched on or off
+};
+
 /// To be called before all others. @return false with errno set
 bool openWakeup();
-/// Lets SIGTERM and SIGINT request the stop.
-void stopOnSignals();
 /// To be watched for input.
 int wakeupDescriptor();
 
-void requestStop();
-/// The adapters changed: the files are to be read again.
-void requestReload();
+void tellAdapters();
+/// An adapter's power, and so the adapters, changed.
+void tellPower();
 /// A connection changed: the targets are to be asked.
-void requestCheck();
+void tellConnection();
 
-bool stopRequested();
-/// Forgets what woke the loop. @return whether a reload was requested since the last call
-bool takeReload();
+/// Forgets what woke the loop.
+News takeNews();
 
 } // namespace AutoConnectd
 
