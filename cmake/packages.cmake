@@ -36,7 +36,8 @@ macro(kesbluetooth_package component name section depends summary text)
     set(CPACK_DEBIAN_${upper}_DESCRIPTION "${summary}\n${text}")
 endmacro()
 
-kesbluetooth_package(runtime ${library} libs "" "Client library for the BlueZ 4 Bluetooth daemon"
+# dbus-glib is loaded when an object is served: what looks for dependencies does not find it.
+kesbluetooth_package(runtime ${library} libs "libdbus-glib-1-2" "Client library for the BlueZ 4 Bluetooth daemon"
 "Proxies for the manager, adapters, devices and their audio and remote-control
 interfaces over D-Bus, a pairing agent, and a scan that programs share.")
 # CPack adds scripts that call ldconfig unless there are others; these do not exist, so none are added.

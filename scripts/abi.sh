@@ -38,4 +38,6 @@ version=$(sed -n 's/^project(kesbluetooth VERSION \([0-9.]*\).*/\1/p' "$root/CMa
 soname=$(objdump -p "$library" | sed -n 's/^ *SONAME *//p')
 [ "$(basename "$library")" = "libkesbluetooth.so.$version" ] && [ "$soname" = "libkesbluetooth.so.${version%%.*}" ] ||
     die "$(basename "$library") with soname $soname does not fit version $version"
+! objdump -p "$library" | grep -q 'NEEDED.*libdbus-glib' ||
+    die "the library is linked with dbus-glib, and so are all programs: what is used of it is loaded (src/scanner/dbus_glib.cpp)"
 echo "ABI: $soname exports $(wc -l <"$exported") symbols, as declared and as kept"

@@ -4,8 +4,7 @@
 #include <bluetooth/scanner_server.h>
 
 #include "core/log.h"
-
-#include <dbus/dbus-glib-lowlevel.h>
+#include "scanner/dbus_glib.h"
 
 #include <iostream>
 
@@ -28,11 +27,11 @@ bool areValid(const char* busName, const char* path) {
 
 /// Whether something else than the object is served at a path. dbus-glib ends the process on a
 /// second one.
-bool isTaken(DBusGConnection* connection, const char* path, const GObject* object) {
+bool isTaken(const DBusGlib& glib, DBusGConnection* connection, const char* path,
+             const GObject* object) {
     void* served = nullptr;
-    return dbus_g_connection_lookup_g_object(connection, path) != object &&
-           dbus_connection_get_object_path_data(dbus_g_connection_get_connection(connection), path,
-                                                &served) &&
+    return glib.lookUpObject(connection, path) != object &&
+           dbus_connection_get_object_path_data(glib.getConnection(connection), path, &served) &&
            served;
 }
 
@@ -60,8 +59,8 @@ ServerObject::ServerObject(const char* busName, const char* path, DBusBusType ty
     : m_busType(type), m_busName(busName), m_path(path) {
     getConnection();
     if (m_connection)
-        m_busProxy = dbus_g_proxy_new_for_name(m_connection, DBUS_SERVICE_DBUS, DBUS_PATH_DBUS,
-                                               DBUS_INTERFACE_DBUS);
+        m_busProxy = DBusGlib::load()->makeProxy(m_connection, DBUS_SERVICE_DBUS, DBUS_PATH_DBUS,
+                                                 DBUS_INTERFACE_DBUS);
 }
 
 ServerObject::~ServerObject() {
@@ -70,12 +69,12 @@ ServerObject::~ServerObject() {
 }
 
 void ServerObject::getConnection() {
-    if (m_connection)
+    const DBusGlib* glib = DBusGlib::load();
+    if (m_connection || !glib)
         return;
-    m_connection = dbus_g_bus_get(m_busType, nullptr);
+    m_connection = glib->busGet(m_busType, nullptr);
     if (m_connection)
-        dbus_connection_set_exit_on_disconnect(dbus_g_connection_get_connection(m_connection),
-                                               false);
+        dbus_connection_set_exit_on_disconnect(glib->getConnection(m_connection), false);
 }
 
 bool ServerObject::prepareObjectInfo(GType type, const DBusGObjectInfo* info, GObject* object) {
@@ -84,25 +83,27 @@ bool ServerObject::prepareObjectInfo(GType type, const DBusGObjectInfo* info, GO
                  "Invalid name or path");
         return false;
     }
-    dbus_g_object_type_install_info(type, info);
+    const DBusGlib* glib = DBusGlib::load();
+    if (glib)
+        glib->installInfo(type, info);
 
     constexpr guint noFlags = 0;
     guint result = 0; // whether the name is owned, or waited for, makes no difference here
     GError* error = nullptr;
     if (!m_busProxy ||
-        !dbus_g_proxy_call(m_busProxy, "RequestName", &error, G_TYPE_STRING, m_busName, G_TYPE_UINT,
-                           noFlags, G_TYPE_INVALID, G_TYPE_UINT, &result, G_TYPE_INVALID)) {
+        !glib->call(m_busProxy, "RequestName", &error, G_TYPE_STRING, m_busName, G_TYPE_UINT,
+                    noFlags, G_TYPE_INVALID, G_TYPE_UINT, &result, G_TYPE_INVALID)) {
         logError(KES_HERE, "Failed to acquire %s, %s", m_busName,
                  error ? error->message : "Not connected to the bus");
         g_clear_error(&error);
         return false;
     }
 
-    if (isTaken(m_connection, m_path, object)) {
+    if (isTaken(*glib, m_connection, m_path, object)) {
         logError(KES_HERE, "Failed to serve %s, another object is there", m_path);
         return false;
     }
-    dbus_g_connection_register_g_object(m_connection, m_path, object);
+    glib->registerObject(m_connection, m_path, object);
     return true;
 }
 
@@ -125,7 +126,8 @@ void ServerObject::startLoop() {
         return;
 
     scanner->startReceiving();
-    dbus_g_thread_init();
+    if (const DBusGlib* glib = DBusGlib::load())
+        glib->initThreads();
     {
         const LoopTimer timer(this);
         g_main_loop_run(loop.get());
@@ -155,22 +157,22 @@ void ServerObject::printInfo() const {
 
 const char* ServerObject::getConnectionName() const {
     return m_connection
-               ? textOf(dbus_bus_get_unique_name(dbus_g_connection_get_connection(m_connection)))
+               ? textOf(dbus_bus_get_unique_name(DBusGlib::load()->getConnection(m_connection)))
                : "";
 }
 
 // These tell about the bus, not about what is served: programs know them so.
 
 const char* ServerObject::getBusName() const {
-    return m_busProxy ? textOf(dbus_g_proxy_get_bus_name(m_busProxy)) : "";
+    return m_busProxy ? textOf(DBusGlib::load()->getBusName(m_busProxy)) : "";
 }
 
 const char* ServerObject::getPath() const {
-    return m_busProxy ? textOf(dbus_g_proxy_get_path(m_busProxy)) : "";
+    return m_busProxy ? textOf(DBusGlib::load()->getPath(m_busProxy)) : "";
 }
 
 const char* ServerObject::getInterface() const {
-    return m_busProxy ? textOf(dbus_g_proxy_get_interface(m_busProxy)) : "";
+    return m_busProxy ? textOf(DBusGlib::load()->getInterface(m_busProxy)) : "";
 }
 
 int ServerObject::callbackThreadHandler(void*) {
