@@ -7,7 +7,9 @@
 #include <bluetooth/manager.h>
 
 #include <signal.h>
+#include <sys/file.h>
 
+#include <functional>
 #include <memory>
 
 namespace Bluetooth::Test {
@@ -18,9 +20,10 @@ using namespace std::string_literals;
 
 constexpr const char* pidFile = "/tmp/test.pid";
 
-Texts commandLine(const std::string& arguments, const char* file = pidFile) {
+Texts commandLine(const std::string& arguments, const char* file = pidFile, const char* by = "") {
     return {"sh", "-c",
-            "exec " KESBT_AUTOCONNECTD " --pid-file "s + file + " " + arguments + " 2>&1"};
+            "exec "s + by + " " KESBT_AUTOCONNECTD " --pid-file " + file + " " + arguments +
+                " 2>&1"};
 }
 
 /// What a daemon said that ended by itself with this status.
@@ -60,6 +63,12 @@ struct Daemon : ChildProcess {
         return std::count(passed.begin(), passed.end(), text);
     }
 
+    long residentKiB() const {
+        long pages = 0;
+        std::ifstream("/proc/" + std::to_string(pid()) + "/statm") >> pages >> pages;
+        return pages * sysconf(_SC_PAGESIZE) / 1024;
+    }
+
     Texts passed;
 };
 
@@ -70,6 +79,14 @@ std::size_t wholeSecondsSince(Moment start) {
     const auto seconds = std::chrono::ceil<std::chrono::seconds>(Clock::now() - start);
     return static_cast<std::size_t>(seconds.count());
 }
+
+bool isOwnPipe() {
+    struct stat status {};
+    return lstat(commandPipe, &status) == 0 && status.st_mode == (S_IFIFO | 0600) &&
+           status.st_uid == geteuid();
+}
+
+constexpr uid_t otherUser = 1000;
 
 } // namespace
 
@@ -137,7 +154,7 @@ TEST_F(AutoConnectDaemonTest, CommandsThatRunTogetherAreCarriedOutInOrder) {
 }
 
 TEST_F(AutoConnectDaemonTest, EveryCommandOfManySendersArrivesAlsoThroughAPipeMadeAnew) {
-    Daemon daemon;
+    Daemon daemon("--interval 3600"); // its own business does not wake it
     ASSERT_TRUE(daemon.waitFor("started"));
     constexpr int senders = 4;
     constexpr int each = 50;
@@ -153,6 +170,62 @@ TEST_F(AutoConnectDaemonTest, EveryCommandOfManySendersArrivesAlsoThroughAPipeMa
     ASSERT_TRUE(becomesTrue([] { return std::filesystem::is_fifo(commandPipe); }));
     ASSERT_TRUE(becomesTrue([this] { return autoConnect.pause(); })) << "made, and opened";
     EXPECT_TRUE(daemon.waitFor("paused"));
+}
+
+TEST_F(AutoConnectDaemonTest, ThePipeIsItsOwnWhateverStandsInItsPlace) {
+    if (geteuid() != 0)
+        GTEST_SKIP() << "only root takes away what others have made";
+    writeFile("/tmp/secret", "secret");
+    const std::function<void(const char*)> places[] = {
+        [](const char* path) { std::filesystem::create_symlink("/tmp/secret", path); },
+        [](const char* path) { writeFile(path, ""); },
+        [](const char* path) { std::filesystem::create_directory(path); },
+        [](const char* path) { EXPECT_EQ(mkfifo(path, 0644), 0); }, // whom it is open to locks it
+        [](const char* path) {
+            EXPECT_EQ(mkfifo(path, 0600), 0);
+            EXPECT_EQ(chown(path, otherUser, otherUser), 0);
+        },
+    };
+    for (const auto& occupy : places) {
+        std::filesystem::remove(commandPipe);
+        occupy(commandPipe);
+        const int held = open(commandPipe, O_RDONLY | O_NONBLOCK | O_CLOEXEC);
+        EXPECT_EQ(flock(held, LOCK_EX | LOCK_NB), 0);
+        Daemon daemon("--interval 3600");
+        ASSERT_TRUE(daemon.waitFor("started"));
+        EXPECT_TRUE(isOwnPipe());
+        EXPECT_TRUE(autoConnect.pause());
+        EXPECT_TRUE(daemon.waitFor("paused"));
+
+        occupy("/tmp/other");
+        if (std::filesystem::is_directory("/tmp/other"))
+            std::filesystem::remove(commandPipe);
+        std::filesystem::rename("/tmp/other", commandPipe);
+        EXPECT_TRUE(becomesTrue(isOwnPipe)) << "noticed although nothing else happens";
+        EXPECT_TRUE(autoConnect.resume());
+        EXPECT_TRUE(daemon.waitFor("resumed"));
+        close(held);
+    }
+    EXPECT_EQ(readFile("/tmp/secret"), "secret");
+}
+
+TEST_F(AutoConnectDaemonTest, RubbishCostsALineASecondAndNoCommandAfterIt) {
+    Daemon daemon;
+    ASSERT_TRUE(daemon.waitFor("started"));
+    const long before = daemon.residentKiB();
+    const Moment start = Clock::now();
+    std::string rubbish = "\033[2J\n\xff";
+    while (rubbish.size() < 10'000'000)
+        rubbish += rubbish;
+    writeFile(commandPipe, rubbish + "pause");
+    ASSERT_TRUE(daemon.waitFor("paused"));
+    EXPECT_LE(daemon.passed.size(), wholeSecondsSince(start) + 3);
+    ASSERT_GE(daemon.passed.size(), 3u);
+    EXPECT_EQ(daemon.passed[1].find("no command: \"\\x1B[2J\\xFF\\x1B"), 0u) << daemon.passed[1];
+    EXPECT_LT(daemon.passed[1].size(), 300u);
+    if (!isSanitized) {
+        EXPECT_LT(daemon.residentKiB() - before, 1024);
+    }
 }
 
 TEST_F(AutoConnectDaemonTest, FollowsTheBluetoothDaemonAndItsAdapters) {
@@ -237,6 +310,9 @@ TEST_F(AutoConnectDaemonTest, GoesIntoTheBackgroundOnceItIsReady) {
         << "the output is let go of";
     const int pid = std::stoi(readFile(pidFile));
     EXPECT_TRUE(autoConnect.reload()) << "it listens";
+    EXPECT_EQ(outputOf(commandLine("", "/tmp/other.pid")),
+              "kesbt-autoconnectd: another kesbt-autoconnectd reads "
+              "/tmp/kes_bluetooth_autoconnect; stop it first\n");
     EXPECT_EQ(outputOf(commandLine("")),
               "kesbt-autoconnectd: already running (/tmp/test.pid is locked); stop the other one, "
               "or choose another file with --pid-file\n");
@@ -247,16 +323,27 @@ TEST_F(AutoConnectDaemonTest, GoesIntoTheBackgroundOnceItIsReady) {
 }
 
 TEST_F(AutoConnectDaemonTest, AFailedStartIsOneLineThatSaysWhatToDo) {
-    writeFile(commandPipe, "a file");
+    std::filesystem::create_directory(commandPipe); // not empty: root does not remove it either
+    writeFile(commandPipe + "/file"s, "");
     const std::string name = "kesbt-autoconnectd: ";
+    const bool isRoot = geteuid() == 0;
+    const auto cannotReplace = [&](int error) {
+        return name +
+               "cannot replace /tmp/kes_bluetooth_autoconnect, which is no pipe of this "
+               "user's own: " +
+               strerror(error) + "; remove it and start again\n";
+    };
     for (const char* mode : {"--foreground", ""}) {
         EXPECT_EQ(outputOf(commandLine(mode, "/nowhere/x")),
                   name + "cannot write /nowhere/x: No such file or directory; run as root, or "
                          "choose another file with --pid-file\n");
-        EXPECT_EQ(outputOf(commandLine(mode)),
-                  name + "/tmp/kes_bluetooth_autoconnect is not a pipe that can be read; remove it "
-                         "and start again\n");
+        EXPECT_EQ(outputOf(commandLine(mode)), cannotReplace(isRoot ? ENOTEMPTY : EPERM));
     }
+    std::filesystem::remove_all(commandPipe);
+    writeFile(commandPipe, "a file");
+    EXPECT_EQ(
+        outputOf(commandLine("", "/tmp/other.pid", isRoot ? "unshare --user --map-user=1000" : "")),
+        cannotReplace(EPERM));
     std::filesystem::remove(commandPipe);
     simulation.bus().kill();
     EXPECT_EQ(outputOf(commandLine("-f")),

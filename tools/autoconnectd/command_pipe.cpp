@@ -2,70 +2,112 @@
 #include "command_pipe.h"
 
 #include <fcntl.h>
+#include <sys/file.h>
+#include <sys/inotify.h>
 #include <sys/stat.h>
-#include <syslog.h>
 #include <unistd.h>
 
 #include <algorithm>
 #include <cerrno>
+#include <cstdio>
 #include <cstring>
 
 namespace AutoConnectd {
 
 namespace {
 
-constexpr mode_t pipeMode = 0666;
-constexpr std::size_t readSize = 512;
+// Who commands the daemon decides what is connected: that is for those who may write the lists.
+constexpr mode_t pipeMode = 0600;
+constexpr mode_t permissionBits = 07777;
+constexpr std::size_t readSize = 65536; // what a pipe holds
+constexpr int attempts = 100;           // against someone who always is faster
 
-bool isPipe(int descriptor) {
+bool isPipeOfThisUser(const struct stat& status) {
+    return S_ISFIFO(status.st_mode) && status.st_uid == geteuid();
+}
+
+/// Takes away what stands in the place of the pipe. @return false with errno set
+bool clearPlace(const char* path) {
     struct stat status {};
-    return fstat(descriptor, &status) == 0 && S_ISFIFO(status.st_mode);
+    if (lstat(path, &status) != 0)
+        return errno == ENOENT;
+    if (geteuid() != 0 && !isPipeOfThisUser(status)) {
+        errno = EPERM;
+        return false;
+    }
+    return std::remove(path) == 0 || errno == ENOENT;
 }
 
 } // namespace
 
 std::unique_ptr<CommandPipe> CommandPipe::open(const std::string& path, std::string& problem) {
-    problem.clear();
-    if (mkfifo(path.c_str(), pipeMode) != 0 && errno != EEXIST) {
-        problem = "cannot create the pipe " + path + ": " + strerror(errno);
-        return nullptr;
+    for (int attempt = 0; attempt < attempts; ++attempt) {
+        const bool isNew = mkfifo(path.c_str(), pipeMode) == 0;
+        if (!isNew && errno != EEXIST) {
+            problem = "cannot create the pipe " + path + ": " + strerror(errno);
+            return nullptr;
+        }
+        std::unique_ptr<CommandPipe> pipe(new CommandPipe(
+            path, ::open(path.c_str(), O_RDWR | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC)));
+        if (!pipe->isOwn(isNew)) {
+            if (clearPlace(path.c_str()))
+                continue;
+            problem = "cannot replace " + path +
+                      ", which is no pipe of this user's own: " + strerror(errno) +
+                      "; remove it and start again";
+            return nullptr;
+        }
+        if (flock(pipe->m_descriptor, LOCK_EX | LOCK_NB) != 0) {
+            problem = "another kesbt-autoconnectd reads " + path + "; stop it first";
+            return nullptr;
+        }
+        pipe->watch();
+        if (pipe->isCurrent())
+            return pipe;
     }
-    const int keeper = ::open(path.c_str(), O_RDWR | O_NONBLOCK | O_CLOEXEC);
-    if (keeper < 0) {
-        problem = "cannot open the pipe " + path + ": " + strerror(errno);
-        return nullptr;
-    }
-    std::unique_ptr<CommandPipe> pipe(new CommandPipe(path, keeper));
-    if (isPipe(keeper))
-        pipe->m_fifo.reset(Bluetooth::Fifo::getReadFifo(path.c_str()));
-    if (!pipe->m_fifo) {
-        problem = path + " is not a pipe that can be read; remove it and start again";
-        return nullptr;
-    }
-    return pipe;
+    problem = path + " is replaced again and again; find out by whom, and start again";
+    return nullptr;
 }
 
 CommandPipe::~CommandPipe() {
-    close(m_keeper);
+    for (const int descriptor : {m_descriptor, m_watch}) {
+        if (descriptor >= 0)
+            close(descriptor);
+    }
+}
+
+/// A pipe that others could open is not taken over: they may have it open still, and locked.
+bool CommandPipe::isOwn(bool isNew) const {
+    struct stat status {};
+    return m_descriptor >= 0 && fstat(m_descriptor, &status) == 0 && isPipeOfThisUser(status) &&
+           (isNew || (status.st_mode & permissionBits) == pipeMode) &&
+           fchmod(m_descriptor, pipeMode) == 0; // whatever the umask has left of it
+}
+
+/// The pipe is watched, not its folder, where others come and go all the time. Without a watch the
+/// main loop finds out when it wakes for something else.
+void CommandPipe::watch() {
+    m_watch = inotify_init1(IN_CLOEXEC | IN_NONBLOCK);
+    // Removing a file changes its number of links, an attribute.
+    inotify_add_watch(m_watch, m_path.c_str(), IN_ATTRIB | IN_MOVE_SELF | IN_DONT_FOLLOW);
 }
 
 bool CommandPipe::isCurrent() const {
+    char events[1024]; // only that there are some counts
+    while (::read(m_watch, events, sizeof events) > 0) {
+    }
     struct stat now {};
     struct stat mine {};
-    return stat(m_path.c_str(), &now) == 0 && fstat(m_keeper, &mine) == 0 &&
+    return lstat(m_path.c_str(), &now) == 0 && fstat(m_descriptor, &mine) == 0 &&
            now.st_ino == mine.st_ino && now.st_dev == mine.st_dev;
 }
 
 std::vector<Command> CommandPipe::read() {
-    // Cleared, since the number of bytes read is not told.
     std::string bytes(readSize, '\0');
-    if (m_fifo->readData(bytes.data(), static_cast<int>(bytes.size())) != 0)
-        return {};
-    bytes.erase(bytes.find_last_not_of('\0') + 1);
+    const ssize_t length = ::read(m_descriptor, bytes.data(), bytes.size());
+    bytes.resize(length < 0 ? 0 : static_cast<std::size_t>(length));
     std::vector<Command> commands = m_splitter.feed(bytes);
-    const std::string unknown = m_splitter.takeUnknown();
-    if (!unknown.empty())
-        syslog(LOG_WARNING, "no command: \"%s\"", unknown.c_str());
+    m_unknown.add(m_splitter.takeUnknown());
 
     const auto bothReload = [](Command one, Command next) {
         return one == Command::Reload && next == Command::Reload;

@@ -2,6 +2,7 @@
 #include "auto_connector.h"
 #include "background.h"
 #include "command_pipe.h"
+#include "main_loop.h"
 #include "wakeup.h"
 
 #include "common/daemon_program.h"
@@ -9,7 +10,6 @@
 
 #include <bluetooth/commandlib.h>
 
-#include <poll.h>
 #include <syslog.h>
 
 #include <algorithm>
@@ -19,6 +19,7 @@
 #include <filesystem>
 #include <memory>
 #include <string>
+#include <utility>
 
 namespace AutoConnectd {
 
@@ -66,51 +67,10 @@ std::string pidFileProblem(const std::string& path, int error) {
     if (error == EAGAIN)
         return "already running (" + path +
                " is locked); stop the other one, or choose another file with --pid-file";
+    if (error == ELOOP)
+        return path + " is a link; remove it, or choose another file with --pid-file";
     return "cannot write " + path + ": " + strerror(error) +
            "; run as root, or choose another file with --pid-file";
-}
-
-/// The pipe was removed from its folder: commands come through a new one now.
-void renewPipe(std::unique_ptr<CommandPipe>& pipe) {
-    std::string problem;
-    auto next = CommandPipe::open(pipePath, problem);
-    if (next)
-        pipe = std::move(next);
-    else
-        syslog(LOG_ERR, "%s", problem.c_str());
-}
-
-/// Waits for a command, for news, or until an attempt is due.
-/// @return whether there are commands to read
-bool wait(const CommandPipe& pipe, Clock::time_point until) {
-    pollfd watched[] = {{pipe.descriptor(), POLLIN, 0},
-                        {wakeupDescriptor(), POLLIN, 0},
-                        {Tools::stopDescriptor(), POLLIN, 0}};
-    const auto left = std::chrono::ceil<std::chrono::milliseconds>(until - Clock::now()).count();
-    const int ready =
-        poll(watched, std::size(watched), static_cast<int>(std::max<std::int64_t>(left, 0)));
-    return ready > 0 && (watched[0].revents & POLLIN) != 0;
-}
-
-int run(AutoConnector& connector, std::unique_ptr<CommandPipe>& pipe) {
-    connector.reload();
-    while (!Tools::stopRequested()) {
-        connector.work();
-        if (wait(*pipe, connector.nextDue())) {
-            for (const Command command : pipe->read())
-                connector.handle(command);
-        }
-        connector.handle(takeNews());
-        if (!pipe->isCurrent())
-            renewPipe(pipe);
-        if (!connector.hasBus()) {
-            // Not program.fail(): in the foreground the log itself goes to standard error by now.
-            syslog(LOG_ERR, "the system bus has gone; start again when it is back");
-            return EXIT_FAILURE;
-        }
-    }
-    syslog(LOG_NOTICE, "stopped");
-    return EXIT_SUCCESS;
 }
 
 int work(const DaemonProgram& program, const StartOptions& options) {
@@ -134,7 +94,7 @@ int work(const DaemonProgram& program, const StartOptions& options) {
     if (options.foreground) // not before: a failed start is told in one line
         openlog(program.name(), LOG_PID | LOG_PERROR, LOG_DAEMON);
     syslog(LOG_NOTICE, "started");
-    return run(connector, pipe);
+    return MainLoop(connector, std::move(pipe)).run();
 }
 
 } // namespace
