@@ -10,6 +10,7 @@
 #include <sys/file.h>
 
 #include <functional>
+#include <iterator>
 #include <memory>
 
 namespace Bluetooth::Test {
@@ -36,7 +37,8 @@ std::string outputOf(const Texts& command, int status = 1) {
 /// A daemon in the foreground, and its log.
 struct Daemon : ChildProcess {
     explicit Daemon(const std::string& arguments = "--interval 1 --max-interval 1")
-        : ChildProcess(commandLine("--foreground " + arguments), Output::Capture) {}
+        : Daemon(commandLine("--foreground " + arguments)) {}
+    explicit Daemon(const Texts& command) : ChildProcess(command, Output::Capture) {}
     ~Daemon() {
         if (!hasEnded()) {
             EXPECT_EQ(stop(), 0);
@@ -71,6 +73,20 @@ struct Daemon : ChildProcess {
 
     Texts passed;
 };
+
+/// What the unit file of the service says under a key.
+std::string serviceSetting(const std::string& key) {
+    const std::string unit = readFile(KESBT_AUTOCONNECTD_SERVICE);
+    const std::size_t begin = unit.find("\n" + key + "=");
+    EXPECT_NE(begin, std::string::npos) << key;
+    const std::size_t value = unit.find('=', begin) + 1;
+    return unit.substr(value, unit.find('\n', value) - value);
+}
+
+Texts split(const std::string& text) {
+    std::istringstream words(text);
+    return {std::istream_iterator<std::string>(words), {}};
+}
 
 using Clock = std::chrono::steady_clock;
 using Moment = Clock::time_point;
@@ -300,6 +316,39 @@ TEST_F(AutoConnectDaemonTest, EndsInTimeWhateverHangs) {
     }
     simulation.process().signal(SIGCONT);
     EXPECT_TRUE(Daemon().waitFor(headsetConnected)) << "nothing is left locked";
+}
+
+TEST_F(AutoConnectDaemonTest, WorksWithinTheLimitsOfItsService) {
+    const std::string runtime = "/run/" + serviceSetting("RuntimeDirectory");
+    std::filesystem::create_directory(runtime);
+    Texts writable = split(serviceSetting("ReadWritePaths"));
+    writable.push_back(runtime);
+    std::ostringstream limits;
+    limits << "bwrap --die-with-parent --ro-bind / / --dev /dev --proc /proc --unshare-net "
+              "--unshare-ipc --cap-drop ALL";
+    for (const std::string& name : split(serviceSetting("CapabilityBoundingSet")))
+        limits << " --cap-add " << name;
+    for (const std::string& path : writable) {
+        const std::string place = path.substr(path.find('/'));
+        limits << " --bind " << place << ' ' << place;
+    }
+    const std::string start = serviceSetting("ExecStart");
+    setConfig(adapter0, "1,"s + headset + "," + stranger);
+    writeFile(commandPipe, "");
+    if (geteuid() == 0) {
+        EXPECT_EQ(chown((std::string(configFolder) + adapter0).c_str(), otherUser, otherUser), 0);
+    } else {
+        std::filesystem::remove(commandPipe);
+    }
+    Daemon daemon({"sh", "-c",
+                   "exec " + limits.str() + " " KESBT_AUTOCONNECTD " --foreground" +
+                       start.substr(start.find(' ')) + " 2>&1"});
+    EXPECT_TRUE(daemon.waitFor(headsetConnected));
+    EXPECT_EQ(config(adapter0), "1,"s + headset);
+    EXPECT_TRUE(autoConnect.pause());
+    EXPECT_TRUE(daemon.waitFor("paused"));
+    EXPECT_EQ(kill(std::stoi(readFile(serviceSetting("PIDFile"))), SIGTERM), 0);
+    EXPECT_EQ(daemon.wait(), 0);
 }
 
 TEST_F(AutoConnectDaemonTest, GoesIntoTheBackgroundOnceItIsReady) {
