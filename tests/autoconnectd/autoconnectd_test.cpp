@@ -270,14 +270,20 @@ TEST_F(AutoConnectDaemonTest, HoweverManySignalsComeADeviceIsTriedOncePerInterva
     const std::string hci1 = pathOf(adapter1);
     Daemon daemon("--interval 60");
     ASSERT_TRUE(daemon.waitFor("connecting "s + headset));
-    const Moment start = Clock::now();
+    EXPECT_TRUE(autoConnect.sendCommand("x"));
+    ASSERT_TRUE(daemon.waitFor("no command: \"x\""));
     const std::size_t before = reloads();
     for (int count = 0; count < 2000; ++count) {
         simulation.peer().emit("/", "org.bluez.Manager", "AdapterAdded", with(Path{hci0}));
         simulation.peer().emit(hci0, "org.bluez.Adapter", "PropertyChanged",
                                with("Powered", Var{false}));
     }
-    for (int count = 0; count < 100; ++count) // not forged
+    EXPECT_TRUE(autoConnect.sendCommand("y"));
+    EXPECT_TRUE(daemon.waitFor("no command: \"y\"")) << "a second later";
+    EXPECT_EQ(reloads(), before) << "forged signals are nothing to it";
+
+    const Moment start = Clock::now();
+    for (int count = 0; count < 100; ++count)
         setPower(hci1, count % 2 != 0);
     setConfig(adapter1, "1,"s + otherDevice);
     setPower(hci1, false);

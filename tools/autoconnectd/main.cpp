@@ -9,6 +9,7 @@
 #include "common/stop_request.h"
 
 #include <bluetooth/commandlib.h>
+#include <bluetooth/connection.h>
 
 #include <syslog.h>
 
@@ -85,6 +86,8 @@ int work(const DaemonProgram& program, const StartOptions& options) {
         return program.fail(problem);
     if (!openWakeup() || !Tools::stopOnSignals())
         return program.fail(std::string("cannot make an event descriptor: ") + strerror(errno));
+    Bluetooth::Connection::checkSenders(
+        true); // anyone may send signals that look like bluetoothd's
     AutoConnector connector(
         {std::chrono::seconds(options.interval), std::chrono::seconds(options.maxInterval)});
     if (!connector.start())
