@@ -63,9 +63,13 @@ TEST_F(AdapterVerbs, ACallThatDoesNothingOrIsNotAnsweredIsAFailure) {
 }
 
 TEST_F(AdapterVerbs, NamesFromOutsideCannotControlTheTerminal) {
-    run("adapter set Name a\x1b[2J\nb\xc3\xa9");
-    EXPECT_NE(run("adapters").out.find("a\\x1b[2J\\nb\xc3\xa9\n"), std::string::npos);
-    EXPECT_EQ(adapterProperties()["Name"], "a\x1b[2J\nb\xc3\xa9");
+    const std::string name = "a\x1b[2J\nb\xc3\xa9\u009b\u202a\u202e\u2066\u2069\u202f\u2065";
+    run("adapter set Name " + name);
+    EXPECT_NE(run("adapters")
+                  .out.find("a\\x1b[2J\\nb\xc3\xa9\\x9b\\u202a\\u202e\\u2066\\u2069"
+                            "\u202f\u2065\n"),
+              std::string::npos);
+    EXPECT_EQ(adapterProperties()["Name"], name);
 }
 
 TEST_F(AdapterVerbs, ColoursAreForTerminalsOnlyAndNoColorEndsThem) {

@@ -48,11 +48,12 @@ void DeviceWatch::print(const char* event, Colour colour, const std::string& add
     constexpr std::size_t addressWidth = 17;
     constexpr std::size_t fieldWidth = 8;
     constexpr std::size_t iconWidth = 14;
+    const auto column = [&properties](const char* name, std::size_t width) {
+        return padded(printable(field(properties, name)), width) + "  ";
+    };
     std::cout << coloured(padded(event, eventWidth), colour) << "  "
-              << padded(printable(address), addressWidth) << "  "
-              << padded(printable(field(properties, "RSSI")), fieldWidth) << "  "
-              << padded(field(properties, "Class"), fieldWidth) << "  "
-              << padded(printable(field(properties, "Icon")), iconWidth) << "  "
+              << padded(printable(address), addressWidth) << "  " << column("RSSI", fieldWidth)
+              << column("Class", fieldWidth) << column("Icon", iconWidth)
               << printable(field(properties, "Alias")) << '\n';
     flushOutput();
 }

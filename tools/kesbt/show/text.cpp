@@ -29,6 +29,36 @@ std::size_t distance(const std::string& from, const std::string& to) {
     return last.back();
 }
 
+struct Character {
+    unsigned code;
+    std::size_t length;
+};
+
+/// Reads UTF-8 of up to three bytes, since no control character has more; anything else is a
+/// character for each byte, with a code that is none.
+Character characterAt(const std::string& text, std::size_t place) {
+    const auto byte = [&](std::size_t i) {
+        return i < text.size() ? static_cast<unsigned char>(text[i]) : 0U;
+    };
+    const auto follows = [&](std::size_t i) { return (byte(i) & 0xc0U) == 0x80; };
+    const unsigned first = byte(place);
+    if (first < 0x80)
+        return {first, 1};
+    if ((first & 0xe0U) == 0xc0 && follows(place + 1))
+        return {(first & 0x1fU) << 6U | (byte(place + 1) & 0x3fU), 2};
+    if ((first & 0xf0U) == 0xe0 && follows(place + 1) && follows(place + 2))
+        return {(first & 0x0fU) << 12U | (byte(place + 1) & 0x3fU) << 6U |
+                    (byte(place + 2) & 0x3fU),
+                3};
+    return {0x110000, 1};
+}
+
+/// What acts on a terminal or changes the order in which the text around it is shown.
+bool isControl(unsigned code) {
+    const auto isIn = [code](unsigned low, unsigned high) { return code >= low && code <= high; };
+    return code < 0x20 || isIn(0x7f, 0x9f) || isIn(0x202a, 0x202e) || isIn(0x2066, 0x2069);
+}
+
 } // namespace
 
 std::string upperCase(std::string text) {
@@ -47,21 +77,19 @@ std::string quoted(const std::string& text) {
 
 std::string printable(const std::string& text) {
     std::string result;
-    for (std::size_t i = 0; i < text.size(); ++i) {
-        const auto byte = static_cast<unsigned char>(text[i]);
-        // U+0080 to U+009F are control characters too; in UTF-8 they begin with 0xc2.
-        const bool wide =
-            byte == 0xc2 && i + 1 < text.size() && static_cast<unsigned char>(text[i + 1]) < 0xa0;
-        if (byte == '\n') {
+    for (std::size_t i = 0; i < text.size();) {
+        const auto [code, length] = characterAt(text, i);
+        if (code == '\n') {
             result += "\\n";
-        } else if (byte < 0x20 || byte == 0x7f || wide) {
+        } else if (isControl(code)) {
             char escape[8];
-            static_cast<void>(std::snprintf(escape, sizeof escape, "\\x%02x",
-                                            wide ? static_cast<unsigned char>(text[++i]) : byte));
+            static_cast<void>(
+                std::snprintf(escape, sizeof escape, code < 0x100 ? "\\x%02x" : "\\u%04x", code));
             result += escape;
         } else {
-            result += text[i];
+            result.append(text, i, length);
         }
+        i += length;
     }
     return result;
 }

@@ -12,7 +12,8 @@ std::string upperCase(std::string text);
 std::string addressInCapitals(const std::string& text);
 /// In double quotes, printable.
 std::string quoted(const std::string& text);
-/// Control characters as escapes such as \n or \x1b: names come from strangers' devices.
+/// Control characters, those of the writing direction too, as escapes such as \n, \x1b or \u202e:
+/// names come from strangers' devices.
 std::string printable(const std::string& text);
 /// How many columns a text takes on a terminal, with one for each character.
 std::size_t columns(const std::string& text);
