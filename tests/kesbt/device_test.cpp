@@ -42,7 +42,14 @@ TEST_F(DeviceVerbs, CreateServicesAndRemove) {
 TEST_F(DeviceVerbs, AnUnreachableDeviceIsNotCreated) {
     const std::string beginning = "cannot create 00:11:22:33:44:07 on hci0: ";
     EXPECT_EQ(failure("create "s + unreachableLaptop),
-              beginning + "Host is down; make sure that the device is on and within reach\n");
+              beginning +
+                  "Host is down; make sure that the device is on, within reach and not in use "
+                  "elsewhere\n");
+    // The advice goes by the error's name.
+    simulation.failNext("org.bluez.Adapter", "CreateDevice",
+                        "org.bluez.Error.ConnectionAttemptFailed", "Already Exists");
+    EXPECT_EQ(failure("create "s + unreachableLaptop),
+              beginning + "Already Exists; make sure that the device is on and within reach\n");
     run("adapter set Powered off");
     EXPECT_EQ(failure("create "s + unreachableLaptop),
               beginning + "Resource Not Ready; the adapter is off, switch it on: kesbt adapter set "

@@ -38,9 +38,10 @@ BusFeed::BusFeed(const std::vector<std::string>& rules)
         dbus_bus_add_match(m_connection.get(), rule.c_str(), &error);
         if (!dbus_error_is_set(&error))
             continue;
-        const std::string reason = textOf(error.message);
+        const Failure failure =
+            refusal("cannot watch the bus", textOf(error.name), textOf(error.message));
         dbus_error_free(&error);
-        throw refusal("cannot watch the bus", reason);
+        throw failure;
     }
 }
 

@@ -50,8 +50,7 @@ std::unique_ptr<Adapter> openAdapter(Manager& manager, const Options& options) {
     }));
     if (adapter)
         return adapter;
-    const std::string reason = manager.getErrorMessage();
-    if (reason == "No such adapter")
+    if (failedWith(manager, "NoSuchAdapter"))
         throw Failure(chosen
                           ? "there is no adapter " + options.adapter +
                                 "; see which there are: kesbt adapters"
@@ -92,7 +91,7 @@ std::unique_ptr<Device> openDevice(Adapter& adapter, const std::string& address)
     std::unique_ptr<Device> device = findDevice(adapter, address);
     if (device)
         return device;
-    if (adapter.getErrorMessage() == "Does Not Exist")
+    if (failedWith(adapter, "DoesNotExist"))
         throw Failure(adapterName(adapter) + " does not know " + address +
                       "; see what it knows: kesbt devices, or make it known: kesbt create " +
                       address);
@@ -133,8 +132,7 @@ Json readOptional(Bluetooth::BluezObject& object) {
         withinLimit([&object] { return object.getProperties(); }));
     if (properties)
         return toJson(*properties);
-    const std::string reason = object.getErrorMessage();
-    if (reason.find("doesn't exist") == std::string::npos)
+    if (!lacksObject(object))
         throw refusal("cannot read the properties of " + lastComponent(object.getPath()), object);
     return nullptr;
 }

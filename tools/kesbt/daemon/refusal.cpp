@@ -6,56 +6,52 @@
 #include <bluetooth/bluez_object.h>
 #include <bluetooth/dbus_object.h>
 
-#include <cstring>
-
 namespace Kesbt {
 
 namespace {
 
 constexpr char trySimulation[] = "or try: bluez4-sim -- kesbt adapters";
 
-/// What the daemon's and the bus's error texts mean for the user.
+#define KESBT_BLUEZ_ERROR "org.bluez.Error."
+
+/// What the daemon's and the bus's errors mean for the user.
 struct Advice {
-    const char* beginning; // of the error's text
+    const char* error; // its name
     const char* text;
 };
 
 constexpr Advice advices[] = {
-    {"Resource Not Ready", "the adapter is off, switch it on: kesbt adapter set Powered true"},
-    {"Host is down", "make sure that the device is on and within reach"},
-    {"Page Timeout", "make sure that the device is on and within reach"},
-    {"Connection Timeout", "make sure that the device is on and within reach"},
-    {"No route to host", "make sure that the adapter and the device are on"},
-    {"Already Exists", "it is known already, see: kesbt devices"},
-    {"Does Not Exist", "see what there is: kesbt devices"},
-    {"In Progress", "wait until it is done, or stop it where it was begun"},
-    {"Device creation in progress", "wait until it is done, or stop it where it was begun"},
-    {"Operation Not Authorized", "only the program that began it can do this"},
-    {"Invalid arguments", "the daemon does not accept this value"},
-    {"Authentication Failed", "check the PIN or passkey, and confirm on the device"},
-    {"Authentication Rejected", "check the PIN or passkey, and confirm on the device"},
-    {"Authentication Timeout", "confirm on the device in time, then try again"},
-    {"Authentication Canceled", "try again when the adapter and the device are on"},
-    {"Repeated Attempts", "wait a minute, then try again"},
-    {"Connect Failed", "make sure that the device is on and not in use elsewhere"},
-    {"Not Connected", "connect it first: kesbt audio connect ADDRESS"},
-    {"Agent Not Available", "register an agent first: kesbt agent"},
-    {"Did not receive a reply", "the daemon may be busy, try again or give a longer --timeout"},
-    {"Message recipient disconnected", "bluetoothd ended meanwhile, start it again"},
-    {"Rejected send message", "the bus does not allow it to this user, run it as root"},
+    {KESBT_BLUEZ_ERROR "NotReady",
+     "the adapter is off, switch it on: kesbt adapter set Powered true"},
+    {KESBT_BLUEZ_ERROR "ConnectionAttemptFailed",
+     "make sure that the device is on and within reach"},
+    {KESBT_BLUEZ_ERROR "Failed",
+     "make sure that the device is on, within reach and not in use elsewhere"},
+    {KESBT_BLUEZ_ERROR "AlreadyExists", "it is known already, see: kesbt devices"},
+    {KESBT_BLUEZ_ERROR "DoesNotExist", "see what there is: kesbt devices"},
+    {KESBT_BLUEZ_ERROR "InProgress", "wait until it is done, or stop it where it was begun"},
+    {KESBT_BLUEZ_ERROR "NotAuthorized", "only the program that began it can do this"},
+    {KESBT_BLUEZ_ERROR "InvalidArguments", "the daemon does not accept this value"},
+    {KESBT_BLUEZ_ERROR "AuthenticationFailed",
+     "check the PIN or passkey, and confirm on the device"},
+    {KESBT_BLUEZ_ERROR "AuthenticationRejected",
+     "check the PIN or passkey, and confirm on the device"},
+    {KESBT_BLUEZ_ERROR "AuthenticationTimeout", "confirm on the device in time, then try again"},
+    {KESBT_BLUEZ_ERROR "AuthenticationCanceled",
+     "try again when the adapter and the device are on"},
+    {KESBT_BLUEZ_ERROR "RepeatedAttempts", "wait a minute, then try again"},
+    {KESBT_BLUEZ_ERROR "NotConnected", "connect it first: kesbt audio connect ADDRESS"},
+    {KESBT_BLUEZ_ERROR "AgentNotAvailable", "register an agent first: kesbt agent"},
+    {DBUS_ERROR_NO_REPLY, "the daemon may be busy, try again or give a longer --timeout"},
+    {DBUS_ERROR_ACCESS_DENIED, "the bus does not allow it to this user, run it as root"},
 };
 
-const char* adviceFor(const std::string& reason) {
+const char* adviceFor(const std::string& errorName) {
     for (const Advice& advice : advices) {
-        if (reason.compare(0, std::strlen(advice.beginning), advice.beginning) == 0)
+        if (errorName == advice.error)
             return advice.text;
     }
     return nullptr;
-}
-
-/// Whether the daemon has no such object (any more).
-bool lacks(const std::string& reason, const std::string& interface) {
-    return reason.find('"' + interface + "\" doesn't exist") != std::string::npos;
 }
 
 /// The daemon ends some of its texts with a line break, and libdbus's are long.
@@ -87,24 +83,36 @@ Failure adapterOff(const std::string& adapter) {
 }
 
 Failure refusal(const std::string& what, Bluetooth::RemoteObject& proxy) {
-    const std::string reason = proxy.getErrorMessage();
-    if (lacks(reason, "org.bluez.Adapter"))
+    const std::string interface = proxy.getInterface();
+    if (lacksObject(proxy) && interface == "org.bluez.Adapter")
         return adapterRemoved(lastComponent(proxy.getPath()));
-    return Bluetooth::BluezObject::hasBluetoothd() ? refusal(what, reason) : daemonAbsent();
-}
-
-Failure refusal(const std::string& what, const std::string& reason) {
     // BlueZ 5 has the same bus name and other objects.
-    if (lacks(reason, "org.bluez.Manager"))
+    if (lacksObject(proxy) && interface == "org.bluez.Manager")
         return Failure(std::string("the bluetoothd on the system bus is not one of BlueZ 4; "
                                    "install that, ") +
                        trySimulation);
-    const char* advice = adviceFor(reason);
+    return Bluetooth::BluezObject::hasBluetoothd()
+               ? refusal(what, proxy.getErrorName(), proxy.getErrorMessage())
+               : daemonAbsent();
+}
+
+Failure refusal(const std::string& what, const std::string& errorName, const std::string& reason) {
+    const char* advice = adviceFor(errorName);
     std::string line = what;
     if (!reason.empty())
         line += ": " + firstSentence(reason);
     return Failure(line + "; " +
                    (advice ? advice : "see what happens meanwhile with: kesbt monitor"));
+}
+
+bool failedWith(const Bluetooth::RemoteObject& proxy, const char* error) {
+    return proxy.getErrorName() == std::string(KESBT_BLUEZ_ERROR) + error;
+}
+
+bool lacksObject(const Bluetooth::RemoteObject& proxy) {
+    const std::string error = proxy.getErrorName();
+    return error == DBUS_ERROR_UNKNOWN_METHOD || error == DBUS_ERROR_UNKNOWN_OBJECT ||
+           error == DBUS_ERROR_UNKNOWN_INTERFACE;
 }
 
 } // namespace Kesbt

@@ -50,14 +50,16 @@ std::string askOwner() {
 }
 
 Failure scanFailure(Scanner& scanner, const std::string& adapter) {
-    const std::string reason = scanner.getErrorMessage();
-    if (reason.empty()) // it was the daemon that failed
+    const std::string error = scanner.getErrorName();
+    if (!scanner.hasError()) // it was the daemon that failed
         return Bluetooth::BluezObject::hasBluetoothd()
                    ? Failure("there is no adapter " + adapter + " any more; see: kesbt adapters")
                    : daemonAbsent();
-    if (reason.find(serviceName) != std::string::npos)
+    const bool couldNotBeStarted = error.rfind("org.freedesktop.DBus.Error.Spawn.", 0) == 0;
+    if (couldNotBeStarted || error == DBUS_ERROR_SERVICE_UNKNOWN)
         return Failure("the scanner service is not running; start it: kesbt-scannerd");
-    return refusal("cannot ask the scanner service about " + adapter, reason);
+    return refusal("cannot ask the scanner service about " + adapter, error,
+                   scanner.getErrorMessage());
 }
 
 } // namespace

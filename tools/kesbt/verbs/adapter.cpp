@@ -115,7 +115,7 @@ void setProperty(const Options& options, const std::string& givenName,
         ask(options, "cannot set " + name + " of " + adapterText, *adapter, "SetProperty",
             name.c_str(), wanted);
     } catch (const Failure&) {
-        if (adapter->getErrorMessage().rfind("Invalid arguments", 0) != 0)
+        if (!failedWith(*adapter, "InvalidArguments"))
             throw;
         throw Failure("the daemon does not let " + name + " of " + adapterText + " be set to " +
                       quoted(givenValue) + "; see what can be set: kesbt adapter set --help");

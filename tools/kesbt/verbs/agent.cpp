@@ -38,7 +38,7 @@ void registerAgent(const Options& options, Bluetooth::Adapter& adapter, const Sh
         ask(options, "cannot register an agent on " + name, adapter, "RegisterAgent",
             Bluetooth::ObjectPath(agent.getPath()), agent.getCapability());
     } catch (const Failure&) {
-        if (adapter.getErrorMessage() == "Already Exists")
+        if (failedWith(adapter, "AlreadyExists"))
             throw Failure(name + " has an agent of another program; end that program first");
         throw;
     }

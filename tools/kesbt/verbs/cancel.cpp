@@ -15,7 +15,7 @@ void cancel(const Options& options, const std::string& address) {
         ask(options, "cannot cancel the creation of " + address, *adapter, "CancelDeviceCreation",
             address.c_str());
     } catch (const Failure&) {
-        if (adapter->getErrorMessage() == "Does Not Exist")
+        if (failedWith(*adapter, "DoesNotExist"))
             throw Failure("no creation of " + address + " is under way on " + name +
                           "; see what happens with: kesbt monitor");
         throw;

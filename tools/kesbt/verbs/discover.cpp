@@ -42,7 +42,7 @@ void subscribe(Bluetooth::Manager& manager, Bluetooth::Adapter& adapter) {
             events().push({Event::Kind::Removed, path->str(), {}});
         }) == 0;
     if (!subscribed)
-        throw refusal("cannot watch " + adapterName(adapter), "");
+        throw refusal("cannot watch " + adapterName(adapter), adapter);
 }
 
 /// Prints until the user interrupts or the deadline comes. A Failure when the discovery ends.

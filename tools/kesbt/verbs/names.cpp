@@ -18,7 +18,8 @@ void listNames(const Options& options) {
     if (!bus.getConnection())
         throw daemonAbsent();
     if (bus.hasError())
-        throw refusal("cannot list the names on the system bus", bus.getErrorMessage());
+        throw refusal("cannot list the names on the system bus", bus.getErrorName(),
+                      bus.getErrorMessage());
     if (options.json) {
         printDocument(*names);
         return;

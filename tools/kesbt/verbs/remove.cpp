@@ -16,7 +16,7 @@ void removeDevice(const Options& options, const std::string& address) {
         Bluetooth::ObjectPath(device->getPath()));
 
     const auto isGone = [&] {
-        return !findDevice(*adapter, address) && adapter->getErrorMessage() == "Does Not Exist";
+        return !findDevice(*adapter, address) && failedWith(*adapter, "DoesNotExist");
     };
     if (!waitUntil(isGone, options.limit.step()))
         throw notConfirmed(address + " is still known to " + adapterName(*adapter));
