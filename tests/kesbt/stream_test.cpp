@@ -85,6 +85,39 @@ TEST_F(Streams, MonitorShowsEverySignalAlsoOfWhatComesLater) {
     EXPECT_EQ(errorsOf(*monitor, 0), "");
 }
 
+TEST_F(Streams, SignalsOfStrangersAreNotBelieved) {
+    const auto monitor = start("monitor --json");
+    awaitEvent(*monitor, "event", "daemon-came");
+    const auto discover = start("discover --json");
+    awaitEvent(*discover, "event", "found");
+    const auto waiting = start("wait found "s + newDevice);
+    awaitCall("StartDiscovery", 2);
+
+    const std::string path = json("adapter")["path"];
+    RawPeer& stranger = simulation.peer();
+    stranger.emitToEach(path, "org.bluez.Adapter", "DeviceFound",
+                        with(newDevice, Settings{{"Name", "Forged"}}));
+    stranger.emitToEach(path, "org.bluez.Adapter", "PropertyChanged", with("Powered", Var{false}));
+    stranger.emitToEach("/", "org.bluez.Manager", "AdapterRemoved", with(Path{path}));
+    stranger.emitToEach(DBUS_PATH_DBUS, DBUS_INTERFACE_DBUS, "NameOwnerChanged",
+                        with("org.bluez", "org.bluez", ""));
+    run("adapter set Powered off");
+    for (ChildProcess* program : {waiting.get(), discover.get()}) {
+        const std::string printed = program->readAll();
+        EXPECT_EQ(printed.find(newDevice), std::string::npos) << printed;
+        EXPECT_EQ(errorsOf(*program),
+                  "hci0 was switched off; switch it on: kesbt adapter set Powered true\n");
+    }
+    while (!HasFailure()) {
+        const Json event = Json::parse(monitor->readLine());
+        EXPECT_EQ(event["event"], "signal");
+        EXPECT_EQ(event.dump().find(newDevice), std::string::npos) << event;
+        if (event["arguments"] == Json{"Powered", false})
+            break;
+    }
+    EXPECT_EQ(json("adapter")["properties"]["Powered"], false);
+}
+
 TEST_F(Streams, ForPeopleTheyAreReadable) {
     const auto monitor = start("monitor");
     EXPECT_EQ(monitor->readLine().substr(12), "  bluetoothd              is on the bus");

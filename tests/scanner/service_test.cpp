@@ -134,6 +134,14 @@ TEST_F(ServiceTest, DevicesThatTheDaemonKnowsAreLeftOut) {
     askUntilListed("hci0", phone);
 }
 
+TEST_F(ServiceTest, SignalsOfStrangersFindNothing) {
+    ask("hci0");
+    system.emitToEach(pathOf("hci0"), "org.bluez.Adapter", "DeviceFound",
+                      with(newDevice, Settings{{"Name", "Forged"}}));
+    comeInReach(phone);
+    EXPECT_FALSE(lists(askUntilListed("hci0", phone), newDevice));
+}
+
 TEST_F(ServiceTest, AdaptersHaveFindersOfTheirOwn) {
     ask("hci0");
     comeInReach(otherDevice);

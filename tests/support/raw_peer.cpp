@@ -104,6 +104,24 @@ void RawPeer::emit(const std::string& path, const std::string& interface, const 
     send(std::move(signal));
 }
 
+void RawPeer::emitToEach(const std::string& path, const std::string& interface,
+                         const std::string& member, const Build& arguments) {
+    emit(path, interface, member, arguments);
+    const MessagePtr reply =
+        call(DBUS_SERVICE_DBUS, DBUS_PATH_DBUS, DBUS_INTERFACE_DBUS, "ListNames").get();
+    char** names = nullptr;
+    int count = 0;
+    dbus_message_get_args(reply.get(), nullptr, DBUS_TYPE_ARRAY, DBUS_TYPE_STRING, &names, &count,
+                          DBUS_TYPE_INVALID);
+    for (int name = 0; name < count; ++name) {
+        MessagePtr signal(dbus_message_new_signal(path.c_str(), interface.c_str(), member.c_str()));
+        dbus_message_set_destination(signal.get(), names[name]);
+        Writer(signal.get(), arguments);
+        send(std::move(signal));
+    }
+    dbus_free_string_array(names);
+}
+
 std::future<MessagePtr> RawPeer::call(const std::string& destination, const std::string& path,
                                       const std::string& interface, const std::string& member,
                                       const Build& arguments, Milliseconds timeout) {

@@ -67,6 +67,9 @@ public:
 
     void emit(const std::string& path, const std::string& interface, const std::string& member,
               const Build& arguments = {});
+    /// The same, and besides straight to each connection of the bus.
+    void emitToEach(const std::string& path, const std::string& interface,
+                    const std::string& member, const Build& arguments = {});
     /// Calls a method. @return its reply, a D-Bus error among them; null when none came
     std::future<MessagePtr> call(const std::string& destination, const std::string& path,
                                  const std::string& interface, const std::string& member,

@@ -8,6 +8,8 @@
 #include "show/text.h"
 #include "verbs/list.h"
 
+#include <bluetooth/connection.h>
+
 #include <dbus/dbus.h>
 #include <fcntl.h>
 #include <unistd.h>
@@ -43,6 +45,7 @@ void run(int argc, char** argv) {
 int main(int argc, char** argv) {
     // Without this libdbus ignores SIGPIPE, and "kesbt monitor | head" would not end.
     dbus_connection_set_change_sigpipe(false);
+    Bluetooth::Connection::checkSenders(true); // any user of the machine can send signals
     try {
         Kesbt::checkDescriptors();
         Kesbt::run(argc, argv);

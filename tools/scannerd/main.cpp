@@ -86,6 +86,7 @@ int serve(const DaemonProgram& program, ServiceName& name, DBusConnection* syste
 int work(const DaemonProgram& program) {
     if (!Tools::stopOnSignals())
         return program.fail(std::string("cannot make a timer: ") + strerror(errno));
+    Bluetooth::Connection::checkSenders(true); // any user of the machine can send signals
     ServiceName name;
     if (!name.getConnection())
         return program.fail(

@@ -22,13 +22,14 @@ struct BusSignal {
 
 /// Signals of the system bus by match rules, on a connection of its own. The library's callbacks
 /// tell which proxy subscribed; this tells which object sent, also objects that came later, and
-/// when the daemon leaves.
+/// when the daemon leaves. Only the daemon and the bus are believed: any program of the machine can
+/// send signals, straight to this connection too.
 class BusFeed {
 public:
-    static const char* const daemonRule; ///< tells when bluetoothd comes and goes
-
-    /// A Failure when the bus cannot be reached.
-    explicit BusFeed(const std::vector<std::string>& rules);
+    /// With signals of the daemon, or only with those that tell when it comes and goes. A Failure
+    /// when the bus cannot be reached.
+    enum class Signals { All, Presence };
+    explicit BusFeed(Signals wanted);
 
     /// For waitForInput(), once next() has returned false.
     int fd() const;
@@ -43,7 +44,11 @@ private:
     struct Close {
         void operator()(DBusConnection* connection) const;
     };
+    void watch(const char* rule);
+    bool take(DBusMessage* message, BusSignal& signal);
+
     std::unique_ptr<DBusConnection, Close> m_connection;
+    std::string m_daemon; ///< its unique name; "" while it is not there
 };
 
 } // namespace Kesbt

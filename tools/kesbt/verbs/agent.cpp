@@ -87,7 +87,7 @@ void serve(DBusConnection* connection, const ShownAgent& agent, BusFeed& daemon,
 void runAgent(const Options& options, const AgentSettings& settings) {
     Interrupt interrupt;
     const auto adapter = openAdapter(options);
-    BusFeed daemon({BusFeed::daemonRule});
+    BusFeed daemon(BusFeed::Signals::Presence);
     const ShownAgent agent(
         settings, [&options](const AgentRequest& request) { printRequest(options, request); });
     registerAgent(options, *adapter, agent);

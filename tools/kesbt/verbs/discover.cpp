@@ -73,7 +73,7 @@ void discover(const Options& options, double seconds) {
     const auto manager = openManager();
     const auto adapter = openAdapter(*manager, options);
     const std::string name = adapterName(*adapter);
-    BusFeed daemon({BusFeed::daemonRule});
+    BusFeed daemon(BusFeed::Signals::Presence);
     subscribe(*manager, *adapter);
     const SignalDelivery delivery(*adapter);
 

@@ -73,7 +73,7 @@ void printSignal(const Options& options, const BusSignal& signal) {
 
 void monitor(const Options& options) {
     Interrupt interrupt;
-    BusFeed feed({"type='signal',sender='org.bluez'", BusFeed::daemonRule});
+    BusFeed feed(BusFeed::Signals::All);
     openManager(); // without a daemon to watch the user has most likely mistaken something
     printDaemon(options, true);
     while (!interrupt.came()) {

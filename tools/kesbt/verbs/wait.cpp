@@ -53,12 +53,8 @@ void await(const Options& options, BusFeed& feed, const Bluetooth::Adapter& adap
         std::cout << goal.subject << " is " << goal.name << '\n';
 }
 
-BusFeed openFeed() {
-    return BusFeed({"type='signal',sender='org.bluez'", BusFeed::daemonRule});
-}
-
 void awaitFound(const Options& options, const std::string& address) {
-    BusFeed feed = openFeed();
+    BusFeed feed(BusFeed::Signals::All);
     const auto adapter = openAdapter(options);
     bool isFound = false;
     Awaited goal = {"found", address, [&isFound] { return isFound; }};
@@ -77,7 +73,7 @@ void awaitFound(const Options& options, const std::string& address) {
 
 void awaitDevice(const Options& options, const std::string& address, const char* name,
                  const char* property) {
-    BusFeed feed = openFeed();
+    BusFeed feed(BusFeed::Signals::All);
     const auto adapter = openAdapter(options);
     const auto isSo = [&] {
         const Json properties = readIfKnown(*adapter, address);
@@ -87,7 +83,7 @@ void awaitDevice(const Options& options, const std::string& address, const char*
 }
 
 void awaitPower(const Options& options) {
-    BusFeed feed = openFeed();
+    BusFeed feed(BusFeed::Signals::All);
     const auto adapter = openAdapter(options);
     const auto isOn = [&] { return readProperties(*adapter).value("Powered", false); };
     await(options, feed, *adapter, {"powered", adapterName(*adapter), isOn});
