@@ -5,7 +5,7 @@
 set -fu
 tests=$(ctest --test-dir "$1" -N)
 status=0
-for name in $(grep -o '`[A-Za-z]*Test\.[^`]*`' "$2" | tr -d '`' | sed 's/\*/.*/'); do
+for name in $(grep -o '`[A-Z][A-Za-z]*\.[A-Z*][^`]*`' "$2" | tr -d '`' | sed 's/\*/.*/'); do
     echo "$tests" | grep -Eq ": $name\$" || {
         echo "no test is called $name"
         status=1
