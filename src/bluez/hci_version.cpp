@@ -5,6 +5,7 @@
 
 #include <libgen.h>
 
+#include <chrono>
 #include <cstdio>
 #include <memory>
 
@@ -18,6 +19,10 @@ std::string controllerName(const char* path) {
 }
 
 namespace {
+
+/// A controller that hangs would otherwise keep it, and who asks, for ever.
+constexpr std::chrono::seconds limit{5};
+
 std::string scanVersion(FILE* output) {
     char line[1024];
     char version[sizeof line];
@@ -27,15 +32,16 @@ std::string scanVersion(FILE* output) {
     }
     return {};
 }
+
 } // namespace
 
 bool readHciVersion(const std::string& controller, std::string& version) {
     const std::unique_ptr<ProcessReader> tool =
-        ProcessReader::open(hciconfigProgram, {controller, "-a"});
+        ProcessReader::open(hciconfigProgram, {controller, "-a"}, limit);
     if (!tool)
         return false;
     version = scanVersion(tool->stream());
-    return true;
+    return !version.empty() || !tool->isOverdue();
 }
 
 } // namespace Bluetooth

@@ -1,7 +1,10 @@
 // SPDX-License-Identifier: LGPL-2.1-or-later
 #include "core/process.h"
 
+#include "core/descriptor.h"
+
 #include <fcntl.h>
+#include <poll.h>
 #include <signal.h>
 #include <spawn.h>
 #include <sys/wait.h>
@@ -53,15 +56,6 @@ private:
     posix_spawnattr_t m_attributes{};
 };
 
-struct PipeEnd {
-    explicit PipeEnd(int owned) : number(owned) {}
-    PipeEnd(const PipeEnd&) = delete;
-    PipeEnd& operator=(const PipeEnd&) = delete;
-    ~PipeEnd() { close(number); }
-
-    const int number;
-};
-
 /// @return the process, or -1 with errno set
 pid_t start(const char* program, const std::vector<std::string>& arguments, int output) {
     if (!program) {
@@ -95,20 +89,44 @@ int waitFor(pid_t pid) {
 
 } // namespace
 
+ProcessReader::ProcessReader(int output, std::chrono::milliseconds limit)
+    : m_output(output), m_end(std::chrono::steady_clock::now() + limit) {
+    cookie_io_functions_t functions{};
+    functions.read = read;
+    m_stream = fopencookie(this, "r", functions);
+}
+
+ssize_t ProcessReader::read(void* reader, char* buffer, size_t size) {
+    auto& self = *static_cast<ProcessReader*>(reader);
+    for (;;) {
+        const auto left = std::chrono::duration_cast<std::chrono::milliseconds>(
+            self.m_end - std::chrono::steady_clock::now());
+        self.m_isOverdue = left.count() <= 0;
+        if (self.m_isOverdue)
+            return 0;
+        pollfd output{self.m_output.number(), POLLIN, 0};
+        const int ready = poll(&output, 1, static_cast<int>(left.count()));
+        if (ready > 0)
+            return ::read(output.fd, buffer, size);
+        if (ready < 0 && errno != EINTR)
+            return -1;
+    }
+}
+
 // Each thing gets its owner before the next step, which may run out of memory.
 std::unique_ptr<ProcessReader> ProcessReader::open(const char* program,
-                                                   const std::vector<std::string>& arguments) {
-    std::unique_ptr<ProcessReader> reader(new ProcessReader);
+                                                   const std::vector<std::string>& arguments,
+                                                   std::chrono::milliseconds limit) {
     int ends[2];
     if (pipe2(ends, O_CLOEXEC) != 0)
         return nullptr;
-    const PipeEnd output(ends[1]);
-    reader->m_stream = fdopen(ends[0], "r");
+    const Descriptor output(ends[1]);
+    Descriptor input(ends[0]);
+    // The memory is there when the descriptor is released: arguments come after it.
+    std::unique_ptr<ProcessReader> reader(new ProcessReader(input.release(), limit));
     if (reader->m_stream)
-        reader->m_pid = start(program, arguments, output.number);
+        reader->m_pid = start(program, arguments, output.number());
     const int error = errno;
-    if (!reader->m_stream)
-        close(ends[0]);
     if (reader->m_pid < 0)
         reader.reset();
     errno = error;
@@ -118,8 +136,10 @@ std::unique_ptr<ProcessReader> ProcessReader::open(const char* program,
 ProcessReader::~ProcessReader() {
     if (m_stream)
         static_cast<void>(fclose(m_stream)); // only read from
-    if (m_pid >= 0)
-        waitFor(m_pid);
+    if (m_pid < 0 || waitpid(m_pid, nullptr, WNOHANG) != 0)
+        return; // nothing to end
+    kill(m_pid, SIGKILL);
+    waitFor(m_pid);
 }
 
 int runProcess(const char* program, const std::vector<std::string>& arguments) {

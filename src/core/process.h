@@ -2,8 +2,11 @@
 #ifndef KESBLUETOOTH_CORE_PROCESS_H
 #define KESBLUETOOTH_CORE_PROCESS_H
 
+#include "core/descriptor.h"
+
 #include <sys/types.h>
 
+#include <chrono>
 #include <cstdio>
 #include <memory>
 #include <string>
@@ -21,22 +24,32 @@ public:
     /// Starts a program.
     /// @param program   its path; also its first argument
     /// @param arguments the arguments after that
+    /// @param limit     how long it may take to write what is read
     /// @return null with errno set when it cannot be started (missing, not executable)
     static std::unique_ptr<ProcessReader> open(const char* program,
-                                               const std::vector<std::string>& arguments);
+                                               const std::vector<std::string>& arguments,
+                                               std::chrono::milliseconds limit);
 
     ProcessReader(const ProcessReader&) = delete;
     ProcessReader& operator=(const ProcessReader&) = delete;
 
-    /// Closes the stream and waits for the program to end.
+    /// Closes the stream, and ends the program where it still runs: nobody reads it any more.
     ~ProcessReader();
 
-    /// What the program writes. Closed by the destructor.
+    /// What the program writes within its time. Closed by the destructor.
     FILE* stream() const { return m_stream; }
+    /// Whether the stream is at its end because the time is over.
+    bool isOverdue() const { return m_isOverdue; }
 
 private:
-    ProcessReader() = default;
+    ProcessReader(int output, std::chrono::milliseconds limit);
 
+    /// read() for the stream.
+    static ssize_t read(void* reader, char* buffer, size_t size);
+
+    const Descriptor m_output;
+    const std::chrono::steady_clock::time_point m_end;
+    bool m_isOverdue = false;
     FILE* m_stream = nullptr;
     pid_t m_pid = -1;
 };

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: LGPL-2.1-or-later
 #include <bluetooth/fifo.h>
 
+#include "core/descriptor.h"
 #include "core/log.h"
 
 #include <fcntl.h>
@@ -45,15 +46,10 @@ int openPipe(const char* path, int access) {
 /// Opens the reading end of the very pipe that was looked at, and waits for a writer. Had it been
 /// open for reading while it was looked at, a writer could have come and gone unnoticed.
 int openForReading(const char* path) {
-    const int pipe = openPipe(path, O_PATH);
-    if (pipe < 0)
-        return -1;
-    const int descriptor =
-        open(("/proc/self/fd/" + std::to_string(pipe)).c_str(), O_RDONLY | O_CLOEXEC);
-    const int error = errno;
-    close(pipe);
-    errno = error;
-    return descriptor;
+    const Descriptor pipe(openPipe(path, O_PATH));
+    return pipe.isOpen() ? open(("/proc/self/fd/" + std::to_string(pipe.number())).c_str(),
+                                O_RDONLY | O_CLOEXEC)
+                         : -1;
 }
 
 /// write() for a pipe whose reader may have gone: EPIPE instead of a signal that ends the process.

@@ -1,12 +1,16 @@
 // SPDX-License-Identifier: LGPL-2.1-or-later
 // The HCI version that an adapter's properties get from hciconfig, which is a script of each test.
 
+#include "host/process_lookup.h"
 #include "support/namespace_test.h"
 #include "support/peer_test.h"
 
 #include <bluetooth/adapter.h>
 #include <bluetooth/dict_codec.h>
 
+#include <sys/wait.h>
+
+#include <chrono>
 #include <memory>
 
 namespace Bluetooth::Test {
@@ -36,9 +40,20 @@ protected:
     static constexpr const char* tool = "/usr/bin/hciconfig";
 };
 
-TEST_F(HciVersionTest, AToolThatCannotBeStartedIsLoggedAndTheEntryIsMissing) {
+TEST_F(HciVersionTest, AToolThatCannotBeStartedOrHangsIsLoggedAndTheEntryIsMissing) {
+    const std::string line = "adapter.cpp Failed to get open(/usr/bin/hciconfig hci0)";
     EXPECT_EQ(version(), "");
-    EXPECT_EQ(log.take(), Texts{"adapter.cpp Failed to get open(/usr/bin/hciconfig hci0)"});
+    EXPECT_EQ(log.take(), Texts{line});
+
+    writeProgram(tool, "echo line; exec sleep 60");
+    const auto begin = std::chrono::steady_clock::now();
+    EXPECT_EQ(version(), "");
+    EXPECT_EQ(log.take(), Texts{line});
+    const auto time = std::chrono::steady_clock::now() - begin;
+    EXPECT_GE(time, std::chrono::seconds(5));
+    EXPECT_LT(time, std::chrono::seconds(10));
+    EXPECT_EQ(getPidFromName("sleep"), -1) << "it was ended ...";
+    EXPECT_EQ(waitpid(-1, nullptr, WNOHANG), 0) << "... and reaped";
 }
 
 TEST_F(HciVersionTest, TheFirstVersionLineCounts) {

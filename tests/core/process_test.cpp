@@ -18,8 +18,10 @@ namespace Bluetooth::Test {
 
 namespace {
 
+constexpr Milliseconds limit(10'000);
+
 std::string outputOf(const char* program, const Texts& arguments) {
-    const auto reader = ProcessReader::open(program, arguments);
+    const auto reader = ProcessReader::open(program, arguments, limit);
     std::string output(1000, '\0');
     output.resize(reader ? fread(output.data(), 1, output.size(), reader->stream()) : 0);
     return output;
@@ -49,7 +51,7 @@ TEST_F(ProcessTest, AProgramThatCannotBeStartedIsSeen) {
          {std::pair("/nowhere/hciconfig", ENOENT), std::pair("/etc/passwd", EACCES),
           std::pair("/", EACCES), std::pair(static_cast<const char*>(nullptr), EINVAL)}) {
         errno = 0;
-        EXPECT_EQ(ProcessReader::open(program, {"-a"}), nullptr);
+        EXPECT_EQ(ProcessReader::open(program, {"-a"}, limit), nullptr);
         EXPECT_EQ(errno, error) << program;
         errno = 0;
         EXPECT_EQ(runProcess(program, {}), -1);
@@ -71,7 +73,7 @@ TEST_F(ProcessTest, TheStatusIsTheProgramsOwnDespiteInterruptions) {
 }
 
 TEST_F(ProcessTest, ClosingEarlyEndsAProgramThatGoesOnWriting) {
-    const auto reader = ProcessReader::open("/usr/bin/yes", {});
+    const auto reader = ProcessReader::open("/usr/bin/yes", {}, limit);
     ASSERT_NE(reader, nullptr);
     EXPECT_EQ(fgetc(reader->stream()), 'y');
 }

@@ -252,7 +252,7 @@ TEST_F(MemoryTest, AProgramIsStartedOrNothingOfItIsLeftBehind) {
     const Texts arguments{"-a", "-b"};
     const auto before = countOpenDescriptors();
     checkEachAllocation("a program", [&] {
-        ProcessReader::open("/bin/true", arguments);
+        ProcessReader::open("/bin/true", arguments, patience);
         return true;
     });
     EXPECT_EQ(countOpenDescriptors(), before);
