@@ -5,6 +5,10 @@
 #include <bluetooth/device_list.h>
 #include <bluetooth/export.h>
 
+#include <functional>
+#include <string>
+#include <vector>
+
 namespace Bluetooth {
 
 /// The lists of devices to connect automatically, one for each adapter.
@@ -16,17 +20,30 @@ namespace Bluetooth {
 ///     1,AA:BB:CC:DD:EE:FF,11:22:33:44:55:66
 /// @endcode
 /// "1" is enabled, "0" disabled. Every operation that reads a missing file creates it, disabled and
-/// empty. A file beyond 1 MiB is not read: it counts as disabled and empty, and only set() changes
-/// it.
+/// empty; an empty file counts as that too. A file beyond 1 MiB is not read: it counts as disabled
+/// and empty, and only set() changes it.
+///
+/// A change is done as one step: of a process that ends or a machine that fails meanwhile, the old
+/// or the new list is left, whole, and readers find one of these. The file's owner and mode stay;
+/// of a symbolic link, the file that it points to is replaced. Where the folder takes no new file,
+/// the file is written in place, without that promise.
 ///
 /// The auto-connect daemon reads the same files and takes commands from the pipe
 /// /tmp/kes_bluetooth_autoconnect.
 ///
 /// ERRORS. A failure is returned and logged.
-/// THREADS. There is no state; any thread may call. Nothing is locked: of two processes that change
-/// one file at the same moment, one may lose its change.
+/// THREADS. There is no state; any thread may call. Changes by several threads or processes wait
+/// for each other (a lock of the file .lock beside the lists); readers wait for nothing. Two calls
+/// are not one step: what getDeviceList() returned may be out of date when set() writes it. Use
+/// changeList() to add, remove or enable.
 class KESBLUETOOTH_API AutoConnect {
 public:
+    /// What an adapter's file holds.
+    struct List {
+        bool isEnabled = false;           ///< the flag, as getEnable() returns it
+        std::vector<std::string> devices; ///< the addresses, or whatever is between the commas
+    };
+
     /// Whether a file can be used as a list. Creates a missing file, and a missing folder
     /// /etc/bluetooth/autoconnect/.
     /// @param path the file's full path
@@ -48,6 +65,29 @@ public:
     /// @return true when the file was rewritten
     bool set(const char* adapter, bool enable, const char* deviceList);
 
+    /// Reads an adapter's list as it is in its file. Neither creates nor changes the file, and asks
+    /// no daemon.
+    /// @param adapter address of the adapter
+    /// @param list    receives the list; a missing file is disabled and empty
+    /// @return true; false with errno set (logged) when there is a file that cannot be read whole:
+    ///         EFBIG when it is too large
+    bool readList(const char* adapter, List& list) const;
+
+    /// Reads an adapter's list, has it changed and writes it, with no change of another program in
+    /// between, and calls reload(), whose result does not count. In contrast to removeDevice() it
+    /// changes a disabled list too.
+    /// @code
+    ///     autoConnect.changeList(adapter, [](AutoConnect::List& list) {
+    ///         list.devices.push_back("11:22:33:44:55:66");
+    ///     });
+    /// @endcode
+    /// @param adapter address of the adapter
+    /// @param change  called once, in this thread, with the list; not where it cannot be read. It
+    ///                may not use AutoConnect, and should not take long: other programs wait for
+    ///                it. When it throws, nothing is changed.
+    /// @return true when the list was written; false when it cannot be read or written (logged)
+    bool changeList(const char* adapter, const std::function<void(List&)>& change);
+
     /// Removes every entry equal to `device` (case matters), rewrites the file and calls reload().
     /// The list of an adapter whose flag is not "1" is left as it is.
     /// @param adapter address of the adapter
@@ -57,8 +97,9 @@ public:
     bool removeDevice(const char* adapter, const char* device);
 
     /// Returns the devices of one adapter's list, enabled or not. Entries that the adapter does not
-    /// know are removed from an enabled file, one after the other (removeDevice()). Entries for
-    /// which the daemon did not reply (it hangs or restarts, the adapter was removed) are kept.
+    /// know are removed from an enabled file, one after the other (removeDevice()), and named in
+    /// the log. Entries for which the daemon did not reply (it hangs or restarts, the adapter was
+    /// removed) are kept.
     /// @dbus org.bluez.Manager.FindAdapter(s pattern) -> o, and for each entry
     ///       org.bluez.Adapter.FindDevice(s address) -> o
     /// @param adapter address of the adapter

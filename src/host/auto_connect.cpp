@@ -7,14 +7,19 @@
 #include <bluetooth/dict_codec.h>
 #include <bluetooth/manager.h>
 
+#include "core/descriptor.h"
 #include "core/log.h"
 #include "host/auto_connect_file.h"
+#include "host/auto_connect_lock.h"
 #include "host/device_lookup.h"
+#include "host/file_replacement.h"
 #include "host/pid_file.h"
 
+#include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <memory>
 #include <string>
@@ -25,6 +30,7 @@ namespace Bluetooth {
 namespace {
 
 constexpr mode_t folderMode = 0755;
+constexpr mode_t fileMode = 0666;
 
 /// @return false, logged for the caller, when an argument is null
 bool isGiven(LogPlace place, const char* argument, const char* name) {
@@ -33,42 +39,41 @@ bool isGiven(LogPlace place, const char* argument, const char* name) {
     return argument;
 }
 
+/// Another program may do the same: what it has written meanwhile stays.
 bool createConfigFile(const char* path) {
     if (mkdir(autoConnectFolder, folderMode) != 0 && errno != EEXIST) {
         logError(KES_HERE, "Can not create config path '%s'", autoConnectFolder);
         return false;
     }
-    std::ofstream file(path, std::ios::binary);
-    if (!file) {
+    const Descriptor file(open(path, O_WRONLY | O_CREAT | O_NONBLOCK | O_CLOEXEC, fileMode));
+    struct stat status {};
+    if (!file.isOpen() || fstat(file.number(), &status) != 0) {
         logError(KES_HERE, "Config '%s' can not be open.", path);
         return false;
     }
-    if (!writeAutoConnectFile(file, "0")) {
+    if (status.st_size == 0 && write(file.number(), "0", 1) != 1) {
         logError(KES_HERE, "Config '%s' can not be written.", path);
         return false;
     }
     return true;
 }
 
-/// AutoConnect::set() for a list that may hold any byte.
-bool rewrite(const AutoConnect& config, const char* adapter, bool enable, const std::string& list) {
-    const std::string path = autoConnectPath(adapter);
-    if (!config.checkConfigFile(path.c_str()))
-        return false;
-    std::ofstream file(path, std::ios::binary);
-    if (!file) {
+/// The last step of each change.
+bool replaceList(const std::string& path, const std::string& content, const AutoConnectLock& lock) {
+    switch (replaceFile(path, content, lock.isHeld())) {
+    case Replacement::Done:
+        return true;
+    case Replacement::NotOpened:
         logError(KES_HERE, "Can not open config file '%s'.", path.c_str());
         return false;
-    }
-    if (!writeAutoConnectFile(file, (enable ? '1' : '0') + list)) {
+    case Replacement::NotWritten:
         logError(KES_HERE, "Can not write config file '%s'.", path.c_str());
         return false;
     }
-    config.reload();
-    return true;
+    return false;
 }
 
-bool isReadable(AutoConnectFile& file, const std::string& path) {
+bool isReadable(const AutoConnectFile& file, const std::string& path) {
     if (file.isTooLarge()) {
         logError(KES_HERE, "Config '%s' is too large.", path.c_str());
         return false;
@@ -76,41 +81,62 @@ bool isReadable(AutoConnectFile& file, const std::string& path) {
     return true;
 }
 
-/// Opens an adapter's file, creating it where it is missing.
+/// Reads an adapter's file, which is created where it is missing.
+/// @param access as for AutoConnectFile
 /// @return null when that cannot be done (logged, the opening for the caller)
 std::unique_ptr<AutoConnectFile> openFile(LogPlace place, const AutoConnect& config,
-                                          const std::string& path, std::ios::openmode mode) {
+                                          const std::string& path, int access) {
     if (!config.checkConfigFile(path.c_str()))
         return nullptr;
-    auto file = std::make_unique<AutoConnectFile>(path, mode);
+    auto file = std::make_unique<AutoConnectFile>(path, access);
     if (file->isOpen())
         return file;
     logError(place, "Cannot open config file '%s'", path.c_str());
     return nullptr;
 }
 
-std::vector<std::string> readEntries(AutoConnectFile& file, const std::string& path) {
-    std::vector<std::string> entries = file.readEntries();
+std::vector<std::string> readEntries(const AutoConnectFile& file, const std::string& path) {
     if (!file.isComplete())
         logError(KES_HERE, "Config '%s' can not be read to its end.", path.c_str());
-    return entries;
+    return file.entries();
+}
+
+enum class Change { NotRead, Disabled, NotWritten, Done };
+
+/// Changes a list as AutoConnect::changeList() does.
+/// @param onlyEnabled whether the list of a disabled adapter is left alone
+Change changeFile(const AutoConnect& config, const char* adapter, bool onlyEnabled,
+                  const std::function<void(AutoConnect::List&)>& change) {
+    const std::string path = autoConnectPath(adapter);
+    if (!config.checkConfigFile(path.c_str())) // makes the folder of the lock
+        return Change::NotRead;
+    {
+        const AutoConnectLock lock;
+        const auto file = openFile(KES_HERE, config, path, O_RDWR);
+        if (!file || !isReadable(*file, path))
+            return Change::NotRead;
+        if (onlyEnabled && !file->readsEnabled())
+            return Change::Disabled;
+        AutoConnect::List list{file->readsNonZero(), readEntries(*file, path)};
+        if (!file->isComplete())
+            return Change::NotRead;
+        change(list);
+        if (!replaceList(path, contentOf(list), lock))
+            return Change::NotWritten;
+    }
+    config.reload();
+    return Change::Done;
 }
 
 /// AutoConnect::removeDevice() for an entry that may hold any byte.
-bool removeEntry(const AutoConnect& config, const char* adapter, const std::string& device) {
-    const std::string path = autoConnectPath(adapter);
-    const auto file = openFile(KES_HERE, config, path, std::ios::in | std::ios::out);
-    if (!file || !isReadable(*file, path))
-        return false;
-    // The list of a disabled adapter is left alone on purpose.
-    if (!file->readsEnabled())
-        return true;
-    const std::vector<std::string> entries = readEntries(*file, path);
-    if (!file->isComplete())
-        return false;
-    // Callers learn that the file was processed, not whether it could be rewritten.
-    rewrite(config, adapter, true, listWithout(entries, device));
-    return true;
+/// @param isListed receives whether it was there
+Change removeEntry(const AutoConnect& config, const char* adapter, const std::string& device,
+                   bool& isListed) {
+    return changeFile(config, adapter, true, [&](AutoConnect::List& list) {
+        const auto kept = std::remove(list.devices.begin(), list.devices.end(), device);
+        isListed = kept != list.devices.end();
+        list.devices.erase(kept, list.devices.end());
+    });
 }
 
 /// Appends the devices of a file's entries, in the file's order, and removes the entries that the
@@ -124,8 +150,12 @@ void appendAndPrune(const AutoConnect& config, const char* address, Adapter& ada
         if (appendDevice(adapter, entry, devices) == Lookup::Unknown)
             unknown.push_back(entry);
     }
-    for (const std::string& entry : unknown)
-        removeEntry(config, address, entry);
+    for (const std::string& entry : unknown) {
+        bool isListed = false;
+        if (removeEntry(config, address, entry, isListed) == Change::Done && isListed)
+            logError(KES_HERE, "Removed '%s' from the list of %s, which does not know it.",
+                     shownEntry(entry).c_str(), address);
+    }
 }
 
 /// One adapter's part of AutoConnect::getAutoConnectDeviceList().
@@ -135,12 +165,9 @@ void appendTargets(const AutoConnect& config, Adapter& adapter, DeviceList& devi
     if (find(properties.get(), "Powered") != "1")
         return;
     const std::string path = autoConnectPath(address.c_str());
-    auto file = openFile(KES_HERE, config, path, std::ios::in);
-    if (!file || !isReadable(*file, path) || !file->readsEnabled())
-        return;
-    const std::vector<std::string> entries = readEntries(*file, path);
-    file.reset();
-    appendAndPrune(config, address.c_str(), adapter, entries, devices);
+    const auto file = openFile(KES_HERE, config, path, O_RDONLY);
+    if (file && isReadable(*file, path) && file->readsEnabled())
+        appendAndPrune(config, address.c_str(), adapter, readEntries(*file, path), devices);
 }
 
 void logFailure(PidFileFailure failure, const char* path, bool reportLocked) {
@@ -198,7 +225,7 @@ bool AutoConnect::getEnable(const char* adapter) const {
     const std::string path = autoConnectPath(adapter);
     if (!checkConfigFile(path.c_str()))
         return false;
-    AutoConnectFile file(path, std::ios::in);
+    const AutoConnectFile file(path, O_RDONLY);
     return file.isOpen() && isReadable(file, path) && file.readsNonZero();
 }
 
@@ -206,14 +233,41 @@ bool AutoConnect::set(const char* adapter, bool enable, const char* deviceList) 
     if (!isGiven(KES_HERE, adapter, "Adapter address") ||
         !isGiven(KES_HERE, deviceList, "Device address list"))
         return false;
-    return rewrite(*this, adapter, enable, deviceList);
+    const std::string path = autoConnectPath(adapter);
+    if (!checkConfigFile(path.c_str()) ||
+        !replaceList(path, (enable ? '1' : '0') + std::string(deviceList), AutoConnectLock()))
+        return false;
+    reload();
+    return true;
 }
 
 bool AutoConnect::removeDevice(const char* adapter, const char* device) {
     if (!isGiven(KES_HERE, adapter, "Adapter address") ||
         !isGiven(KES_HERE, device, "Device address"))
         return false;
-    return removeEntry(*this, adapter, device);
+    // Callers learn that the file was processed, not whether it could be rewritten.
+    bool isListed = false;
+    return removeEntry(*this, adapter, device, isListed) != Change::NotRead;
+}
+
+bool AutoConnect::readList(const char* adapter, List& list) const {
+    if (!isGiven(KES_HERE, adapter, "Adapter address")) {
+        errno = EINVAL;
+        return false;
+    }
+    const std::string path = autoConnectPath(adapter);
+    const AutoConnectFile file(path, O_RDONLY);
+    if (!file.isOpen() && file.error() != ENOENT)
+        logError(KES_HERE, "Cannot open config file '%s'", path.c_str());
+    else if (isReadable(file, path))
+        list = {file.readsNonZero(), file.isOpen() ? readEntries(file, path) : file.entries()};
+    errno = file.error();
+    return file.isComplete() || file.error() == ENOENT;
+}
+
+bool AutoConnect::changeList(const char* adapter, const std::function<void(List&)>& change) {
+    return isGiven(KES_HERE, adapter, "Adapter address") &&
+           changeFile(*this, adapter, false, change) == Change::Done;
 }
 
 DeviceList* AutoConnect::getDeviceList(const char* adapter) {
@@ -230,15 +284,12 @@ DeviceList* AutoConnect::getDeviceList(const char* adapter) {
         return nullptr;
     }
     const std::string path = autoConnectPath(adapter);
-    auto file = openFile(KES_HERE, *this, path, std::ios::in);
+    const auto file = openFile(KES_HERE, *this, path, O_RDONLY);
     if (!file)
         return nullptr;
     auto devices = std::make_unique<DeviceList>();
-    if (!isReadable(*file, path))
-        return devices.release();
-    const std::vector<std::string> entries = readEntries(*file, path);
-    file.reset();
-    appendAndPrune(*this, adapter, *proxy, entries, *devices);
+    if (isReadable(*file, path))
+        appendAndPrune(*this, adapter, *proxy, readEntries(*file, path), *devices);
     return devices.release();
 }
 

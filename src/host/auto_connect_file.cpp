@@ -1,15 +1,31 @@
 // SPDX-License-Identifier: LGPL-2.1-or-later
 #include "host/auto_connect_file.h"
 
+#include "core/descriptor.h"
+
+#include <fcntl.h>
+#include <sys/stat.h>
+
+#include <cstdio>
 #include <locale>
+#include <sstream>
 
 namespace Bluetooth {
 
 namespace {
 
-constexpr std::streamoff maxSize = 1 << 20;
-constexpr std::streamoff firstEntry = 2; // after the flag and one comma, whatever they are
+constexpr std::size_t maxSize = 1 << 20;
+constexpr std::size_t firstEntry = 2; // after the flag and one comma, whatever they are
 constexpr char separator = ',';
+
+/// Reads the value at the beginning of a text.
+template <class Value>
+bool readsAs(const std::string& content, Value& value) {
+    std::istringstream stream(content);
+    // Where the program's locale groups digits by commas, "1,112" would be read as one number.
+    stream.imbue(std::locale::classic());
+    return static_cast<bool>(stream >> value);
+}
 
 } // namespace
 
@@ -17,69 +33,75 @@ std::string autoConnectPath(const char* adapter) {
     return std::string(autoConnectFolder) + adapter;
 }
 
-AutoConnectFile::AutoConnectFile(const std::string& path, std::ios::openmode mode)
-    : m_file(path, mode | std::ios::binary) {
-    // Where the program's locale groups digits by commas, "1,112" would be read as one number.
-    m_file.imbue(std::locale::classic());
+AutoConnectFile::AutoConnectFile(const std::string& path, int access) {
+    const Descriptor file(open(path.c_str(), access | O_NONBLOCK | O_CLOEXEC));
+    struct stat status {};
+    if (!file.isOpen() || fstat(file.number(), &status) != 0)
+        m_error = errno;
+    else if (!S_ISREG(status.st_mode))
+        m_error = S_ISDIR(status.st_mode) ? EISDIR : EINVAL;
+    m_isOpen = m_error == 0;
+    m_isTooLarge = m_isOpen && status.st_size > static_cast<off_t>(maxSize);
+    if (m_isTooLarge)
+        m_error = EFBIG;
+    else if (m_isOpen)
+        m_error = read(file.number());
 }
 
-bool AutoConnectFile::isTooLarge() {
-    m_file.clear();
-    m_file.seekg(0, std::ios::end);
-    const bool tooLarge = m_file.tellg() > maxSize;
-    m_file.seekg(0);
-    return tooLarge;
-}
-
-bool AutoConnectFile::readsNonZero() {
-    m_file.clear();
-    m_file.seekg(0);
-    int number = 0;
-    return (m_file >> number) && number != 0;
-}
-
-bool AutoConnectFile::readsEnabled() {
-    m_file.clear();
-    m_file.seekg(0);
-    bool flag = false;
-    return (m_file >> flag) && flag;
-}
-
-std::vector<std::string> AutoConnectFile::readEntries() {
-    m_file.clear();
-    m_complete = false;
-    std::vector<std::string> entries;
-    try {
-        // Without this the stream keeps a lack of memory to itself, and a list that is cut short
-        // would be written back so.
-        m_file.exceptions(std::ios::badbit);
-        m_file.seekg(firstEntry);
-        while (m_file.peek() != std::fstream::traits_type::eof()) {
-            std::string entry;
-            std::getline(m_file, entry, separator);
-            entries.push_back(std::move(entry));
-        }
-        m_complete = true;
-    } catch (const std::ios_base::failure&) {
-        // The disk failed: the entries before that.
+int AutoConnectFile::read(int descriptor) {
+    char bytes[4096];
+    for (;;) {
+        const ssize_t length = ::read(descriptor, bytes, sizeof bytes);
+        if (length < 0 && errno == EINTR)
+            continue;
+        if (length <= 0)
+            return length < 0 ? errno : 0;
+        m_content.append(bytes, static_cast<std::size_t>(length));
+        m_isTooLarge = m_content.size() > maxSize; // it grows
+        if (m_isTooLarge)
+            return EFBIG;
     }
-    m_file.exceptions(std::ios::goodbit);
+}
+
+bool AutoConnectFile::readsNonZero() const {
+    int number = 0;
+    return readsAs(m_content, number) && number != 0;
+}
+
+bool AutoConnectFile::readsEnabled() const {
+    bool flag = false;
+    return readsAs(m_content, flag) && flag;
+}
+
+std::vector<std::string> AutoConnectFile::entries() const {
+    std::vector<std::string> entries;
+    for (std::size_t begin = firstEntry; begin < m_content.size();) {
+        const std::size_t end = m_content.find(separator, begin);
+        entries.push_back(m_content.substr(begin, end - begin));
+        if (end == std::string::npos)
+            break;
+        begin = end + 1;
+    }
     return entries;
 }
 
-std::string listWithout(const std::vector<std::string>& entries, const std::string& device) {
-    std::string list;
-    for (const std::string& entry : entries) {
-        if (entry != device)
-            list += separator + entry;
-    }
-    return list;
+std::string contentOf(const AutoConnect::List& list) {
+    std::string content = list.isEnabled ? "1" : "0";
+    for (const std::string& device : list.devices)
+        content += separator + device;
+    return content;
 }
 
-bool writeAutoConnectFile(std::ofstream& file, const std::string& content) {
-    file << content;
-    file.close();
-    return !file.fail();
+std::string shownEntry(const std::string& entry) {
+    constexpr std::size_t maxShown = 64;
+    std::string shown;
+    for (const char character : entry.substr(0, maxShown)) {
+        char escape[8] = {character};
+        if (character < ' ' || character > '~')
+            std::snprintf(escape, sizeof escape, "\\x%02x", static_cast<unsigned char>(character));
+        shown += escape;
+    }
+    return entry.size() > maxShown ? shown + "..." : shown;
 }
 
 } // namespace Bluetooth

@@ -2,7 +2,8 @@
 #ifndef KESBLUETOOTH_HOST_AUTO_CONNECT_FILE_H
 #define KESBLUETOOTH_HOST_AUTO_CONNECT_FILE_H
 
-#include <fstream>
+#include <bluetooth/auto_connect.h>
+
 #include <string>
 #include <vector>
 
@@ -14,37 +15,45 @@ constexpr const char* autoConnectFolder = "/etc/bluetooth/autoconnect/";
 /// The configuration file of an adapter.
 std::string autoConnectPath(const char* adapter);
 
-/// An open configuration file: a flag, a comma, and addresses with commas between them.
+/// What a configuration file held when this object was made: a flag, a comma, and addresses with
+/// commas between them.
 class AutoConnectFile {
 public:
-    /// The open mode is std::fstream's.
-    AutoConnectFile(const std::string& path, std::ios::openmode mode);
+    /// @param access O_RDONLY, or O_RDWR to find out also whether it could be written
+    AutoConnectFile(const std::string& path, int access);
 
-    bool isOpen() const { return m_file.is_open(); }
-    /// Whether it is too large to be a list of addresses; such a file is not to be read.
-    bool isTooLarge();
+    /// Whether it is a file and could be opened.
+    bool isOpen() const { return m_isOpen; }
+    /// Whether it is too large to be a list of addresses; nothing of such a file is read.
+    bool isTooLarge() const { return m_isTooLarge; }
+    /// Whether it could be read to its end. A list that is cut short must not be written back.
+    bool isComplete() const { return m_error == 0; }
+    /// Why it could not be opened or read, as errno has it; 0 when it could.
+    int error() const { return m_error; }
+
     /// The number at the beginning is there and is not 0.
-    bool readsNonZero();
+    bool readsNonZero() const;
     /// The number at the beginning is 1. Any other cannot be read as a flag.
-    bool readsEnabled();
+    bool readsEnabled() const;
     /// The texts between the commas, from the third byte to the end of the file. What follows a
     /// comma at the very end is not an entry.
-    std::vector<std::string> readEntries();
-    /// Whether the last readEntries() came to the end of the file. A list that is cut short by a
-    /// read error must not be written back.
-    bool isComplete() const { return m_complete; }
+    std::vector<std::string> entries() const;
 
 private:
-    std::fstream m_file;
-    bool m_complete = false;
+    /// @return 0 or an error
+    int read(int descriptor);
+
+    std::string m_content;
+    bool m_isOpen = false;
+    bool m_isTooLarge = false;
+    int m_error = 0;
 };
 
-/// The list of entries without those equal to `device`, as it stands behind the flag.
-std::string listWithout(const std::vector<std::string>& entries, const std::string& device);
+/// A list as it stands in a file.
+std::string contentOf(const AutoConnect::List& list);
 
-/// Overwrites a file with `content`.
-/// @return false, with nothing of the file certain, on a full disk for example
-bool writeAutoConnectFile(std::ofstream& file, const std::string& content);
+/// An entry for the log: printable, and not endless.
+std::string shownEntry(const std::string& entry);
 
 } // namespace Bluetooth
 

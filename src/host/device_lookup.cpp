@@ -13,8 +13,9 @@ namespace Bluetooth {
 
 namespace {
 
-bool isDeniedByDaemon(const std::string& error) {
-    return error == "Does Not Exist" || error == "Invalid arguments in method call";
+bool isDeniedByDaemon(const std::string& errorName) {
+    return errorName == "org.bluez.Error.DoesNotExist" ||
+           errorName == "org.bluez.Error.InvalidArguments";
 }
 
 } // namespace
@@ -29,7 +30,7 @@ Lookup appendDevice(Adapter& adapter, const std::string& address, DeviceList& de
         return Lookup::Found;
     }
     const bool canBeSent = dbus_validate_utf8(address.c_str(), nullptr);
-    return !canBeSent || isDeniedByDaemon(adapter.getErrorMessage()) ? Lookup::Unknown
+    return !canBeSent || isDeniedByDaemon(adapter.getErrorName()) ? Lookup::Unknown
                                                                      : Lookup::NotAnswered;
 }
 

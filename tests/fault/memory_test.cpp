@@ -17,6 +17,7 @@
 #include <bluetooth/dict_codec.h>
 #include <bluetooth/manager.h>
 
+#include <fcntl.h>
 #include <sys/wait.h>
 
 #include <atomic>
@@ -239,10 +240,10 @@ TEST_F(MemoryTest, DecodingAndTextSurviveEachFailedAllocation) {
         content += "," + entry;
     std::ofstream(path) << content;
     checkEachAllocation("an auto-connect file", [&] {
-        AutoConnectFile file(path, std::ios::in);
+        const AutoConnectFile file(path, O_RDONLY);
         if (!file.isOpen() || !file.readsEnabled())
             return false;
-        const std::size_t count = file.readEntries().size();
+        const std::size_t count = file.entries().size();
         EXPECT_EQ(count, entries.size());
         return true;
     });

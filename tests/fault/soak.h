@@ -17,11 +17,11 @@
 namespace Bluetooth::Test {
 
 /// How much of a full soak is to be done: KESBLUETOOTH_SOAK percent, or so much that the tests stay
-/// quick.
-inline int soakCount(int full) {
+/// quick, which is 1 percent or what is given.
+inline int soakCount(int full, int quick = 0) {
     const char* percent = std::getenv("KESBLUETOOTH_SOAK");
     const auto share = percent ? static_cast<int>(std::strtol(percent, nullptr, 10)) : 1;
-    return std::max(full / 100 * share, 1) / (isSanitized ? 5 : 1) + 1;
+    return std::max({full / 100 * share, quick, 1}) / (isSanitized ? 5 : 1) + 1;
 }
 
 /// What the process holds.

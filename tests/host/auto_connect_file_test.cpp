@@ -1,14 +1,18 @@
 // SPDX-License-Identifier: LGPL-2.1-or-later
+#include "fault/soak.h"
 #include "support/namespace_test.h"
 
 #include <bluetooth/auto_connect.h>
 
+#include <signal.h>
 #include <sys/syscall.h>
+#include <sys/wait.h>
 
 #include <cerrno>
 #include <functional>
 #include <limits>
 #include <locale>
+#include <random>
 #include <tuple>
 
 namespace {
@@ -163,7 +167,7 @@ TEST_F(AutoConnectFileTest, WhatIsNoUsableFileIsRefusedAndKept) {
     expectAllFail("Can not create config path '/etc/bluetooth/autoconnect/'");
 }
 
-TEST_F(AutoConnectFileTest, AFullDiskIsReportedAndDoesNoMore) {
+TEST_F(AutoConnectFileTest, AFullDiskIsReportedAndCostsNothing) {
     writeFile("/small/x", "1,A,B");
     writeFile("/small/filler", std::string(100000, 'x'));
     std::filesystem::create_directory(configFolder);
@@ -171,6 +175,7 @@ TEST_F(AutoConnectFileTest, AFullDiskIsReportedAndDoesNoMore) {
     EXPECT_FALSE(config.set(adapter, true, std::string(70000, ',').c_str()));
     EXPECT_EQ(log.take(), Texts{inAutoConnect("Can not write config file '" + file + "'.")});
     EXPECT_EQ(pipe.take(), "") << "nothing that is worth reading again";
+    EXPECT_EQ(content(), "1,A,B");
 
     std::filesystem::remove("/small/x");
     std::filesystem::resize_file("/small/filler", 0);
@@ -194,6 +199,103 @@ TEST_F(AutoConnectFileTest, AListThatCannotBeReadToItsEndIsKept) {
     EXPECT_EQ(pipe.take(), "");
     EXPECT_TRUE(config.removeDevice(adapter, "A"));
     EXPECT_TRUE(content() == "1" + rest);
+}
+
+TEST_F(AutoConnectFileTest, ListsAreReadWithoutChangeAndChangedWhateverTheirFlag) {
+    AutoConnect::List list{true, {"X"}};
+    EXPECT_TRUE(config.readList(adapter, list)) << "there is none";
+    EXPECT_FALSE(list.isEnabled);
+    EXPECT_EQ(list.devices, Texts());
+    EXPECT_FALSE(std::filesystem::exists(configFolder));
+
+    const std::tuple<const char*, const char*> cases[] = {
+        {"", "0,A"}, {"0", "0,A"}, {"0,", "0,A"}, {"1", "1,A"}, {"1,B,,C,", "1,B,,C,A"}};
+    for (const auto& [before, after] : cases) {
+        write(before);
+        EXPECT_TRUE(config.changeList(
+            adapter, [](AutoConnect::List& changed) { changed.devices.emplace_back("A"); }));
+        EXPECT_EQ(content(), after);
+        EXPECT_EQ(pipe.take(), "1");
+    }
+    EXPECT_THROW(
+        config.changeList(adapter, [](AutoConnect::List&) { throw std::logic_error("no"); }),
+        std::logic_error);
+    EXPECT_EQ(content(), "1,B,,C,A");
+    EXPECT_TRUE(config.set(adapter, false, "")) << "and nothing is locked any more";
+}
+
+TEST_F(AutoConnectFileTest, AReplacedFileKeepsItsOwnerItsModeAndTheLinkToIt) {
+    const auto statusOf = [this] {
+        struct stat status {};
+        stat(file.c_str(), &status);
+        return status;
+    };
+    const std::string lock = std::string(configFolder) + ".lock";
+    write("1,A");
+    writeFile("/tmp/precious", "kept");
+    std::filesystem::create_symlink("/tmp/precious", lock);
+    std::filesystem::permissions("/tmp/precious", std::filesystem::perms(0666));
+    std::filesystem::permissions(file, std::filesystem::perms(0640));
+    const bool isRoot = geteuid() == 0;
+    if (isRoot) {
+        ASSERT_EQ(chown(file.c_str(), 1234, 1235), 0);
+    }
+    const struct stat old = statusOf();
+    const auto expectKept = [&](const char* list, bool isReplaced) {
+        EXPECT_EQ(content(), list);
+        const struct stat now = statusOf();
+        EXPECT_EQ(now.st_ino != old.st_ino, isReplaced);
+        EXPECT_EQ(std::tuple(now.st_mode, now.st_uid, now.st_gid),
+                  std::tuple(old.st_mode, old.st_uid, old.st_gid));
+    };
+    if (isRoot) { // who may write the file, and nothing beside it
+        ASSERT_EQ(seteuid(1234), 0);
+        EXPECT_TRUE(config.set(adapter, true, ",B"));
+        ASSERT_EQ(seteuid(0), 0);
+        expectKept("1,B", false);
+    }
+    EXPECT_TRUE(config.set(adapter, true, ",C")) << "a link is no lock";
+    expectKept("1,C", true);
+    EXPECT_EQ(readFile("/tmp/precious"), "kept");
+
+    std::filesystem::remove(lock);
+    std::filesystem::rename(file, "/etc/bluetooth/list");
+    std::filesystem::create_symlink("../list", file);
+    EXPECT_TRUE(config.removeDevice(adapter, "C"));
+    expectKept("1", true);
+    EXPECT_EQ(readFile("/etc/bluetooth/list"), "1");
+    struct stat status {};
+    ASSERT_EQ(lstat(lock.c_str(), &status), 0);
+    EXPECT_EQ(status.st_mode, static_cast<mode_t>(S_IFREG | 0600)) << "users cannot hold it";
+    if (isRoot)
+        log.take(); // another user may not use the pipe
+    EXPECT_EQ(log.take(), Texts());
+}
+
+TEST_F(AutoConnectFileTest, AProcessThatIsKilledWhileItChangesAListLosesNothing) {
+    constexpr int devices = 200;
+    std::string list = "1";
+    for (int i = 0; i < devices; ++i)
+        list += ",00:11:22:33:44:55";
+    write(list);
+    const std::string longer = list + ",X";
+    std::minstd_rand random(1);
+    for (int kills = soakCount(1000, 50); kills > 0 && !HasFailure(); --kills) {
+        const pid_t changing = fork();
+        ASSERT_GE(changing, 0);
+        while (changing == 0) {
+            config.set(adapter, true, longer.c_str() + 1);
+            config.removeDevice(adapter, "X");
+        }
+        usleep(static_cast<useconds_t>(random() % 3000)); // at any moment
+        kill(changing, SIGKILL);
+        waitpid(changing, nullptr, 0);
+        const std::string left = content();
+        EXPECT_TRUE(left == list || left == longer) << left;
+    }
+    EXPECT_TRUE(config.set(adapter, false, ""));
+    EXPECT_EQ(std::distance(std::filesystem::directory_iterator(configFolder), {}), 2)
+        << "the list and its lock";
 }
 
 TEST_F(AutoConnectFileTest, AHugeFileIsNotReadAndKept) {

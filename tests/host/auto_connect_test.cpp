@@ -1,12 +1,15 @@
 // SPDX-License-Identifier: LGPL-2.1-or-later
 // Which devices are to be connected: the lists in the files, and what the daemon knows of them.
 
+#include "fault/soak.h"
 #include "support/auto_connect_fixture.h"
 
 #include <bluetooth/adapter.h>
 #include <bluetooth/device.h>
 #include <bluetooth/manager.h>
 
+#include <algorithm>
+#include <atomic>
 #include <memory>
 #include <thread>
 
@@ -18,6 +21,11 @@ using namespace std::string_literals;
 
 const std::string unknownLine = "adapter.cpp Does Not Exist";
 const Texts both{"hci0/01", "hci0/08"};
+
+std::string removedLine(const std::string& entry) {
+    return inAutoConnect("Removed '" + entry + "' from the list of " + adapter0 +
+                         ", which does not know it.");
+}
 
 /// The devices' adapters with the last part of their addresses, e.g. "hci0/01".
 Texts namesOf(DeviceList* list) {
@@ -53,7 +61,9 @@ TEST_F(AutoConnectTest, ListsKnownDevicesAndPrunesStaleEntriesOfAnEnabledList) {
     EXPECT_EQ(listOf(adapter0), both) << "in the file's order";
     EXPECT_EQ(config(adapter0), "1,"s + headset + "," + carKit);
     EXPECT_EQ(pipe.take(), "1111") << "one for each stale entry";
-    EXPECT_EQ(log.take(), Texts(4, unknownLine));
+    EXPECT_EQ(log.take(),
+              (Texts{unknownLine, unknownLine, unknownLine, unknownLine, removedLine(stranger),
+                     removedLine(""), removedLine(otherDevice)}));
     EXPECT_EQ(listOf(adapter0), both);
 
     const std::string disabled = "0,"s + headset + "," + stranger;
@@ -99,7 +109,7 @@ TEST_F(AutoConnectTest, TargetsAreThoseOfPoweredAndEnabledAdapters) {
     EXPECT_EQ(targets(), (Texts{"hci0/01", "hci1/66"}));
     EXPECT_EQ(config(adapter0), "1,"s + headset);
     EXPECT_EQ(pipe.take(), "1");
-    EXPECT_EQ(log.take(), Texts{unknownLine});
+    EXPECT_EQ(log.take(), (Texts{unknownLine, removedLine(stranger)}));
 
     for (const char* noFlag : {"0,", "2,", "x,", ""}) {
         setConfig(adapter0, std::string(noFlag) + headset);
@@ -127,22 +137,30 @@ TEST_F(AutoConnectTest, EntriesThatAreNoAddressArePruned) {
     EXPECT_EQ(config(adapter0), "1,"s + headset);
     EXPECT_EQ(log.take(),
               (Texts{inAutoConnect("An entry of the config file holds a NUL byte."),
-                     "adapter.cpp Failed to append args to message", unknownLine, unknownLine}));
+                     "adapter.cpp Failed to append args to message", unknownLine, unknownLine,
+                     removedLine(headset + "\\x00x"s), removedLine("\\xff\\xfe"),
+                     removedLine(junk.substr(0, 64) + "..."), removedLine("\\x0a")}));
 }
 
 TEST_F(AutoConnectTest, OnlyWhatTheDaemonDeniesIsPruned) {
     const std::string content = "1,"s + headset + "," + carKit;
-    for (const auto& [text, isPruned] :
-         {std::pair("Did not receive a reply.", false), std::pair("Connection is closed", false),
-          std::pair("The name org.bluez was not provided by any .service files", false),
-          std::pair("Method \"FindDevice\" doesn't exist\n", false),
-          std::pair("Invalid arguments in method call", true), std::pair("Does Not Exist", true)}) {
+    for (const auto& [name, isPruned] :
+         {std::pair("org.freedesktop.DBus.Error.NoReply", false),
+          std::pair("org.freedesktop.DBus.Error.UnknownMethod", false),
+          std::pair("org.bluez.Error.Failed", false),
+          std::pair("org.bluez.Error.InvalidArguments", true),
+          std::pair("org.bluez.Error.DoesNotExist", true)}) {
         setConfig(adapter0, content);
-        simulation.failNext("org.bluez.Adapter", "FindDevice", "org.bluez.Error.Any", text);
-        EXPECT_EQ(listOf(adapter0), Texts{"hci0/08"}) << text;
-        EXPECT_EQ(config(adapter0), isPruned ? "1,"s + carKit : content) << text;
-        EXPECT_EQ(pipe.take(), isPruned ? "1" : "") << text;
-        EXPECT_EQ(log.take(), Texts{"adapter.cpp "s + text});
+        // Texts are for people.
+        const char* text = isPruned ? "Gibt es nicht" : "Does Not Exist";
+        simulation.failNext("org.bluez.Adapter", "FindDevice", name, text);
+        EXPECT_EQ(listOf(adapter0), Texts{"hci0/08"}) << name;
+        EXPECT_EQ(config(adapter0), isPruned ? "1,"s + carKit : content) << name;
+        EXPECT_EQ(pipe.take(), isPruned ? "1" : "") << name;
+        Texts lines{"adapter.cpp "s + text};
+        if (isPruned)
+            lines.push_back(removedLine(headset));
+        EXPECT_EQ(log.take(), lines);
     }
 }
 
@@ -152,13 +170,49 @@ TEST_F(AutoConnectTest, ADaemonThatRestartsMeanwhileCostsNoEntry) {
     simulation.delayNext("org.bluez.Adapter", "FindDevice", 300);
     std::thread restart([this] {
         EXPECT_TRUE(simulation.awaitCalls("s:FindDevice ")); // it waits in the daemon now
+        EXPECT_TRUE(autoConnect.set(adapter1, true, "")) << "a change need not wait for that";
         simulation.control("Restart");
     });
     EXPECT_EQ(listOf(adapter0), Texts());
     restart.join();
     EXPECT_EQ(config(adapter0), content);
-    EXPECT_EQ(pipe.take(), "");
+    EXPECT_EQ(pipe.take(), "1") << "of the other list";
     EXPECT_EQ(listOf(adapter0), both);
+}
+
+TEST_F(AutoConnectTest, NoChangeIsLostBesideAProgramThatPrunes) {
+    const auto add = [this](const char* device) {
+        EXPECT_TRUE(autoConnect.changeList(
+            adapter0, [=](AutoConnect::List& list) { list.devices.emplace_back(device); }));
+    };
+    const auto list = [this] {
+        AutoConnect::List read;
+        EXPECT_TRUE(autoConnect.readList(adapter0, read));
+        EXPECT_TRUE(read.isEnabled);
+        std::sort(read.devices.begin(), read.devices.end());
+        return read.devices;
+    };
+    setConfig(adapter0, "1,"s + headset);
+    std::atomic<bool> isOver{false};
+    std::thread pruning([&] {
+        while (!isOver)
+            delete autoConnect.getAutoConnectDeviceList();
+    });
+    for (int rounds = soakCount(1000, 50); rounds > 0 && !HasFailure(); --rounds) {
+        add(stranger);
+        Texts devices;
+        do {
+            add(carKit);
+            devices = list();
+            const bool hasStranger = devices.back() == stranger;
+            EXPECT_EQ(devices,
+                      (hasStranger ? Texts{headset, carKit, stranger} : Texts{headset, carKit}));
+            EXPECT_TRUE(autoConnect.removeDevice(adapter0, carKit));
+        } while (list().back() == stranger && !HasFailure());
+    }
+    isOver = true;
+    pruning.join();
+    EXPECT_EQ(config(adapter0), "1,"s + headset);
 }
 
 } // namespace Bluetooth::Test
