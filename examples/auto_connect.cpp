@@ -8,6 +8,7 @@
 #include <bluetooth/dict_codec.h>
 #include <bluetooth/manager.h>
 
+#include <algorithm>
 #include <iostream>
 #include <memory>
 #include <string>
@@ -39,18 +40,17 @@ int main(int argc, char** argv) {
 
     const std::string adapterAddress = addressOf(*adapter);
     const std::string address = addressOf(*device);
-    AutoConnect autoConnect;
-    const std::unique_ptr<DeviceList> listed(autoConnect.getDeviceList(adapterAddress.c_str()));
-    if (!listed)
-        return fail("cannot read the auto-connect list; run this as root");
-    std::string list; // a comma before each address
-    for (Device* other : *listed) {
-        if (addressOf(*other) != address)
-            list += ',' + addressOf(*other);
-    }
-    list += ',' + address;
-    if (!autoConnect.set(adapterAddress.c_str(), true, list.c_str()))
-        return fail("cannot write the auto-connect list; run this as root");
-    std::cout << "to be connected: " << list.substr(1) << '\n';
+    std::string list;
+    const auto putLast = [&](AutoConnect::List& changed) {
+        changed.isEnabled = true;
+        auto& devices = changed.devices;
+        devices.erase(std::remove(devices.begin(), devices.end(), address), devices.end());
+        devices.push_back(address);
+        for (const std::string& listed : devices)
+            list += (list.empty() ? "" : ",") + listed;
+    };
+    if (!AutoConnect().changeList(adapterAddress.c_str(), putLast))
+        return fail("cannot change the auto-connect list; run this as root");
+    std::cout << "to be connected: " << list << '\n';
     return 0;
 }

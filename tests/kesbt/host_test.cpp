@@ -29,9 +29,13 @@ TEST_F(HostVerbs, TheListIsChangedEntryByEntryAndTheFlagStays) {
                                               {"devices", Json::array()}}));
     EXPECT_FALSE(std::filesystem::exists(configFolder)); // looking changes nothing
 
-    EXPECT_EQ(run("autoconnect add "s + mouse).status, 0);
+    setContent("");
+    EXPECT_EQ(run("autoconnect add "s + mouse).err, "");
     EXPECT_EQ(readFile(file), "0," + mouse);
-    run("autoconnect add "s + receiver);
+    const Result unknown = run("autoconnect add "s + receiver);
+    EXPECT_EQ(unknown.status, 0);
+    EXPECT_EQ(unknown.err, adapterAddress + " does not know " + receiver +
+                               ", which leaves an enabled list when that is read; pair it\n");
     run("autoconnect enable");
     run("autoconnect add "s + receiver);
     EXPECT_EQ(readFile(file), "1," + mouse + "," + receiver);
@@ -51,17 +55,20 @@ TEST_F(HostVerbs, TheListIsChangedEntryByEntryAndTheFlagStays) {
               (Json{receiver, mouse}));
 }
 
-TEST_F(HostVerbs, KnownDevicesAndTargetsAreListed) {
-    setContent("1," + mouse + "," + receiver);
-    EXPECT_EQ(json("autoconnect targets")[0]["address"], mouse);
-    setContent("1," + mouse + "," + receiver);
-    EXPECT_EQ(json("autoconnect list")[0]["address"], mouse);
-    EXPECT_EQ(readFile(file), "1," + mouse); // what the adapter does not know leaves
+TEST_F(HostVerbs, KnownDevicesAndTargetsAreListedAndOthersNamed) {
+    for (const char* verb : {"autoconnect targets --json", "autoconnect list --json"}) {
+        setContent("1," + mouse + "," + receiver);
+        const Result result = run(verb);
+        EXPECT_EQ(Json::parse(result.out)[0]["address"], mouse);
+        EXPECT_EQ(readFile(file), "1," + mouse);
+        EXPECT_EQ(result.err, adapterAddress + " does not know \"" + receiver +
+                                  "\", which has left its list; pair it and add it again\n");
+    }
 }
 
 TEST_F(HostVerbs, AFileThatCannotBeUsedIsAFailureAndStays) {
     std::filesystem::create_directories(file);
-    for (const char* verb : {"show", "enable", "disable", "list"})
+    for (const char* verb : {"show", "enable", "disable", "list", "targets"})
         EXPECT_EQ(failure("autoconnect "s + verb),
                   "cannot use " + file + ": Is a directory; make the file writable or remove it\n");
     EXPECT_TRUE(std::filesystem::is_directory(file));

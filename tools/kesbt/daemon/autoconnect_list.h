@@ -2,6 +2,9 @@
 #ifndef KESBT_DAEMON_AUTOCONNECT_LIST_H
 #define KESBT_DAEMON_AUTOCONNECT_LIST_H
 
+#include <bluetooth/auto_connect.h>
+
+#include <functional>
 #include <string>
 #include <vector>
 
@@ -11,31 +14,29 @@ namespace Kesbt {
 /// that no adapter knows, and without the daemon.
 class AutoConnectList {
 public:
+    using List = Bluetooth::AutoConnect::List;
+
     /// @param adapter the adapter's address
     /// A Failure when there is a file that cannot be read. A missing one is disabled and empty.
     explicit AutoConnectList(const std::string& adapter);
 
-    const std::string& path() const { return m_path; }
-    bool isEnabled() const;
-    std::vector<std::string> devices() const;
-
-    bool has(const std::string& device) const;
-    void add(const std::string& device);
-    void remove(const std::string& device);
+    std::string path() const;
+    const std::string& adapter() const { return m_adapter; }
+    bool isEnabled() const { return m_list.isEnabled; }
+    const std::vector<std::string>& devices() const { return m_list.devices; }
 
     /// A Failure that says what is missing when the file cannot be written or created.
     void checkWritable() const;
-    /// Writes it, with the flag given, and reads it back. A Failure when that is not possible.
-    void write(bool enable);
+    /// Changes it, as it is now, in one step. A Failure when that is not possible.
+    void change(const std::function<void(List&)>& change);
 
 private:
-    std::string list() const { return m_content.substr(m_content.empty() ? 0 : 1); }
-    void read();
-
     std::string m_adapter;
-    std::string m_path;
-    std::string m_content = "0";
+    List m_list;
 };
+
+/// Names on standard error what has left the list since, as the adapter does not know it.
+void nameRemoved(const AutoConnectList& before);
 
 } // namespace Kesbt
 

@@ -4,11 +4,13 @@
 #include "show/text.h"
 #include "verbs/list.h"
 
+#include <bluetooth/adapter_list.h>
 #include <bluetooth/auto_connect.h>
 
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <cstring>
 #include <iostream>
@@ -27,8 +29,13 @@ std::string adapterAddress(const Options& options) {
     return readProperties(*adapter).value("Address", "");
 }
 
-void show(const Options& options, const AutoConnectList& list, const std::string& adapter) {
-    const Json document = {{"adapterAddress", adapter},
+/// Whether an entry is a device: people may have written it in small letters.
+auto isDevice(const std::string& device) {
+    return [&device](const std::string& entry) { return upperCase(entry) == device; };
+}
+
+void show(const Options& options, const AutoConnectList& list) {
+    const Json document = {{"adapterAddress", list.adapter()},
                            {"file", list.path()},
                            {"enabled", list.isEnabled()},
                            {"devices", list.devices()}};
@@ -43,8 +50,7 @@ void show(const Options& options, const AutoConnectList& list, const std::string
 }
 
 void showList(const Options& options) {
-    const std::string adapter = adapterAddress(options);
-    show(options, AutoConnectList(adapter), adapter);
+    show(options, AutoConnectList(adapterAddress(options)));
 }
 
 std::vector<std::string> listedDevices(const Options& options) {
@@ -52,50 +58,85 @@ std::vector<std::string> listedDevices(const Options& options) {
 }
 
 void enable(const Options& options, bool enabled) {
-    const std::string adapter = adapterAddress(options);
-    AutoConnectList list(adapter);
-    list.write(enabled);
-    show(options, list, adapter);
+    AutoConnectList list(adapterAddress(options));
+    list.change([=](AutoConnectList::List& now) { now.isEnabled = enabled; });
+    show(options, list);
 }
 
-void change(const Options& options, const std::string& device, bool listed) {
-    const std::string adapter = adapterAddress(options);
-    AutoConnectList list(adapter);
-    if (!listed && !list.has(device))
-        throw Failure(device + " is not in the list; see what is: kesbt autoconnect show");
-    if (listed && !list.has(device))
-        list.add(device);
-    else if (!listed)
-        list.remove(device);
-    list.write(list.isEnabled());
-    show(options, list, adapter);
+/// A list takes any device. One that the adapter does not know leaves it when it is read.
+bool isUnknown(const std::string& adapterAddress, const std::string& device) {
+    const std::unique_ptr<Bluetooth::Manager> manager(
+        withinLimit([] { return Bluetooth::Manager::getManager(); }));
+    const std::unique_ptr<Bluetooth::Adapter> adapter(withinLimit(
+        [&] { return manager ? manager->findAdapter(adapterAddress.c_str()) : nullptr; }));
+    return adapter && !findDevice(*adapter, device) &&
+           std::strcmp(adapter->getErrorName(), "org.bluez.Error.DoesNotExist") == 0;
 }
 
 void addDevice(const Options& options, const std::string& device) {
-    change(options, device, true);
+    AutoConnectList list(adapterAddress(options));
+    const bool leaves = isUnknown(list.adapter(), device);
+    list.change([&](AutoConnectList::List& now) {
+        if (std::none_of(now.devices.begin(), now.devices.end(), isDevice(device)))
+            now.devices.push_back(device);
+    });
+    if (leaves)
+        std::cerr << list.adapter() << " does not know " << device
+                  << ", which leaves an enabled list when that is read; pair it\n";
+    show(options, list);
 }
 
 void removeDevice(const Options& options, const std::string& device) {
-    change(options, device, false);
+    AutoConnectList list(adapterAddress(options));
+    list.change([&](AutoConnectList::List& now) {
+        auto& devices = now.devices;
+        const auto kept = std::remove_if(devices.begin(), devices.end(), isDevice(device));
+        if (kept == devices.end())
+            throw Failure(device + " is not in the list; see what is: kesbt autoconnect show");
+        devices.erase(kept, devices.end());
+    });
+    show(options, list);
 }
 
 void listKnown(const Options& options) {
     openManager();
-    const std::string adapter = adapterAddress(options);
-    AutoConnectList list(adapter);
+    const AutoConnectList list(adapterAddress(options));
     list.checkWritable(); // unknown devices are taken out of an enabled list
     const std::unique_ptr<Bluetooth::DeviceList> devices(
-        AutoConnect().getDeviceList(adapter.c_str()));
+        AutoConnect().getDeviceList(list.adapter().c_str()));
     if (!devices)
-        throw Failure("cannot list the devices of " + adapter + "; see: kesbt adapters");
+        throw Failure("cannot list the devices of " + list.adapter() + "; see: kesbt adapters");
+    nameRemoved(list);
     printDevices(options, *devices);
 }
 
+/// The lists of the adapters that are on. A Failure for one that cannot be used, which the library
+/// passes over.
+std::vector<AutoConnectList> listsInUse() {
+    const auto manager = openManager();
+    const std::unique_ptr<Bluetooth::AdapterList> adapters(manager->listAdapters());
+    if (!adapters)
+        throw refusal("cannot list the adapters", *manager);
+    std::vector<AutoConnectList> lists;
+    for (Bluetooth::Adapter* adapter : *adapters) {
+        if (!adapter)
+            throw daemonLost();
+        const Json properties = readProperties(*adapter);
+        if (properties.value("Powered", false)) {
+            lists.emplace_back(properties.value("Address", ""));
+            lists.back().checkWritable();
+        }
+    }
+    return lists;
+}
+
 void listTargets(const Options& options) {
-    openManager();
+    const std::vector<AutoConnectList> lists = listsInUse();
     const std::unique_ptr<Bluetooth::DeviceList> devices(AutoConnect().getAutoConnectDeviceList());
     if (!devices)
         throw daemonLost();
+    for (const AutoConnectList& list : lists)
+        nameRemoved(list);
     printDevices(options, *devices);
 }
 
