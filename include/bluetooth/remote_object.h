@@ -212,7 +212,8 @@ public:
     /// stay undelivered. Safe in a signal handler.
     void stopLoop();
     /// Waits for this proxy's receive thread to end.
-    /// @return 0, or pthread_join's error number (ESRCH when startLoop() was not called)
+    /// @return 0, or pthread_join's error number: ESRCH when startLoop() was not called or another
+    ///         waitLoop() came first; EDEADLK in a callback, and another thread may still wait
     int waitLoop();
 
     /// Dispatches one signal to the subscriptions without arguments. The receive thread calls this
@@ -261,10 +262,10 @@ private:
     DBusMessage* m_message = nullptr;
     DBusMessage* m_reply = nullptr;
     DBusBusType m_busType;
-    pthread_t m_loopThread = 0;
-    std::atomic<int> m_errorNumber{0}; // a loop proxy's is also set by the receive thread
-    std::string m_errorText;           // a D-Bus error's name follows its message after a NUL
-    bool m_usable;                     // destination, path and interface are valid names
+    std::atomic<pthread_t> m_loopThread{0}; // 0: none, or joined
+    std::atomic<int> m_errorNumber{0};      // a loop proxy's is also set by the receive thread
+    std::string m_errorText;                // a D-Bus error's name follows its message after a NUL
+    bool m_usable;                          // destination, path and interface are valid names
 
     // The subscriptions of all proxies, by kind.
     static std::list<SignalHandler<NoArgumentCallback>>& signalHandlerVectorNoArgument;

@@ -261,9 +261,10 @@ void RemoteObject::stopLoop() {
 }
 
 int RemoteObject::waitLoop() {
-    if (m_loopThread == 0)
-        return ESRCH;
-    return pthread_join(std::exchange(m_loopThread, 0), nullptr);
+    if (m_loopThread == pthread_self())
+        return EDEADLK; // the thread stays there for another one to wait for
+    const pthread_t thread = m_loopThread.exchange(0);
+    return thread == 0 ? ESRCH : pthread_join(thread, nullptr);
 }
 
 void* receiveSignal(void* proxy) {

@@ -6,6 +6,7 @@
 #include "support/peer_test.h"
 
 #include <atomic>
+#include <cerrno>
 #include <map>
 #include <memory>
 #include <thread>
@@ -301,16 +302,22 @@ TEST_F(SignalTest, ProxiesComeAndGoInOtherThreadsWhileSignalsAreDelivered) {
 }
 
 TEST_F(SignalTest, StoppingLeavesTheRestUndeliveredForGood) {
+    static RemoteObject* runs;
+    runs = &loop;
+    static Latch stopped;
     ASSERT_EQ(proxy.setSignalHandlerString("Changed",
                                            [](RemoteObject* receiver, const char* text) {
                                                onString(receiver, text);
                                                receiver->stopLoop();
+                                               EXPECT_EQ(runs->waitLoop(), EDEADLK); // itself
+                                               stopped.open();
                                            }),
               0);
     for (const char* text : {"('1',)", "('2',)", "('3',)"})
         emit("Changed", text);
     EXPECT_NE(loop.waitLoop(), 0); // never started
     ASSERT_EQ(loop.startLoop(), 0);
+    ASSERT_TRUE(stopped.wait());
     EXPECT_EQ(loop.waitLoop(), 0);
     EXPECT_NE(loop.waitLoop(), 0); // joined already
     EXPECT_EQ(seen().events(), Texts{"string /com/example/peer 1"});
