@@ -63,7 +63,8 @@ public:
     /// @dbus org.freedesktop.DBus.RemoveMatch(s rule), for each subscription
     ///
     /// Waits while another thread runs one of this proxy's callbacks: do not destroy it in a
-    /// handler of requests while its callbacks make calls on the same bus.
+    /// handler of requests while its callbacks make calls on the same bus. A derived class has to
+    /// call unsubscribeAll() in its destructor.
     virtual ~RemoteObject();
 
     /// The shared connection of the bus, not to be unreferenced; null when the bus could not be
@@ -234,6 +235,17 @@ public:
     /// Decodes its value. @return as parseEntryName()
     int parseEntryValue(DBusMessageIter& iter, DictEntry& entry);
 
+protected:
+    /// Ends this proxy's subscriptions, and waits while another thread runs one of its callbacks.
+    /// What a derived class has is gone when the base's destructor does this, so the destructor of
+    /// every derived class does it first, whatever it adds:
+    /// @code
+    ///     Headset::~Headset() { unsubscribeAll(); }
+    /// @endcode
+    /// The proxies of this library do.
+    /// @dbus org.freedesktop.DBus.RemoveMatch(s rule), for each subscription
+    void unsubscribeAll();
+
 private:
     friend void* receiveSignal(void* proxy);
 
@@ -251,7 +263,6 @@ private:
 
     template <class Callback>
     KESBLUETOOTH_LOCAL int subscribe(const char* member, Callback callback);
-    void unsubscribeAll();
     std::string matchRule(const std::string& member) const;
     static void dispatch(void* proxy, DBusMessage* message);
 

@@ -35,7 +35,9 @@ bool readDevicePaths(Adapter& adapter, std::vector<ObjectPath>& paths) {
 
 Adapter::Adapter(const char* path) : BluezObject(path, "org.bluez.Adapter") {}
 
-Adapter::~Adapter() = default;
+Adapter::~Adapter() {
+    unsubscribeAll();
+}
 
 Adapter* Adapter::getAdapter(const char* path) {
     return makeProxy<Adapter>(path);

@@ -8,7 +8,9 @@ namespace Bluetooth {
 
 Audio::Audio(const char* path) : BluezObject(path, "org.bluez.Audio") {}
 
-Audio::~Audio() = default;
+Audio::~Audio() {
+    unsubscribeAll();
+}
 
 Audio* Audio::getAudio(const char* path) {
     return makeProxy<Audio>(path);

@@ -9,7 +9,9 @@ namespace Bluetooth {
 
 AudioSink::AudioSink(const char* path) : BluezObject(path, "org.bluez.AudioSink") {}
 
-AudioSink::~AudioSink() = default;
+AudioSink::~AudioSink() {
+    unsubscribeAll();
+}
 
 AudioSink* AudioSink::getAudioSink(const char* path) {
     return makeProxy<AudioSink>(path);

@@ -12,7 +12,9 @@ namespace Bluetooth {
 BluezObject::BluezObject(const char* path, const char* interface)
     : RemoteObject(daemonName, path, interface, DBUS_BUS_SYSTEM) {}
 
-BluezObject::~BluezObject() = default;
+BluezObject::~BluezObject() {
+    unsubscribeAll();
+}
 
 Dict* BluezObject::getProperties() {
     return readDict(KES_HERE, *this, "GetProperties");

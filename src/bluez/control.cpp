@@ -9,7 +9,9 @@ namespace Bluetooth {
 
 Control::Control(const char* path) : BluezObject(path, "org.bluez.Control") {}
 
-Control::~Control() = default;
+Control::~Control() {
+    unsubscribeAll();
+}
 
 Control* Control::getControl(const char* path) {
     return makeProxy<Control>(path);

@@ -9,7 +9,9 @@ namespace Bluetooth {
 
 Device::Device(const char* path) : BluezObject(path, "org.bluez.Device") {}
 
-Device::~Device() = default;
+Device::~Device() {
+    unsubscribeAll();
+}
 
 Device* Device::getDevice(const char* path) {
     return makeProxy<Device>(path);

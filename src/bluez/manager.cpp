@@ -12,7 +12,9 @@ namespace Bluetooth {
 
 Manager::Manager() : BluezObject("/", "org.bluez.Manager") {}
 
-Manager::~Manager() = default;
+Manager::~Manager() {
+    unsubscribeAll();
+}
 
 Manager* Manager::getManager() {
     return makeProxy<Manager>();

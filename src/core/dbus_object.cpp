@@ -47,7 +47,9 @@ bool lists(MessagePtr reply, const char* name) {
 DBusObject::DBusObject()
     : RemoteObject(DBUS_SERVICE_DBUS, DBUS_PATH_DBUS, DBUS_INTERFACE_DBUS, DBUS_BUS_SYSTEM) {}
 
-DBusObject::~DBusObject() = default;
+DBusObject::~DBusObject() {
+    unsubscribeAll();
+}
 
 std::vector<std::string>* DBusObject::listNames() {
     auto names = std::make_unique<std::vector<std::string>>();

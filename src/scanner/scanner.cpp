@@ -25,7 +25,9 @@ bool isAdapter(const char* adapterId) {
 Scanner::Scanner()
     : RemoteObject(scannerBusName, scannerPath, scannerInterface, DBUS_BUS_SESSION) {}
 
-Scanner::~Scanner() = default;
+Scanner::~Scanner() {
+    unsubscribeAll();
+}
 
 std::vector<std::pair<std::string, Dict*>>* Scanner::listDevices(const char* adapterId,
                                                                  bool logErrors) {

@@ -6,12 +6,16 @@
 #include "support/stdout_capture.h"
 
 #include <bluetooth/adapter.h>
+#include <bluetooth/audio.h>
 #include <bluetooth/audio_sink.h>
 #include <bluetooth/control.h>
 #include <bluetooth/device.h>
 #include <bluetooth/manager.h>
 
+#include <memory>
 #include <regex>
+#include <thread>
+#include <typeinfo>
 
 namespace Bluetooth::Test {
 
@@ -97,6 +101,46 @@ TEST_F(HandlerTest, EachSetterSubscribesToItsSignal) {
     checkEvent(control, "Connected", &Control::setConnectedHandler, "Connected from");
     checkEvent(control, "Disconnected", &Control::setDisconnectedHandler, "Disconnected from");
     EXPECT_EQ(log.take(), Texts{});
+}
+
+TEST_F(HandlerTest, AProxyIsWholeUntilItsCallbacksOnOtherThreadsHaveEnded) {
+    const RunningLoop running(loop);
+    const auto check = [&](RemoteObject* proxy) {
+        struct Call {
+            Latch entered, leave;
+            std::string type;
+        };
+        static std::unique_ptr<Call> call;
+        call = std::make_unique<Call>();
+        const std::string type = typeid(*proxy).name();
+        const std::string path = proxy->getPath();
+        const std::string interface = proxy->getInterface();
+        ASSERT_EQ(proxy->setSignalHandlerString("Changed",
+                                                [](RemoteObject* receiver, const char*) {
+                                                    call->entered.open();
+                                                    call->leave.wait();
+                                                    call->type = typeid(*receiver).name();
+                                                }),
+                  0);
+        daemon.emit(path, interface, "Changed", with("x"));
+        ASSERT_TRUE(call->entered.wait()) << type;
+        Latch destroyed;
+        std::thread destroyer([&] {
+            delete proxy;
+            destroyed.open();
+        });
+        EXPECT_FALSE(destroyed.wait(Milliseconds(20))) << type; // it has got as far as it can
+        call->leave.open();
+        destroyer.join();
+        EXPECT_EQ(call->type, type);
+    };
+    check(new BluezObject("/object", "org.bluez.Object"));
+    check(new Manager);
+    check(new Adapter(adapterPath));
+    check(new Device(devicePath));
+    check(new Audio(devicePath));
+    check(new AudioSink(devicePath));
+    check(new Control(devicePath));
 }
 
 } // namespace Bluetooth::Test
