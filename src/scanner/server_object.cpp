@@ -18,11 +18,11 @@ const char* textOf(const char* text) {
     return text ? text : "";
 }
 
-/// libdbus ends the process on an invalid name or path.
-bool areValid(const char* busName, const char* path) {
+/// libdbus ends the process on an argument that is not UTF-8, and on an invalid path. A name that
+/// is invalid otherwise is for the bus to refuse.
+bool areUsable(const char* busName, const char* path) {
     return busName && path && dbus_validate_utf8(busName, nullptr) &&
-           dbus_validate_utf8(path, nullptr) && dbus_validate_bus_name(busName, nullptr) &&
-           dbus_validate_path(path, nullptr);
+           dbus_validate_utf8(path, nullptr) && dbus_validate_path(path, nullptr);
 }
 
 /// Whether something else than the object is served at a path. dbus-glib ends the process on a
@@ -78,7 +78,7 @@ void ServerObject::getConnection() {
 }
 
 bool ServerObject::prepareObjectInfo(GType type, const DBusGObjectInfo* info, GObject* object) {
-    if (!areValid(m_busName, m_path)) {
+    if (!areUsable(m_busName, m_path)) {
         logError(KES_HERE, "Failed to acquire %s, %s", m_busName ? m_busName : "(null)",
                  "Invalid name or path");
         return false;

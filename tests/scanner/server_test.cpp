@@ -82,12 +82,16 @@ TEST_F(ServerTest, FrameTellsAboutTheBus) {
     frame.startLoop(); // returns: it is no scanner server
     EXPECT_EQ(updateTimer(&frame), 1);
     EXPECT_TRUE(log.take().empty());
-    // libdbus would end the process on these.
-    for (const auto& [name, path] : {std::pair("no name", "/"), std::pair("com.example.X", "x")}) {
+    // The bus refuses a name; what libdbus would end the process on does not get as far.
+    const DBusGObjectInfo nothing{1, nullptr, 0, "", "", ""};
+    for (const auto& [name, path, text] :
+         {std::tuple("no name", "/", "Requested bus name \"no name\" is not valid"),
+          std::tuple("com.example.X", "x", "Invalid name or path"),
+          std::tuple("\xff", "/", "Invalid name or path")}) {
         ServerObject unusable(name, path, DBUS_BUS_SESSION);
-        EXPECT_FALSE(unusable.prepareObjectInfo(G_TYPE_OBJECT, nullptr, nullptr));
-        EXPECT_EQ(log.take(), Texts{std::string("server_object.cpp Failed to acquire ") + name +
-                                    ", Invalid name or path"});
+        EXPECT_FALSE(unusable.prepareObjectInfo(G_TYPE_OBJECT, &nothing, nullptr));
+        EXPECT_EQ(log.take(),
+                  Texts{std::string("server_object.cpp Failed to acquire ") + name + ", " + text});
     }
 }
 
