@@ -27,7 +27,7 @@ public:
     /// Returns the connection, and opens it when the process has none to that bus.
     /// @param type DBUS_BUS_SYSTEM or DBUS_BUS_SESSION
     /// @return the shared connection with one more reference, or null when the bus cannot be
-    ///         reached (logged)
+    ///         reached or the type is none (logged)
     ///
     /// Blocks while connecting. May be called from any thread.
     static DBusConnection* get(DBusBusType type);

@@ -2,23 +2,33 @@
 #include <bluetooth/connection.h>
 
 #include "core/bus_link.h"
-#include "core/dbus_ptr.h"
 #include "core/log.h"
 
 namespace Bluetooth {
 
+namespace {
+
+/// libdbus ends the process when the bus goes away, unless told otherwise before it is noticed. And
+/// it takes a type that is none for a fault of the program, and ends that too.
+DBusConnection* connect(DBusBusType type) {
+    const bool isType = static_cast<unsigned int>(type) <= DBUS_BUS_STARTER;
+    DBusConnection* connection = isType ? dbus_bus_get(type, nullptr) : nullptr;
+    if (connection)
+        dbus_connection_set_exit_on_disconnect(connection, false);
+    return connection;
+}
+
+} // namespace
+
 DBusConnection* Connection::get(DBusBusType type) {
-    ScopedError error;
-    DBusConnection* connection = dbus_bus_get(type, error);
+    DBusConnection* connection = connect(type);
     BusLink* link = BusLink::of(connection);
     if (link && !link->checkOpen()) {
         dbus_connection_unref(connection);
-        connection = dbus_bus_get(type, nullptr);
+        connection = connect(type);
     }
     if (!connection)
         logError(KES_HERE, "Failed to get bus connection");
-    else
-        dbus_connection_set_exit_on_disconnect(connection, false);
     return connection;
 }
 

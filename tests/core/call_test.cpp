@@ -105,6 +105,8 @@ TEST_F(CallTest, WithoutABusEveryCallFailsAndNothingAborts) {
     RemoteObject object(peerName, peerPath, peerInterface, DBUS_BUS_SYSTEM);
     EXPECT_EQ(log.take(), (Texts{noBus, noBus}));
     EXPECT_EQ(object.getConnection(), nullptr);
+    EXPECT_EQ(Connection::get(static_cast<DBusBusType>(DBUS_BUS_STARTER + 1)), nullptr);
+    EXPECT_EQ(log.take(), Texts{noBus});
     EXPECT_STREQ(object.getConnectionName(), "");
 
     EXPECT_EQ(ask(object, "Take"), "-1 11 Not connected to the bus");
