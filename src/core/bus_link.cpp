@@ -140,12 +140,13 @@ BusLink* BusLink::of(DBusConnection* connection) {
         return link;
     auto* link = new BusLink(connection);
     const auto destroy = [](void* data) { delete static_cast<BusLink*>(data); };
-    if (!link->attach() || !dbus_connection_set_data(connection, slot, link, destroy)) {
+    if (link->attach()) {
+        if (dbus_connection_set_data(connection, slot, link, destroy))
+            return link;
         dbus_connection_remove_filter(connection, filter, link);
-        delete link;
-        return nullptr;
     }
-    return link;
+    delete link;
+    return nullptr;
 }
 
 BusLink::BusLink(DBusConnection* connection) : m_connection(connection) {}
@@ -158,8 +159,7 @@ BusLink::~BusLink() {
 bool BusLink::attach() {
     m_wakeFd = eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK);
     dbus_connection_set_max_received_size(m_connection, receiveLimit);
-    // The filter is there whether or not this succeeds: of() removes it.
-    return dbus_connection_add_filter(m_connection, filter, this, nullptr) && m_wakeFd >= 0;
+    return m_wakeFd >= 0 && dbus_connection_add_filter(m_connection, filter, this, nullptr);
 }
 
 MessagePtr BusLink::call(DBusMessage* message, int timeoutMs, DBusError& error,

@@ -106,7 +106,7 @@ private:
 
     explicit BusLink(DBusConnection* connection);
     ~BusLink();
-    bool attach();
+    bool attach(); // adds the filter, or returns false
 
     MessagePtr takeSignal();
     std::uint64_t keptSignals(const Lock&) const;
@@ -127,7 +127,7 @@ private:
     static void exchangeInsideDispatch(DBusConnection* connection, Exchange* first,
                                        std::size_t count, int timeoutMs);
 
-    static DBusHandlerResult filter(DBusConnection*, DBusMessage* message, void* link);
+    static DBusHandlerResult filter(DBusConnection*, DBusMessage* message, void* data);
     DBusHandlerResult sort(DBusMessage* message);
     DBusHandlerResult keepSignal(DBusMessage* message);
     DBusHandlerResult giveReply(DBusMessage* message);

@@ -3,6 +3,7 @@
 // libdbus and in the C++ library. The operation then reports an error or throws std::bad_alloc,
 // works the next time, and has leaked nothing.
 
+#include "core/bus_link.h"
 #include "core/process.h"
 #include "host/auto_connect_file.h"
 #include "support/namespace_test.h"
@@ -158,6 +159,17 @@ protected:
 
 TEST_F(MemoryTest, CallsAndSubscriptionsSurviveEachFailedAllocation) {
     const PrivateBus bus(PrivateBus::Kind::Session);
+    checkEachAllocation("the link of a new connection", [&] {
+        const int which = std::exchange(untilFailure, 0); // opening it is libdbus's affair
+        const auto close = [](DBusConnection* connection) {
+            dbus_connection_close(connection);
+            dbus_connection_unref(connection);
+        };
+        const std::unique_ptr<DBusConnection, decltype(close)> connection(
+            dbus_connection_open_private(bus.address().c_str(), nullptr), close);
+        untilFailure = which;
+        return BusLink::of(connection.get()) != nullptr;
+    });
     const auto busProxy = [](const char* path) {
         return std::make_unique<RemoteObject>(DBUS_SERVICE_DBUS, path, DBUS_INTERFACE_DBUS,
                                               DBUS_BUS_SESSION);
