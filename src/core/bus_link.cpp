@@ -528,6 +528,7 @@ void BusLink::receiveMore(Lock& lock, Milliseconds limit) {
 DBusHandlerResult BusLink::filter(DBusConnection*, DBusMessage* message, void* data) {
     auto* link = static_cast<BusLink*>(data);
     const DBusHandlerResult result = link->sort(message);
+    link->m_ownDispatch.end(); // of what this thread has dispatched before
     if (result == DBUS_HANDLER_RESULT_NOT_YET_HANDLED && !LeadingScope::has(link))
         link->m_ownDispatch.mark(message); // the program's handlers come next
     return result;

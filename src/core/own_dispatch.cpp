@@ -10,30 +10,39 @@
 
 namespace Bluetooth {
 
-struct OwnDispatch::Threads {
-    std::atomic<int> count{0}; // spares programs that never dispatch the lock
-    std::mutex mutex;          // for `inside`
-    std::vector<std::thread::id> inside;
-};
-
 struct OwnDispatch::Mark {
-    explicit Mark(std::shared_ptr<Threads> marked)
-        : threads(std::move(marked)), thread(std::this_thread::get_id()) {
-        const std::lock_guard<std::mutex> lock(threads->mutex);
-        threads->inside.push_back(thread);
-        ++threads->count;
-    }
-    ~Mark() {
-        const std::lock_guard<std::mutex> lock(threads->mutex);
-        threads->inside.erase(std::find(threads->inside.begin(), threads->inside.end(), thread));
-        --threads->count;
-    }
+    explicit Mark(std::shared_ptr<Threads> marked);
+    ~Mark();
     Mark(const Mark&) = delete;
     Mark& operator=(const Mark&) = delete;
 
     std::shared_ptr<Threads> threads;
-    std::thread::id thread;
+    const std::thread::id thread = std::this_thread::get_id();
 };
+
+/// The threads that are inside a dispatch: the last mark of each, unless that has ended.
+struct OwnDispatch::Threads {
+    std::atomic<int> count{0}; // spares programs that never dispatch the lock
+    std::mutex mutex;          // for `inside`
+    std::vector<const Mark*> inside;
+
+    template <class Condition>
+    void removeIf(Condition isOver) {
+        const std::lock_guard<std::mutex> lock(mutex);
+        inside.erase(std::remove_if(inside.begin(), inside.end(), isOver), inside.end());
+        count = static_cast<int>(inside.size());
+    }
+};
+
+OwnDispatch::Mark::Mark(std::shared_ptr<Threads> marked) : threads(std::move(marked)) {
+    const std::lock_guard<std::mutex> lock(threads->mutex);
+    threads->inside.push_back(this);
+    ++threads->count;
+}
+
+OwnDispatch::Mark::~Mark() {
+    threads->removeIf([this](const Mark* mark) { return mark == this; });
+}
 
 OwnDispatch::OwnDispatch() : m_threads(std::make_shared<Threads>()) {}
 
@@ -52,12 +61,21 @@ void OwnDispatch::mark(DBusMessage* message) {
     }
 }
 
+void OwnDispatch::end() {
+    if (m_threads->count > 0)
+        m_threads->removeIf(isOfThisThread);
+}
+
 bool OwnDispatch::isHere() const {
     if (m_threads->count == 0)
         return false;
     const std::lock_guard<std::mutex> lock(m_threads->mutex);
     const auto& inside = m_threads->inside;
-    return std::find(inside.begin(), inside.end(), std::this_thread::get_id()) != inside.end();
+    return std::any_of(inside.begin(), inside.end(), isOfThisThread);
+}
+
+bool OwnDispatch::isOfThisThread(const Mark* mark) {
+    return mark->thread == std::this_thread::get_id();
 }
 
 } // namespace Bluetooth

@@ -15,15 +15,19 @@ class OwnDispatch {
 public:
     OwnDispatch();
 
-    /// This thread has begun to dispatch a message. A handler that keeps the message keeps the
-    /// mark.
+    /// This thread has begun to dispatch a message.
     void mark(DBusMessage* message);
+
+    /// What this thread has dispatched is over: a handler may have kept the message, to answer it
+    /// later. Called when the thread dispatches the next one, for dispatches do not nest.
+    void end();
 
     bool isHere() const;
 
 private:
     struct Threads;
     struct Mark;
+    static bool isOfThisThread(const Mark* mark);
     std::shared_ptr<Threads> m_threads; // messages may outlive the connection
 };
 

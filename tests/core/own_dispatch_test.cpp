@@ -59,6 +59,48 @@ TEST_F(OwnDispatchTest, HandlersOfTheProgramMayCall) {
     EXPECT_TRUE(asked);
 }
 
+TEST_F(OwnDispatchTest, ARequestThatIsKeptDoesNotChangeLaterCalls) {
+    static MessagePtr kept;
+    DBusObjectPathVTable keeper{};
+    keeper.message_function = [](DBusConnection*, DBusMessage* request, void*) {
+        kept.reset(dbus_message_ref(request));
+        return DBUS_HANDLER_RESULT_HANDLED;
+    };
+    ASSERT_TRUE(
+        dbus_connection_register_object_path(proxy.getConnection(), "/keeper", &keeper, nullptr));
+    auto late = peer.call(proxy.getConnectionName(), "/keeper", "com.example.Object", "Do");
+    mainLoop([] { return kept != nullptr; });
+    serveObject(proxy.getConnection());
+    int requests = 0;
+    onRequest() = [&requests] { return std::to_string(++requests); };
+    peer.send(requestTo(proxy.getConnectionName()));
+    mainLoop([&] { return requests == 1; }); // the next message
+
+    peer.handle("Pair", [this](DBusMessage* pair) {
+        peer.send(requestTo(proxy.getConnectionName()));
+        return replyTo(pair);
+    });
+    ASSERT_EQ(proxy.newMessage("Pair"), 0);
+    EXPECT_EQ(proxy.sendMessagePending(), 0);
+    EXPECT_EQ(requests, 2) << "answered while the call waits, as outside a dispatch";
+    dbus_connection_send(proxy.getConnection(), replyTo(kept.get()).get(), nullptr);
+    EXPECT_TRUE(late.get());
+    kept.reset();
+}
+
+TEST_F(OwnDispatchTest, WhatANotificationSaysIsActedOnAfterTheDispatch) {
+    const MessagePtr question(
+        dbus_message_new_method_call(peerName, peerPath, peerInterface, "Ask"));
+    DBusPendingCall* begun = nullptr;
+    ASSERT_TRUE(dbus_connection_send_with_reply(proxy.getConnection(), question.get(), &begun, -1));
+    const PendingPtr pending(begun);
+    static bool answered = false;
+    const auto notify = [](DBusPendingCall*, void*) { answered = true; }; // must not call
+    ASSERT_TRUE(dbus_pending_call_set_notify(begun, notify, nullptr, nullptr));
+    mainLoop([] { return answered; });
+    EXPECT_EQ(ask(proxy, "Ask"), "answer");
+}
+
 TEST_F(OwnDispatchTest, CallsAndSignalsOfOtherThreadsAreNotLostToIt) {
     ASSERT_EQ(proxy.setSignalHandlerString(
                   "Changed", [](RemoteObject*, const char* text) { seen().add(text); }),
