@@ -86,8 +86,8 @@ int work(const DaemonProgram& program, const StartOptions& options) {
         return program.fail(problem);
     if (!openWakeup() || !Tools::stopOnSignals())
         return program.fail(std::string("cannot make an event descriptor: ") + strerror(errno));
-    Bluetooth::Connection::checkSenders(
-        true); // anyone may send signals that look like bluetoothd's
+    // Anyone on the bus may send signals that look like bluetoothd's.
+    Bluetooth::Connection::checkSenders(true);
     AutoConnector connector(
         {std::chrono::seconds(options.interval), std::chrono::seconds(options.maxInterval)});
     if (!connector.start())
