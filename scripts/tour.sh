@@ -2,7 +2,7 @@
 # SPDX-License-Identifier: LGPL-2.1-or-later
 # A tour of what the programs do, against the simulated daemon on private buses. It expects the
 # programs in PATH and needs no Bluetooth. Where that is possible it runs in a mount namespace of its
-# own: what it writes to /etc and /tmp is then seen by nobody else.
+# own: what it writes to /etc, /run and /tmp is then seen by nobody else.
 set -euo pipefail
 
 case "${1:-}" in
@@ -22,6 +22,7 @@ isolated) # The simulated adapters' hciconfig stands in /usr/bin, and /etc and /
     mount -t overlay overlay -o "lowerdir=/tmp,upperdir=$layer/tmp,workdir=$layer/tmp-work" /tmp
     mkdir -p /etc/bluetooth
     mount -t tmpfs tmpfs /etc/bluetooth # one that was there belongs to somebody else
+    mount -t tmpfs tmpfs /run # for the PID file
     export KES_TOUR_ISOLATED=1
     ;;
 esac
@@ -114,7 +115,7 @@ if [ -n "${KES_TOUR_ISOLATED:-}" ]; then
     run kesbt autoconnect add "$headset"
     run kesbt autoconnect enable
     run kesbt autoconnect show
-    start kesbt-autoconnectd --foreground --pid-file /tmp/autoconnectd.pid --interval 1
+    start kesbt-autoconnectd --foreground --pid-file /run/autoconnectd.pid --interval 1
     printf '... the headset is switched on\n'
     headset_in_range true
     sink_connected

@@ -270,6 +270,7 @@ TEST_F(AutoConnectDaemonTest, HoweverManySignalsComeADeviceIsTriedOncePerInterva
     const std::string hci1 = pathOf(adapter1);
     Daemon daemon("--interval 60");
     ASSERT_TRUE(daemon.waitFor("connecting "s + headset));
+    EXPECT_TRUE(simulation.awaitCalls("s:ListAdapters ", 2));
     const std::size_t before = reloads();
     for (int count = 0; count < 2000; ++count) {
         simulation.peer().emit("/", "org.bluez.Manager", "AdapterAdded", with(Path{hci0}));
