@@ -2,6 +2,7 @@
 // Shows the devices in range as they come and go, for a time or until Ctrl-C.
 //   find_devices [SECONDS]     10 by default
 #include <bluetooth/adapter.h>
+#include <bluetooth/connection.h>
 #include <bluetooth/dict_codec.h>
 #include <bluetooth/manager.h>
 
@@ -34,6 +35,7 @@ int main(int argc, char** argv) {
     const long seconds = argc > 1 ? std::strtol(argv[1], nullptr, 10) : 10;
     if (argc > 2 || seconds <= 0)
         return fail("usage: find_devices [SECONDS]", 2);
+    Connection::checkSenders(true); // no signals but the daemon's own
     const std::unique_ptr<Manager> manager(Manager::getManager());
     if (!manager)
         return fail("bluetoothd is not running; start it and try again");

@@ -4,6 +4,7 @@
 #include <bluetooth/adapter.h>
 #include <bluetooth/audio.h>
 #include <bluetooth/audio_sink.h>
+#include <bluetooth/connection.h>
 #include <bluetooth/device.h>
 #include <bluetooth/dict_codec.h>
 #include <bluetooth/manager.h>
@@ -30,6 +31,7 @@ void changed(RemoteObject* from, const char* name, const Variant* value) {
 int main(int argc, char** argv) {
     if (argc != 2)
         return fail("usage: watch_headset ADDRESS", 2);
+    Connection::checkSenders(true); // no signals but the daemon's own
     const std::unique_ptr<Manager> manager(Manager::getManager());
     const std::unique_ptr<Adapter> adapter(manager ? manager->defaultAdapter() : nullptr);
     if (!adapter)
@@ -47,7 +49,7 @@ int main(int argc, char** argv) {
         return fail("cannot watch the headset; see the system log");
     // In steps: connect() would not wait for the daemon's reply. Changes are shown meanwhile.
     const bool connected = (audio.newMessage("Connect") == 0 && audio.sendMessage(true, -1) == 0) ||
-                           audio.getErrorMessage() == "Already Connected";
+                           std::string("org.bluez.Error.AlreadyConnected") == audio.getErrorName();
     receiver = manager.get();
     struct sigaction stop = {};
     stop.sa_handler = [](int) { receiver->stopLoop(); };
