@@ -19,7 +19,17 @@ namespace Bluetooth {
 /// - where the program dispatches the connection (a GLib main loop,
 ///   dbus_connection_read_write_dispatch()), its handlers may call methods; calls of other threads
 ///   on that bus may wait until a handler returns, so a handler must not wait for such a thread;
-/// - its dispatch status function must not call the library.
+/// - its filters and object path handlers run on any thread that dispatches: besides its own, each
+///   one that waits in a call of the library on that bus, and the receive thread;
+/// - inside the notification of a pending call, a filter that was added before the first proxy, and
+///   the dispatch status function a call of the library hangs for ever, and the library cannot tell
+///   that it is inside one. These only note what has happened; the program acts on it when its
+///   dbus_connection_dispatch() has returned, or on another thread.
+///
+/// Where a receive thread runs (RemoteObject::startLoop()), leave its bus's connection to the
+/// library, and open another one (dbus_bus_get_private()) for whatever the library does not do:
+/// - signals are kept from filters that were added after the first proxy;
+/// - requests to objects of the program that the receive thread reads are not answered.
 class KESBLUETOOTH_API Connection {
 public:
     Connection() = delete;
