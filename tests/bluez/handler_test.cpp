@@ -12,7 +12,7 @@
 #include <bluetooth/device.h>
 #include <bluetooth/manager.h>
 
-#include <memory>
+#include <initializer_list>
 #include <regex>
 #include <thread>
 #include <typeinfo>
@@ -105,42 +105,29 @@ TEST_F(HandlerTest, EachSetterSubscribesToItsSignal) {
 
 TEST_F(HandlerTest, AProxyIsWholeUntilItsCallbacksOnOtherThreadsHaveEnded) {
     const RunningLoop running(loop);
-    const auto check = [&](RemoteObject* proxy) {
-        struct Call {
-            Latch entered, leave;
-            std::string type;
-        };
-        static std::unique_ptr<Call> call;
-        call = std::make_unique<Call>();
-        const std::string type = typeid(*proxy).name();
-        const std::string path = proxy->getPath();
-        const std::string interface = proxy->getInterface();
-        ASSERT_EQ(proxy->setSignalHandlerString("Changed",
-                                                [](RemoteObject* receiver, const char*) {
-                                                    call->entered.open();
-                                                    call->leave.wait();
-                                                    call->type = typeid(*receiver).name();
-                                                }),
-                  0);
-        daemon.emit(path, interface, "Changed", with("x"));
-        ASSERT_TRUE(call->entered.wait()) << type;
-        Latch destroyed;
-        std::thread destroyer([&] {
-            delete proxy;
-            destroyed.open();
-        });
-        EXPECT_FALSE(destroyed.wait(Milliseconds(20))) << type; // it has got as far as it can
-        call->leave.open();
-        destroyer.join();
-        EXPECT_EQ(call->type, type);
+    static std::thread destroyer;
+    const auto destroyElsewhere = [](RemoteObject* receiver, const char*) {
+        const std::string type = typeid(*receiver).name();
+        destroyer = std::thread([receiver] { delete receiver; });
+        Latch().wait(Milliseconds(20)); // it has got as far as it can
+        seen().add(type == typeid(*receiver).name() ? "whole" : type);
     };
-    check(new BluezObject("/object", "org.bluez.Object"));
-    check(new Manager);
-    check(new Adapter(adapterPath));
-    check(new Device(devicePath));
-    check(new Audio(devicePath));
-    check(new AudioSink(devicePath));
-    check(new Control(devicePath));
+    const std::initializer_list<RemoteObject*> proxies{
+        new BluezObject("/object", "org.bluez.Object"),
+        new Manager,
+        new Adapter(adapterPath),
+        new Device(devicePath),
+        new Audio(devicePath),
+        new AudioSink(devicePath),
+        new Control(devicePath)};
+    for (RemoteObject* proxy : proxies) {
+        ASSERT_EQ(proxy->setSignalHandlerString("Changed", destroyElsewhere), 0);
+        seen().clear();
+        daemon.emit(proxy->getPath(), proxy->getInterface(), "Changed", with("x"));
+        ASSERT_TRUE(seen().waitFor(1));
+        EXPECT_EQ(seen().events(), Texts{"whole"});
+        destroyer.join();
+    }
 }
 
 } // namespace Bluetooth::Test
