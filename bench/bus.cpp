@@ -6,8 +6,10 @@
 namespace Bench {
 
 namespace {
-// dispatch is measured with more subscriptions than a bus allows as it comes
-constexpr const char* limits = "<limit name=\"max_match_rules_per_connection\">100000</limit>";
+// dispatch is measured with more subscriptions, and a presence check with more names, than a bus
+// allows as it comes
+constexpr const char* limits = "<limit name=\"max_match_rules_per_connection\">100000</limit>"
+                               "<limit name=\"max_names_per_connection\">100000</limit>";
 } // namespace
 
 Bus::Bus()

@@ -53,7 +53,8 @@ struct Library {
 };
 
 extern const Library kesbluetooth;
-extern const Library libdbus; // the limit: nothing but the traffic and a look at each value
+extern const Library libdbus;       // the limit: nothing but the traffic and a look at each value
+extern const Library libdbusShared; // the same with one connection for all callers
 extern const Library sdbuscpp;
 extern const Library gdbus;
 extern const Library dbusglib;

@@ -89,6 +89,19 @@ private:
     LibdbusConnection m_connection;
 };
 
+class SharingCaller : public Caller {
+public:
+    void callNothing() override { shared().callNothing(); }
+    std::size_t callText() override { return shared().callText(); }
+    std::size_t callProperties() override { return shared().callProperties(); }
+
+private:
+    static RawCaller& shared() {
+        static RawCaller& caller = *new RawCaller;
+        return caller;
+    }
+};
+
 class RawListener : public Listener {
 public:
     explicit RawListener(Handler handler) {
@@ -147,6 +160,13 @@ const Library libdbus = {
     [](std::size_t entries) -> std::unique_ptr<Decoder> {
         return std::make_unique<RawDecoder>(entries);
     },
+};
+
+const Library libdbusShared = {
+    "libdbus-shared",
+    []() -> std::unique_ptr<Caller> { return std::make_unique<SharingCaller>(); },
+    nullptr,
+    nullptr,
 };
 
 void emitTicks(unsigned int count, unsigned int interval) {

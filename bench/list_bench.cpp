@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: LGPL-2.1-or-later
 // Listing devices with all that it takes: ListDevices, and for each device the factory's question
-// to the bus whether the daemon is there. Raw libdbus sends the very same messages.
+// to the bus whether the daemon is there. Raw libdbus sends the very same messages, one by one.
 
 #include "bus.h"
 #include "client.h"
@@ -9,6 +9,7 @@
 #include "core/dbus_ptr.h"
 
 #include <bluetooth/adapter.h>
+#include <bluetooth/bluez_object.h>
 #include <bluetooth/device.h>
 #include <bluetooth/device_list.h>
 
@@ -52,9 +53,24 @@ bool hasDaemon(DBusConnection* connection) {
                        [](const char* name) { return std::strcmp(name, peerName) == 0; });
 }
 
+class Connection {
+public:
+    ~Connection() {
+        dbus_connection_close(m_connection);
+        dbus_connection_unref(m_connection);
+    }
+    Connection() = default;
+    Connection(const Connection&) = delete;
+    Connection& operator=(const Connection&) = delete;
+    operator DBusConnection*() const { return m_connection; }
+
+private:
+    DBusConnection* m_connection = dbus_bus_get_private(DBUS_BUS_SYSTEM, nullptr);
+};
+
 void listThroughLibdbus(benchmark::State& state, std::size_t count) {
     const std::string adapter = adapterWith(count);
-    DBusConnection* connection = dbus_bus_get_private(DBUS_BUS_SYSTEM, nullptr);
+    const Connection connection;
     for (auto _ : state) {
         const Texts paths(connection, DBUS_TYPE_OBJECT_PATH, peerName, adapter.c_str(),
                           peerInterface, "ListDevices");
@@ -65,8 +81,6 @@ void listThroughLibdbus(benchmark::State& state, std::size_t count) {
         }
         require(devices.size() == count, "libdbus: not all devices");
     }
-    dbus_connection_close(connection);
-    dbus_connection_unref(connection);
 }
 
 void listThroughKesbluetooth(benchmark::State& state, std::size_t count) {
@@ -78,20 +92,56 @@ void listThroughKesbluetooth(benchmark::State& state, std::size_t count) {
     }
 }
 
+/// Gives the bus so many names more while it lives.
+class Names {
+public:
+    explicit Names(std::size_t count) {
+        for (std::size_t i = 0; i < count; ++i)
+            require(dbus_bus_request_name(m_connection,
+                                          ("com.example.n" + std::to_string(i)).c_str(), 0,
+                                          nullptr) > 0,
+                    "libdbus: no name");
+    }
+
+private:
+    Connection m_connection;
+};
+
+void checkThroughLibdbus(benchmark::State& state, std::size_t count) {
+    const Names names(count);
+    const Connection connection;
+    for (auto _ : state)
+        require(hasDaemon(connection), "libdbus: the daemon is not there");
+}
+
+void checkThroughKesbluetooth(benchmark::State& state, std::size_t count) {
+    const Names names(count);
+    for (auto _ : state)
+        require(Bluetooth::BluezObject::hasBluetoothd(), "kesbluetooth: the daemon is not there");
+}
+
+using Measure = void (*)(benchmark::State&, std::size_t);
+
+void add(const char* group, std::size_t count, Measure libdbusWay, Measure kesbluetoothWay,
+         std::size_t iterations) {
+    for (const auto& [library, measure] :
+         {std::pair(libdbus.name, libdbusWay), std::pair(kesbluetooth.name, kesbluetoothWay)}) {
+        const std::string name = std::string(group) + "/" + std::to_string(count) + "/" + library;
+        benchmark::RegisterBenchmark(name.c_str(), measure, count)
+            ->Iterations(static_cast<benchmark::IterationCount>(iterations))
+            ->UseRealTime();
+    }
+}
+
 } // namespace
 
 int main(int argc, char** argv) {
     benchmark::Initialize(&argc, argv);
     const Bus bus;
-    for (const std::size_t count : {1, 10, 100, 1000}) {
-        const std::string name = "list/" + std::to_string(count) + "/";
-        // The same number of devices in each, and thus of messages.
-        const auto iterations = static_cast<benchmark::IterationCount>(1000 / count);
-        for (const auto& [library, list] : {std::pair(libdbus.name, listThroughLibdbus),
-                                            std::pair(kesbluetooth.name, listThroughKesbluetooth)})
-            benchmark::RegisterBenchmark((name + library).c_str(), list, count)
-                ->Iterations(std::min<benchmark::IterationCount>(iterations, 100))
-                ->UseRealTime();
-    }
+    for (const std::size_t count : {1, 10, 100, 1000}) // the same number of devices in each
+        add("list", count, listThroughLibdbus, listThroughKesbluetooth,
+            std::min<std::size_t>(1000 / count, 100));
+    for (const std::size_t count : {10, 1000})
+        add("presence-check", count, checkThroughLibdbus, checkThroughKesbluetooth, 50);
     benchmark::RunSpecifiedBenchmarks();
 }

@@ -213,10 +213,10 @@ private:
     }
 
     void wait() {
-        if (dbus_connection_has_messages_to_send(m_connection))
-            return;
         pollfd socket = {-1, POLLIN, 0};
         dbus_connection_get_unix_fd(m_connection, &socket.fd);
+        if (dbus_connection_has_messages_to_send(m_connection))
+            socket.events |= POLLOUT; // sleeps: the bus may have only this processor to read on
         const long long left = std::max(m_nextSignal - now(), 0LL);
         const timespec limit = {left / second, left % second};
         ppoll(&socket, 1, m_signalsLeft > 0 ? &limit : nullptr, nullptr);

@@ -5,8 +5,9 @@
     bench/report.py FOLDER [RESULTS-FOLDER]
 
 With the folder of what the benchmarks printed, it makes performance.json from that first. A file
-there is named PROCESSORS.PROGRAM.ROUND.json. A benchmark is named CASE/LIBRARY, and a case's first
-part is its group. A figure is the median of all repetitions of all rounds.
+there is named PROCESSORS.PROGRAM.ROUND.json, with PROGRAM-before for the version before this one. A
+benchmark is named CASE/LIBRARY, and a case's first part is its group. A figure is the median of all
+repetitions of all rounds; its spread is the lowest and the highest median of a round.
 """
 
 import collections
@@ -18,11 +19,14 @@ import statistics
 import subprocess
 import sys
 
-OURS, LIMIT = "kesbluetooth", "libdbus"
+OURS, LIMIT, SHARED, BEFORE = "kesbluetooth", "libdbus", "libdbus-shared", "before"
 LIBRARIES = [OURS, LIMIT, "sdbus-c++", "GDBus", "dbus-glib"]
 PACKAGES = ["libdbus-1-3", "dbus", "libsdbus-c++1", "libsystemd0", "libglib2.0-0",
             "libdbus-glib-1-2", "libbenchmark1debian", "g++"]
 SECONDS = {"s": 1, "ms": 1e-3, "us": 1e-6, "ns": 1e-9}
+RATES = ("calls_per_second", "signals_per_second", "answers_per_second", "bytes_per_second")
+COUNTERS = RATES + ("p99_us", "longest_us", "processor_us", "ns_per_entry", "ns_per_record",
+                    "wake_ups", "rss_before_bytes", "rss_bytes", "rss_peak_bytes", "pss_bytes")
 
 
 class Figures:
@@ -41,18 +45,28 @@ class Figures:
         other = self.median(processors, case, base, quantity)
         return value / other if value is not None and other else None
 
-    def overlap(self, processors, case, library, other):
-        """Whether the middle halves of two libraries' times overlap."""
-        first, second = (self.values[processors, case, name]["time"] for name in (library, other))
-        if "lower_quartile" not in first or "lower_quartile" not in second:
-            return True
-        return (first["lower_quartile"] <= second["upper_quartile"]
-                and second["lower_quartile"] <= first["upper_quartile"])
+    def spread(self, processors, case, library, base=None, quantity="time"):
+        """The figure, or its ratio to another library's: (of all rounds, lowest, highest)."""
+        row = self.values.get((processors, case, library), {}).get(quantity)
+        other = self.values.get((processors, case, base), {}).get(quantity)
+        if row is None or base and other is None:
+            return None
+        if base is None:
+            return row["median"], min(row["rounds"]), max(row["rounds"])
+        pairs = [(row["median"], other["median"]), *zip(row["rounds"], other["rounds"])]
+        if quantity in RATES: # the time of one
+            pairs = [(second, first) for first, second in pairs]
+        ratios = [first / second if second else float("inf") for first, second in pairs]
+        return ratios[0], min(ratios), max(ratios)
 
     def cases(self, processors, group):
         found = {case for where, case, _ in self.values if where == processors
                  and case.split("/")[0] == group}
         return sorted(found, key=lambda case: int(case.split("/")[1]))
+
+    def has(self, processors, group):
+        return any(where == processors and case.split("/")[0] == group
+                   for where, case, _ in self.values)
 
 
 def microseconds(value):
@@ -76,7 +90,7 @@ def compared(figures, processors, cases, libraries, label, quantity="time", scal
         for library in libraries:
             value = figures.median(processors, case, library, quantity)
             cell = microseconds(value * scale if value is not None else None)
-            if library != OURS and value is not None:
+            if library != OURS and value:
                 ratio = figures.ratio(processors, case, OURS, library, quantity)
                 cell += f" (× {ratio:.2f})"
             cells.append(cell)
@@ -90,32 +104,76 @@ CALLS = [("call/nothing", "no data"), ("call/text", "a string"),
 SIGNALS = [("signal/idle", "200 a second"), ("signal/2000-per-second", "2,000 a second"),
            ("signal/idle-while-calling", "200 a second, another thread calls"),
            ("signal/2000-per-second-while-calling", "2,000 a second, another thread calls")]
+LISTS = [(f"list/{count}", f"{count:,}") for count in (1, 10, 100, 1000)]
+CHECKS = [(f"presence-check/{count}", f"{count:,}") for count in (10, 1000)]
+DECODING = [(f"decode/{count}", f"{count:,}") for count in (1, 15, 100, 1000, 10000)]
+PLACES = {"one": "one processor", "all": "all processors", "plain": "one processor, shared",
+          "real": "all processors, real-time"}
 
 
-def goal(figures, text, case, base, limit):
-    ratio = figures.ratio("one", case, OURS, base)
-    verdict = "met" if ratio <= limit else "missed"
-    if limit == 1 and figures.overlap("one", case, OURS, base):
-        verdict = "level"
-    return [text, f"× {ratio:.3f}", f"{'<' if limit == 1 else '≤'} {limit}", verdict]
+def worst(figures, where, cases, library, base, quantity):
+    """The row that is furthest from its goal, and where it is."""
+    found = [(figures.spread(place, case, library, base, quantity), f"{text}; {PLACES[place]}")
+             for place in where for case, text in cases]
+    return max((row for row in found if row[0]), default=None)
+
+
+def verdict(spread, limit):
+    if spread[0] <= limit:
+        return "met"
+    if spread[1] <= limit:
+        return "met in a round, missed in another"
+    return f"missed by {spread[0] / limit - 1:.0%}"
 
 
 def goals(figures):
-    rows = []
-    for case, text in CALLS[:3]:
-        rows.append(goal(figures, f"call, {text}: against raw libdbus", case, LIMIT, 1.03))
-        for peer in LIBRARIES[2:]:
-            rows.append(goal(figures, f"call, {text}: against {peer}", case, peer, 1))
-    for peer in ("sdbus-c++", "GDBus"):
-        worst = max(figures.cases("one", "decode"),
-                    key=lambda case: figures.ratio("one", case, OURS, peer))
-        rows.append(goal(figures, f"decoding, worst size: against {peer}", worst, peer, 1))
-    for case in figures.cases("one", "list"):
-        rows.append(goal(figures, f"listing {case.split('/')[1]}: against raw libdbus", case, LIMIT,
-                         1.05))
-    for peer in ("sdbus-c++", "GDBus"):
-        rows.append(goal(figures, f"signal, idle: against {peer}", "signal/idle", peer, 1))
-    return table(["goal", "time", "wanted", ""], rows)
+    """One row for each goal: the worst of all that it is for."""
+    one, every, both = ("one",), ("all",), ("one", "all")
+    idle, loop, answers = [("idle-minute", "a minute")], [("stop/loop", "a loop")], "scanner/"
+    many = [(answers + "found-4000", "64 clients, 4,000 devices")]
+    entries = [(case, f"{text} entries") for case, text in DECODING]
+    lists = [(case, f"{text} devices") for case, text in LISTS]
+    checks = [(case, f"{text} names") for case, text in CHECKS]
+    relative = [
+        ("a call against raw libdbus", both, CALLS, LIMIT, 1.03, "time"),
+        ("a call against sdbus-c++", both, CALLS, "sdbus-c++", 1.1, "time"),
+        ("a call against GDBus", both, CALLS, "GDBus", 1, "time"),
+        ("a call against dbus-glib", both, CALLS, "dbus-glib", 1, "time"),
+        ("decoding against sdbus-c++", one, entries, "sdbus-c++", 1, "time"),
+        ("decoding against GDBus", one, entries, "GDBus", 1, "time"),
+        ("a list against raw libdbus, one by one", both, lists, LIMIT, 1.05, "time"),
+        ("a list of 100 against raw libdbus, one by one", every, lists[2:3], LIMIT, 0.3, "time"),
+        ("a presence check against raw libdbus", both, checks, LIMIT, 1.05, "time"),
+        ("signals, nobody calls: against sdbus-c++", both, SIGNALS[:1], "sdbus-c++", 1, "time"),
+        ("signals, nobody calls: against sdbus-c++", both, SIGNALS[1:2], "sdbus-c++", 1.2, "time"),
+        ("signals beside calls: against sdbus-c++", both, SIGNALS[2:], "sdbus-c++", 1.2, "time"),
+        ("signals against GDBus", both, SIGNALS, "GDBus", 1, "time"),
+        ("calls beside signals: against the version before", both, SIGNALS[2:], BEFORE, 1.02,
+         "calls_per_second"),
+        ("`kesbt adapters` against `gdbus call`", every, [("command/adapters", "whole process")],
+         "GDBus", 1, "time")]
+    absolute = [
+        ("wake-ups of an idle receive thread", one, idle, 60, "wake_ups", 1, ""),
+        ("processor time of an idle receive thread", one, idle, 4, "time", 1e3, " ms"),
+        ("from `stopLoop()` to the end of `waitLoop()`", every, loop, 1, "time", 1e3, " ms"),
+        ("an answer of the scanner service", every,
+         [(answers + "known-1000", "1,000 known devices")], 5, "time", 1e3, " ms"),
+        ("an answer's processor time", every, many, 3.4, "processor_us", 1e-3, " ms"),
+        ("the service's memory, at most", every, many, 60, "rss_peak_bytes", 1e-6, " MB")]
+    rows = [(text, worst(figures, where, cases, OURS, base, quantity), limit, 1, "")
+            for text, where, cases, base, limit, quantity in relative]
+    rows += [(text, worst(figures, where, cases, OURS, None, quantity), limit, scale, unit)
+             for text, where, cases, limit, quantity, scale, unit in absolute]
+    cells = []
+    for text, found, limit, scale, unit in rows:
+        if found is None: # not measured in this run
+            continue
+        spread, label = [value * scale for value in found[0]], found[1]
+        sign, form = ("", ".1f") if unit or limit > 2 else ("× ", ".3f")
+        cells.append([text, label, f"{sign}{spread[0]:{form}}{unit}",
+                      f"{spread[1]:{form}} to {spread[2]:{form}}", f"≤ {limit}{unit}",
+                      verdict(spread, limit)])
+    return table(["goal", "its worst row", "measured", "by rounds", "wanted", ""], cells)
 
 
 def numbered(figures, group, quantity, unit, scale):
@@ -129,26 +187,128 @@ def numbered(figures, group, quantity, unit, scale):
     return rows
 
 
-def scanner(rows):
-    """What the load of the scanner service printed, a quantity and its value in each row."""
-    if not rows:
+def cell(figures, place, case, library, quantity="time", scale=1.0, form=",.1f"):
+    value = figures.median(place, case, library, quantity)
+    return "–" if value is None else f"{value * scale:{form}}"
+
+
+def grid(figures, head, cases, columns):
+    """A row for each (processors, case, library, text), with a column for each quantity."""
+    rows = [[text] + [cell(figures, place, case, library, *column[1:]) for column in columns]
+            for place, case, library, text in cases]
+    return table([head] + [column[0] for column in columns], rows)
+
+
+def scanner(figures):
+    loads = [("scanner/known-1000", "1 client, 20 devices found, 1,000 known"),
+             ("scanner/found-1000", "8 clients, 1,000 devices found"),
+             ("scanner/found-4000", "64 clients, 4,000 devices found")]
+    if not figures.has("all", "scanner"):
         return ""
+    columns = [("median, ms", "time", 1e3), ("99th percentile, ms", "p99_us", 1e-3),
+               ("longest, ms", "longest_us", 1e-3), ("answers a second", "answers_per_second"),
+               ("processor time of one, ms", "processor_us", 1e-3),
+               ("signals a second", "signals_per_second", 1, ",.0f"),
+               ("memory, MB", "rss_bytes", 1e-6), ("at most, MB", "rss_peak_bytes", 1e-6)]
     return f"""## The scanner service under load
 
-8 client programs ask on 2 adapters without pause, while 1,000 devices are found again and again.
-All processors.
+Client programs ask on 2 adapters without pause, while the devices are found again and again; the
+4,000 are reported once, before. All processors; the clients and the simulated daemon take part of
+them. Processor time is the service's alone.
 
-{table(["", "measured"], rows)}
+{grid(figures, "load", [("all", case, OURS, text) for case, text in loads], columns)}
+"""
+
+
+def processes(figures):
+    if not figures.has("all", "command"):
+        return ""
+    commands = [("all", "command/adapters", OURS, "`kesbt adapters`"),
+                ("all", "command/adapters", "GDBus", "one `gdbus call`")]
+    loops = [("all", "memory/loop", OURS, "with a receive thread"),
+             ("all", "memory/loop", LIMIT, "with raw libdbus alone")]
+    return f"""## Start-up and memory
+
+From the start of a command to its end, beside the simulated daemon, on all processors. `gdbus call`
+sends one message.
+
+{grid(figures, "command", commands, [("ms", "time", 1e3, ".2f")])}
+What a program that only waits for signals holds (RSS), and its share of that (PSS):
+
+{grid(figures, "program", loops, [("RSS, MB", "rss_bytes", 1e-6, ".2f"),
+                                  ("PSS, MB", "pss_bytes", 1e-6, ".2f")])}
+"""
+
+
+def real_time(figures):
+    if not figures.has("real", "signal"):
+        return ("Real-time priority (`chrt`) was not permitted where this was measured: all of it "
+                "has ordinary scheduling.\n")
+    pair = [OURS, "sdbus-c++"]
+    return f"""All of this on one processor had real-time priority (`chrt -f 1`). With ordinary scheduling, one
+processor:
+
+{compared(figures, "plain", SIGNALS, pair, "signals")}
+With real-time priority, all processors:
+
+{compared(figures, "real", SIGNALS, pair, "signals")}"""
+
+
+def threads(figures):
+    cases = [(case, case.split("/")[1]) for case in figures.cases("all", "threads")]
+    columns = [OURS, LIMIT, SHARED, "sdbus-c++"]
+    rates = [[text] + [cell(figures, "all", case, library, "calls_per_second", 1, ",.0f")
+                       for library in columns] for case, text in cases]
+    return f"""## Threads that call at once
+
+Calls for a string, all processors. kesbluetooth has one connection for all threads, and so has
+`{SHARED}`; the others have one for each. Calls a second of all threads together:
+
+{table(["threads"] + columns, rates)}
+The median time of a call:
+
+{compared(figures, "all", cases, columns, "threads")}"""
+
+
+def before(figures):
+    """The version before beside this one, where it was measured."""
+    groups = [(f"call, {text}", case, "time") for case, text in CALLS]
+    groups += [(f"signals, {text}", case, "time") for case, text in SIGNALS]
+    groups += [(f"a call beside signals, {text}", case, "calls_per_second")
+               for case, text in SIGNALS[2:]]
+    groups += [(f"list of {text}", case, "time") for case, text in LISTS]
+    groups += [("most signals a second", "most-signals", "signals_per_second"),
+               ("a minute idle", "idle-minute", "time"),
+               ("a minute idle, wake-ups", "idle-minute", "wake_ups"),
+               ("end of a loop", "stop/loop", "time"), ("memory of a loop", "memory/loop", "rss_bytes"),
+               ("`kesbt adapters`", "command/adapters", "time")]
+    groups += [(f"scanner, {case}, {text}", f"scanner/{case}", quantity)
+               for case in ("known-1000", "found-1000", "found-4000")
+               for quantity, text in (("time", "median"), ("processor_us", "processor time"),
+                                      ("rss_peak_bytes", "memory"))]
+    rows = []
+    for text, case, quantity in groups:
+        for place in PLACES:
+            spread = figures.spread(place, case, OURS, BEFORE, quantity)
+            if spread:
+                rows.append([text, PLACES[place], *(f"× {value:.3f}" for value in spread)])
+    if not rows:
+        return ""
+    return f"""## Against the version before
+
+How the cost relates to that of the version that `KES_BENCH_BASELINE` named, side by side in the same
+run.
+
+{table(["what", "where", "ratio", "lowest round", "highest round"], rows)}
 """
 
 
 def document(figures, measured):
     one, every = "one", "all"
-    sizes = [(case, f"{int(case.split('/')[1]):,}") for case in figures.cases(one, "decode")]
-    lists = [(case, f"{int(case.split('/')[1]):,}") for case in figures.cases(one, "list")]
     quick = LIBRARIES[:4]
-    idle = [[library, f"{figures.median(one, 'idle-processor-time-per-minute', library) * 1e3:.1f}"]
-            for library in (OURS, "sdbus-c++", "GDBus")]
+    idle = [(one, "idle-minute", library, library) for library in (OURS, "sdbus-c++", "GDBus")]
+    most = [[library] + [cell(figures, place, "most-signals", library, "signals_per_second", 1, ",.0f")
+                         for place in (one, every)] for library in quick]
     rates = [[text] + [f"{figures.median(one, case, library, 'calls_per_second'):,.0f}"
                        for library in quick] for case, text in SIGNALS[2:]]
     text = numbered(figures, "format", "bytes_per_second", "MB/s", 1e-6)
@@ -174,11 +334,12 @@ scheduler puts whom and on what else the machine does.
 ## Goals
 
 {goals(figures)}
-"Level" means that the middle halves of both libraries' repetitions overlap.
+Ratios are of times. "By rounds" has the lowest and the highest of the rounds of this run.
 
 In small calls sdbus-c++ is ahead of raw libdbus, and so of kesbluetooth: libdbus reads and checks a
-string reply with 17,000 instructions, and sdbus-c++ makes the whole call with 13,000. It is 34,000
-with kesbluetooth and 59,000 with raw libdbus (counted by callgrind).
+string reply with 17,000 instructions, and sdbus-c++ makes the whole call with 13,000. It is 33,100
+with kesbluetooth, of which 617 are its own and all others libdbus's and the C library's, and 59,000
+with raw libdbus (counted by callgrind).
 
 ## Blocking calls
 
@@ -201,22 +362,34 @@ The slowest of a hundred (99th percentile), on one processor:
 Calls a second that the other thread made meanwhile; raw libdbus has a second connection for them:
 
 {table(["signals"] + quick, rates)}
-Processor time of a thread that waits for signals while none comes, in milliseconds a minute.
-kesbluetooth's looks ten times a second whether `stopLoop()` was called, which may happen in a signal
-handler and so sets a flag only:
+{real_time(figures)}
+The most signals a second before anybody on the way has to queue, so that they arrive late: the peer,
+the bus or the library.
 
-{table(["library", "ms"], idle)}
+{table(["library", "one processor", "all processors"], most)}
+What a thread that waits for signals takes in a minute in which none comes. kesbluetooth's looks once
+a second whether a blocking call of the program itself has read a signal without waking it;
+`stopLoop()` wakes it at once:
+
+{grid(figures, "library", idle, [("wake-ups", "wake_ups", 1, ".0f"), ("ms of processor", "time", 1e3)])}
+{threads(figures)}
 ## Listing devices
 
 `Adapter::listDevices()` asks the daemon for its devices and, for each, the bus whether the daemon
-is there. Raw libdbus sends the same messages.
+is there; these questions are sent many at a time. Raw libdbus sends the same messages one by one.
 
-{compared(figures, one, lists, LIBRARIES[:2], "devices")}
+{compared(figures, one, LISTS, LIBRARIES[:2], "devices")}
+On all processors:
+
+{compared(figures, every, LISTS, LIBRARIES[:2], "devices")}
+One such question, by the number of names on the bus besides:
+
+{compared(figures, one, CHECKS, LIBRARIES[:2], "names")}
 ## Decoding dictionaries
 
 From a received message to all names and values as objects of the program; raw libdbus makes none.
 
-{compared(figures, one, sizes, quick, "entries")}
+{compared(figures, one, DECODING, quick, "entries")}
 ## Text form of dictionaries
 
 {table(["entries", "time", "rate"], text)}
@@ -225,7 +398,7 @@ From a received message to all names and values as objects of the program; raw l
 One signal offered to as many subscriptions of its kind, all or none of which it is for.
 
 {table(["subscriptions", "time", "each"], dispatch)}
-{scanner(measured["scanner"])}## Versions
+{scanner(figures)}{processes(figures)}{before(figures)}## Versions
 
 {table(["package", "version"], measured["versions"].items())}"""
 
@@ -271,29 +444,31 @@ def chart(figures):
 
 
 def repetitions(folder):
-    """All repetitions of all rounds: {(processors, case, library): {quantity: [value]}}."""
-    found = collections.defaultdict(lambda: collections.defaultdict(list))
+    """All repetitions: {(processors, case, library): {quantity: [[value of a round]]}}."""
+    found = collections.defaultdict(lambda: collections.defaultdict(dict))
     for file in sorted(folder.glob("*.*.*.json")):
+        processors, program, _, _ = file.name.split(".")
         for run in json.loads(file.read_text())["benchmarks"]:
             if run.get("run_type") == "aggregate":
                 continue
             parts = [part for part in run["name"].split("/")
                      if part not in ("real_time", "manual_time")
                      and not part.startswith("iterations:")]
-            values = found[file.name.split(".")[0], "/".join(parts[:-1]), parts[-1]]
+            library = BEFORE if program.endswith("-before") else parts[-1]
+            values = found[processors, "/".join(parts[:-1]), library]
             # What happens inside one thread is measured in its processor time.
             waits = run["name"].endswith("_time")
-            values["time"].append(run["real_time" if waits else "cpu_time"]
-                                  * SECONDS[run["time_unit"]])
-            for name in ("p99_us", "calls_per_second", "ns_per_entry", "ns_per_record",
-                         "bytes_per_second"):
-                if name in run:
-                    values[name].append(run[name])
+            time = run["real_time" if waits else "cpu_time"] * SECONDS[run["time_unit"]]
+            for name in ("time", *COUNTERS):
+                if name == "time" or name in run:
+                    values[name].setdefault(file, []).append(time if name == "time" else run[name])
     return found
 
 
-def statistic(values):
-    result = {"median": statistics.median(values), "repetitions": len(values)}
+def statistic(rounds):
+    values = [value for one in rounds for value in one]
+    result = {"median": statistics.median(values), "repetitions": len(values),
+              "rounds": [statistics.median(one) for one in rounds]}
     if len(values) > 1:
         quarters = statistics.quantiles(values, n=4)
         result.update(lower_quartile=quarters[0], upper_quartile=quarters[2])
@@ -318,14 +493,11 @@ def machine():
 
 def collect(folder):
     """Performance.json of what the benchmarks printed, a result in each line."""
-    scanner_file = folder / "scanner.txt"
-    lines = scanner_file.read_text().splitlines() if scanner_file.exists() else []
     facts = {"date": str(datetime.date.today()), "machine": machine(),
              "versions": {package: version(package) for package in PACKAGES},
-             "scanner": [line.split(None, 1) for line in lines if line.strip()],
              "times": "seconds"}
     rows = [{"processors": processors, "case": case, "library": library}
-            | {name: statistic(values) for name, values in quantities.items()}
+            | {name: statistic(list(rounds.values())) for name, rounds in quantities.items()}
             for (processors, case, library), quantities in repetitions(folder).items()]
     return ("{" + ",\n".join(f'"{name}": {json.dumps(value)}' for name, value in facts.items())
             + ',\n"results": [\n' + ",\n".join(map(json.dumps, rows)) + "\n]}\n")
