@@ -8,11 +8,13 @@
 #include <sys/syscall.h>
 #include <sys/wait.h>
 
+#include <atomic>
 #include <cerrno>
 #include <functional>
 #include <limits>
 #include <locale>
 #include <random>
+#include <thread>
 #include <tuple>
 
 namespace {
@@ -222,6 +224,24 @@ TEST_F(AutoConnectFileTest, ListsAreReadWithoutChangeAndChangedWhateverTheirFlag
         std::logic_error);
     EXPECT_EQ(content(), "1,B,,C,A");
     EXPECT_TRUE(config.set(adapter, false, "")) << "and nothing is locked any more";
+}
+
+TEST_F(AutoConnectFileTest, AChangeWaitsForTheEndOfTheOneBeforeIt) {
+    write("1,A,B");
+    std::thread other;
+    std::atomic<bool> isOtherDone{false};
+    EXPECT_TRUE(config.changeList(adapter, [&](AutoConnect::List& list) {
+        other = std::thread([&] {
+            EXPECT_TRUE(config.removeDevice(adapter, "A"));
+            isOtherDone = true;
+        });
+        EXPECT_TRUE(becomesTrue([&] {
+            return isOtherDone || readFile("/proc/locks").find("-> FLOCK") != std::string::npos;
+        })) << "it waits, which the system knows";
+        list.devices.emplace_back("C");
+    }));
+    other.join();
+    EXPECT_EQ(content(), "1,B,C");
 }
 
 TEST_F(AutoConnectFileTest, AReplacedFileKeepsItsOwnerItsModeAndTheLinkToIt) {

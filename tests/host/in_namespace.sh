@@ -5,7 +5,7 @@
 #   in_namespace.sh BUILD_FOLDER COMMAND [ARGUMENT...]
 # /etc, /tmp, /run and /usr/sbin are empty there, /usr/bin can be added to, /usr/bin/hciconfig is
 # missing, /small holds 64 KiB. The build folder is there, read-only. Works for root and for plain
-# users. Fails when the command fails, or when it changed anything of the real machine.
+# users. /etc is on a disk where KESBLUETOOTH_ETC names an empty folder there. Fails when the command fails, or when it changed anything of the real machine.
 set -eu
 
 build=$1
@@ -46,7 +46,11 @@ for path in /bin /sbin /lib /lib32 /lib64 /libx32; do
         set -- --ro-bind "$path" "$path" "$@"
     fi
 done
-set -- --perms 0755 --dir /etc "$@"
+if [ "${KESBLUETOOTH_ETC:-}" ]; then
+    set -- --bind "$KESBLUETOOTH_ETC" /etc "$@"
+else
+    set -- --perms 0755 --dir /etc "$@"
+fi
 
 before=$(fingerprint)
 status=0
