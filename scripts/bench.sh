@@ -44,9 +44,9 @@ if chrt -f 1 true 2>/dev/null; then
     all=(nice -n -10)
 fi
 
-# measure WHERE PROGRAM ROUND REPETITIONS GROUPS [LIBRARIES]: runs the benchmarks of these groups and
-# libraries (extended regular expressions; default: all), their repetitions in random order; then
-# ours with the version before.
+# measure WHERE PROGRAM ROUND REPETITIONS GROUPS [LIBRARIES]: runs the benchmarks of these groups
+# and libraries (extended regular expressions; default: all), their repetitions in random order;
+# then ours with the version before.
 measure() {
     local -n command=$1
     local program=$folder/bench/kesbluetooth-bench-$2 libraries=${6:-[^/]*}
