@@ -245,8 +245,8 @@ def real_time(figures):
         return ("Real-time priority (`chrt`) was not permitted where this was measured: all of it "
                 "has ordinary scheduling.\n")
     pair = [OURS, "sdbus-c++"]
-    return f"""All of this on one processor had real-time priority (`chrt -f 1`). With ordinary scheduling,
-one processor:
+    return f"""All of this on one processor had real-time priority (`chrt -f 1`). With ordinary
+scheduling, one processor:
 
 {compared(figures, "plain", SIGNALS, pair, "signals")}
 With real-time priority, all processors:
