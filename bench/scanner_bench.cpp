@@ -39,7 +39,7 @@ struct Load {
     const char* name;
     int clients;
     int found;     // devices that no adapter knows
-    int known;     // devices that both adapters know
+    int known;     // devices out of range that both adapters know
     int interval;  // milliseconds from one found device to the next
     int variation; // of the signal strength: who is found again with another is reported again
     int warmUp;    // seconds until all were found, so that answers have their full length
@@ -75,7 +75,7 @@ std::string scenario(const Load& load) {
         text << "[Device " << address << "]\nName=Device " << device << "\nClass=0x5a020c\n"
              << "RSSIVariation=" << load.variation << "\nUUIDs=110a;110c\n";
         if (device >= load.found)
-            text << "Known=true\n";
+            text << "Known=true\nPresent=false\n";
     }
     return text.str();
 }
