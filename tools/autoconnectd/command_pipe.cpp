@@ -10,6 +10,7 @@
 #include <algorithm>
 #include <cerrno>
 #include <cstdio>
+#include <cstdlib>
 #include <cstring>
 
 namespace AutoConnectd {
@@ -26,6 +27,19 @@ bool isPipeOfThisUser(const struct stat& status) {
     return S_ISFIFO(status.st_mode) && status.st_uid == geteuid();
 }
 
+/// A folder with something in it is not for us to remove.
+bool setAside(const char* folder) {
+    std::string aside = std::string(folder) + ".XXXXXX";
+    if (!mkdtemp(aside.data()))
+        return false;
+    if (rename(folder, aside.c_str()) == 0)
+        return true;
+    const int error = errno;
+    rmdir(aside.c_str());
+    errno = error;
+    return false;
+}
+
 /// Takes away what stands in the place of the pipe. @return false with errno set
 bool clearPlace(const char* path) {
     struct stat status {};
@@ -35,7 +49,7 @@ bool clearPlace(const char* path) {
         errno = EPERM;
         return false;
     }
-    return std::remove(path) == 0 || errno == ENOENT;
+    return std::remove(path) == 0 || errno == ENOENT || (errno == ENOTEMPTY && setAside(path));
 }
 
 } // namespace
