@@ -98,7 +98,8 @@ std::string shownEntry(const std::string& entry) {
     for (const char character : entry.substr(0, maxShown)) {
         char escape[8] = {character};
         if (character < ' ' || character > '~')
-            std::snprintf(escape, sizeof escape, "\\x%02x", static_cast<unsigned char>(character));
+            static_cast<void>(std::snprintf(escape, sizeof escape, "\\x%02x",
+                                            static_cast<unsigned char>(character)));
         shown += escape;
     }
     return entry.size() > maxShown ? shown + "..." : shown;
