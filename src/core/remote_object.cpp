@@ -39,6 +39,8 @@ bool openArguments(DBusMessage* message, DBusMessageIter& iter, int type) {
     return false;
 }
 
+thread_local const RemoteObject* loopHere = nullptr; // whose receive thread this is
+
 const char* textAt(DBusMessageIter& iter) {
     const char* text = nullptr;
     dbus_message_iter_get_basic(&iter, &text);
@@ -261,16 +263,18 @@ void RemoteObject::stopLoop() {
 }
 
 int RemoteObject::waitLoop() {
-    if (m_loopThread == pthread_self())
-        return EDEADLK; // the thread stays there for another one to wait for
+    if (loopHere == this) // startLoop() may not have noted the thread yet
+        return EDEADLK;   // and it stays there for another one to wait for
     const pthread_t thread = m_loopThread.exchange(0);
     return thread == 0 ? ESRCH : pthread_join(thread, nullptr);
 }
 
 void* receiveSignal(void* proxy) {
     auto* object = static_cast<RemoteObject*>(proxy);
+    loopHere = object;
     if (BusLink* link = BusLink::of(object->getConnection()))
         link->receive(RemoteObject::dispatch, object);
+    loopHere = nullptr;
     return nullptr; // without a bus nothing can come
 }
 
