@@ -55,7 +55,7 @@ void OwnDispatch::mark(DBusMessage* message) {
         auto owned = std::make_unique<Mark>(m_threads);
         const auto destroy = [](void* data) { delete static_cast<Mark*>(data); };
         if (dbus_message_set_data(message, slot, owned.get(), destroy))
-            owned.release();
+            static_cast<void>(owned.release()); // the message's now
     } catch (const std::bad_alloc&) {
         // Unmarked, a call in the handler waits in vain; without memory it would fail anyway.
     }
