@@ -52,7 +52,8 @@ public:
     /// send signals that look like the Bluetooth daemon's, to all or to one process.
     /// @param on for all proxies on all buses of the process, from the next signal on
     /// @dbus org.freedesktop.DBus.GetNameOwner(s name) -> s, when a proxy subscribes to a service
-    ///       whose owner is not known, and once for each new sender
+    ///       whose owner is not known, and for each new sender: once, and again once a second while
+    ///       a stranger goes on
     ///
     /// A service that is restarted is known again by its first signal. A process that sends signals
     /// before it owns the service's name is believed a second later at the latest.

@@ -70,6 +70,8 @@ bool SenderCheck::isOwner(const char* name, const char* sender) {
     if (known == m_names.end())
         known = m_names.try_emplace(name).first;
     Name& owned = known->second;
+    if (owned.former == sender && hadComeBefore(owned.formerUntil))
+        return true;
     if (isAnswered(owned, sender))
         return false;
     const Clock::time_point due = std::max(Clock::now(), owned.asked + shortestPause);
@@ -89,7 +91,12 @@ bool SenderCheck::isAnswered(const Name& name, const char* sender) const {
     const bool isStranger =
         std::find(name.strangers.begin(), name.strangers.end(), sender) != name.strangers.end();
     return (isStranger && Clock::now() < name.asked + strangersPause) ||
-           (BusLink::receivingHere() == &m_link && m_link.takenSignals() <= name.answered);
+           hadComeBefore(name.answered);
+}
+
+/// Whether the signal that is delivered is one of the first `signals`.
+bool SenderCheck::hadComeBefore(std::uint64_t signals) const {
+    return BusLink::receivingHere() == &m_link && m_link.takenSignals() <= signals;
 }
 
 /// Asks the bus who owns a name. The mutex is not held meanwhile.
@@ -108,6 +115,10 @@ bool SenderCheck::ask(const std::string& text, Name& name, std::unique_lock<std:
     lock.lock();
     if (answered >= name.answered) { // no other thread has asked since
         name.answered = answered;
+        if (owner && !name.owner.empty() && name.owner != owner) {
+            name.former = name.owner;
+            name.formerUntil = answered;
+        }
         if (owner)
             name.owner = owner;
     }

@@ -27,7 +27,7 @@ class RemoteObject;
 /// signal comes from a sender that is not known, since a service that was restarted has a new
 /// unique name. A signal of the known owner costs a comparison. A bus never gives a unique name
 /// twice, so an owner is right until another one is known; an owner that gives its name away is
-/// trusted until then.
+/// trusted until then. Its last signals may still wait when that is known: they are let through.
 ///
 /// STRANGERS. The last ones are remembered and ask for nothing again, except once a second: a
 /// stranger may have come to own the name since. Strangers that come in ever new names find that
@@ -56,9 +56,11 @@ public:
 private:
     using Clock = std::chrono::steady_clock;
     struct Name {
-        std::string owner;          // "": none
-        std::uint64_t answered = 0; // how many signals had come before the last answer
-        Clock::time_point asked;    // when the last question was, or will be
+        std::string owner;             // "": none
+        std::string former;            // the last one before it
+        std::uint64_t formerUntil = 0; // how many signals had come when it was known to be gone
+        std::uint64_t answered = 0;    // how many signals had come before the last answer
+        Clock::time_point asked;       // when the last question was
         std::array<std::string, 32> strangers;
         std::size_t nextStranger = 0;
     };
@@ -67,6 +69,7 @@ private:
 
     bool isOwner(const char* name, const char* sender);
     bool isAnswered(const Name& name, const char* sender) const;
+    bool hadComeBefore(std::uint64_t signals) const;
     bool ask(const std::string& text, Name& name, std::unique_lock<std::mutex>& lock);
 
     BusLink& m_link;
