@@ -62,8 +62,8 @@ public:
     /// connection is kept on purpose: Connection::unref() is for programs that want to drop it.
     /// @dbus org.freedesktop.DBus.RemoveMatch(s rule), for each subscription
     ///
-    /// Waits while another thread runs one of this proxy's callbacks: do not destroy it in a
-    /// handler of requests while its callbacks make calls on the same bus. A derived class has to
+    /// Waits while another thread runs one of this proxy's callbacks, or asks for the sender of its
+    /// signal: do not destroy it in a handler of requests on the same bus. A derived class has to
     /// call unsubscribeAll() in its destructor.
     virtual ~RemoteObject();
 

@@ -109,8 +109,8 @@ struct BusLink::Waiter {
         --missing;
         return true;
     }
-    /// How long to sleep next. Longer the longer it has waited: a reply that was read past this
-    /// file at most doubles the time of its call.
+    /// How long to sleep next. Longer the longer it has waited: of a reply that was read past this
+    /// file it learns after twice the time of its call, or after shortWait.
     Milliseconds nextWait() const {
         const auto now = Clock::now();
         const auto wait = std::clamp<Clock::duration>(now - begin, shortWait, longestWait);
@@ -268,7 +268,6 @@ bool BusLink::converse(DBusMessage* message, WakingFlag& interrupted, void (*sen
     const ReceivingScope answersRequests(nullptr);
     interrupted.open(); // without it an interruption is noticed at the next look
     Waiter waiter(&exchange, 1, m_connection);
-    waiter.interrupted = &interrupted;
     waiter.leadsAlways = true;
 
     Lock lock(m_mutex);
@@ -285,6 +284,7 @@ bool BusLink::converse(DBusMessage* message, WakingFlag& interrupted, void (*sen
         sent();
     else
         waiter.deadline = waiter.begin;
+    waiter.interrupted = &interrupted; // the call goes out all the same
     wait(waiter, lock);
     reply = std::move(exchange.reply);
     return queued;
@@ -372,6 +372,9 @@ void BusLink::passOnStop() {
         return;
     m_stopPassedOn = true;
     m_receiverWake.notify_all();
+    for (Waiter* waiter : m_waiters)
+        if (waiter->interrupted == &stop)
+            waiter->wake.notify_one();
 }
 
 /// Waits for input, reads it and dispatches it. The mutex is not held.
@@ -433,12 +436,15 @@ void BusLink::passLead() {
 }
 
 void BusLink::wakeFinished() {
-    for (Waiter* waiter : m_waiters) {
-        if (!waiter->woken && waiter->isFinished()) {
-            waiter->woken = true;
-            waiter->wake.notify_one();
-        }
-    }
+    for (Waiter* waiter : m_waiters)
+        wakeIfFinished(*waiter);
+}
+
+void BusLink::wakeIfFinished(Waiter& waiter) {
+    if (waiter.woken || !waiter.isFinished())
+        return;
+    waiter.woken = true;
+    waiter.wake.notify_one();
 }
 
 void BusLink::wakeLeader() {
@@ -489,6 +495,8 @@ void BusLink::receive(Deliver deliver, void* context) {
     const ReceivingScope scope(this);
     const Milliseconds limit = stop.open() ? longestWait : shortWait;
     Lock lock(m_mutex);
+    if (m_reading)
+        wakeLeader(); // to sleep on the stop too
     ++m_receivers;
     while (!stop.isRaised()) {
         if (m_inbox.empty()) {
@@ -512,15 +520,16 @@ void BusLink::receiveMore(Lock& lock, Milliseconds limit) {
         m_receiverParked = sinceCall >= 2 * callBurst;
         m_receiverWake.wait_for(lock, m_receiverParked ? limit : callBurst);
         m_receiverParked = false;
-    } else if (!lead(lock, limit, nullptr)) {
+    } else {
+        const bool open = lead(lock, limit, nullptr);
         passLead();
+        if (open || !m_inbox.empty())
+            return;
         lock.unlock(); // closed: nothing will come
         pollfd stopped{stop.descriptor(), POLLIN, 0};
-        poll(&stopped, 1, static_cast<int>(limit.count()));
-        stop.calm();
+        if (poll(&stopped, 1, static_cast<int>(limit.count())) > 0)
+            stop.calm();
         lock.lock();
-    } else {
-        passLead();
     }
 }
 
@@ -551,12 +560,12 @@ DBusHandlerResult BusLink::sort(DBusMessage* message) {
 DBusHandlerResult BusLink::giveReply(DBusMessage* message) {
     const dbus_uint32_t serial = dbus_message_get_reply_serial(message);
     const Lock lock(m_mutex);
-    const bool taken =
-        serial != 0 && std::any_of(m_waiters.begin(), m_waiters.end(), [&](Waiter* waiter) {
-            return waiter->take(serial, message, keptSignals(lock));
-        });
-    if (!taken)
+    const auto taker = std::find_if(m_waiters.begin(), m_waiters.end(), [&](Waiter* waiter) {
+        return serial != 0 && waiter->take(serial, message, keptSignals(lock));
+    });
+    if (taker == m_waiters.end())
         return DBUS_HANDLER_RESULT_NOT_YET_HANDLED;
+    wakeIfFinished(**taker); // now: a handler that takes its time may come next
     if (!LeadingScope::has(this))
         wakeLeader();
     return DBUS_HANDLER_RESULT_HANDLED;

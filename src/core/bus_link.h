@@ -120,6 +120,7 @@ private:
     void flush();
     void passLead();
     void wakeFinished();
+    static void wakeIfFinished(Waiter& waiter);
     void wakeLeader();
     void receiveMore(Lock& lock, Milliseconds limit);
     bool dispatchesHere() const;

@@ -36,9 +36,11 @@ bool WakingFlag::open() {
 }
 
 void WakingFlag::calm() {
+    const int fd = m_fd;
     eventfd_t count = 0;
-    if (!isRaised() && m_fd >= 0)
-        eventfd_read(m_fd, &count);
+    if (fd < 0 || isRaised() || eventfd_read(fd, &count) != 0 || !isRaised())
+        return;
+    eventfd_write(fd, count); // raised meanwhile
 }
 
 } // namespace Bluetooth
