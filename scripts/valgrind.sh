@@ -2,10 +2,11 @@
 # SPDX-License-Identifier: LGPL-2.1-or-later
 # Runs tests that decode, call, answer and clean up under valgrind's memcheck, each in a process of
 # its own: invalid reads and writes, uninitialised values and leaks fail it.
+# A test that floods is for the thread sanitizer: here the flood outruns what it is for.
 #   scripts/valgrind.sh [GTEST_FILTER]    the filter holds for each of the programs
 source "$(dirname "$0")/lib.sh"
 
-filter=${1:-DecodingTest.*:CallTest.*:SignalTest.*:PendingTest.*:Agent*Test.*:*Codec*:ProxyTest.*:ServerTest.*}
+filter=${1:-DecodingTest.*:CallTest.*:SignalTest.*:PendingTest.*:Agent*Test.*:*Codec*:ProxyTest.*:ServerTest.*-ServerTest.FindersComeAndGo*}
 need_packages "${build_packages[@]}" "${test_packages[@]}" valgrind
 echo "Building in build ..."
 build "$root/build" -DKESBLUETOOTH_BUILD_TESTS=ON -DKESBLUETOOTH_SANITIZE=
