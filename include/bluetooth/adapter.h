@@ -33,11 +33,11 @@ public:
 
     /// Reads all properties, and adds "HCIVersion" at the end: a string such as "2.1", from
     /// /usr/bin/hciconfig. It is "" when that program prints no version, and missing when the
-    /// program cannot be started (logged).
+    /// program cannot be started or takes more than 5 s (logged).
     /// @dbus GetProperties() -> a{sv}
     /// @return a new dictionary, deleted by the caller; null when the daemon's part fails
     ///
-    /// Blocks until the daemon replies, at most 25 s, and while hciconfig runs.
+    /// Blocks until the daemon replies, at most 25 s, and while hciconfig runs, at most 5 s.
     Dict* getProperties() override;
 
     /// Makes the daemon keep the controller up until releaseSession().

@@ -29,8 +29,8 @@ std::string pointerText(const ObjectPath* path) {
 
 } // namespace
 
-bool readDevicePaths(Adapter& adapter, std::vector<ObjectPath>& paths) {
-    return readMethod(KES_HERE, adapter, "ListDevices", paths);
+bool readDevicePaths(LogPlace place, Adapter& adapter, std::vector<ObjectPath>& paths) {
+    return readMethod(place, adapter, "ListDevices", paths);
 }
 
 Adapter::Adapter(const char* path) : BluezObject(path, "org.bluez.Adapter") {}
@@ -84,13 +84,14 @@ Device* Adapter::findDevice(const char* address, bool logError) {
 
 Device* Adapter::getDeviceByIndex(unsigned int index) {
     std::vector<ObjectPath> paths;
-    return readDevicePaths(*this, paths) && index < paths.size() ? Device::getDevice(paths[index])
-                                                                 : nullptr;
+    return readDevicePaths(KES_HERE, *this, paths) && index < paths.size()
+               ? Device::getDevice(paths[index])
+               : nullptr;
 }
 
 DeviceList* Adapter::listDevices() {
     std::vector<ObjectPath> paths;
-    return readDevicePaths(*this, paths) ? makeList<Device, DeviceList>(paths) : nullptr;
+    return readDevicePaths(KES_HERE, *this, paths) ? makeList<Device, DeviceList>(paths) : nullptr;
 }
 
 Device* Adapter::createDevice(const char* address) {

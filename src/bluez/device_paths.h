@@ -4,6 +4,8 @@
 
 #include <bluetooth/object_path.h>
 
+#include "core/log.h"
+
 #include <vector>
 
 namespace Bluetooth {
@@ -11,8 +13,8 @@ namespace Bluetooth {
 class Adapter;
 
 /// Reads which devices an adapter knows, in one call, without a proxy for each.
-/// @return false (logged) on failure; `paths` is unchanged then
-bool readDevicePaths(Adapter& adapter, std::vector<ObjectPath>& paths);
+/// @return false (logged for the caller) on failure; `paths` is unchanged then
+bool readDevicePaths(LogPlace place, Adapter& adapter, std::vector<ObjectPath>& paths);
 
 } // namespace Bluetooth
 

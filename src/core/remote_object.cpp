@@ -13,6 +13,7 @@
 #include "core/subscriptions.h"
 
 #include <cerrno>
+#include <cstring>
 #include <iostream>
 #include <new>
 
@@ -103,7 +104,10 @@ std::string RemoteObject::matchRule(const std::string& member) const {
 template <class Callback>
 int RemoteObject::subscribe(const char* member, Callback callback) {
     ScopedError error;
-    if (member && callback && dbus_validate_member(member, error)) {
+    // The bus refuses what is no member, but a quote would end the text in its rule.
+    const bool isText =
+        member && (!std::strchr(member, '\'') || dbus_validate_member(member, error));
+    if (isText && callback) {
         // Before AddMatch: without memory for the record the bus must not be left with a rule, and
         // the first signal may come before the reply.
         Subscriptions::Records<Callback> record;

@@ -27,7 +27,8 @@ std::atomic<Finders*> current{nullptr};
 /// Adds the addresses of the devices that the daemon knows on an adapter.
 void addKnownDevices(Adapter& adapter, AddressSet& addresses) {
     std::vector<ObjectPath> paths;
-    readDevicePaths(adapter, paths); // not listDevices(): each proxy would look for the daemon
+    readDevicePaths(KES_HERE, adapter,
+                    paths); // not listDevices(): each proxy would look for the daemon
     for (const ObjectPath& path : paths) {
         const auto address = addressInPath(path);
         if (address && !address->empty())
