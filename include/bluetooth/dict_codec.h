@@ -15,8 +15,9 @@
 ///     Address: 00:11:22:33:44:55;Class: 360;Paired: 0;UUIDs: [a1, b2];
 /// @endcode
 /// Nothing is escaped: a name or value that contains the terminator, or a name that contains ":",
-/// is not parsed back. So who chooses a value, as a stranger chooses the name of a device, can forge
-/// entries: replace the terminator in it first, as the scanner service does. Types are not parsed back either: every parsed value is a string.
+/// is not parsed back. So who chooses a value, as a stranger chooses the name of a device, can
+/// forge entries: replace the terminator in it first, as the scanner service does. Types are not
+/// parsed back either: every parsed value is a string.
 ///
 /// None of these functions logs, depends on the locale, or fails except for lack of memory. Strings
 /// may contain any bytes. Any thread may call them.

@@ -36,9 +36,9 @@ struct StartedDiscovery;
 /// its adapters have other object paths, and so other finders; those of the old paths stay, without
 /// effect, until the service ends.
 ///
-/// MEMORY. The properties of the 4,096 devices that were found last are kept until the service ends,
-/// at most 4 KiB a device and commonly 0.5 KiB. When there are more, the device that was not heard
-/// of for longest is forgotten and listed no more; the first time is logged.
+/// MEMORY. The properties of the 4,096 devices that were found last are kept until the service
+/// ends, at most 4 KiB a device and commonly 0.5 KiB. When there are more, the device that was not
+/// heard of for longest is forgotten and listed no more; the first time is logged.
 ///
 /// TWO ADAPTERS. The signals of one adapter reach the finders of all: a device that one adapter
 /// found is returned for the others too.

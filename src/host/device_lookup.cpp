@@ -31,7 +31,7 @@ Lookup appendDevice(Adapter& adapter, const std::string& address, DeviceList& de
     }
     const bool canBeSent = dbus_validate_utf8(address.c_str(), nullptr);
     return !canBeSent || isDeniedByDaemon(adapter.getErrorName()) ? Lookup::Unknown
-                                                                     : Lookup::NotAnswered;
+                                                                  : Lookup::NotAnswered;
 }
 
 } // namespace Bluetooth
