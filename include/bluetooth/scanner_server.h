@@ -36,7 +36,7 @@ struct StartedDiscovery;
 /// its adapters have other object paths, and so other finders; those of the old paths stay, without
 /// effect, until the service ends.
 ///
-/// MEMORY. The properties of the 4,096 devices that were found last are kept until the service
+/// MEMORY. The properties of the 4,096 devices that were heard of last are kept until the service
 /// ends, at most 4 KiB a device and commonly 0.5 KiB. When there are more, the device that was not
 /// heard of for longest is forgotten and listed no more; the first time is logged.
 ///

@@ -8,8 +8,8 @@
 namespace Bluetooth {
 
 /// What is used of dbus-glib. Its library is loaded when an object is served for the first time:
-/// it brings GIO and the libraries of that, whose linking was a sixth of the start of each program
-/// that serves none.
+/// it brings GIO and the libraries of that, which programs that serve none need not link at their
+/// start.
 struct DBusGlib {
     /// @return null (logged) when the library cannot be loaded
     static const DBusGlib* load();
