@@ -90,11 +90,11 @@ bool ServerObject::prepareObjectInfo(GType type, const DBusGObjectInfo* info, GO
     constexpr guint noFlags = 0;
     guint result = 0; // whether the name is owned, or waited for, makes no difference here
     GError* error = nullptr;
+    const char* const problem = glib ? "Not connected to the bus" : "dbus-glib is missing";
     if (!glib || !m_busProxy ||
         !glib->call(m_busProxy, "RequestName", &error, G_TYPE_STRING, m_busName, G_TYPE_UINT,
                     noFlags, G_TYPE_INVALID, G_TYPE_UINT, &result, G_TYPE_INVALID)) {
-        logError(KES_HERE, "Failed to acquire %s, %s", m_busName,
-                 error ? error->message : "Not connected to the bus");
+        logError(KES_HERE, "Failed to acquire %s, %s", m_busName, error ? error->message : problem);
         g_clear_error(&error);
         return false;
     }

@@ -30,11 +30,12 @@ Texts list(Scanner& scanner, const char* adapterId, bool logErrors = true) {
 }
 
 /// @return what the program wrote to its output and to its errors
-std::pair<std::string, std::string> run(const std::string& argument, int status) {
+std::pair<std::string, std::string> run(const std::string& argument, int status,
+                                        const Texts& environment = {}) {
     Texts command{KESBT_SCANNERD};
     if (!argument.empty())
         command.push_back(argument);
-    ChildProcess program(command, ChildProcess::Output::Capture);
+    ChildProcess program(command, ChildProcess::Output::Capture, environment);
     EXPECT_EQ(program.wait(), status);
     const std::string output = program.readAll();
     return {output, program.readErrors()};
@@ -273,6 +274,11 @@ TEST_F(ServiceTest, RunsOnceInASessionAndTellsItsUsage) {
     EXPECT_EQ(run("--version", 0).first, "kesbt-scannerd 1.0.0\n");
     run("--help", 0);
     run("--nonsense", 2);
+
+    stopService();
+    std::ofstream(testFolder() + "/libdbus-glib-1.so.2") << "no library";
+    EXPECT_EQ(run("", 1, {"LD_LIBRARY_PATH=" + testFolder()}).second,
+              "kesbt-scannerd: cannot load libdbus-glib-1.so.2; install libdbus-glib-1-2\n");
 }
 
 TEST_F(ServiceTest, EndsWithItsBuses) {

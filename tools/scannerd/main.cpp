@@ -10,6 +10,7 @@
 #include <glib-unix.h>
 
 #include <cerrno>
+#include <chrono>
 #include <cstdlib>
 #include <cstring>
 #include <memory>
@@ -65,15 +66,20 @@ int serve(const DaemonProgram& program, ServiceName& name, DBusConnection* syste
     g_unix_fd_add(Tools::stopDescriptor(), G_IO_IN, quitOnStop, &server);
 
     server = std::make_unique<ScannerServer>();
-    if (name.owner() == server->getConnectionName())
+    const std::string servedBy = server->getConnectionName(); // "" without dbus-glib
+    if (!servedBy.empty() && name.owner() == servedBy)
         server->startLoop();
     else if (!session.isLost())
         return program.fail(
-            "the session bus did not give it its name; only one can run in a session");
+            servedBy.empty()
+                ? "cannot load libdbus-glib-1.so.2; install libdbus-glib-1-2"
+                : "the session bus did not give it its name; only one can run in a session");
 
     // Calls that came before the name was given up are answered, the others go to the next daemon.
+    // Both take a second at most: programs may call more often, and call the unique name.
+    const auto end = std::chrono::steady_clock::now() + std::chrono::seconds(1);
     name.release();
-    while (g_main_context_iteration(nullptr, false)) {
+    while (std::chrono::steady_clock::now() < end && g_main_context_iteration(nullptr, false)) {
     }
     server->stopDiscovery();
     if (session.isLost())

@@ -22,8 +22,9 @@ std::string ServiceName::owner() {
 
 void ServiceName::release() {
     resetError();
+    constexpr int limit = 1000; // ms, in which the calls before it are answered too
     if (newMessage("ReleaseName") == 0 && append(serviceName) == 0)
-        sendMessage(true, -1);
+        sendMessage(true, limit);
 }
 
 } // namespace Scannerd

@@ -15,7 +15,7 @@ public:
 
     /// @return the owner's unique name; "" when nobody owns it
     std::string owner();
-    /// Gives it up: calls made from now on go to the next owner, or start one.
+    /// Gives it up: calls made from now on go to the next owner, or start one. Takes 1 s at most.
     void release();
 };
 
