@@ -17,6 +17,8 @@
 
 namespace Bluetooth {
 
+class Finders;
+
 /// The frame of an object that this library serves on a bus with dbus-glib: the bus connection, the
 /// well-known name, and a GLib main loop with a timer of one second. Its one subclass is
 /// ScannerServer, and startLoop() runs for no other.
@@ -88,6 +90,8 @@ public:
     const char* getInterface() const;
 
 private:
+    friend class Finders; // awaits that the connection has written its answers
+
     bool setLoop(const std::shared_ptr<GMainLoop>& loop);
 
     std::mutex m_loopMutex; // guards m_loop; nothing is called while it is held

@@ -6,9 +6,10 @@
 #include <bluetooth/scanner_server.h>
 
 #include "bluez/device_address.h"
-#include "core/log.h"
+#include "scanner/dbus_glib.h"
 #include "scanner/scan_text.h"
 
+#include <chrono>
 #include <cstring>
 
 namespace Bluetooth {
@@ -81,19 +82,29 @@ void Finders::remove(ScannerObject& object, Adapter& adapter) {
     m_state.forgetFinder(object, path);
 }
 
-std::vector<std::pair<std::string, std::string>> Finders::unknownDevices(const AddressSet& set) {
+void Finders::showUnknownDevices(const AddressSet& set, const ScannerState::Show& show) {
     m_server.updateFilterSet();
-    return m_state.unknownDevices(set);
+    m_state.showUnknownDevices(set, show);
+}
+
+void Finders::awaitAnswersWritten() {
+    constexpr long mostWaiting = 8 * 1024 * 1024;
+    if (!m_server.m_connection)
+        return;
+    DBusConnection* const connection = DBusGlib::load()->getConnection(m_server.m_connection);
+    // A bus may read no more because somebody does not: the loop's timer has to go on.
+    const auto end = std::chrono::steady_clock::now() + std::chrono::seconds(1);
+    while (dbus_connection_get_outgoing_size(connection) > mostWaiting &&
+           std::chrono::steady_clock::now() < end)
+        dbus_connection_read_write(connection, 100);
 }
 
 // A signal makes a finder where there is none any more.
 
 void Finders::deviceFound(const RemoteObject* sender, const std::string& address,
                           const std::string& text) {
-    if (m_state.isListening(sender) &&
-        m_state.addDevice(of(m_served, sender->getPath()), address, text))
-        logError(KES_HERE, "More than %zu devices were found, the oldest are left out from now on",
-                 FoundDevices::mostDevices);
+    if (m_state.isListening(sender))
+        m_state.addDevice(of(m_served, sender->getPath()), address, text);
 }
 
 void Finders::deviceDisappeared(const RemoteObject* sender, const std::string& address) {

@@ -6,8 +6,6 @@
 
 #include <memory>
 #include <string>
-#include <utility>
-#include <vector>
 
 namespace Bluetooth {
 
@@ -41,9 +39,11 @@ public:
     /// Ends the oldest discovery on an adapter, and its finder.
     void remove(ScannerObject& object, Adapter& adapter);
 
-    /// Asks the daemon which devices it knows.
-    /// @return address and properties of the others in the set
-    std::vector<std::pair<std::string, std::string>> unknownDevices(const AddressSet& set);
+    /// Asks the daemon which devices it knows, and shows the others in the set.
+    void showUnknownDevices(const AddressSet& set, const ScannerState::Show& show);
+    /// Waits while much of the answers before is still to be written: programs can ask faster than
+    /// the bus takes answers, and each of these would be kept in memory.
+    void awaitAnswersWritten();
 
     /// Callbacks for the signals of an adapter.
     void deviceFound(const RemoteObject* sender, const std::string& address,

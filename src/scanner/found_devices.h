@@ -3,9 +3,9 @@
 #define KESBLUETOOTH_SCANNER_FOUND_DEVICES_H
 
 #include <list>
-#include <map>
 #include <optional>
 #include <string>
+#include <unordered_map>
 
 namespace Bluetooth {
 
@@ -30,7 +30,7 @@ private:
         Ages::iterator age;
     };
 
-    std::map<std::string, Device> m_devices;
+    std::unordered_map<std::string, Device> m_devices;
     Ages m_ages;
 };
 

@@ -93,14 +93,18 @@ gboolean scanner_object_list_devices(ScannerObject* object, const char* adapterI
     const Finders::Set set = current->of(*object, adapter->getPath());
     if (!set)
         return notFound(error, "Set", adapterId);
-    const auto unknown = current->unknownDevices(*set);
+    current->awaitAnswersWritten();
 
     // dbus-glib unrefs the table and leaves its texts to it.
-    *devices = g_hash_table_new_full(g_str_hash, g_str_equal, g_free, g_free);
-    for (const auto& [address, text] : unknown)
-        g_hash_table_insert(*devices, g_strdup(address.c_str()), g_strdup(text.c_str()));
-    if (g_hash_table_size(*devices) == 0) // clients know an answer by its never being empty
-        g_hash_table_insert(*devices, g_strdup(""), g_strdup(""));
+    std::unique_ptr<GHashTable, decltype(&g_hash_table_unref)> table(
+        g_hash_table_new_full(g_str_hash, g_str_equal, g_free, g_free), g_hash_table_unref);
+    const auto insert = [&table](const std::string& address, const std::string& text) {
+        g_hash_table_insert(table.get(), g_strdup(address.c_str()), g_strdup(text.c_str()));
+    };
+    current->showUnknownDevices(*set, insert);
+    if (g_hash_table_size(table.get()) == 0) // clients know an answer by its never being empty
+        insert("", "");
+    *devices = table.release();
     return TRUE;
 } catch (const std::bad_alloc&) { // not through the frames of C that called
     return notFound(error, "Set", adapterId);

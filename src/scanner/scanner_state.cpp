@@ -3,16 +3,12 @@
 
 #include <bluetooth/adapter.h>
 
+#include "core/log.h"
+
 #include <algorithm>
 #include <utility>
 
 namespace Bluetooth {
-
-namespace {
-
-using Lock = std::lock_guard<std::mutex>;
-
-} // namespace
 
 void ScannerState::addFinder(ScannerObject& object, const std::string& path,
                              const StartedDiscovery& discovery) {
@@ -61,21 +57,25 @@ bool ScannerState::isListening(const RemoteObject* sender) const {
     });
 }
 
-bool ScannerState::addDevice(const Set& set, const std::string& address, const std::string& text) {
-    const Lock lock(m_mutex);
+void ScannerState::addDevice(const Set& set, const std::string& address, const std::string& text) {
+    Lock lock(m_mutex);
     if (set)
         set->insert(address);
-    return keep(address, text);
+    keep(std::move(lock), address, text);
 }
 
-/// Under the lock. @return whether a device had to go for the first time
-bool ScannerState::keep(const std::string& address, const std::string& text) {
+/// Ends what is done under the lock: it is free when the first device that has to go is logged.
+void ScannerState::keep(Lock lock, const std::string& address, const std::string& text) {
     const std::optional<std::string> gone = m_devices.put(address, text);
     if (!gone)
-        return false;
+        return;
     for (const StartedDiscovery& discovery : m_discoveries)
         discovery.found->erase(*gone);
-    return !std::exchange(m_hadTooMany, true);
+    if (std::exchange(m_hadTooMany, true))
+        return;
+    lock.unlock();
+    logError(KES_HERE, "More than %zu devices were found, the oldest are left out from now on",
+             FoundDevices::mostDevices);
 }
 
 void ScannerState::removeDevice(const Set& set, const std::string& address) {
@@ -84,28 +84,24 @@ void ScannerState::removeDevice(const Set& set, const std::string& address) {
         set->erase(address);
 }
 
-std::vector<std::pair<std::string, std::string>>
-ScannerState::unknownDevices(const AddressSet& set) {
-    std::vector<std::pair<std::string, std::string>> devices;
+void ScannerState::showUnknownDevices(const AddressSet& set, const Show& show) const {
     const Lock lock(m_mutex);
     for (const std::string& address : set) {
         const std::string* text = m_devices.find(address);
         if (text && m_filter.count(address) == 0)
-            devices.emplace_back(address, *text);
+            show(address, *text);
     }
-    return devices;
 }
 
 void ScannerState::putText(const std::string& address, const std::string& text) {
-    const Lock lock(m_mutex);
-    keep(address, text);
+    keep(Lock(m_mutex), address, text);
 }
 
 std::string ScannerState::text(const std::string& address) {
-    const Lock lock(m_mutex);
+    Lock lock(m_mutex);
     if (const std::string* text = m_devices.find(address))
         return *text;
-    keep(address, "");
+    keep(std::move(lock), address, "");
     return "";
 }
 

@@ -6,10 +6,10 @@
 
 #include "scanner/found_devices.h"
 
+#include <functional>
 #include <memory>
 #include <mutex>
 #include <string>
-#include <utility>
 #include <vector>
 
 namespace Bluetooth {
@@ -30,13 +30,15 @@ struct StartedDiscovery {
 /// scanner object and their sets too, which are therefore read and changed here only. Any thread
 /// may call any operation at any time.
 ///
-/// Under the lock nothing is called (no bus, no GLib, no callback), no other lock is taken, and no
-/// Adapter is destroyed: that waits for the adapter's callbacks, and they use this state. What is
-/// taken out is therefore returned, for the caller to destroy.
+/// Under the lock nothing is called (no bus, no callback, but who copies what is shown), no other
+/// lock is taken, and no Adapter is destroyed: that waits for the adapter's callbacks, and they use
+/// this state. What is taken out is therefore returned, for the caller to destroy.
 class ScannerState {
 public:
     /// Holding a set keeps it alive; what it holds is guarded all the same.
     using Set = std::shared_ptr<AddressSet>;
+    /// Copies the address and the properties of a device, under the lock: it does nothing else.
+    using Show = std::function<void(const std::string& address, const std::string& text)>;
 
     /// Keeps a discovery, makes its set the adapter's finder where there is none, and lets the
     /// service live on.
@@ -54,15 +56,14 @@ public:
     /// taken may still call; it must not act any more, nor be looked at: it is being destroyed.
     bool isListening(const RemoteObject* sender) const;
 
-    /// A device came into reach of a finder, or its properties changed. One that was found longest
-    /// ago goes from all finders when there are too many.
+    /// A device came into reach of a finder, or its properties changed. The one not heard of for
+    /// longest goes from all finders when there are too many.
     /// @param set null when there is no finder: the properties are kept all the same
-    /// @return whether that was the first one to go
-    bool addDevice(const Set& set, const std::string& address, const std::string& text);
+    void addDevice(const Set& set, const std::string& address, const std::string& text);
     /// A device left the reach of a finder. Its properties are kept.
     void removeDevice(const Set& set, const std::string& address);
-    /// @return address and properties of the devices in the set that the daemon does not know
-    std::vector<std::pair<std::string, std::string>> unknownDevices(const AddressSet& set);
+    /// Shows the devices in the set that the daemon does not know.
+    void showUnknownDevices(const AddressSet& set, const Show& show) const;
 
     /// See ScannerServer::putInfoToMap() and getInfoFromMap().
     void putText(const std::string& address, const std::string& text);
@@ -77,9 +78,10 @@ public:
     bool countDown();
 
 private:
+    using Lock = std::unique_lock<std::mutex>;
     static constexpr int ticksToLive = 30;
 
-    bool keep(const std::string& address, const std::string& text);
+    void keep(Lock lock, const std::string& address, const std::string& text);
 
     mutable std::mutex m_mutex; // guards what follows, and the finders of scanner objects
     std::vector<StartedDiscovery> m_discoveries;

@@ -258,8 +258,8 @@ TEST_F(ServerTest, WhatStrangersTellIsBoundedAndForgesNothing) {
     EXPECT_TRUE(lists(full, phone));
     find(invented(most), {{"Name", "x"}});
     EXPECT_FALSE(lists(askUntilListed("hci0", invented(most).c_str()), invented(1).c_str()));
-    EXPECT_EQ(log.take(), Texts{"finders.cpp More than 4096 devices were found, the oldest are "
-                                "left out from now on"});
+    EXPECT_EQ(log.take(), Texts{"scanner_state.cpp More than 4096 devices were found, the "
+                                "oldest are left out from now on"});
 }
 
 TEST_F(ServerTest, FindersComeAndGoWhileDevicesAreFound) {
