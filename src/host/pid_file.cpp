@@ -2,6 +2,7 @@
 #include "host/pid_file.h"
 
 #include <fcntl.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <cerrno>
@@ -13,6 +14,17 @@ namespace {
 
 constexpr int closeOnExecFlag = 1;
 constexpr mode_t pidFileMode = 0600;
+
+/// A file that has another name is another program's too.
+bool hasOneName(int descriptor) {
+    struct stat status {};
+    if (fstat(descriptor, &status) != 0)
+        return false;
+    if (status.st_nlink <= 1)
+        return true;
+    errno = EMLINK;
+    return false;
+}
 
 bool setCloseOnExec(int descriptor, PidFileFailure& failure) {
     failure = PidFileFailure::GetFlags;
@@ -51,12 +63,13 @@ int lockPidFile(const char* path, int flags, PidFileFailure& failure) {
         errno = EINVAL;
         return -1;
     }
-    const int descriptor = open(path, O_RDWR | O_CREAT | O_NOFOLLOW, pidFileMode);
+    const int descriptor =
+        open(path, O_RDWR | O_CREAT | O_NOFOLLOW | O_NONBLOCK | O_NOCTTY, pidFileMode);
     if (descriptor < 0)
         return -1;
     const bool closeOnExec = (flags & closeOnExecFlag) != 0;
-    if ((!closeOnExec || setCloseOnExec(descriptor, failure)) && lockWhole(descriptor, failure) &&
-        writePid(descriptor, failure))
+    if (hasOneName(descriptor) && (!closeOnExec || setCloseOnExec(descriptor, failure)) &&
+        lockWhole(descriptor, failure) && writePid(descriptor, failure))
         return descriptor;
 
     const int error = errno;

@@ -63,12 +63,14 @@ TEST_F(PidFileTest, EachFailureHasItsOwnLineAndLeavesNothingOpen) {
         {"/tmp", "Could not open PID file /tmp"},
         {"/nowhere/x.pid", "Could not open PID file /nowhere/x.pid"},
         {path, "Could not open PID file /tmp/test.pid"}, // a link
+        {"/tmp/hard.pid", "Could not open PID file /tmp/hard.pid"},
         {"/dev/null", "Could not truncate PID file '/dev/null'"},
         {"/small/x.pid", "Writing to PID file '/small/x.pid'"},
     };
     writeFile("/small/x.pid", "");
     writeFile("/tmp/precious", "kept");
     std::filesystem::create_symlink("/tmp/precious", path);
+    std::filesystem::create_hard_link("/tmp/precious", "/tmp/hard.pid");
     writeFile("/small/filler", std::string(100000, 'x'));
     for (const auto& [file, message] : cases) {
         EXPECT_EQ(createPidFile(file, closeOnExec, true), -1);
