@@ -22,4 +22,10 @@ AutoConnectLock::AutoConnectLock()
     m_isHeld = result == 0;
 }
 
+AutoConnectLock::~AutoConnectLock() {
+    // Closing alone would leave it with a process that was forked meanwhile and started no program.
+    if (m_isHeld)
+        flock(m_file.number(), LOCK_UN);
+}
+
 } // namespace Bluetooth

@@ -15,6 +15,9 @@ class AutoConnectLock {
 public:
     /// Waits for the lock. Goes without where it cannot be had, as in a folder that is read-only.
     AutoConnectLock();
+    AutoConnectLock(const AutoConnectLock&) = delete;
+    AutoConnectLock& operator=(const AutoConnectLock&) = delete;
+    ~AutoConnectLock();
 
     bool isHeld() const { return m_isHeld; }
 

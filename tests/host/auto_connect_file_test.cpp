@@ -219,11 +219,18 @@ TEST_F(AutoConnectFileTest, ListsAreReadWithoutChangeAndChangedWhateverTheirFlag
         EXPECT_EQ(content(), after);
         EXPECT_EQ(pipe.take(), "1");
     }
-    EXPECT_THROW(
-        config.changeList(adapter, [](AutoConnect::List&) { throw std::logic_error("no"); }),
-        std::logic_error);
+    pid_t forked = -1;
+    const auto fail = [&](AutoConnect::List&) {
+        forked = fork();
+        while (forked == 0)
+            pause();
+        throw std::logic_error("no");
+    };
+    EXPECT_THROW(config.changeList(adapter, fail), std::logic_error);
     EXPECT_EQ(content(), "1,B,,C,A");
-    EXPECT_TRUE(config.set(adapter, false, "")) << "and nothing is locked any more";
+    EXPECT_TRUE(config.set(adapter, false, "")) << "nothing is locked, nor by the other process";
+    kill(forked, SIGKILL);
+    waitpid(forked, nullptr, 0);
 }
 
 TEST_F(AutoConnectFileTest, AChangeWaitsForTheEndOfTheOneBeforeIt) {
