@@ -97,7 +97,7 @@ std::string shownEntry(const std::string& entry) {
     std::string shown;
     for (const char character : entry.substr(0, maxShown)) {
         char escape[8] = {character};
-        if (character < ' ' || character > '~')
+        if (character < ' ' || character > '~' || character == '\\')
             static_cast<void>(std::snprintf(escape, sizeof escape, "\\x%02x",
                                             static_cast<unsigned char>(character)));
         shown += escape;

@@ -52,7 +52,7 @@ private:
 /// A list as it stands in a file.
 std::string contentOf(const AutoConnect::List& list);
 
-/// An entry for the log: printable, and not endless.
+/// An entry for the log: printable, told from what others look like, and not endless.
 std::string shownEntry(const std::string& entry);
 
 } // namespace Bluetooth
