@@ -30,7 +30,7 @@ namespace Bluetooth {
 namespace {
 
 constexpr mode_t folderMode = 0755;
-constexpr mode_t fileMode = 0666;
+constexpr mode_t fileMode = 0664; // less the umask, and never for everybody
 
 /// @return false, logged for the caller, when an argument is null
 bool isGiven(LogPlace place, const char* argument, const char* name) {
