@@ -276,9 +276,13 @@ TEST_F(AutoConnectFileTest, AReplacedFileKeepsItsOwnerItsModeAndTheLinkToIt) {
                   std::tuple(old.st_mode, old.st_uid, old.st_gid));
     };
     if (isRoot) { // who may write the file, and nothing beside it
-        ASSERT_EQ(seteuid(1234), 0);
-        EXPECT_TRUE(config.set(adapter, true, ",B"));
-        ASSERT_EQ(seteuid(0), 0);
+        std::filesystem::create_hard_link(file, "/etc/other-name");
+        for (const bool hasOneName : {false, true}) {
+            ASSERT_EQ(seteuid(1234), 0);
+            EXPECT_EQ(config.set(adapter, true, ",B"), hasOneName);
+            ASSERT_EQ(seteuid(0), 0);
+            std::filesystem::remove("/etc/other-name");
+        }
         expectKept("1,B", false);
     }
     EXPECT_TRUE(config.set(adapter, true, ",C")) << "a link is no lock";
@@ -290,6 +294,10 @@ TEST_F(AutoConnectFileTest, AReplacedFileKeepsItsOwnerItsModeAndTheLinkToIt) {
     std::filesystem::create_symlink("../list", file);
     EXPECT_TRUE(config.removeDevice(adapter, "C"));
     expectKept("1", true);
+    if (isRoot) {
+        ASSERT_EQ(lchown(file.c_str(), 1234, 1234), 0);
+        EXPECT_FALSE(config.set(adapter, true, ",D")) << "another user chose the file";
+    }
     EXPECT_EQ(readFile("/etc/bluetooth/list"), "1");
     struct stat status {};
     ASSERT_EQ(lstat(lock.c_str(), &status), 0);
@@ -320,9 +328,12 @@ TEST_F(AutoConnectFileTest, AProcessThatIsKilledWhileItChangesAListLosesNothing)
         const std::string left = content();
         EXPECT_TRUE(left == list || left == longer) << left;
     }
+    for (const auto& entry : std::filesystem::directory_iterator(configFolder))
+        last_write_time(entry, entry.last_write_time() - std::chrono::seconds(11));
+    writeFile(std::string(configFolder) + ".tmp-" + adapter + "-1", "may be being written");
     EXPECT_TRUE(config.set(adapter, false, ""));
-    EXPECT_EQ(std::distance(std::filesystem::directory_iterator(configFolder), {}), 2)
-        << "the list and its lock";
+    EXPECT_EQ(std::distance(std::filesystem::directory_iterator(configFolder), {}), 3)
+        << "that, the list and its lock";
 }
 
 TEST_F(AutoConnectFileTest, AHugeFileIsNotReadAndKept) {
