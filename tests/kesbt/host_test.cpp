@@ -75,9 +75,21 @@ TEST_F(HostVerbs, AFileThatCannotBeUsedIsAFailureAndStays) {
 }
 
 TEST_F(HostVerbs, CommandsNeedTheAutoConnectDaemonAndItsPipe) {
-    for (const char* verb : {"reload", "pause", "resume"})
+    const auto expectNoDaemon = [this](const char* verb) {
         EXPECT_EQ(failure("autoconnect "s + verb),
                   "no auto-connect daemon takes commands; start it: kesbt-autoconnectd\n");
+    };
+    expectNoDaemon("reload");
+    EXPECT_FALSE(std::filesystem::exists(commandPipe)) << "any user could read it";
+    {
+        const PipeReader daemon(commandPipe);
+        std::filesystem::permissions(commandPipe, std::filesystem::perms(0644));
+        expectNoDaemon("pause");
+        std::filesystem::permissions(commandPipe, std::filesystem::perms(0600));
+    }
+    const int reader = open(commandPipe, O_RDONLY | O_NONBLOCK);
+    expectNoDaemon("resume"); // it holds no lock
+    close(reader);
     const PipeReader daemon(commandPipe);
     EXPECT_EQ(run("autoconnect pause").status, 0);
     EXPECT_EQ(daemon.take(), "pause");

@@ -7,6 +7,7 @@
 #include <gtest/gtest.h>
 
 #include <fcntl.h>
+#include <sys/file.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -46,12 +47,13 @@ inline std::string inAutoConnect(const std::string& message) {
     return "auto_connect.cpp " + message;
 }
 
-/// A daemon's end of a pipe, which does not wait for a writer.
+/// A daemon's end of a pipe, which is locked and does not wait for a writer.
 class PipeReader {
 public:
     explicit PipeReader(const char* pipe, int access = O_RDONLY) {
         mkfifo(pipe, 0600);
         m_descriptor = open(pipe, access | O_NONBLOCK | O_CLOEXEC);
+        flock(m_descriptor, LOCK_EX | LOCK_NB);
     }
     ~PipeReader() { close(m_descriptor); }
     PipeReader(const PipeReader&) = delete;

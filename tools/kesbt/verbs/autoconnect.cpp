@@ -1,5 +1,6 @@
 // SPDX-License-Identifier: LGPL-2.1-or-later
 #include "daemon/autoconnect_list.h"
+#include "daemon/autoconnect_pipe.h"
 #include "daemon/objects.h"
 #include "show/text.h"
 #include "verbs/list.h"
@@ -7,11 +8,7 @@
 #include <bluetooth/adapter_list.h>
 #include <bluetooth/auto_connect.h>
 
-#include <sys/stat.h>
-#include <unistd.h>
-
 #include <algorithm>
-#include <cerrno>
 #include <cstring>
 #include <iostream>
 
@@ -140,32 +137,10 @@ void listTargets(const Options& options) {
     printDevices(options, *devices);
 }
 
-/// Why the auto-connect daemon was sent nothing.
-Failure notSent(int reason) {
-    constexpr char pipe[] = "/tmp/kes_bluetooth_autoconnect";
-    const std::string restart = "start the auto-connect daemon again: kesbt-autoconnectd";
-    if (reason == ENXIO || reason == EPIPE)
-        return Failure("no auto-connect daemon takes commands; start it: kesbt-autoconnectd");
-    if (reason == EAGAIN)
-        return Failure("the auto-connect daemon does not read its commands; stop it, then " +
-                       restart);
-    struct stat status {};
-    const bool isPipe = lstat(pipe, &status) == 0 && S_ISFIFO(status.st_mode) &&
-                        (status.st_uid == 0 || status.st_uid == geteuid());
-    if (isPipe && reason == EACCES)
-        return Failure("no permission to command the auto-connect daemon; run it as root");
-    if (!isPipe)
-        return Failure(std::string(pipe) +
-                       " is not the auto-connect daemon's pipe; remove it and " + restart);
-    return Failure(std::string("cannot use ") + pipe + ": " + std::strerror(reason) + "; " +
-                   restart);
-}
-
 Build command(const char* name, bool (AutoConnect::*send)() const) {
     return [name, send](const Syntax& syntax) {
         return [name, send, &options = syntax.options] {
-            if (!(AutoConnect().*send)())
-                throw notSent(errno);
+            sendToDaemon(send);
             if (options.json)
                 printDocument({{"command", name}, {"sent", true}});
             else
