@@ -47,7 +47,10 @@ TEST_F(HostVerbs, TheListIsChangedEntryByEntryAndTheFlagStays) {
 
     setContent("1," + receiver + "\n"); // written with an editor
     run("autoconnect add "s + headset);
-    EXPECT_EQ(readFile(file), "1," + receiver + "," + headset);
+    EXPECT_EQ(readFile(file), "1," + receiver + "\n," + headset) << "it is part of the entry";
+    EXPECT_NE(run("autoconnect show").out.find(receiver + "\\n"), std::string::npos);
+    run("autoconnect remove "s + receiver);
+    EXPECT_EQ(readFile(file), "1,"s + headset);
     setContent("1," + receiver + ",");
     run("autoconnect add "s + mouse);
     EXPECT_EQ(readFile(file), "1," + receiver + "," + mouse);

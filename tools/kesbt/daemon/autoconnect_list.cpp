@@ -2,15 +2,12 @@
 #include "daemon/autoconnect_list.h"
 
 #include "show/failure.h"
-#include "show/text.h"
 
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include <algorithm>
 #include <cerrno>
 #include <cstring>
-#include <iostream>
 
 namespace Kesbt {
 
@@ -46,22 +43,11 @@ int writeError(const std::string& path) {
     return ENOENT;
 }
 
-/// Editors end files with a line break, which would be part of the last address.
-void dropLineBreak(AutoConnectList::List& list) {
-    if (list.devices.empty())
-        return;
-    std::string& last = list.devices.back();
-    last.erase(last.find_last_not_of("\r\n") + 1);
-    if (last.empty())
-        list.devices.pop_back();
-}
-
 } // namespace
 
 AutoConnectList::AutoConnectList(const std::string& adapter) : m_adapter(adapter) {
     if (!AutoConnect().readList(m_adapter.c_str(), m_list))
         throw unusable(path(), errno);
-    dropLineBreak(m_list);
 }
 
 std::string AutoConnectList::path() const {
@@ -76,21 +62,11 @@ void AutoConnectList::checkWritable() const {
 void AutoConnectList::change(const std::function<void(List&)>& change) {
     checkWritable();
     const auto changeText = [&](List& list) {
-        dropLineBreak(list);
         change(list);
         m_list = list;
     };
     if (!AutoConnect().changeList(m_adapter.c_str(), changeText))
         throw Failure("cannot write " + path() + "; look into the system log for the reason");
-}
-
-void nameRemoved(const AutoConnectList& before) {
-    const std::vector<std::string> left = AutoConnectList(before.adapter()).devices();
-    for (const std::string& device : before.devices()) {
-        if (std::find(left.begin(), left.end(), device) == left.end())
-            std::cerr << before.adapter() << " does not know " << quoted(device)
-                      << ", which has left its list; pair it and add it again\n";
-    }
 }
 
 } // namespace Kesbt

@@ -35,9 +35,6 @@ private:
     List m_list;
 };
 
-/// Names on standard error what has left the list since, as the adapter does not know it.
-void nameRemoved(const AutoConnectList& before);
-
 } // namespace Kesbt
 
 #endif

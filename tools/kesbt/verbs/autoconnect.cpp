@@ -31,6 +31,14 @@ auto isDevice(const std::string& device) {
     return [&device](const std::string& entry) { return upperCase(entry) == device; };
 }
 
+/// Whether an entry is meant to be one: an editor may have put a line end behind it, with which no
+/// adapter knows it.
+auto isMeantAs(const std::string& device) {
+    return [&device](const std::string& entry) {
+        return isDevice(device)(entry.substr(0, entry.find_last_not_of("\r\n") + 1));
+    };
+}
+
 void show(const Options& options, const AutoConnectList& list) {
     const Json document = {{"adapterAddress", list.adapter()},
                            {"file", list.path()},
@@ -70,6 +78,21 @@ bool isUnknown(const std::string& adapterAddress, const std::string& device) {
            std::strcmp(adapter->getErrorName(), "org.bluez.Error.DoesNotExist") == 0;
 }
 
+/// Names on standard error what has left the list since: mostly since the adapter does not know it,
+/// and another program may have changed it too.
+void nameRemoved(const AutoConnectList& before) {
+    const std::vector<std::string> left = AutoConnectList(before.adapter()).devices();
+    for (const std::string& device : before.devices()) {
+        if (std::find(left.begin(), left.end(), device) != left.end())
+            continue;
+        if (isUnknown(before.adapter(), device))
+            std::cerr << before.adapter() << " does not know " << quoted(device)
+                      << ", which has left its list; pair it and add it again\n";
+        else
+            std::cerr << quoted(device) << " has left the list of " << before.adapter() << '\n';
+    }
+}
+
 void addDevice(const Options& options, const std::string& device) {
     AutoConnectList list(adapterAddress(options));
     const bool leaves = isUnknown(list.adapter(), device);
@@ -87,7 +110,7 @@ void removeDevice(const Options& options, const std::string& device) {
     AutoConnectList list(adapterAddress(options));
     list.change([&](AutoConnectList::List& now) {
         auto& devices = now.devices;
-        const auto kept = std::remove_if(devices.begin(), devices.end(), isDevice(device));
+        const auto kept = std::remove_if(devices.begin(), devices.end(), isMeantAs(device));
         if (kept == devices.end())
             throw Failure(device + " is not in the list; see what is: kesbt autoconnect show");
         devices.erase(kept, devices.end());
