@@ -75,6 +75,15 @@ TEST_F(HostVerbs, AFileThatCannotBeUsedIsAFailureAndStays) {
         EXPECT_EQ(failure("autoconnect "s + verb),
                   "cannot use " + file + ": Is a directory; make the file writable or remove it\n");
     EXPECT_TRUE(std::filesystem::is_directory(file));
+
+    std::filesystem::remove(file);
+    setContent("0"); // and another program that changes it hangs
+    const int lock = open((configFolder + ".lock"s).c_str(), O_RDWR | O_CREAT, 0600);
+    ASSERT_EQ(flock(lock, LOCK_EX), 0);
+    EXPECT_EQ(failure("autoconnect enable --timeout 0.2"),
+              "no answer within the time-out; try again or give a longer --timeout\n");
+    EXPECT_EQ(readFile(file), "0");
+    close(lock);
 }
 
 TEST_F(HostVerbs, CommandsNeedTheAutoConnectDaemonAndItsPipe) {

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: LGPL-2.1-or-later
 #include "daemon/autoconnect_list.h"
 
+#include "command/limit.h"
 #include "show/failure.h"
 
 #include <sys/stat.h>
@@ -65,7 +66,8 @@ void AutoConnectList::change(const std::function<void(List&)>& change) {
         change(list);
         m_list = list;
     };
-    if (!AutoConnect().changeList(m_adapter.c_str(), changeText))
+    // Another program's change may have to end first.
+    if (!withinLimit([&] { return AutoConnect().changeList(m_adapter.c_str(), changeText); }))
         throw Failure("cannot write " + path() + "; look into the system log for the reason");
 }
 
