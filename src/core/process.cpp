@@ -7,14 +7,21 @@
 #include <poll.h>
 #include <signal.h>
 #include <spawn.h>
+#include <sys/syscall.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <algorithm>
+#include <array>
 #include <cerrno>
+#include <mutex>
+#include <optional>
 
 namespace Bluetooth {
 
 namespace {
+
+using Clock = std::chrono::steady_clock;
 
 /// What the new process does to itself before it becomes the program.
 class SpawnSetup {
@@ -56,6 +63,50 @@ private:
     posix_spawnattr_t m_attributes{};
 };
 
+/// Processes, as descriptors, that were killed and are there still: a broken device may hold one in
+/// a call that nothing ends. Where there are more, they stay as zombies.
+std::mutex keptLock;
+std::array<std::optional<int>, 16> kept;
+
+bool isReaped(int process) {
+    siginfo_t info{};
+    return waitid(P_PIDFD, static_cast<id_t>(process), &info, WEXITED | WNOHANG) != 0 ||
+           info.si_pid != 0;
+}
+
+/// By descriptors, since the numbers may be other processes' where the program waits for all.
+void reapKept() {
+    const std::lock_guard guard(keptLock);
+    for (std::optional<int>& process : kept) {
+        if (process && isReaped(*process)) {
+            close(*process);
+            process.reset();
+        }
+    }
+}
+
+void keep(int process) {
+    const std::lock_guard guard(keptLock);
+    const auto place = std::find(kept.begin(), kept.end(), std::nullopt);
+    if (place != kept.end())
+        *place = process;
+    else
+        close(process);
+}
+
+/// @return 1 when there is something to read, or an end; 0 when the time is over; -1 with errno set
+int awaitInput(int descriptor, Clock::time_point end) {
+    for (;;) {
+        const auto left = std::chrono::duration_cast<std::chrono::milliseconds>(end - Clock::now());
+        if (left.count() <= 0)
+            return 0;
+        pollfd input{descriptor, POLLIN, 0};
+        const int ready = poll(&input, 1, static_cast<int>(left.count()));
+        if (ready > 0 || (ready < 0 && errno != EINTR))
+            return ready;
+    }
+}
+
 /// @return the process, or -1 with errno set
 pid_t start(const char* program, const std::vector<std::string>& arguments, int output) {
     if (!program) {
@@ -68,6 +119,7 @@ pid_t start(const char* program, const std::vector<std::string>& arguments, int 
     argv.push_back(nullptr);
 
     const SpawnSetup setup(output);
+    reapKept();
     pid_t pid = -1;
     const int error =
         posix_spawn(&pid, program, setup.actions(), setup.attributes(), argv.data(), environ);
@@ -87,6 +139,22 @@ int waitFor(pid_t pid) {
     return status;
 }
 
+/// Kills a process; one that does not end then is left to a later reapKept().
+void endProcess(pid_t pid) {
+    constexpr std::chrono::seconds patience{1};
+    kill(pid, SIGKILL);
+    const int process = static_cast<int>(syscall(SYS_pidfd_open, pid, 0));
+    if (process < 0) { // an old system, or one that does not permit it
+        waitFor(pid);
+        return;
+    }
+    awaitInput(process, Clock::now() + patience);
+    if (isReaped(process))
+        close(process);
+    else
+        keep(process);
+}
+
 } // namespace
 
 ProcessReader::ProcessReader(int output, std::chrono::milliseconds limit)
@@ -98,19 +166,9 @@ ProcessReader::ProcessReader(int output, std::chrono::milliseconds limit)
 
 ssize_t ProcessReader::read(void* reader, char* buffer, size_t size) {
     auto& self = *static_cast<ProcessReader*>(reader);
-    for (;;) {
-        const auto left = std::chrono::duration_cast<std::chrono::milliseconds>(
-            self.m_end - std::chrono::steady_clock::now());
-        self.m_isOverdue = left.count() <= 0;
-        if (self.m_isOverdue)
-            return 0;
-        pollfd output{self.m_output.number(), POLLIN, 0};
-        const int ready = poll(&output, 1, static_cast<int>(left.count()));
-        if (ready > 0)
-            return ::read(output.fd, buffer, size);
-        if (ready < 0 && errno != EINTR)
-            return -1;
-    }
+    const int ready = awaitInput(self.m_output.number(), self.m_end);
+    self.m_isOverdue = ready == 0;
+    return ready > 0 ? ::read(self.m_output.number(), buffer, size) : ready;
 }
 
 // Each thing gets its owner before the next step, which may run out of memory.
@@ -138,8 +196,7 @@ ProcessReader::~ProcessReader() {
         static_cast<void>(fclose(m_stream)); // only read from
     if (m_pid < 0 || waitpid(m_pid, nullptr, WNOHANG) != 0)
         return; // nothing to end
-    kill(m_pid, SIGKILL);
-    waitFor(m_pid);
+    endProcess(m_pid);
 }
 
 int runProcess(const char* program, const std::vector<std::string>& arguments) {

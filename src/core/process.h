@@ -33,7 +33,8 @@ public:
     ProcessReader(const ProcessReader&) = delete;
     ProcessReader& operator=(const ProcessReader&) = delete;
 
-    /// Closes the stream, and ends the program where it still runs: nobody reads it any more.
+    /// Closes the stream, and ends the program where it still runs: nobody reads it any more. Waits
+    /// for its end for at most 1 s; after that a later start of a program clears it away.
     ~ProcessReader();
 
     /// What the program writes within its time. Closed by the destructor.

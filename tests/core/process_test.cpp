@@ -7,6 +7,7 @@
 
 #include <fcntl.h>
 #include <signal.h>
+#include <sys/ptrace.h>
 #include <sys/time.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -72,10 +73,63 @@ TEST_F(ProcessTest, TheStatusIsTheProgramsOwnDespiteInterruptions) {
     setitimer(ITIMER_REAL, &never, nullptr);
 }
 
+TEST_F(ProcessTest, AProgramThatCannotBeStartedIsSeen) {
+    for (const auto& [program, error] :
+         {std::pair("/nowhere/hciconfig", ENOENT), std::pair("/etc/passwd", EACCES),
+          std::pair("/", EACCES), std::pair(static_cast<const char*>(nullptr), EINVAL)}) {
+        errno = 0;
+        EXPECT_EQ(ProcessReader::open(program, {"-a"}, limit), nullptr);
+        EXPECT_EQ(errno, error) << program;
+        errno = 0;
+        EXPECT_EQ(runProcess(program, {}), -1);
+        EXPECT_EQ(errno, error) << program;
+    }
+}
+
+TEST_F(ProcessTest, TheStatusIsTheProgramsOwnDespiteInterruptions) {
+    // From now on system calls are interrupted all the time.
+    struct sigaction interrupting {};
+    interrupting.sa_handler = [](int) {};
+    sigaction(SIGALRM, &interrupting, nullptr);
+    const itimerval often{{0, 1000}, {0, 1000}};
+    const itimerval never{};
+    setitimer(ITIMER_REAL, &often, nullptr);
+    EXPECT_EQ(statusOf("sleep 0.1; exit 7"), W_EXITCODE(7, 0));
+    EXPECT_EQ(statusOf("kill -9 $$"), W_EXITCODE(0, SIGKILL));
+    setitimer(ITIMER_REAL, &never, nullptr);
+}
+
 TEST_F(ProcessTest, ClosingEarlyEndsAProgramThatGoesOnWriting) {
     const auto reader = ProcessReader::open("/usr/bin/yes", {}, limit);
     ASSERT_NE(reader, nullptr);
     EXPECT_EQ(fgetc(reader->stream()), 'y');
+}
+
+TEST_F(ProcessTest, AProgramThatCannotBeClearedAwayHoldsNobodyAndIsLater) {
+    auto reader = ProcessReader::open("/bin/sh", {"-c", "echo $$; exec sleep 1000"}, limit);
+    int program = 0;
+    ASSERT_EQ(fscanf(reader->stream(), "%d", &program), 1);
+    int ends[2];
+    ASSERT_EQ(pipe(ends), 0);
+    const pid_t debugger = fork(); // what is debugged does not go before the debugger has seen it
+    if (debugger == 0) {
+        const bool isHeld = ptrace(PTRACE_SEIZE, program, nullptr, nullptr) == 0;
+        EXPECT_EQ(write(ends[1], isHeld ? "y" : "n", 1), 1);
+        for (;;)
+            pause();
+    }
+    char isHeld = 0;
+    EXPECT_EQ(read(ends[0], &isHeld, 1), 1);
+    reader.reset();
+    EXPECT_EQ(kill(program, 0) == 0, isHeld == 'y');
+    kill(debugger, SIGKILL);
+    EXPECT_EQ(waitpid(debugger, nullptr, 0), debugger);
+    EXPECT_EQ(statusOf("exit 0"), 0);
+    EXPECT_EQ(kill(program, 0), -1);
+    close(ends[0]);
+    close(ends[1]);
+    if (isHeld != 'y')
+        GTEST_SKIP() << "the system permits no debugger";
 }
 
 TEST_F(ProcessTest, TheProgramInheritsOutputsOnlyAndNoSignalSettings) {
