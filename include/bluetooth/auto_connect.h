@@ -25,8 +25,9 @@ namespace Bluetooth {
 ///
 /// A change is done as one step: of a process that ends or a machine that fails meanwhile, the old
 /// or the new list is left, whole, and readers find one of these. The file's owner and mode stay;
-/// of a symbolic link, the file that it points to is replaced. Where the folder takes no new file,
-/// the file is written in place, without that promise.
+/// of a symbolic link, the file that it points to is replaced, unless the link is another user's
+/// than root's or the caller's. Where the folder takes no new file, the file is written in place,
+/// without that promise, if it has no other name.
 ///
 /// The auto-connect daemon reads the same files and takes commands from the pipe
 /// /tmp/kes_bluetooth_autoconnect.

@@ -26,8 +26,9 @@ enum GetNameTimeout : int {
 /// The lock lasts as long as the descriptor, normally as long as the process; the file stays.
 /// It is a record lock: it belongs to the process (a second call of the same process succeeds),
 /// is not inherited by fork(), and ends when the process closes any descriptor of the file.
-/// @param path         the file; its folder must exist. A symbolic link is refused: what it points
-///                     to would be emptied.
+/// @param path         the file; its folder must exist. A symbolic link and a file
+///                     that has another name (EMLINK) are refused: another program's file would be
+///                     emptied.
 /// @param flags        bit 0 (value 1) makes the descriptor close-on-exec; others are ignored
 /// @param reportLocked whether to log that another process holds the lock
 /// @return the open descriptor; -1 on failure (logged) with errno set, EAGAIN or EACCES when
