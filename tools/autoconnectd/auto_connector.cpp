@@ -9,6 +9,7 @@
 
 #include <algorithm>
 #include <cstring>
+#include <iterator>
 #include <set>
 #include <string>
 #include <utility>
@@ -79,8 +80,23 @@ void AutoConnector::handle(News news) {
 }
 
 void AutoConnector::hurryAll() {
+    m_tried.clear();
     for (const auto& target : m_targets)
         target->hurry();
+}
+
+void AutoConnector::remember(const Target& dropped) {
+    if (dropped.tried() == Clock::time_point{})
+        return;
+    Clock::time_point& tried = m_tried[dropped.address()];
+    tried = std::max(tried, dropped.tried());
+}
+
+void AutoConnector::forgetOldAttempts() {
+    for (auto attempt = m_tried.begin(); attempt != m_tried.end();) {
+        const bool isOld = attempt->second + m_pace.first <= Clock::now();
+        attempt = isOld ? m_tried.erase(attempt) : std::next(attempt);
+    }
 }
 
 /// Asked first, since every call to a daemon that is absent is logged as a failure.
@@ -119,17 +135,24 @@ std::unique_ptr<Target> AutoConnector::takeOrCreate(Bluetooth::Device& device) {
             return std::move(target);
     }
     auto target = Target::create(device, m_pace);
-    if (target)
-        syslog(LOG_INFO, "watching %s", target->address().c_str());
-    else
+    if (!target) {
         syslog(LOG_WARNING, "%s offers no audio; it is not connected", device.getPath());
+        return nullptr;
+    }
+    syslog(LOG_INFO, "watching %s", target->address().c_str());
+    const auto attempt = m_tried.find(target->address());
+    if (attempt != m_tried.end())
+        target->wasTried(attempt->second);
     return target;
 }
 
 void AutoConnector::reload() {
     m_reloadDue = false;
     m_reloaded = Clock::now();
+    forgetOldAttempts();
     if (!hasDaemon()) {
+        for (const auto& target : m_targets)
+            remember(*target);
         m_targets.clear();
         m_adapters.reset();
         retryLater();
@@ -150,8 +173,11 @@ void AutoConnector::reload() {
             targets.push_back(std::move(target));
     }
     for (const auto& target : m_targets) {
-        if (target) // no longer listed, or its adapter was switched off: log what became of it
-            target->check(Clock::now(), false);
+        if (!target)
+            continue;
+        // No longer listed, or its adapter was switched off: log what became of it.
+        target->check(Clock::now(), false);
+        remember(*target);
     }
     m_targets = std::move(targets);
 }
@@ -160,9 +186,13 @@ void AutoConnector::work() {
     const Clock::time_point now = Clock::now();
     if (m_reloadDue ? now >= m_reloadAt : !hasDaemon())
         reload();
-    const auto lost = std::remove_if(
-        m_targets.begin(), m_targets.end(),
-        [&](const std::unique_ptr<Target>& target) { return !target->check(now, !m_paused); });
+    const auto lost = std::remove_if(m_targets.begin(), m_targets.end(),
+                                     [&](const std::unique_ptr<Target>& target) {
+                                         if (target->check(now, !m_paused))
+                                             return false;
+                                         remember(*target);
+                                         return true;
+                                     });
     if (lost == m_targets.end()) {
         if (!m_reloadDue)
             m_retryDelay = m_pace.first;

@@ -10,7 +10,9 @@
 #include <bluetooth/auto_connect.h>
 #include <bluetooth/manager.h>
 
+#include <map>
 #include <memory>
+#include <string>
 #include <vector>
 
 namespace AutoConnectd {
@@ -45,6 +47,8 @@ private:
     bool hasDaemon();
     void watchAdapters();
     void hurryAll();
+    void remember(const Target& dropped);
+    void forgetOldAttempts();
     void reloadAt(Clock::time_point when);
     void retryLater();
     std::unique_ptr<Target> takeOrCreate(Bluetooth::Device& device);
@@ -61,6 +65,9 @@ private:
     std::chrono::seconds m_retryDelay;
     std::unique_ptr<Bluetooth::AdapterList> m_adapters;
     std::vector<std::unique_ptr<Target>> m_targets;
+    // The last attempt at devices whose target was dropped, by address, for as long as an interval:
+    // their adapter was switched off, say, and may be on again in no time.
+    std::map<std::string, Clock::time_point> m_tried;
 };
 
 } // namespace AutoConnectd

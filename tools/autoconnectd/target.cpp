@@ -65,6 +65,11 @@ std::unique_ptr<Target> Target::create(Bluetooth::Device& device, Pace pace) {
     return target->queryConnected(connected) ? std::move(target) : nullptr;
 }
 
+void Target::wasTried(Clock::time_point when) {
+    m_tried = when;
+    m_due = when + m_pace.first;
+}
+
 bool Target::queryConnected(bool& connected) {
     if (m_sink)
         return m_sink->isConnected(connected) == 0;

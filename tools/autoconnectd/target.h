@@ -33,6 +33,11 @@ public:
     const std::string& path() const { return m_path; }
     const std::string& address() const { return m_address; }
 
+    /// Reckons with an attempt that was made before this target was there.
+    void wasTried(Clock::time_point when);
+    /// The last attempt; the clock's zero when there was none.
+    Clock::time_point tried() const { return m_tried; }
+
     /// Asks the daemon for the state, logs a change, and connects when the device is away, an
     /// attempt is due and `mayConnect` is set.
     /// @return false when the daemon does not know the device any more
