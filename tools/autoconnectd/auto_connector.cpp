@@ -52,10 +52,19 @@ bool AutoConnector::start() {
     return m_loopRuns;
 }
 
-void AutoConnector::handle(Command command) {
+void AutoConnector::handle(const std::vector<Command>& commands) {
+    // Whoever changes a list asks for a reload, the pruning in reload() too: nobody has asked for
+    // attempts then. What it wrote is in the pipe by the time it is done.
+    const bool mayHurry = !std::exchange(m_hasPruned, false);
+    for (const Command command : commands)
+        handle(command, mayHurry);
+}
+
+void AutoConnector::handle(Command command, bool mayHurry) {
     switch (command) {
     case Command::Reload:
-        hurryAll();
+        if (mayHurry)
+            hurryAll();
         reload();
         break;
     case Command::Pause:
@@ -119,6 +128,22 @@ void AutoConnector::watchAdapters() {
     }
 }
 
+/// The entries of the adapters' files, known devices or not.
+std::size_t AutoConnector::countEntries() const {
+    std::size_t count = 0;
+    if (!m_adapters)
+        return count;
+    for (Bluetooth::Adapter* adapter : *m_adapters) {
+        const std::unique_ptr<Bluetooth::Dict> properties(adapter ? adapter->getProperties()
+                                                                  : nullptr);
+        const std::string address = Bluetooth::find(properties.get(), "Address");
+        Bluetooth::AutoConnect::List list;
+        if (!address.empty() && m_files.readList(address.c_str(), list))
+            count += list.devices.size();
+    }
+    return count;
+}
+
 void AutoConnector::reloadAt(Clock::time_point when) {
     m_reloadAt = m_reloadDue ? std::min(m_reloadAt, when) : when;
     m_reloadDue = true;
@@ -160,11 +185,13 @@ void AutoConnector::reload() {
     }
     // Watched before the files are read: an adapter that is switched on meanwhile is not missed.
     watchAdapters();
+    const std::size_t entries = countEntries();
     const std::unique_ptr<Bluetooth::DeviceList> devices(m_files.getAutoConnectDeviceList());
     if (!devices) {
         retryLater();
         return;
     }
+    m_hasPruned |= devices->size() < entries && countEntries() < entries;
     std::vector<std::unique_ptr<Target>> targets;
     std::set<std::string> paths; // an entry may stand twice in a file
     for (Bluetooth::Device* device : *devices) {

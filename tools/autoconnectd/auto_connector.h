@@ -35,7 +35,8 @@ public:
     /// Whether the connection to the system bus still stands. It does not come back.
     bool hasBus() const;
 
-    void handle(Command command);
+    /// @param commands all that have come since the last call
+    void handle(const std::vector<Command>& commands);
     void handle(News news);
     /// Reads the files again. A device that is still listed keeps its pace.
     void reload();
@@ -46,6 +47,8 @@ public:
 private:
     bool hasDaemon();
     void watchAdapters();
+    void handle(Command command, bool mayHurry);
+    std::size_t countEntries() const;
     void hurryAll();
     void remember(const Target& dropped);
     void forgetOldAttempts();
@@ -60,6 +63,7 @@ private:
     bool m_paused = false;
     bool m_daemonMissed = false;
     bool m_reloadDue = false;
+    bool m_hasPruned = false;
     Clock::time_point m_reloadAt{};
     Clock::time_point m_reloaded{};
     std::chrono::seconds m_retryDelay;

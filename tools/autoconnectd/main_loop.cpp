@@ -52,8 +52,7 @@ int MainLoop::run() {
         wait();
         const std::vector<Command> commands = m_pipe->read();
         m_pipe->unknown().log(Clock::now());
-        for (const Command command : commands)
-            m_connector.handle(command);
+        m_connector.handle(commands);
         m_connector.handle(takeNews());
         renewPipe(Clock::now());
         if (!m_connector.hasBus()) {
