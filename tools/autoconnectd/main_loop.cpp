@@ -19,8 +19,12 @@ constexpr std::chrono::seconds renewalPause{10};
 
 /// Once the pipe was removed from its folder, commands come through a new one.
 void MainLoop::renewPipe(Clock::time_point now) {
+    if (m_pipe->isCurrent()) { // maybe again: what stood in its place has gone
+        m_renewalDue = Clock::time_point::max();
+        return;
+    }
     const bool isAgain = m_renewalDue != Clock::time_point::max();
-    if (m_pipe->isCurrent() || (isAgain && now < m_renewalDue))
+    if (isAgain && now < m_renewalDue)
         return;
     std::string problem;
     auto next = CommandPipe::open(m_pipe->path(), problem);
