@@ -20,11 +20,14 @@ std::string answerOf(DBusMessage* reply) {
 }
 
 std::string shorten(std::string text) {
-    for (const auto& [noise, name] : {std::pair("/org/bluez/[0-9]+/", ""),
-                                      {"(hci0/)?dev_00_11_22_33_44_55", "device"},
-                                      {"org\\.bluez\\.Error\\.", ""},
-                                      {"PropertyChanged s:(\\w+) v\\((.*)\\)$", "$1=$2"}})
-        text = std::regex_replace(text, std::regex(noise), name);
+    // Made once: the C++ library's making of them is not safe in two threads at a time.
+    static const std::pair<std::regex, const char*> replacements[] = {
+        {std::regex("/org/bluez/[0-9]+/"), ""},
+        {std::regex("(hci0/)?dev_00_11_22_33_44_55"), "device"},
+        {std::regex("org\\.bluez\\.Error\\."), ""},
+        {std::regex("PropertyChanged s:(\\w+) v\\((.*)\\)$"), "$1=$2"}};
+    for (const auto& [noise, name] : replacements)
+        text = std::regex_replace(text, noise, name);
     return text;
 }
 
