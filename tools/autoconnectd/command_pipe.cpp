@@ -27,6 +27,29 @@ bool isPipeOfThisUser(const struct stat& status) {
     return S_ISFIFO(status.st_mode) && status.st_uid == geteuid();
 }
 
+/// A pipe that others could open is not taken over: they may have it open still, and locked.
+bool mayTakeOver(const struct stat& status) {
+    return isPipeOfThisUser(status) && (status.st_mode & permissionBits) == pipeMode;
+}
+
+/// What is not the daemon's is not opened, not even for a moment: what is written to a pipe just
+/// then would be lost, and its sender not told.
+/// @return -1 when it is not the daemon's, or cannot be opened
+int openOwn(const char* path, bool isNew) {
+    const int place = open(path, O_PATH | O_NOFOLLOW | O_CLOEXEC);
+    if (place < 0)
+        return -1;
+    struct stat status {};
+    int pipe = -1;
+    if (fstat(place, &status) == 0 && (isNew ? isPipeOfThisUser(status) : mayTakeOver(status)))
+        pipe = open(("/proc/self/fd/" + std::to_string(place)).c_str(),
+                    O_RDWR | O_NONBLOCK | O_CLOEXEC);
+    close(place);
+    if (pipe >= 0)
+        fchmod(pipe, pipeMode); // whatever the umask has left of it
+    return pipe;
+}
+
 /// A folder with something in it is not for us to remove.
 bool setAside(const char* folder) {
     std::string aside = std::string(folder) + ".XXXXXX";
@@ -40,7 +63,8 @@ bool setAside(const char* folder) {
     return false;
 }
 
-/// Takes away what stands in the place of the pipe. @return false with errno set
+/// Takes away what stands in the place of the pipe, except for a pipe that has been made there
+/// meanwhile by a daemon that starts at the same time. @return false with errno set
 bool clearPlace(const char* path) {
     struct stat status {};
     if (lstat(path, &status) != 0)
@@ -49,7 +73,8 @@ bool clearPlace(const char* path) {
         errno = EPERM;
         return false;
     }
-    return std::remove(path) == 0 || errno == ENOENT || (errno == ENOTEMPTY && setAside(path));
+    return mayTakeOver(status) || std::remove(path) == 0 || errno == ENOENT ||
+           (errno == ENOTEMPTY && setAside(path));
 }
 
 } // namespace
@@ -61,9 +86,8 @@ std::unique_ptr<CommandPipe> CommandPipe::open(const std::string& path, std::str
             problem = "cannot create the pipe " + path + ": " + strerror(errno);
             return nullptr;
         }
-        std::unique_ptr<CommandPipe> pipe(new CommandPipe(
-            path, ::open(path.c_str(), O_RDWR | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC)));
-        if (!pipe->isOwn(isNew)) {
+        std::unique_ptr<CommandPipe> pipe(new CommandPipe(path, openOwn(path.c_str(), isNew)));
+        if (pipe->m_descriptor < 0) {
             if (clearPlace(path.c_str()))
                 continue;
             problem = "cannot replace " + path +
@@ -79,7 +103,8 @@ std::unique_ptr<CommandPipe> CommandPipe::open(const std::string& path, std::str
         if (pipe->isCurrent())
             return pipe;
     }
-    problem = path + " is replaced again and again; find out by whom, and start again";
+    problem = path + " cannot be opened, or is replaced again and again; find out by whom, and "
+                     "start again";
     return nullptr;
 }
 
@@ -88,14 +113,6 @@ CommandPipe::~CommandPipe() {
         if (descriptor >= 0)
             close(descriptor);
     }
-}
-
-/// A pipe that others could open is not taken over: they may have it open still, and locked.
-bool CommandPipe::isOwn(bool isNew) const {
-    struct stat status {};
-    return m_descriptor >= 0 && fstat(m_descriptor, &status) == 0 && isPipeOfThisUser(status) &&
-           (isNew || (status.st_mode & permissionBits) == pipeMode) &&
-           fchmod(m_descriptor, pipeMode) == 0; // whatever the umask has left of it
 }
 
 /// The pipe is watched, not its folder, where others come and go all the time. Without a watch the

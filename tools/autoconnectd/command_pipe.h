@@ -45,7 +45,6 @@ public:
 private:
     CommandPipe(const std::string& path, int descriptor) : m_path(path), m_descriptor(descriptor) {}
 
-    bool isOwn(bool isNew) const;
     void watch();
 
     std::string m_path;
