@@ -17,6 +17,12 @@ namespace {
 constexpr std::chrono::seconds renewalPause{10};
 }
 
+void MainLoop::handleCommands() {
+    const std::vector<Command> commands = m_pipe->read();
+    m_pipe->unknown().log(Clock::now());
+    m_connector.handle(commands);
+}
+
 /// Once the pipe was removed from its folder, commands come through a new one.
 void MainLoop::renewPipe(Clock::time_point now) {
     if (m_pipe->isCurrent()) { // maybe again: what stood in its place has gone
@@ -29,10 +35,12 @@ void MainLoop::renewPipe(Clock::time_point now) {
     std::string problem;
     auto next = CommandPipe::open(m_pipe->path(), problem);
     m_renewalDue = next ? Clock::time_point::max() : now + renewalPause;
-    if (next)
+    if (next) {
+        handleCommands(); // the last that came through the old one
         m_pipe = std::move(next);
-    else if (!isAgain)
+    } else if (!isAgain) {
         syslog(LOG_ERR, "%s", problem.c_str());
+    }
 }
 
 Clock::time_point MainLoop::nextDue() const {
@@ -54,9 +62,7 @@ int MainLoop::run() {
     while (!Tools::stopRequested()) {
         m_connector.work();
         wait();
-        const std::vector<Command> commands = m_pipe->read();
-        m_pipe->unknown().log(Clock::now());
-        m_connector.handle(commands);
+        handleCommands();
         m_connector.handle(takeNews());
         renewPipe(Clock::now());
         if (!m_connector.hasBus()) {

@@ -22,6 +22,7 @@ public:
 private:
     Clock::time_point nextDue() const;
     void wait() const;
+    void handleCommands();
     void renewPipe(Clock::time_point now);
 
     AutoConnector& m_connector;
