@@ -304,14 +304,16 @@ TEST_F(AutoConnectDaemonTest, HoweverManySignalsComeADeviceIsTriedOncePerInterva
 TEST_F(AutoConnectDaemonTest, EndsInTimeWhateverHangs) {
     setConfig(adapter0, "1,"s + headset);
     for (const bool isTool : {true, false}) {
-        writeProgram("/usr/bin/hciconfig", isTool ? "touch /tmp/hangs; exec sleep 60" : "");
+        writeProgram("/usr/bin/hciconfig", isTool ? "echo $$ > /tmp/hangs; exec sleep 60" : "");
         simulation.process().signal(isTool ? SIGCONT : SIGSTOP);
         Daemon daemon;
         ASSERT_TRUE(daemon.waitFor("started"));
-        EXPECT_TRUE(!isTool || becomesTrue([] { return std::filesystem::exists("/tmp/hangs"); }));
+        EXPECT_TRUE(!isTool || becomesTrue([] { return !readFile("/tmp/hangs").empty(); }));
         const Moment start = Clock::now();
         EXPECT_EQ(daemon.stop(isTool ? SIGINT : SIGTERM), 0) << isTool;
         EXPECT_LT(Clock::now() - start, std::chrono::seconds(2)) << isTool;
+        const std::string tool = "/proc/" + std::to_string(std::stoi(readFile("/tmp/hangs")));
+        EXPECT_TRUE(becomesTrue([&] { return readFile(tool + "/cmdline").empty(); })) << "it stays";
     }
     simulation.process().signal(SIGCONT);
     EXPECT_TRUE(Daemon().waitFor(headsetConnected)) << "nothing is left locked";

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: LGPL-2.1-or-later
 #include "common/stop_request.h"
 
+#include <fcntl.h>
 #include <signal.h>
 #include <sys/eventfd.h>
 #include <time.h>
@@ -9,6 +10,7 @@
 #include <atomic>
 #include <cerrno>
 #include <cstdint>
+#include <cstdio>
 #include <cstdlib>
 #include <initializer_list>
 
@@ -22,6 +24,7 @@ static_assert(std::atomic<bool>::is_always_lock_free, "a signal handler sets it"
 std::atomic<bool> stopWanted{false};
 int eventDescriptor = -1;
 timer_t deadline{};
+char childrenFile[64]; // named before a signal comes
 
 void requestStop(int /*signal*/) {
     if (stopWanted.exchange(true))
@@ -33,7 +36,24 @@ void requestStop(int /*signal*/) {
     errno = error;
 }
 
+/// Ends the programs that the main thread has started: they would stay. Signal handlers may do so.
+void endChildren() {
+    const int list = open(childrenFile, O_RDONLY | O_CLOEXEC);
+    char text[1024] = {}; // more than it ever starts
+    const ssize_t length = list < 0 ? 0 : read(list, text, sizeof text);
+    pid_t child = 0;
+    for (ssize_t at = 0; at < length; ++at) {
+        if (text[at] >= '0' && text[at] <= '9') {
+            child = child * 10 + (text[at] - '0');
+        } else if (child > 0) { // each number is followed by a blank
+            kill(child, SIGKILL);
+            child = 0;
+        }
+    }
+}
+
 void endAtOnce(int /*signal*/) {
+    endChildren();
     _exit(EXIT_SUCCESS);
 }
 
@@ -54,6 +74,8 @@ bool stopOnSignals() {
     alarm.sigev_signo = SIGALRM;
     if (eventDescriptor < 0 || timer_create(CLOCK_MONOTONIC, &alarm, &deadline) != 0)
         return false;
+    const int process = getpid();
+    snprintf(childrenFile, sizeof childrenFile, "/proc/%d/task/%d/children", process, process);
     handle(SIGALRM, endAtOnce);
     handle(SIGTERM, requestStop);
     handle(SIGINT, requestStop);

@@ -7,8 +7,8 @@
 ///
 /// From the first of these signals the daemon has 1.5 s to stop what it began and to return from
 /// main(). Where a call blocks for longer, the process then ends by _exit(), with status 0: no
-/// destructor runs, and the system releases its locks, files and names on the buses. Further
-/// signals give no more time.
+/// destructor runs, and the system releases its locks, files and names on the buses. Programs that
+/// the main thread has started are killed before. Further signals give no more time.
 ///
 /// The deadline needs no loop, thread or lock of the program: it works while all of them hang.
 /// SIGALRM is taken for it. There is one for the process.
