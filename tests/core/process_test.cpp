@@ -73,38 +73,6 @@ TEST_F(ProcessTest, TheStatusIsTheProgramsOwnDespiteInterruptions) {
     setitimer(ITIMER_REAL, &never, nullptr);
 }
 
-TEST_F(ProcessTest, AProgramThatCannotBeStartedIsSeen) {
-    for (const auto& [program, error] :
-         {std::pair("/nowhere/hciconfig", ENOENT), std::pair("/etc/passwd", EACCES),
-          std::pair("/", EACCES), std::pair(static_cast<const char*>(nullptr), EINVAL)}) {
-        errno = 0;
-        EXPECT_EQ(ProcessReader::open(program, {"-a"}, limit), nullptr);
-        EXPECT_EQ(errno, error) << program;
-        errno = 0;
-        EXPECT_EQ(runProcess(program, {}), -1);
-        EXPECT_EQ(errno, error) << program;
-    }
-}
-
-TEST_F(ProcessTest, TheStatusIsTheProgramsOwnDespiteInterruptions) {
-    // From now on system calls are interrupted all the time.
-    struct sigaction interrupting {};
-    interrupting.sa_handler = [](int) {};
-    sigaction(SIGALRM, &interrupting, nullptr);
-    const itimerval often{{0, 1000}, {0, 1000}};
-    const itimerval never{};
-    setitimer(ITIMER_REAL, &often, nullptr);
-    EXPECT_EQ(statusOf("sleep 0.1; exit 7"), W_EXITCODE(7, 0));
-    EXPECT_EQ(statusOf("kill -9 $$"), W_EXITCODE(0, SIGKILL));
-    setitimer(ITIMER_REAL, &never, nullptr);
-}
-
-TEST_F(ProcessTest, ClosingEarlyEndsAProgramThatGoesOnWriting) {
-    const auto reader = ProcessReader::open("/usr/bin/yes", {}, limit);
-    ASSERT_NE(reader, nullptr);
-    EXPECT_EQ(fgetc(reader->stream()), 'y');
-}
-
 TEST_F(ProcessTest, AProgramThatCannotBeClearedAwayHoldsNobodyAndIsLater) {
     auto reader = ProcessReader::open("/bin/sh", {"-c", "echo $$; exec sleep 1000"}, limit);
     int program = 0;
