@@ -75,7 +75,8 @@ bool stopOnSignals() {
     if (eventDescriptor < 0 || timer_create(CLOCK_MONOTONIC, &alarm, &deadline) != 0)
         return false;
     const int process = getpid();
-    snprintf(childrenFile, sizeof childrenFile, "/proc/%d/task/%d/children", process, process);
+    static_cast<void>(
+        snprintf(childrenFile, sizeof childrenFile, "/proc/%d/task/%d/children", process, process));
     handle(SIGALRM, endAtOnce);
     handle(SIGTERM, requestStop);
     handle(SIGINT, requestStop);
