@@ -42,6 +42,11 @@ int main(int argc, char** argv) {
     if (!device)
         return fail("cannot reach the headset (" + adapter->getErrorMessage() + "); switch it on");
 
+    receiver = manager.get();
+    struct sigaction stop = {};
+    stop.sa_handler = [](int) { receiver->stopLoop(); };
+    sigaction(SIGINT, &stop, nullptr);
+
     Audio audio(device->getPath());
     AudioSink sink(device->getPath());
     if (audio.setPropertyChangedHandler(changed) != 0 ||
@@ -50,10 +55,6 @@ int main(int argc, char** argv) {
     // In steps: connect() would not wait for the daemon's reply. Changes are shown meanwhile.
     const bool connected = (audio.newMessage("Connect") == 0 && audio.sendMessage(true, -1) == 0) ||
                            std::string("org.bluez.Error.AlreadyConnected") == audio.getErrorName();
-    receiver = manager.get();
-    struct sigaction stop = {};
-    stop.sa_handler = [](int) { receiver->stopLoop(); };
-    sigaction(SIGINT, &stop, nullptr);
     if (!connected)
         manager->stopLoop();
     manager->waitLoop(); // until Ctrl-C
