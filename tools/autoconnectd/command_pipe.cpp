@@ -9,9 +9,11 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <chrono>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
+#include <thread>
 
 namespace AutoConnectd {
 
@@ -77,6 +79,16 @@ bool clearPlace(const char* path) {
            (errno == ENOTEMPTY && setAside(path));
 }
 
+/// kesbt finds out whether a daemon has the lock by taking it for a moment.
+bool lock(int pipe) {
+    for (int attempt = 1; flock(pipe, LOCK_EX | LOCK_NB) != 0; ++attempt) {
+        if (attempt == 10)
+            return false;
+        std::this_thread::sleep_for(std::chrono::milliseconds(10));
+    }
+    return true;
+}
+
 } // namespace
 
 std::unique_ptr<CommandPipe> CommandPipe::open(const std::string& path, std::string& problem) {
@@ -95,7 +107,7 @@ std::unique_ptr<CommandPipe> CommandPipe::open(const std::string& path, std::str
                       "; remove it and start again";
             return nullptr;
         }
-        if (flock(pipe->m_descriptor, LOCK_EX | LOCK_NB) != 0) {
+        if (!lock(pipe->m_descriptor)) {
             problem = "another kesbt-autoconnectd reads " + path + "; stop it first";
             return nullptr;
         }
