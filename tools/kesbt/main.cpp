@@ -2,6 +2,7 @@
 // kesbt: works with Bluetooth from the command line, through BlueZ 4's bluetoothd.
 
 #include "command/command_line.h"
+#include "common/standard_descriptors.h"
 #include "daemon/objects.h"
 #include "show/failure.h"
 #include "show/output.h"
@@ -11,25 +12,12 @@
 #include <bluetooth/connection.h>
 
 #include <dbus/dbus.h>
-#include <fcntl.h>
-#include <unistd.h>
 
 #include <iostream>
 
 namespace Kesbt {
 
 namespace {
-
-/// A closed standard descriptor would be taken by the next socket, and results be written there.
-void checkDescriptors() {
-    for (const int standard : {STDIN_FILENO, STDOUT_FILENO, STDERR_FILENO}) {
-        if (fcntl(standard, F_GETFD) >= 0)
-            continue;
-        const int opened = open("/dev/null", O_RDWR); // the lowest free one
-        if (standard == STDOUT_FILENO || opened < 0)
-            throw Failure("standard output is closed; give results somewhere to go");
-    }
-}
 
 void run(int argc, char** argv) {
 #define KESBT_ENTRY(name) &name##Verb,
@@ -47,7 +35,8 @@ int main(int argc, char** argv) {
     dbus_connection_set_change_sigpipe(false);
     Bluetooth::Connection::checkSenders(true); // any user of the machine can send signals
     try {
-        Kesbt::checkDescriptors();
+        if (!Tools::openStandardDescriptors())
+            throw Kesbt::Failure("standard output is closed; give results somewhere to go");
         Kesbt::run(argc, argv);
         return 0;
     } catch (const Kesbt::Failure& failure) {
