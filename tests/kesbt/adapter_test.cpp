@@ -70,6 +70,14 @@ TEST_F(AdapterVerbs, NamesFromOutsideCannotControlTheTerminal) {
                             "\u202f\u2065\n"),
               std::string::npos);
     EXPECT_EQ(adapterProperties()["Name"], name);
+    EXPECT_NE(runShell("script -qec '" KESBT " adapter --json' /dev/null")
+                  .out.find("\"a\\u001b[2J\\nb\xc3\xa9\\u009b\\u202a\\u202e\\u2066\\u2069"
+                            "\u202f\u2065\""),
+              std::string::npos);
+    // What is no UTF-8: alone, at the end, too long for what it is, beside what is.
+    EXPECT_NE(failure("devices --adapter \x9b[2J\xc0\x9b\xff\U0001f600\xe2\x80", 2)
+                  .find("\"\\x9b[2J\\xc0\\x9b\\xff\U0001f600\\xe2\\x80\""),
+              std::string::npos);
 }
 
 TEST_F(AdapterVerbs, ColoursAreForTerminalsOnlyAndNoColorEndsThem) {

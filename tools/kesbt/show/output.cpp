@@ -36,6 +36,12 @@ std::string displayProperty(const std::string& name, const Json& value) {
     return display(value);
 }
 
+/// JSON leaves most control characters to be written as they are.
+void printJson(const Json& json, int indent) {
+    const std::string text = json.dump(indent, ' ', false, Json::error_handler_t::replace);
+    std::cout << (isatty(STDOUT_FILENO) != 0 ? printableJson(text) : text) << '\n';
+}
+
 std::string formatTime(bool local, const char* format, const char* ending) {
     timeval now{};
     gettimeofday(&now, nullptr);
@@ -86,11 +92,11 @@ std::string field(const Json& properties, const char* name) {
 }
 
 void printDocument(const Json& document) {
-    std::cout << document.dump(2, ' ', false, Json::error_handler_t::replace) << '\n';
+    printJson(document, 2);
 }
 
 void printEvent(const Json& event) {
-    std::cout << event.dump(-1, ' ', false, Json::error_handler_t::replace) << '\n';
+    printJson(event, -1);
     flushOutput();
 }
 

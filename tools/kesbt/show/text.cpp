@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: LGPL-2.1-or-later
 #include "show/text.h"
 
+#include <glib.h>
+
 #include <algorithm>
 #include <cctype>
 #include <cstdio>
@@ -30,33 +32,26 @@ std::size_t distance(const std::string& from, const std::string& to) {
 }
 
 struct Character {
-    unsigned code;
+    unsigned code; // the byte itself where no UTF-8 begins
     std::size_t length;
+    bool isPrintable;
 };
-
-/// Reads UTF-8 of up to three bytes, since no control character has more; anything else is a
-/// character for each byte, with a code that is none.
-Character characterAt(const std::string& text, std::size_t place) {
-    const auto byte = [&](std::size_t i) {
-        return i < text.size() ? static_cast<unsigned char>(text[i]) : 0U;
-    };
-    const auto follows = [&](std::size_t i) { return (byte(i) & 0xc0U) == 0x80; };
-    const unsigned first = byte(place);
-    if (first < 0x80)
-        return {first, 1};
-    if ((first & 0xe0U) == 0xc0 && follows(place + 1))
-        return {(first & 0x1fU) << 6U | (byte(place + 1) & 0x3fU), 2};
-    if ((first & 0xf0U) == 0xe0 && follows(place + 1) && follows(place + 2))
-        return {(first & 0x0fU) << 12U | (byte(place + 1) & 0x3fU) << 6U |
-                    (byte(place + 2) & 0x3fU),
-                3};
-    return {0x110000, 1};
-}
 
 /// What acts on a terminal or changes the order in which the text around it is shown.
 bool isControl(unsigned code) {
     const auto isIn = [code](unsigned low, unsigned high) { return code >= low && code <= high; };
     return code < 0x20 || isIn(0x7f, 0x9f) || isIn(0x202a, 0x202e) || isIn(0x2066, 0x2069);
+}
+
+Character characterAt(const std::string& text, std::size_t place) {
+    const auto byte = static_cast<unsigned char>(text[place]);
+    if (byte < 0x80)
+        return {byte, 1, !isControl(byte)};
+    const gunichar code =
+        g_utf8_get_char_validated(text.data() + place, static_cast<gssize>(text.size() - place));
+    if (code > 0x10ffff)
+        return {byte, 1, false};
+    return {code, static_cast<std::size_t>(g_unichar_to_utf8(code, nullptr)), !isControl(code)};
 }
 
 } // namespace
@@ -78,17 +73,30 @@ std::string quoted(const std::string& text) {
 std::string printable(const std::string& text) {
     std::string result;
     for (std::size_t i = 0; i < text.size();) {
-        const auto [code, length] = characterAt(text, i);
+        const auto [code, length, isPrintable] = characterAt(text, i);
         if (code == '\n') {
             result += "\\n";
-        } else if (isControl(code)) {
-            char escape[8];
+        } else if (!isPrintable) {
+            char escape[16];
             static_cast<void>(
                 std::snprintf(escape, sizeof escape, code < 0x100 ? "\\x%02x" : "\\u%04x", code));
             result += escape;
         } else {
             result.append(text, i, length);
         }
+        i += length;
+    }
+    return result;
+}
+
+std::string printableJson(const std::string& document) {
+    std::string result;
+    for (std::size_t i = 0; i < document.size();) {
+        const auto [code, length, isPrintable] = characterAt(document, i);
+        char escape[16] = "";
+        if (!isPrintable && code > 0x20) // those before it are line breaks, or escaped already
+            static_cast<void>(std::snprintf(escape, sizeof escape, "\\u%04x", code));
+        result.append(*escape ? escape : document.substr(i, length));
         i += length;
     }
     return result;

@@ -12,9 +12,11 @@ std::string upperCase(std::string text);
 std::string addressInCapitals(const std::string& text);
 /// In double quotes, printable.
 std::string quoted(const std::string& text);
-/// Control characters, those of the writing direction too, as escapes such as \n, \x1b or \u202e:
-/// names come from strangers' devices.
+/// Control characters, those of the writing direction too, as escapes such as \n, \x1b or \u202e,
+/// and bytes that are no UTF-8 such as \x9b: names come from strangers' devices.
 std::string printable(const std::string& text);
+/// A JSON document, which is UTF-8, with the same characters as JSON's own escapes: the data stay.
+std::string printableJson(const std::string& document);
 /// How many columns a text takes on a terminal, with one for each character.
 std::size_t columns(const std::string& text);
 
