@@ -133,6 +133,20 @@ TEST_F(ServiceTest, DevicesThatTheDaemonKnowsAreLeftOut) {
     EXPECT_FALSE(lists(ask("hci0"), phone));
     onAdapter("RemoveDevice", with(Path{devicePath}));
     askUntilListed("hci0", phone);
+
+    // However many they are, an answer takes as many questions.
+    RawPeer monitor(simulation.bus().address());
+    monitor.becomeMonitor();
+    const auto questions = [&] {
+        monitor.forgetCalls();
+        ask("hci0");
+        EXPECT_TRUE(monitor.waitForCalls("ListDevices", 2)); // to each adapter, at its end
+        return monitor.calls().size();
+    };
+    const std::size_t withOneKnown = questions();
+    onAdapter("CreateDevice", with(phone));
+    questions(); // what the monitor sees late of the creation is not counted
+    EXPECT_EQ(questions(), withOneKnown);
 }
 
 TEST_F(ServiceTest, SignalsOfStrangersFindNothing) {
