@@ -22,7 +22,7 @@ for program in kesbt kesbt-scannerd kesbt-autoconnectd bluez4-sim; do
     man "$program" | grep -q 'EXIT STATUS' || fail "$program has no manual page"
 done
 [ -e /usr/share/dbus-1/services/com.kestrine.bluetooth.service ] || fail "no bus can start the scanner"
-grep -q '^ExecStart=/usr/bin/kesbt-autoconnectd$' /usr/lib/systemd/system/kesbt-autoconnectd.service ||
+grep -q '^ExecStart=/usr/bin/kesbt-autoconnectd ' /usr/lib/systemd/system/kesbt-autoconnectd.service ||
     fail "systemd cannot start kesbt-autoconnectd"
 # Enabled, as systemctl does it; there is none here.
 mkdir -p /etc/systemd/system/multi-user.target.wants
