@@ -120,6 +120,7 @@ part_scan() {
 }
 
 part_lists() {
+    rm -rf "${list%/*}" # of a run before, where there is no namespace
     mkdir -p "${list%/*/*}"
     check 1 "$phone is not known .*" auto_connect "$phone"
     check 0 "to be connected: $mouse" auto_connect "$mouse"
