@@ -12,6 +12,7 @@
 #include "host/auto_connect_file.h"
 #include "host/auto_connect_lock.h"
 #include "host/device_lookup.h"
+#include "host/file_place.h"
 #include "host/file_replacement.h"
 #include "host/pid_file.h"
 
@@ -30,7 +31,7 @@ namespace Bluetooth {
 namespace {
 
 constexpr mode_t folderMode = 0755;
-constexpr mode_t fileMode = 0664; // less the umask, and never for everybody
+constexpr mode_t fileMode = 0664; // less the umask, and never writable for everybody
 
 /// @return false, logged for the caller, when an argument is null
 bool isGiven(LogPlace place, const char* argument, const char* name) {
@@ -45,7 +46,11 @@ bool createConfigFile(const char* path) {
         logError(KES_HERE, "Can not create config path '%s'", autoConnectFolder);
         return false;
     }
-    const Descriptor file(open(path, O_WRONLY | O_CREAT | O_NONBLOCK | O_CLOEXEC, fileMode));
+    // Another user's link would choose which file is made.
+    const auto place = findPlace(path, true);
+    constexpr int flags = O_WRONLY | O_CREAT | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC;
+    const Descriptor file(
+        place ? openat(place->folder->number(), place->name.c_str(), flags, fileMode) : -1);
     struct stat status {};
     if (!file.isOpen() || fstat(file.number(), &status) != 0) {
         logError(KES_HERE, "Config '%s' can not be open.", path);

@@ -5,6 +5,8 @@
 #include <limits.h>
 #include <sys/stat.h>
 
+#include <cerrno>
+
 namespace Bluetooth {
 
 namespace {
@@ -12,8 +14,8 @@ namespace {
 constexpr int maxLinks = 40; // as the system has it
 constexpr int toLookAt = O_PATH | O_NOFOLLOW | O_CLOEXEC;
 
-std::unique_ptr<Descriptor> openRoot() {
-    return std::make_unique<Descriptor>(open("/", toLookAt | O_DIRECTORY));
+std::unique_ptr<Descriptor> openFolder(const char* path) {
+    return std::make_unique<Descriptor>(open(path, toLookAt | O_DIRECTORY));
 }
 
 /// Takes the first name off a path. @return "" when there is none left
@@ -41,13 +43,16 @@ bool follow(int link, const struct stat& status, int links, std::string& rest) {
 
 } // namespace
 
-std::unique_ptr<FilePlace> findPlace(const std::string& path) {
+std::unique_ptr<FilePlace> findPlace(const std::string& path, bool mayBeMissing) {
     std::string rest = path;
     int links = 0;
-    auto folder = openRoot();
+    auto folder = openFolder(path.rfind('/', 0) == 0 ? "/" : ".");
     while (folder->isOpen()) {
         std::string name = takeName(rest);
         auto entry = std::make_unique<Descriptor>(openat(folder->number(), name.c_str(), toLookAt));
+        const bool isLast = rest.find_first_not_of('/') == std::string::npos;
+        if (!entry->isOpen() && errno == ENOENT && isLast && mayBeMissing)
+            return std::make_unique<FilePlace>(FilePlace{std::move(folder), std::move(name)});
         struct stat status {};
         if (!entry->isOpen() || fstat(entry->number(), &status) != 0)
             break;
@@ -55,8 +60,8 @@ std::unique_ptr<FilePlace> findPlace(const std::string& path) {
             if (!follow(entry->number(), status, ++links, rest))
                 break;
             if (rest.front() == '/')
-                folder = openRoot();
-        } else if (rest.find_first_not_of('/') == std::string::npos) {
+                folder = openFolder("/");
+        } else if (isLast) {
             return std::make_unique<FilePlace>(FilePlace{std::move(folder), std::move(name)});
         } else {
             folder = std::move(entry);
