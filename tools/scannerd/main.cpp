@@ -14,6 +14,7 @@
 #include <cstdlib>
 #include <cstring>
 #include <memory>
+#include <new>
 #include <string>
 
 namespace Scannerd {
@@ -38,7 +39,8 @@ class BusWatch {
 public:
     BusWatch(DBusConnection* connection, std::unique_ptr<ScannerServer>& server)
         : m_connection(connection), m_server(server) {
-        dbus_connection_add_filter(m_connection, filter, this, nullptr);
+        if (!dbus_connection_add_filter(m_connection, filter, this, nullptr))
+            throw std::bad_alloc(); // nobody would notice that the bus goes
     }
     ~BusWatch() { dbus_connection_remove_filter(m_connection, filter, this); }
     BusWatch(const BusWatch&) = delete;
