@@ -19,9 +19,9 @@ namespace Bluetooth {
 /// @code
 ///     1,AA:BB:CC:DD:EE:FF,11:22:33:44:55:66
 /// @endcode
-/// "1" is enabled, "0" disabled. Every operation that reads a missing file creates it, disabled and
-/// empty; an empty file counts as that too. A file beyond 1 MiB is not read: it counts as disabled
-/// and empty, and only set() changes it.
+/// "1" is enabled, "0" disabled. Every operation but readList() that reads a missing file creates
+/// it, disabled and empty; an empty file counts as that too. A file beyond 1 MiB is not read: it
+/// counts as disabled and empty, and only set() changes it.
 ///
 /// A change is done as one step: of a process that ends or a machine that fails meanwhile, the old
 /// or the new list is left, whole, and readers find one of these. The file's owner and mode stay;

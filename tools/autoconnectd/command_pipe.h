@@ -23,7 +23,7 @@ public:
     CommandPipe& operator=(const CommandPipe&) = delete;
 
     /// Opens the pipe, creating it when it is missing. What else stands at the path is refused, and
-    /// replaced where this user is root; a folder only when it is empty.
+    /// replaced where this user is root; a folder that is not empty is renamed.
     /// @return null with `problem` set to what the user should do
     static std::unique_ptr<CommandPipe> open(const std::string& path, std::string& problem);
 
