@@ -19,18 +19,6 @@ std::string answerOf(DBusMessage* reply) {
     return argumentsOf(reply);
 }
 
-std::string shorten(std::string text) {
-    // Made once: the C++ library's making of them is not safe in two threads at a time.
-    static const std::pair<std::regex, const char*> replacements[] = {
-        {std::regex("/org/bluez/[0-9]+/"), ""},
-        {std::regex("(hci0/)?dev_00_11_22_33_44_55"), "device"},
-        {std::regex("org\\.bluez\\.Error\\."), ""},
-        {std::regex("PropertyChanged s:(\\w+) v\\((.*)\\)$"), "$1=$2"}};
-    for (const auto& [noise, name] : replacements)
-        text = std::regex_replace(text, noise, name);
-    return text;
-}
-
 } // namespace
 
 SimClient::SimClient()
@@ -42,6 +30,12 @@ SimClient::SimClient()
         m_peer.reply(request);
     m_peer.addMatch("type='signal',sender='org.bluez'");
     findBase();
+}
+
+std::string SimClient::shorten(std::string text) const {
+    for (const auto& [noise, name] : m_replacements)
+        text = std::regex_replace(text, noise, name);
+    return text;
 }
 
 SimClient::Callee SimClient::calleeOf(const Question& question) const {

@@ -9,7 +9,10 @@
 
 #include <map>
 #include <memory>
+#include <regex>
 #include <string>
+#include <utility>
+#include <vector>
 
 namespace Bluetooth::Test {
 
@@ -63,6 +66,7 @@ private:
     };
 
     Callee calleeOf(const Question& question) const;
+    std::string shorten(std::string text) const;
     void write(DBusMessage* message);
     Texts take(std::size_t end);
 
@@ -70,6 +74,12 @@ private:
     std::size_t m_taken = 0;
     std::map<dbus_uint32_t, std::string> m_asked; // methods by serial; of the peer's thread
     std::string m_base;
+    // Not made by the peer's thread: two threads cannot compile expressions at once.
+    const std::vector<std::pair<std::regex, std::string>> m_replacements{
+        {std::regex("/org/bluez/[0-9]+/"), ""},
+        {std::regex("(hci0/)?dev_00_11_22_33_44_55"), "device"},
+        {std::regex("org\\.bluez\\.Error\\."), ""},
+        {std::regex("PropertyChanged s:(\\w+) v\\((.*)\\)$"), "$1=$2"}};
     RawPeer m_peer; // last, since it uses the others to its end
 };
 
