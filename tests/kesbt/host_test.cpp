@@ -76,6 +76,8 @@ TEST_F(HostVerbs, AFileThatCannotBeUsedIsAFailureAndStays) {
                   "cannot use " + file + ": Is a directory; make the file writable or remove it\n");
     EXPECT_TRUE(std::filesystem::is_directory(file));
 
+    if (isSanitized)
+        return; // the thread sanitizer holds the time-out's signal back while flock() waits
     std::filesystem::remove(file);
     setContent("0"); // and another program that changes it hangs
     const int lock = open((configFolder + ".lock"s).c_str(), O_RDWR | O_CREAT, 0600);
