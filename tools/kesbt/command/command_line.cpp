@@ -4,8 +4,10 @@
 #include "command/usage.h"
 #include "show/text.h"
 
+#include <algorithm>
 #include <iostream>
 #include <sstream>
+#include <utility>
 
 namespace Kesbt {
 
@@ -27,8 +29,9 @@ std::string checkAdapter(const std::string& text) {
 
 } // namespace
 
-CommandLine::CommandLine(const std::vector<const Verb*>& verbs, Offer adapters)
-    : m_program("Works with Bluetooth through bluetoothd (BlueZ 4).", "kesbt") {
+CommandLine::CommandLine(std::vector<const Verb*> verbs, Offer adapters)
+    : m_verbs(std::move(verbs)),
+      m_program("Works with Bluetooth through bluetoothd (BlueZ 4).", "kesbt") {
     m_program.fallthrough(); // global options may stand behind the verb too
     m_program.require_subcommand(1);
     constexpr std::size_t nameColumns = 20;
@@ -37,11 +40,10 @@ CommandLine::CommandLine(const std::vector<const Verb*>& verbs, Offer adapters)
     m_program.footer("kesbt VERB --help tells more about a verb and gives examples.\n"
                      "Exit status: 0 success, 1 failure, 2 wrong usage.\n");
     addOptions(adapters);
-    for (const Verb* verb : verbs)
-        add(*verb);
 }
 
 void CommandLine::run(int argc, const char* const* argv) {
+    addVerbs(argc > 1 ? argv[1] : "");
     if (argc > 1 && argv[1] == std::string("--complete")) {
         printCompletions({argv + 2, argv + argc});
         return;
@@ -79,6 +81,16 @@ void CommandLine::addOptions(Offer adapters) {
         ->type_name("SECONDS")
         ->check(checkSeconds);
     m_program.set_version_flag("--version", "kesbt " KESBT_VERSION);
+}
+
+/// Adds the verb that `first` names, or all of them: that takes longer than many a verb does.
+void CommandLine::addVerbs(const std::string& first) {
+    const auto named = std::find_if(m_verbs.begin(), m_verbs.end(),
+                                    [&](const Verb* verb) { return verb->name == first; });
+    if (named != m_verbs.end())
+        return add(**named);
+    for (const Verb* verb : m_verbs)
+        add(*verb);
 }
 
 void CommandLine::add(const Verb& verb) {

@@ -13,7 +13,7 @@ namespace Kesbt {
 class CommandLine {
 public:
     /// @param adapters what is offered for --adapter
-    CommandLine(const std::vector<const Verb*>& verbs, Offer adapters);
+    CommandLine(std::vector<const Verb*> verbs, Offer adapters);
 
     /// Runs the verb that is named, within the limit that it declares. A Failure when the words
     /// cannot be meant so, or the verb fails. Hidden: behind "--complete" the words are completed.
@@ -22,9 +22,11 @@ public:
 private:
     void addOptions(Offer adapters);
     void printCompletions(const std::vector<std::string>& words);
+    void addVerbs(const std::string& first);
     void add(const Verb& verb);
     void setAction(CLI::App& app, const Form& form);
 
+    const std::vector<const Verb*> m_verbs;
     Options m_options;
     CLI::App m_program;
     Completion m_completion;
