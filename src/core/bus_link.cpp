@@ -380,9 +380,13 @@ void BusLink::passOnStop() {
 /// Waits for input, reads it and dispatches it. The mutex is not held.
 bool BusLink::step(Milliseconds limit, const Waiter* waiter) {
     const LeadingScope scope(this);
-    if (dbus_connection_get_dispatch_status(m_connection) != DBUS_DISPATCH_DATA_REMAINS)
-        awaitInput(limit, waiter ? waiter->interrupted : nullptr);
-    const bool open = dbus_connection_read_write(m_connection, 0);
+    // Each tick of an idle thread comes past here: only what there is to do is done.
+    const bool isQuiet =
+        dbus_connection_get_dispatch_status(m_connection) != DBUS_DISPATCH_DATA_REMAINS &&
+        !awaitInput(limit, waiter ? waiter->interrupted : nullptr) &&
+        !dbus_connection_has_messages_to_send(m_connection);
+    const bool open = isQuiet ? dbus_connection_get_is_connected(m_connection)
+                              : dbus_connection_read_write(m_connection, 0);
     // What a handler's delay has left is for the next leader when this one has to go.
     while (dbus_connection_dispatch(m_connection) == DBUS_DISPATCH_DATA_REMAINS &&
            !(waiter ? waiter->isOver() : stop.isRaised())) {
@@ -393,7 +397,8 @@ bool BusLink::step(Milliseconds limit, const Waiter* waiter) {
     return open;
 }
 
-void BusLink::awaitInput(Milliseconds limit, WakingFlag* interrupted) {
+/// @return whether something has happened before the time was over
+bool BusLink::awaitInput(Milliseconds limit, WakingFlag* interrupted) {
     // Once passed on, the stop would only keep callers from sleeping.
     pollfd fds[] = {{-1, POLLIN, 0},
                     {m_wakeFd, POLLIN, 0},
@@ -401,11 +406,12 @@ void BusLink::awaitInput(Milliseconds limit, WakingFlag* interrupted) {
                     {interrupted ? interrupted->descriptor() : -1, POLLIN, 0}};
     // Asked anew each time: the descriptor of a closed connection may belong to somebody else.
     if (!dbus_connection_get_unix_fd(m_connection, &fds[0].fd))
-        return;
+        return true;
     if (dbus_connection_has_messages_to_send(m_connection))
         limit = std::min(limit, outputRetry);
-    if (poll(fds, interrupted ? 4 : 3, static_cast<int>(limit.count())) <= 0)
-        return;
+    const int ready = poll(fds, interrupted ? 4 : 3, static_cast<int>(limit.count()));
+    if (ready <= 0)
+        return ready < 0;
     if (fds[1].revents != 0) {
         eventfd_t count = 0;
         eventfd_read(m_wakeFd, &count);
@@ -414,6 +420,7 @@ void BusLink::awaitInput(Milliseconds limit, WakingFlag* interrupted) {
         stop.calm();
     if (fds[3].revents != 0)
         interrupted->calm();
+    return true;
 }
 
 /// Wakes whoever leads next: the thread that always leads, else any that still waits, else the

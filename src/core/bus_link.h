@@ -115,7 +115,7 @@ private:
     bool mayLead(const Waiter& waiter) const;
     bool lead(Lock& lock, Milliseconds limit, const Waiter* waiter);
     bool step(Milliseconds limit, const Waiter* waiter);
-    void awaitInput(Milliseconds limit, WakingFlag* interrupted);
+    bool awaitInput(Milliseconds limit, WakingFlag* interrupted);
     void passOnStop();
     void flush();
     void passLead();
