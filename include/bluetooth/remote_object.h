@@ -131,6 +131,13 @@ public:
     int getReplyValue(std::string& text);
     /// Reads a boolean. Otherwise as the one for a string.
     int getReplyValue(bool& value);
+    /// Reads an unsigned number of 32 bits, type u. Otherwise as the one for a string.
+    int getReplyValue(unsigned int& value);
+    /// Reads an unsigned number of 16 bits, type q. Otherwise as the one for a string.
+    int getReplyValue(unsigned short& value);
+    /// Reads an array of bytes; an empty array of any type is an empty list. Otherwise as the one
+    /// for a string.
+    int getReplyValue(std::vector<unsigned char>& bytes);
     /// Reads an array of strings; an empty array of any type is an empty list. Otherwise as the one
     /// for a string.
     int getReplyValue(std::vector<std::string>& texts);

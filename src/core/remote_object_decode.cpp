@@ -40,18 +40,44 @@ void readTextArray(DBusMessageIter& array, std::vector<Text>& texts) {
     while (dbus_message_iter_next(&element));
 }
 
-bool readValue(DBusMessageIter& iter, std::string& text) {
-    const bool valid = dbus_message_iter_get_arg_type(&iter) == DBUS_TYPE_STRING;
+template <class Wire, class Value>
+bool readBasic(DBusMessageIter& iter, int type, Value& value) {
+    const bool valid = dbus_message_iter_get_arg_type(&iter) == type;
     if (valid)
-        text = basicAt<const char*>(iter);
+        value = static_cast<Value>(basicAt<Wire>(iter));
     return valid;
 }
 
+bool readValue(DBusMessageIter& iter, std::string& text) {
+    return readBasic<const char*>(iter, DBUS_TYPE_STRING, text);
+}
+
 bool readValue(DBusMessageIter& iter, bool& value) {
-    const bool valid = dbus_message_iter_get_arg_type(&iter) == DBUS_TYPE_BOOLEAN;
-    if (valid)
-        value = basicAt<dbus_bool_t>(iter) != 0;
-    return valid;
+    return readBasic<dbus_bool_t>(iter, DBUS_TYPE_BOOLEAN, value);
+}
+
+bool readValue(DBusMessageIter& iter, unsigned int& value) {
+    return readBasic<dbus_uint32_t>(iter, DBUS_TYPE_UINT32, value);
+}
+
+bool readValue(DBusMessageIter& iter, unsigned short& value) {
+    return readBasic<dbus_uint16_t>(iter, DBUS_TYPE_UINT16, value);
+}
+
+bool readValue(DBusMessageIter& iter, std::vector<unsigned char>& bytes) {
+    if (dbus_message_iter_get_arg_type(&iter) != DBUS_TYPE_ARRAY)
+        return false;
+    const bool holdsBytes = dbus_message_iter_get_element_type(&iter) == DBUS_TYPE_BYTE;
+    if (!holdsBytes && !isEmptyArray(iter))
+        return false;
+    DBusMessageIter first;
+    dbus_message_iter_recurse(&iter, &first);
+    const unsigned char* begin = nullptr;
+    int count = 0;
+    if (holdsBytes)
+        dbus_message_iter_get_fixed_array(&first, &begin, &count);
+    bytes.assign(begin, begin + count);
+    return true;
 }
 
 template <class Text>
@@ -249,6 +275,18 @@ int RemoteObject::getReplyValue(std::string& text) {
 
 int RemoteObject::getReplyValue(bool& value) {
     return readReply(value);
+}
+
+int RemoteObject::getReplyValue(unsigned int& value) {
+    return readReply(value);
+}
+
+int RemoteObject::getReplyValue(unsigned short& value) {
+    return readReply(value);
+}
+
+int RemoteObject::getReplyValue(std::vector<unsigned char>& bytes) {
+    return readReply(bytes);
 }
 
 int RemoteObject::getReplyValue(std::vector<std::string>& texts) {

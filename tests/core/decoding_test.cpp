@@ -39,7 +39,7 @@ protected:
     }
 };
 
-TEST_F(DecodingTest, TextsAndBooleansAreReadFromTheirOwnTypeOnly) {
+TEST_F(DecodingTest, SingleValuesAreReadFromTheirOwnTypeOnly) {
     std::string text;
     EXPECT_EQ(read("('hello', uint32 5)", text), success); // only the first argument is looked at
     bool no = true;
@@ -47,13 +47,27 @@ TEST_F(DecodingTest, TextsAndBooleansAreReadFromTheirOwnTypeOnly) {
     EXPECT_FALSE(no);
     bool yes = false;
     EXPECT_EQ(read("(true,)", yes), success);
+    unsigned int large = 0;
+    EXPECT_EQ(read("(uint32 4294967295,)", large), success);
+    unsigned short small = 0;
+    EXPECT_EQ(read("(uint16 65535,)", small), success);
+    std::vector<unsigned char> bytes{1};
+    EXPECT_EQ(read("(@au [],)", bytes), success); // empty of whatever type
+    EXPECT_TRUE(bytes.empty());
+    EXPECT_EQ(read("([byte 0, 255],)", bytes), success);
     for (const char* reply :
-         {"()", "(objectpath '/',)", "(uint32 1,)", "(<'text'>,)", "(@as [],)"}) {
+         {"()", "(objectpath '/',)", "(byte 1,)", "(<'text'>,)", "([objectpath '/'],)"}) {
         EXPECT_EQ(read(reply, text), wrongType) << reply;
         EXPECT_EQ(read(reply, yes), wrongType) << reply;
+        EXPECT_EQ(read(reply, large), wrongType) << reply;
+        EXPECT_EQ(read(reply, small), wrongType) << reply;
+        EXPECT_EQ(read(reply, bytes), wrongType) << reply;
     }
     EXPECT_EQ(text, "hello");
     EXPECT_TRUE(yes);
+    EXPECT_EQ(large, 4294967295U);
+    EXPECT_EQ(small, 65535U);
+    EXPECT_EQ(bytes, (std::vector<unsigned char>{0, 255}));
 }
 
 TEST_F(DecodingTest, ATextWhereAPathWasAskedForIsTheServicesError) {
