@@ -37,6 +37,12 @@ public:
     /// @return 0 when the call was handed to the bus, otherwise -1
     int cancelDiscovery();
 
+    /// Makes the daemon close the device's connection, with all that uses it. DisconnectRequested
+    /// comes first; about 2 s later the property "Connected" reports success.
+    /// @dbus Disconnect()
+    /// @return 0 when the call was handed to the bus, otherwise -1
+    int disconnect();
+
     /// Subscribes to DisconnectRequested: the daemon is about to close the device's connection.
     /// @dbus signal DisconnectRequested()
     /// @param callback called on the receive thread with the proxy that runs it, which need not be

@@ -25,6 +25,10 @@ int Device::cancelDiscovery() {
     return callMethod(KES_HERE, *this, "CancelDiscovery");
 }
 
+int Device::disconnect() {
+    return callMethod(KES_HERE, *this, "Disconnect");
+}
+
 int Device::setDisconnectRequestedHandler(NoArgumentCallback callback) {
     return setSignalHandlerNoArgument("DisconnectRequested",
                                       callback ? callback : disconnectRequestedHandler);
