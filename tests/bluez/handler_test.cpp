@@ -8,9 +8,14 @@
 #include <bluetooth/adapter.h>
 #include <bluetooth/audio.h>
 #include <bluetooth/audio_sink.h>
+#include <bluetooth/audio_source.h>
 #include <bluetooth/control.h>
 #include <bluetooth/device.h>
+#include <bluetooth/headset.h>
+#include <bluetooth/input.h>
 #include <bluetooth/manager.h>
+#include <bluetooth/network.h>
+#include <bluetooth/serial.h>
 
 #include <initializer_list>
 #include <regex>
@@ -45,6 +50,7 @@ protected:
     Device device{devicePath};
     AudioSink sink{devicePath};
     Control control{devicePath};
+    Headset unit{devicePath};
     RemoteObject loop{"org.bluez", "/loop", "com.example.Loop", DBUS_BUS_SYSTEM};
 };
 
@@ -100,6 +106,13 @@ TEST_F(HandlerTest, EachSetterSubscribesToItsSignal) {
     checkEvent(sink, "Stopped", &AudioSink::setStoppedHandler, "Stopped in");
     checkEvent(control, "Connected", &Control::setConnectedHandler, "Connected from");
     checkEvent(control, "Disconnected", &Control::setDisconnectedHandler, "Disconnected from");
+    checkEvent(unit, "Connected", &Headset::setConnectedHandler, "Connected from");
+    checkEvent(unit, "Disconnected", &Headset::setDisconnectedHandler, "Disconnected from");
+    checkEvent(unit, "Playing", &Headset::setPlayingHandler, "Playing in");
+    checkEvent(unit, "Stopped", &Headset::setStoppedHandler, "Stopped in");
+    checkEvent(unit, "AnswerRequested", &Headset::setAnswerRequestedHandler,
+               "Answer requested from");
+    checkEvent(unit, "CallTerminated", &Headset::setCallTerminatedHandler, "Call terminated from");
     EXPECT_EQ(log.take(), Texts{});
 }
 
@@ -119,7 +132,12 @@ TEST_F(HandlerTest, AProxyIsWholeUntilItsCallbacksOnOtherThreadsHaveEnded) {
         new Device(devicePath),
         new Audio(devicePath),
         new AudioSink(devicePath),
-        new Control(devicePath)};
+        new Control(devicePath),
+        new Input(devicePath),
+        new Network(devicePath),
+        new Serial(devicePath),
+        new Headset(devicePath),
+        new AudioSource(devicePath)};
     for (RemoteObject* proxy : proxies) {
         ASSERT_EQ(proxy->setSignalHandlerString("Changed", destroyElsewhere), 0);
         seen().clear();

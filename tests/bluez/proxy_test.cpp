@@ -8,11 +8,16 @@
 #include <bluetooth/agent.h>
 #include <bluetooth/audio.h>
 #include <bluetooth/audio_sink.h>
+#include <bluetooth/audio_source.h>
 #include <bluetooth/control.h>
 #include <bluetooth/device.h>
 #include <bluetooth/device_list.h>
 #include <bluetooth/dict_codec.h>
+#include <bluetooth/headset.h>
+#include <bluetooth/input.h>
 #include <bluetooth/manager.h>
+#include <bluetooth/network.h>
+#include <bluetooth/serial.h>
 
 #include <algorithm>
 #include <functional>
@@ -62,12 +67,30 @@ TEST_F(ProxyTest, OperationsWithoutResultAreSentAndNotWaitedFor) {
         {"adapter", "Adapter.UnregisterAgent! o:" + agentPath,
          [&](auto p) { return Adapter(p).unregisterAgent(agent); }},
         {"device", "Device.CancelDiscovery!", [](auto p) { return Device(p).cancelDiscovery(); }},
+        {"device", "Device.Disconnect!", [](auto p) { return Device(p).disconnect(); }},
         {"audio", "Audio.Connect!", [](auto p) { return Audio(p).connect(); }},
         {"audio", "Audio.Disconnect!", [](auto p) { return Audio(p).disconnect(); }},
         {"audio_sink", "AudioSink.Connect!", [](auto p) { return AudioSink(p).connect(); }},
         {"audio_sink", "AudioSink.Disconnect!", [](auto p) { return AudioSink(p).disconnect(); }},
         {"control", "Control.VolumeUp!", [](auto p) { return Control(p).volumeUp(); }},
         {"control", "Control.VolumeDown!", [](auto p) { return Control(p).volumeDown(); }},
+        {"input", "Input.Connect!", [](auto p) { return Input(p).connect(); }},
+        {"input", "Input.Disconnect!", [](auto p) { return Input(p).disconnect(); }},
+        {"audio_source", "AudioSource.Connect!", [](auto p) { return AudioSource(p).connect(); }},
+        {"audio_source", "AudioSource.Disconnect!",
+         [](auto p) { return AudioSource(p).disconnect(); }},
+        {"network", "Network.Disconnect!", [](auto p) { return Network(p).disconnect(); }},
+        {"serial", "Serial.Disconnect! s:tty", [](auto p) { return Serial(p).disconnect("tty"); }},
+        {"headset", "Headset.Connect!", [](auto p) { return Headset(p).connect(); }},
+        {"headset", "Headset.Disconnect!", [](auto p) { return Headset(p).disconnect(); }},
+        {"headset", "Headset.IndicateCall!", [](auto p) { return Headset(p).indicateCall(); }},
+        {"headset", "Headset.CancelCall!", [](auto p) { return Headset(p).cancelCall(); }},
+        {"headset", "Headset.Play!", [](auto p) { return Headset(p).play(); }},
+        {"headset", "Headset.Stop!", [](auto p) { return Headset(p).stop(); }},
+        {"headset", "Headset.SetSpeakerGain! q:7",
+         [](auto p) { return Headset(p).setSpeakerGain(7); }},
+        {"headset", "Headset.SetMicrophoneGain! q:8",
+         [](auto p) { return Headset(p).setMicrophoneGain(8); }},
         {"bluez_object", "Device.SetProperty! s:Alias v(s:x)",
          [](auto p) { return Device(p).setProperty("Alias", Variant(std::string("x"))); }},
     };
@@ -146,6 +169,45 @@ TEST_F(ProxyTest, OperationsThatGiveAnObjectReadItsPath) {
         daemon.forgetCalls();
     }
     agent.unregisterPath();
+}
+
+TEST_F(ProxyTest, OperationsThatReadAValueLeaveItAloneOnFailure) {
+    const auto check = [&](const std::string& file, const std::string& call, auto value,
+                           auto operation) {
+        const std::size_t dot = call.find('.') + 1;
+        const std::string method = call.substr(dot, call.find(' ') - dot);
+        daemon.reply(method, with(value));
+        auto read = decltype(value){};
+        EXPECT_EQ(operation(read), 0) << call;
+        const SeenCall sent = daemon.calls().at(0);
+        EXPECT_EQ(sent.interface + "." + sent.text(), "org.bluez." + call);
+        EXPECT_EQ(log.take(), Texts{});
+        daemon.replyError(method, "org.bluez.Error.Failed", "Broken");
+        EXPECT_EQ(operation(read), -1) << call;
+        EXPECT_EQ(read, value) << call;
+        EXPECT_EQ(log.take(), Texts{file + ".cpp Broken"});
+        daemon.forgetCalls();
+    };
+    AudioSink sink(devicePath);
+    Control control(devicePath);
+    Headset headset(devicePath);
+    Network network(devicePath);
+    Serial serial(devicePath);
+    const auto gain = std::uint16_t{15};
+    const std::string name = "bnep0";
+    check("audio_sink", "AudioSink.IsConnected", true,
+          [&](auto& v) { return sink.isConnected(v); });
+    check("control", "Control.IsConnected", true, [&](auto& v) { return control.isConnected(v); });
+    check("headset", "Headset.IsConnected", true, [&](auto& v) { return headset.isConnected(v); });
+    check("headset", "Headset.IsPlaying", true, [&](auto& v) { return headset.isPlaying(v); });
+    check("headset", "Headset.GetSpeakerGain", gain,
+          [&](auto& v) { return headset.getSpeakerGain(v); });
+    check("headset", "Headset.GetMicrophoneGain", gain,
+          [&](auto& v) { return headset.getMicrophoneGain(v); });
+    check("network", "Network.Connect s:nap", name,
+          [&](auto& v) { return network.connect("nap", v); });
+    check("serial", "Serial.Connect s:spp", name,
+          [&](auto& v) { return serial.connect("spp", v); });
 }
 
 TEST_F(ProxyTest, UnusableArgumentsAreLoggedAndNothingIsSent) {
@@ -351,7 +413,12 @@ TEST_F(ProxyTest, FactoriesAskWhetherTheDaemonIsThereByItsExactName) {
         {[] { return Found(Device::getDevice(devicePath)); }, devicePath},
         {[] { return Found(Audio::getAudio(devicePath)); }, devicePath},
         {[] { return Found(AudioSink::getAudioSink(devicePath)); }, devicePath},
-        {[] { return Found(Control::getControl(devicePath)); }, devicePath}};
+        {[] { return Found(Control::getControl(devicePath)); }, devicePath},
+        {[] { return Found(Input::getInput(devicePath)); }, devicePath},
+        {[] { return Found(Network::getNetwork(devicePath)); }, devicePath},
+        {[] { return Found(Serial::getSerial(devicePath)); }, devicePath},
+        {[] { return Found(Headset::getHeadset(devicePath)); }, devicePath},
+        {[] { return Found(AudioSource::getAudioSource(devicePath)); }, devicePath}};
     EXPECT_TRUE(BluezObject::hasBluetoothd());
     for (const auto& [make, path] : factories)
         EXPECT_EQ(make()->getPath(), path);
