@@ -34,9 +34,8 @@ int main(int argc, char** argv) {
         const std::unique_ptr<std::vector<std::pair<std::string, Dict*>>> devices(
             scanner.listDevices("hci0", false));
         if (!devices)
-            return fail(scanner.hasError()
-                            ? "is kesbt-scannerd installed? " + scanner.getErrorMessage()
-                            : "there is no adapter hci0; plug one in and try again");
+            return fail("cannot scan (" + scanner.getErrorMessage() +
+                        "); check that hci0 is there and kesbt-scannerd is installed");
         for (const auto& [address, dict] : *devices) {
             const std::unique_ptr<Dict> properties(dict); // ours to delete, as the list is
             if (shown.insert(address).second)

@@ -255,6 +255,7 @@ protected:
 
 private:
     friend void* receiveSignal(void* proxy);
+    friend class Scanner; // takes over the Bluetooth daemon's errors
 
     enum ErrorNumber : int;
     enum class DictResult;

@@ -41,7 +41,9 @@ public:
     ///                  either way. A failure of the Bluetooth daemon is always logged.
     /// @return a new list of (address, properties), deleted by the caller together with each Dict
     ///         in it; empty when no device was found yet. Null on failure; the service is not
-    ///         called when the Bluetooth daemon is absent or does not know the adapter.
+    ///         called when the Bluetooth daemon is absent (getErrorName() is then
+    ///         org.freedesktop.DBus.Error.NameHasNoOwner) or does not know the adapter
+    ///         (org.bluez.Error.NoSuchAdapter).
     ///
     /// A Dict holds the properties that the daemon reported for the device (Address, Class, Icon,
     /// RSSI, Name, ...), in its order, every value as a string: RSSI is "-60", Paired "0".
@@ -57,6 +59,9 @@ public:
     /// @return whether the call was handed to the bus; its reply is not awaited. False also when
     ///         the Bluetooth daemon is absent or does not know the adapter. A failure is logged.
     bool removeFinder(const char* adapterId);
+
+private:
+    KESBLUETOOTH_LOCAL bool isAdapter(const char* adapterId);
 };
 
 } // namespace Bluetooth

@@ -6,27 +6,33 @@
 #include <bluetooth/manager.h>
 
 #include "core/method_call.h"
+#include "core/remote_object_private.h"
 #include "scanner/names.h"
 
 #include <memory>
 
 namespace Bluetooth {
 
-namespace {
-
-/// Whether the Bluetooth daemon knows the adapter: otherwise the service need not be started.
-bool isAdapter(const char* adapterId) {
-    const std::unique_ptr<Manager> manager(Manager::getManager());
-    return manager && std::unique_ptr<Adapter>(manager->findAdapter(adapterId));
-}
-
-} // namespace
-
 Scanner::Scanner()
     : RemoteObject(scannerBusName, scannerPath, scannerInterface, DBUS_BUS_SESSION) {}
 
 Scanner::~Scanner() {
     unsubscribeAll();
+}
+
+/// Whether the Bluetooth daemon knows the adapter: otherwise the service need not be started. What
+/// it says instead becomes the scanner's error; the manager has logged it.
+bool Scanner::isAdapter(const char* adapterId) {
+    const std::unique_ptr<Manager> manager(Manager::getManager());
+    if (manager && std::unique_ptr<Adapter>(manager->findAdapter(adapterId)))
+        return true;
+    if (!manager || !manager->hasError() || !BluezObject::hasBluetoothd())
+        recordDBusError(DBUS_ERROR_NAME_HAS_NO_OWNER, "The Bluetooth daemon is not running");
+    else if (manager->getErrorNumber() == errorDBus)
+        recordDBusError(manager->getErrorName(), manager->getErrorMessage().c_str());
+    else
+        recordError(static_cast<ErrorNumber>(manager->getErrorNumber()));
+    return false;
 }
 
 std::vector<std::pair<std::string, Dict*>>* Scanner::listDevices(const char* adapterId,

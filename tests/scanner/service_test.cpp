@@ -322,18 +322,20 @@ TEST_F(ScannerClientTest, StartsTheServiceThatIsMissing) {
     askUntilListed("hci0", phone);
 }
 
-TEST_F(ScannerClientTest, IsSilentAboutAdaptersThatAreNot) {
+TEST_F(ScannerClientTest, GivesTheDaemonsErrorForAdaptersThatAreNot) {
     Scanner scanner;
-    EXPECT_EQ(list(scanner, "hci9"), noList);
     EXPECT_EQ(list(scanner, nullptr), noList);
+    EXPECT_EQ(scanner.getErrorMessage(), "Parameter is null");
+    EXPECT_EQ(list(scanner, "hci9"), noList);
+    EXPECT_EQ(scanner.getErrorMessage(), "No such adapter");
+    EXPECT_STREQ(scanner.getErrorName(), "org.bluez.Error.NoSuchAdapter");
     EXPECT_FALSE(scanner.removeFinder("hci9"));
-    EXPECT_FALSE(scanner.hasError());
     simulation.control("DropName");
-    EXPECT_EQ(list(scanner, "hci0"), noList);
     EXPECT_FALSE(scanner.removeFinder("hci0"));
-    EXPECT_FALSE(scanner.hasError());
+    EXPECT_EQ(list(scanner, "hci0"), noList);
+    EXPECT_EQ(scanner.getErrorMessage(), "The Bluetooth daemon is not running");
     EXPECT_FALSE(session.hasOwner(serviceName)); // it was not asked, and so not started
-    EXPECT_EQ(log.take(), (Texts{"manager.cpp No such adapter", "manager.cpp Parameter is null",
+    EXPECT_EQ(log.take(), (Texts{"manager.cpp Parameter is null", "manager.cpp No such adapter",
                                  "manager.cpp No such adapter"}));
 }
 

@@ -4,8 +4,6 @@
 #include "command/limit.h"
 #include "daemon/refusal.h"
 
-#include <bluetooth/bluez_object.h>
-
 #include <cstdlib>
 #include <memory>
 
@@ -51,10 +49,10 @@ std::string askOwner() {
 
 Failure scanFailure(Scanner& scanner, const std::string& adapter) {
     const std::string error = scanner.getErrorName();
-    if (!scanner.hasError()) // it was the daemon that failed
-        return Bluetooth::BluezObject::hasBluetoothd()
-                   ? Failure("there is no adapter " + adapter + " any more; see: kesbt adapters")
-                   : daemonAbsent();
+    if (error == "org.bluez.Error.NoSuchAdapter")
+        return Failure("there is no adapter " + adapter + " any more; see: kesbt adapters");
+    if (error == DBUS_ERROR_NAME_HAS_NO_OWNER)
+        return daemonAbsent();
     const bool couldNotBeStarted = error.rfind("org.freedesktop.DBus.Error.Spawn.", 0) == 0;
     if (couldNotBeStarted || error == DBUS_ERROR_SERVICE_UNKNOWN)
         return Failure("the scanner service is not running; start it: kesbt-scannerd");
