@@ -40,6 +40,10 @@ void Bluetoothd::start(int pid) {
     }
     m_bus = std::move(bus);
     m_objects.add(basePath() + "/any");
+    m_records = std::make_unique<OwnRecords>([this](const std::string& id) {
+        if (ServedAdapter* adapter = find(id))
+            adapter->uuidsChanged();
+    });
     for (const auto& hardware : m_world.adapters)
         plugIn(hardware);
 }
@@ -67,9 +71,9 @@ void Bluetoothd::clear() {
 }
 
 void Bluetoothd::plugIn(const std::shared_ptr<AdapterHardware>& hardware) {
-    for (const auto& other : m_adapters)
-        for (int times = 0; times < 2; ++times)
-            other->uuidsChanged();
+    m_records->plugIn(hardware->id());
+    for (const std::string& uuid : hardware->uuids)
+        m_records->add({hardware->id(), uuid, ""});
     m_adapters.push_back(std::make_unique<ServedAdapter>(*this, hardware));
     m_adapters.back()->announce();
     m_manager->adapterAdded(*m_adapters.back());
@@ -79,11 +83,13 @@ void Bluetoothd::plugIn(const std::shared_ptr<AdapterHardware>& hardware) {
 void Bluetoothd::pullOut(ServedAdapter& adapter) {
     const bool wasDefault = m_adapters.front().get() == &adapter;
     const std::string path = adapter.path();
+    const std::string id = adapter.hardware().id();
     adapter.goDown();
     const auto found = std::find_if(m_adapters.begin(), m_adapters.end(),
                                     [&](const auto& other) { return other.get() == &adapter; });
     bury(std::shared_ptr<ServedAdapter>(std::move(*found)));
     m_adapters.erase(found);
+    m_records->pullOut(id);
     m_manager->adapterRemoved(path, wasDefault);
 }
 

@@ -2,6 +2,7 @@
 #ifndef KESBLUETOOTH_SIM_DAEMON_BLUETOOTHD_H
 #define KESBLUETOOTH_SIM_DAEMON_BLUETOOTHD_H
 
+#include "daemon/own_records.h"
 #include "serving.h"
 #include "serving/bus/bus_connection.h"
 #include "serving/bus/object_tree.h"
@@ -51,6 +52,7 @@ public:
     BusConnection& bus() { return *m_bus; }
     ObjectTree& objects() { return m_objects; }
     ServedManager& manager() { return *m_manager; }
+    OwnRecords& records() { return *m_records; }
     const std::vector<std::unique_ptr<ServedAdapter>>& adapters() const { return m_adapters; }
     /// The adapter with that id or address, or null.
     ServedAdapter* find(const std::string& idOrAddress) const;
@@ -72,6 +74,7 @@ private:
     ObjectTree m_objects;
     std::unique_ptr<BusConnection> m_bus;
     std::unique_ptr<ServedManager> m_manager;
+    std::unique_ptr<OwnRecords> m_records;
     std::vector<std::unique_ptr<ServedAdapter>> m_adapters;
 };
 

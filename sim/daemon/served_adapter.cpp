@@ -157,7 +157,11 @@ void ServedAdapter::changed(const char* property, const Value& value) {
 }
 
 void ServedAdapter::uuidsChanged() {
-    changed("UUIDs", listValue("s", m_hardware->uuids));
+    changed("UUIDs", uuids());
+}
+
+Value ServedAdapter::uuids() const {
+    return listValue("s", m_daemon.records().uuids(m_hardware->id()));
 }
 
 void ServedAdapter::devicesChanged() {
@@ -183,7 +187,7 @@ void ServedAdapter::getProperties(const CallPtr& call) {
         .add("PairableTimeout", m_hardware->pairableTimeout)
         .add("Discovering", m_discovery.active())
         .add("Devices", devicePaths())
-        .add("UUIDs", listValue("s", m_hardware->uuids));
+        .add("UUIDs", uuids());
     call->reply(tuple(properties.end()));
 }
 

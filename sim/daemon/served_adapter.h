@@ -82,6 +82,7 @@ private:
     void setName(const CallPtr& call, const Value& value);
     void devicesChanged();
     Value devicePaths() const;
+    Value uuids() const;
 
     Bluetoothd& m_daemon;
     std::shared_ptr<AdapterHardware> m_hardware;

@@ -7,6 +7,8 @@
 #include "serving/bluez4/properties.h"
 #include "serving/bus/dict_builder.h"
 
+#include <cstdlib>
+
 namespace Bluetooth::Sim {
 
 ServedManager::ServedManager(Bluetoothd& daemon) : m_daemon(daemon) {
@@ -29,9 +31,12 @@ void ServedManager::defaultAdapter(const CallPtr& call) {
 
 void ServedManager::findAdapter(const CallPtr& call) {
     const std::string pattern = call->text(0);
-    if (pattern == "any")
+    if (pattern == "any" || pattern == "00:00:00:00:00:00")
         return call->reply(tuple(pathValue(m_daemon.basePath() + "/any")));
-    const ServedAdapter* adapter = m_daemon.find(pattern);
+    // What follows "hci" is read as a number, up to where it is none: "hciX" is hci0.
+    const bool isName = pattern.size() > 3 && pattern.compare(0, 3, "hci") == 0;
+    const ServedAdapter* adapter = m_daemon.find(
+        isName ? "hci" + std::to_string(std::strtol(pattern.c_str() + 3, nullptr, 10)) : pattern);
     if (!adapter)
         return call->fail(Errors::noSuchAdapter);
     call->reply(tuple(pathValue(adapter->path())));

@@ -37,9 +37,12 @@ struct AdapterHardware {
     bool powered = true;
     bool discoverable = false;
     bool pairable = true;
-    guint32 discoverableTimeout = 180;
+    guint32 discoverableTimeout = 0;
     guint32 pairableTimeout = 0;
-    std::vector<std::string> uuids;
+    /// The classes of its own service records: those of the daemon as it is shipped.
+    std::vector<std::string> uuids{
+        "00001112-0000-1000-8000-00805f9b34fb", "0000111f-0000-1000-8000-00805f9b34fb",
+        "0000110c-0000-1000-8000-00805f9b34fb", "0000110e-0000-1000-8000-00805f9b34fb"};
     std::map<std::string, StoredDevice> storage; ///< by address
 
     std::string id() const { return "hci" + std::to_string(index); }

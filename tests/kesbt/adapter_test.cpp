@@ -20,7 +20,7 @@ TEST_F(AdapterVerbs, AdaptersAreListedAndChosenByNameOrAddress) {
 TEST_F(AdapterVerbs, SetTellsOldAndNewValueInThePropertysOwnType) {
     EXPECT_EQ(run("adapter set powered off"), (Result{0, "Powered: yes -> no\n", ""}));
     EXPECT_EQ(run("adapter set Powered true").out, "Powered: no -> yes\n");
-    EXPECT_EQ(run("adapter set DiscoverableTimeout 60").out, "DiscoverableTimeout: 180 -> 60\n");
+    EXPECT_EQ(run("adapter set DiscoverableTimeout 60").out, "DiscoverableTimeout: 0 -> 60\n");
     EXPECT_EQ(
         json("adapter set Name 42"),
         (Json{{"adapter", "hci0"}, {"property", "Name"}, {"old", "kestrine-0"}, {"new", "42"}}));
