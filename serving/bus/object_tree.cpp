@@ -30,7 +30,7 @@ void ObjectTree::dispatch(const CallPtr& call) const {
         return introspect(call);
     const auto object = m_objects.find(call->path());
     if (object == m_objects.end())
-        return call->fail(unknown(*call, false));
+        return call->fail(unknown(*call, !childrenOf(call->path()).empty()));
     for (const Served& served : object->second) {
         if (call->interface() != served.interface->name)
             continue;

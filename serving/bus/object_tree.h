@@ -13,7 +13,7 @@ namespace Bluetooth::Serving {
 /// Which object serves which interfaces at which path.
 ///
 /// Answers as libdbus and the daemon do: an unknown interface, method or signature is
-/// UnknownMethod, an unknown path UnknownObject, and each path with something at or below it can be
+/// UnknownMethod, an unknown path UnknownObject. A path with something below it exists, and can be
 /// introspected.
 class ObjectTree {
 public:
