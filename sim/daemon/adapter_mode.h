@@ -19,8 +19,8 @@ class AdapterMode {
 public:
     explicit AdapterMode(ServedAdapter& adapter);
 
-    bool powered() const { return m_powered; }
-    bool discoverable() const { return m_discoverable; }
+    bool powered() const { return m_mode != Mode::Off; }
+    bool discoverable() const { return m_mode == Mode::Discoverable; }
     bool pairable() const;
     guint32 deviceClass() const;
 
@@ -39,19 +39,26 @@ public:
     void clientGone(const std::string& client);
 
 private:
+    enum class Mode { Off, Connectable, Discoverable };
+
+    Mode storedMode() const;
+    void change(const CallPtr& call, Mode wanted);
+    void changeTo(Mode wanted);
     void powerOn();
     void powerOff();
     void startDiscoverableTimeout();
     void startPairableTimeout();
     bool limited() const;
-    void classChangedFrom(bool wasLimited);
+    void classMayChange();
     void sessionEnded();
 
     ServedAdapter& m_adapter;
-    bool m_powered = false;
-    bool m_discoverable = false;
-    bool m_restoreDiscoverable = false; ///< what the next power-on brings back
-    bool m_powerFromSession = false;
+    Mode m_mode = Mode::Off;
+    Mode m_lastingMode = Mode::Off; ///< what it is without sessions
+    bool m_limited = false;         ///< the class says that it is discoverable for a short time
+    CallPtr m_asking;               ///< the RequestSession whose agent is asked
+    CallPtr m_changing;             ///< what is answered when the change has been made
+    OneShotTimer m_change;
     OneShotTimer m_discoverableTimer;
     OneShotTimer m_pairableTimer;
     std::vector<std::string> m_sessions; ///< owners, once for each session

@@ -81,16 +81,15 @@ void Bluetoothd::plugIn(const std::shared_ptr<AdapterHardware>& hardware) {
 }
 
 void Bluetoothd::pullOut(ServedAdapter& adapter) {
-    const bool wasDefault = m_adapters.front().get() == &adapter;
-    const std::string path = adapter.path();
-    const std::string id = adapter.hardware().id();
     adapter.goDown();
     const auto found = std::find_if(m_adapters.begin(), m_adapters.end(),
                                     [&](const auto& other) { return other.get() == &adapter; });
-    bury(std::shared_ptr<ServedAdapter>(std::move(*found)));
+    const std::shared_ptr<ServedAdapter> gone = std::move(*found);
     m_adapters.erase(found);
-    m_records->pullOut(id);
-    m_manager->adapterRemoved(path, wasDefault);
+    m_records->pullOut(gone->hardware().id());
+    m_manager->adapterRemoved(*gone);
+    gone->releaseAgents();
+    bury(gone);
 }
 
 ServedAdapter* Bluetoothd::find(const std::string& idOrAddress) const {

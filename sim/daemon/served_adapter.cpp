@@ -19,16 +19,6 @@ namespace {
 
 constexpr std::size_t longestName = 248;
 
-/// Cuts a name to what a controller stores, between two characters.
-std::string cut(const std::string& name) {
-    if (name.size() <= longestName)
-        return name;
-    const char* end = name.c_str() + longestName;
-    const gchar* valid = nullptr;
-    g_utf8_validate(name.c_str(), end - name.c_str(), &valid);
-    return {name.c_str(), valid};
-}
-
 } // namespace
 
 ServedAdapter::ServedAdapter(Bluetoothd& daemon, std::shared_ptr<AdapterHardware> hardware)
@@ -63,8 +53,6 @@ void ServedAdapter::comeUp() {
 
 void ServedAdapter::goDown() {
     m_mode.goDown();
-    releaseAgents();
-    m_agent.reset();
     for (const auto& device : m_devices)
         device->retire();
     m_daemon.objects().remove(m_path);
@@ -205,12 +193,16 @@ void ServedAdapter::setProperty(const CallPtr& call) {
 }
 
 void ServedAdapter::setName(const CallPtr& call, const Value& value) {
-    const std::string name = cut(value.text());
+    const std::string name = value.text().substr(0, longestName);
+    // It may have been cut within a character.
+    if (!g_utf8_validate(name.c_str(), -1, nullptr))
+        return call->fail(Errors::invalidArguments);
     call->reply();
     if (name == m_hardware->name)
         return;
     m_hardware->name = name;
-    changed("Name", name);
+    if (m_mode.powered())
+        changed("Name", name);
 }
 
 void ServedAdapter::requestSession(const CallPtr& call) {

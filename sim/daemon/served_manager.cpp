@@ -7,6 +7,7 @@
 #include "serving/bluez4/properties.h"
 #include "serving/bus/dict_builder.h"
 
+#include <algorithm>
 #include <cstdlib>
 
 namespace Bluetooth::Sim {
@@ -24,9 +25,9 @@ void ServedManager::getProperties(const CallPtr& call) {
 }
 
 void ServedManager::defaultAdapter(const CallPtr& call) {
-    if (m_daemon.adapters().empty())
+    if (m_default.empty())
         return call->fail(Errors::noSuchAdapter);
-    call->reply(tuple(pathValue(m_daemon.adapters().front()->path())));
+    call->reply(tuple(pathValue(m_default)));
 }
 
 void ServedManager::findAdapter(const CallPtr& call) {
@@ -61,18 +62,30 @@ void ServedManager::adaptersChanged() {
     emit("PropertyChanged", propertyChange("Adapters", adapterPaths()));
 }
 
+void ServedManager::setDefault(const ServedAdapter& adapter) {
+    m_default = adapter.path();
+    emit("DefaultAdapterChanged", tuple(pathValue(m_default)));
+}
+
 void ServedManager::adapterAdded(const ServedAdapter& adapter) {
     emit("AdapterAdded", tuple(pathValue(adapter.path())));
     adaptersChanged();
-    if (m_daemon.adapters().size() == 1)
-        emit("DefaultAdapterChanged", tuple(pathValue(adapter.path())));
+    if (m_default.empty())
+        setDefault(adapter);
 }
 
-void ServedManager::adapterRemoved(const std::string& path, bool wasDefault) {
+void ServedManager::adapterRemoved(const ServedAdapter& adapter) {
     adaptersChanged();
-    if (wasDefault && !m_daemon.adapters().empty())
-        emit("DefaultAdapterChanged", tuple(pathValue(m_daemon.adapters().front()->path())));
-    emit("AdapterRemoved", tuple(pathValue(path)));
+    if (m_default.empty() || m_default == adapter.path()) {
+        // The kernel lists its controllers the last one first, and only those that are on count.
+        const auto& all = m_daemon.adapters();
+        const auto next = std::find_if(all.rbegin(), all.rend(),
+                                       [](const auto& other) { return other->mode().powered(); });
+        m_default.clear();
+        if (next != all.rend())
+            setDefault(**next);
+    }
+    emit("AdapterRemoved", tuple(pathValue(adapter.path())));
 }
 
 } // namespace Bluetooth::Sim

@@ -21,7 +21,7 @@ public:
     ~ServedManager();
 
     void adapterAdded(const ServedAdapter& adapter);
-    void adapterRemoved(const std::string& path, bool wasDefault);
+    void adapterRemoved(const ServedAdapter& adapter);
 
 private:
     template <class Served>
@@ -35,8 +35,10 @@ private:
     Value adapterPaths() const;
     void emit(const char* member, const Value& arguments);
     void adaptersChanged();
+    void setDefault(const ServedAdapter& adapter);
 
     Bluetoothd& m_daemon;
+    std::string m_default; ///< path of the default adapter, or ""
 };
 
 } // namespace Bluetooth::Sim

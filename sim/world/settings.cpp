@@ -164,6 +164,7 @@ const SettingKey<Times> timeKeys[] = {
     {"ReverseSearch", setTime<&Times::reverseSearch>},
     {"Pairing", setTime<&Times::pairing>},
     {"KeyPress", setTime<&Times::keyPress>},
+    {"ModeChange", setTime<&Times::modeChange>},
     {"LinkLoss", setTime<&Times::linkLoss>},
     {"IdleDisconnect", setTime<&Times::idleDisconnect>},
     {"DisconnectRequest", setTime<&Times::disconnectRequest>},

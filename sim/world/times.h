@@ -21,6 +21,7 @@ struct Times {
     guint reverseSearch = 2000;     ///< from a device's own connection to our search
     guint pairing = 800;            ///< from the last answer to the end of a pairing
     guint keyPress = 300;           ///< between two keys that are typed on a device
+    guint modeChange = 50;          ///< to turn an adapter on, or to make it discoverable or not
     guint linkLoss = 5000;          ///< until the loss of a link is noticed
     guint idleDisconnect = 4000;    ///< until an unused link drops
     guint disconnectRequest = 2000; ///< from DisconnectRequested to the end of the link

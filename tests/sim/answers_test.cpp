@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <fstream>
+#include <ostream>
 #include <regex>
 
 namespace Bluetooth::Test {
@@ -13,6 +14,10 @@ struct Section {
     std::string name;
     Texts rows;
 };
+
+void PrintTo(const Section& section, std::ostream* out) {
+    *out << section.name;
+}
 
 struct Answers {
     std::map<std::string, std::string> errors; ///< texts by names

@@ -14,13 +14,14 @@ TEST_F(SimDaemonTest, PropertiesSayWhatTheyBecameBeforeOrAfterTheReply) {
     const std::string answer = "answer SetProperty";
     EXPECT_EQ(set("Name", "new"), lines(answer, "hci0 Name=s:new"));
     EXPECT_EQ(set("Name", "new"), lines(answer));
-    const std::string longName(247, 'x'); // names are cut between characters
-    EXPECT_EQ(set("Name", longName + "äö").back(), "hci0 Name=s:" + longName);
+    const std::string longName(247, 'x'); // names are cut, but in no character
+    EXPECT_EQ(set("Name", longName + "xyz").back(), "hci0 Name=s:" + longName + "x");
+    EXPECT_EQ(set("Name", longName + "äö"), lines(answer + " " + badArguments));
     EXPECT_EQ(set("Pairable", false), lines("hci0 Pairable=b:0", answer));
     EXPECT_EQ(set("PairableTimeout", 9U), lines("hci0 PairableTimeout=u:9", answer));
     EXPECT_EQ(set("Discoverable", true), lines("hci0 Discoverable=b:1", answer));
-    EXPECT_EQ(set("Powered", false),
-              lines("hci0 Discoverable=b:0", "hci0 Pairable=b:0", "hci0 Powered=b:0", answer));
+    EXPECT_EQ(set("Powered", false), lines("hci0 Discoverable=b:0", "hci0 Powered=b:0", answer));
+    EXPECT_EQ(set("Name", "off"), lines(answer));
     EXPECT_EQ(set("Powered", true),
               lines("hci0 Powered=b:1", "hci0 Pairable=b:0", "hci0 Class=u:7209216",
                     "hci0 Pairable=b:0", "hci0 Discoverable=b:1", answer));
@@ -33,26 +34,61 @@ TEST_F(SimDaemonTest, PropertiesSayWhatTheyBecameBeforeOrAfterTheReply) {
 }
 
 TEST_F(SimDaemonTest, DiscoverableTurnsTheAdapterOnAndEndsByItself) {
+    const auto on = [](const char* bits, const char* discoverable) {
+        return lines("hci0 Powered=b:1", "hci0 Pairable=b:1", std::string("hci0 Class=u:") + bits,
+                     "hci0 Pairable=b:1", std::string("hci0 Discoverable=b:") + discoverable,
+                     "answer SetProperty");
+    };
+    set("Powered", false);
+    EXPECT_EQ(set("Discoverable", false), on("7209216", "0"));
     set("Powered", false);
     set("DiscoverableTimeout", 2U);
     EXPECT_EQ(trace({"Adapter.SetProperty", "Discoverable", Var{true}}, "hci0 Class=u:7209216"),
-              lines("hci0 Powered=b:1", "hci0 Pairable=b:1", "hci0 Discoverable=b:1",
-                    "answer SetProperty", "hci0 Class=u:7217408", "hci0 Discoverable=b:0",
-                    "hci0 Class=u:7209216"));
+              lines("hci0 Powered=b:1", "hci0 Pairable=b:1", "hci0 Class=u:7217408",
+                    "hci0 Pairable=b:1", "hci0 Discoverable=b:1", "answer SetProperty",
+                    "hci0 Discoverable=b:0", "hci0 Class=u:7209216"));
     set("Pairable", false);
     set("PairableTimeout", 2U); // so does Pairable
     EXPECT_EQ(trace({"Adapter.SetProperty", "Pairable", Var{true}}, "hci0 Pairable=b:0"),
               lines("hci0 Pairable=b:1", "answer SetProperty", "hci0 Pairable=b:0"));
 }
 
-TEST_F(SimDaemonTest, AnAdapterThatIsOffIsNotReadyForTheAir) {
-    set("Powered", false);
-    for (const Question& question :
-         {Question("Adapter.StartDiscovery"), Question("Adapter.StopDiscovery"),
-          Question("Adapter.CreateDevice", newDevice),
-          Question("Adapter.CreatePairedDevice", newDevice, agent, "")})
-        EXPECT_EQ(call(question), "error NotReady: Resource Not Ready") << question.method;
-    EXPECT_EQ(call("Adapter.ListDevices"), "a()");
+TEST_F(SimDaemonTest, TheClassSaysLimitedOnlyForAShortTimeThatWasSetWhilePairable) {
+    const std::string answer = "answer SetProperty";
+    const std::string isLimited = "hci0 Class=u:7217408";
+    const std::string isNot = "hci0 Class=u:7209216";
+    control({"SetTimeScale", 1.0});
+    set("DiscoverableTimeout", 60U);
+    EXPECT_EQ(set("Discoverable", true), lines("hci0 Discoverable=b:1", answer, isLimited));
+    EXPECT_EQ(set("Pairable", false), lines("hci0 Pairable=b:0", answer));
+    EXPECT_NE(call("Adapter.GetProperties").find("u:7217408"), std::string::npos);
+    EXPECT_EQ(set("DiscoverableTimeout", 60U),
+              lines("hci0 DiscoverableTimeout=u:60", answer, isNot));
+    set("Pairable", true);
+    EXPECT_EQ(set("DiscoverableTimeout", 59U).back(), isLimited);
+    EXPECT_EQ(set("DiscoverableTimeout", 61U).back(), isNot);
+    EXPECT_EQ(set("DiscoverableTimeout", 0U).back(), answer);
+    EXPECT_EQ(set("DiscoverableTimeout", 0U), lines(answer));
+    set("DiscoverableTimeout", 1U);
+    EXPECT_EQ(set("Discoverable", false), lines("hci0 Discoverable=b:0", answer, isNot));
+}
+
+TEST_F(SimDaemonTest, OneChangeOfTheModeIsMadeAtATime) {
+    const std::string busy = "error Failed: Operation already in progress";
+    const auto startSetting = [&](const char* name, bool value) {
+        start({"Adapter.SetProperty", name, Var{value}});
+    };
+    setTime("ModeChange", "5000");
+    startSetting("Discoverable", true);
+    for (const Question& question : {Question("Adapter.SetProperty", "Powered", Var{false}),
+                                     Question("Adapter.SetProperty", "Discoverable", Var{true})})
+        EXPECT_EQ(call(question), busy);
+    until("answer");
+    startSetting("Powered", false); // this one takes no time
+    startSetting("Powered", true);
+    until("answer");
+    EXPECT_EQ(until("answer").back(), "answer SetProperty");
+    EXPECT_EQ(call({"Adapter.SetProperty", "Powered", Var{true}}), "");
 }
 
 TEST_F(SimDaemonTest, AdaptersComeAndGoInTheOrderOfTheDaemon) {
@@ -64,9 +100,11 @@ TEST_F(SimDaemonTest, AdaptersComeAndGoInTheOrderOfTheDaemon) {
                           "/ AdapterAdded o:hci2", "/ Adapters=a(o:hci0 o:hci1 o:hci2)",
                           "hci2 Powered=b:1", "hci2 Pairable=b:1", "hci2 Class=u:7209216",
                           "hci2 Name=s:third", "hci2 Pairable=b:1", "hci2 Discoverable=b:0"));
-    control({"RemoveAdapter", "hci0"});
-    EXPECT_EQ(taken(), lines("hci0 Pairable=b:0", "hci0 Powered=b:0", "/ Adapters=a(o:hci1 o:hci2)",
-                             "/ DefaultAdapterChanged o:hci1", "/ AdapterRemoved o:hci0"));
+    registerAgent();
+    control({"RemoveAdapter", "hci0"}); // what came last is the default
+    EXPECT_EQ(taken(),
+              lines("hci0 Pairable=b:0", "hci0 Powered=b:0", "/ Adapters=a(o:hci1 o:hci2)",
+                    "/ DefaultAdapterChanged o:hci2", "/ AdapterRemoved o:hci0", "agent Release"));
     control({"RemoveAdapter", "hci1"});
     control({"RemoveAdapter", "hci2"});
     EXPECT_EQ(taken().back(), "/ AdapterRemoved o:hci2");

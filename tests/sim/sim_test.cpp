@@ -144,10 +144,9 @@ void SimTest::create(const Settings& settings) {
 }
 
 Texts SimTest::effectOf(const Question& question) {
-    taken();
-    start(question);
+    Texts came = trace(question);
     control("ClearFaults"); // answered after all that the call brought about
-    return taken();
+    return came + taken();
 }
 
 void SimTest::leave(std::unique_ptr<SimClient>& other) {
