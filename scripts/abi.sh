@@ -9,7 +9,6 @@ kept=$root/src/kesbluetooth.symbols
 case "${1:-}" in '' | --update) ;; *) echo "usage: abi.sh [--update]" >&2; exit 2 ;; esac
 # The folder is shared with the tests, and configured for them unless it was otherwise before.
 need_packages "${build_packages[@]}" "${test_packages[@]}" binutils castxml python3
-echo "Building in build ..."
 build_target=kesbluetooth
 build "$root/build"
 

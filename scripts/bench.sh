@@ -23,7 +23,6 @@ esac
     die "KES_BENCH_BASELINE has to name a libkesbluetooth.so.1: $baseline"
 
 need_packages "${build_packages[@]}" "${bench_packages[@]}"
-echo "Building in ${folder#"$root"/} ..."
 build_target=bench/all
 build "$folder" -DKESBLUETOOTH_BUILD_BENCH=ON -DKESBLUETOOTH_BUILD_TESTS=OFF
 

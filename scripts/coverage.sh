@@ -6,7 +6,6 @@ source "$(dirname "$0")/lib.sh"
 
 folder=$root/build-coverage
 need_packages "${build_packages[@]}" "${test_packages[@]}" gcovr
-echo "Building in ${folder#"$root"/} ..."
 build "$folder" -DCMAKE_BUILD_TYPE=Debug -DCMAKE_CXX_FLAGS="--coverage -fprofile-update=atomic"
 find "$folder" -name '*.gcda' -delete # of a run before
 echo "Testing ..."

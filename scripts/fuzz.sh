@@ -14,7 +14,6 @@ seconds=${1:-600}
 
 folder=$root/build-fuzz
 need_packages "${build_packages[@]}" clang-14 libclang-rt-14-dev
-echo "Building in ${folder#"$root"/} ..."
 build "$folder" -DCMAKE_C_COMPILER=clang-14 -DCMAKE_CXX_COMPILER=clang++-14 \
     -DKESBLUETOOTH_SANITIZE=fuzzer-no-link,address,undefined -DKESBLUETOOTH_BUILD_FUZZERS=ON \
     -DKESBLUETOOTH_BUILD_TESTS=OFF -DKESBLUETOOTH_BUILD_TOOLS=OFF -DKESBLUETOOTH_BUILD_SIM=OFF

@@ -37,10 +37,12 @@ need_packages() {
 
 build_target=all
 
-# build FOLDER [cmake option...]: configures and builds, showing output only when that fails.
+# build FOLDER [cmake option...]: configures and builds, showing its output only when it fails.
 build() {
-    local folder=$1 log
+    local folder=$1 log first=""
     shift
+    [ -e "$folder/build.ninja" ] || first=" (the first time this takes minutes)"
+    echo "Building in ${folder#"$root"/}$first ..."
     log=$(mktemp)
     # What was compiled in one build folder is not compiled again in another.
     local launcher=()

@@ -10,7 +10,6 @@ case "${1:-}" in '' | --test) ;; *) echo "usage: packages.sh [--test]" >&2; exit
 
 folder=$root/build-packages
 need_packages "${build_packages[@]}" "${docs_packages[@]}" dpkg-dev file lintian
-echo "Building in ${folder#"$root"/} ..."
 build "$folder" -DCMAKE_INSTALL_PREFIX=/usr -DCMAKE_SKIP_INSTALL_RPATH=ON \
     -DKESBLUETOOTH_BUILD_TESTS=OFF -DKESBLUETOOTH_BUILD_DOCS=ON
 rm -f "$folder"/*.deb

@@ -14,7 +14,6 @@ case "${1:-}" in
 esac
 
 need_packages "${build_packages[@]}" "${test_packages[@]}"
-echo "Building in build ..."
 build "$root/build" -DKESBLUETOOTH_BUILD_TESTS=ON -DKESBLUETOOTH_SANITIZE=
 # Not through ctest, which ends a test after two minutes. Each in a process of its own.
 tests=$root/build/tests/soak-tests

@@ -4,7 +4,6 @@
 source "$(dirname "$0")/lib.sh"
 
 need_packages "${build_packages[@]}"
-echo "Building in build ..."
 build "$root/build" -DKESBLUETOOTH_BUILD_TESTS=OFF
 
 for program in kesbt scannerd autoconnectd; do

@@ -8,7 +8,6 @@ source "$(dirname "$0")/lib.sh"
 
 filter=${1:-DecodingTest.*:CallTest.*:SignalTest.*:PendingTest.*:Agent*Test.*:*Codec*:ProxyTest.*:ServerTest.*-ServerTest.FindersComeAndGo*}
 need_packages "${build_packages[@]}" "${test_packages[@]}" valgrind
-echo "Building in build ..."
 build "$root/build" -DKESBLUETOOTH_BUILD_TESTS=ON -DKESBLUETOOTH_SANITIZE=
 
 log=$root/build/valgrind
