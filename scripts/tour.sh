@@ -12,17 +12,26 @@ case "${1:-}" in
     "${enter[@]}" true 2>/dev/null && exec "${enter[@]}" "$0" isolated
     echo "Without namespaces: no HCI versions, and no auto-connect, which writes to /etc."
     ;;
-isolated) # The simulated adapters' hciconfig stands in /usr/bin, and /etc and /tmp can be written.
+isolated) # The simulated adapters' hciconfig stands in /usr/bin, and /etc can be written.
     hciconfig=${KES_TOUR_HCICONFIG:-$(dirname "$(realpath "$0")")/host}
-    layer=$(mktemp -d)
-    mount -t tmpfs tmpfs "$layer"
-    mkdir "$layer"/{etc,etc-work,tmp,tmp-work}
+    mount -t tmpfs tmpfs /run # for the PID file, and what is laid over the other folders
+    layer=/run/tour
+    mkdir -p "$layer"/{etc,etc-work,tmp}
+    chmod 1777 "$layer/tmp"
+    # A /tmp of its own: what others have left there is in the way, a pipe for instance. The programs
+    # stay, should they be there.
+    IFS=: read -ra places <<<"$PWD:$(realpath "$0"):$hciconfig:${KES_TOUR_SERVICES:-}:$PATH"
+    for place in "${places[@]}"; do
+        [[ $place =~ ^/tmp/[^/]+ ]] && place=${BASH_REMATCH[0]} && [ -d "$place" ] && [ ! -e "$layer$place" ] || continue
+        mkdir "$layer$place"
+        mount --rbind "$place" "$layer$place"
+    done
     mount -t overlay overlay -o "lowerdir=$hciconfig:/usr/bin" /usr/bin
     mount -t overlay overlay -o "lowerdir=/etc,upperdir=$layer/etc,workdir=$layer/etc-work" /etc
-    mount -t overlay overlay -o "lowerdir=/tmp,upperdir=$layer/tmp,workdir=$layer/tmp-work" /tmp
+    mount --rbind "$layer/tmp" /tmp
+    cd "$PWD"
     mkdir -p /etc/bluetooth
     mount -t tmpfs tmpfs /etc/bluetooth # one that was there belongs to somebody else
-    mount -t tmpfs tmpfs /run # for the PID file
     export KES_TOUR_ISOLATED=1
     ;;
 esac
