@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: LGPL-2.1-or-later
 #include "bus.h"
 
+#include "processor_time.h"
+
 #include <stdexcept>
 
 namespace Bench {
@@ -17,6 +19,10 @@ Bus::Bus()
       m_peer({KES_BENCH_PEER, m_bus.address()}, Bluetooth::Test::ChildProcess::Output::Capture) {
     if (m_peer.readLine() != "ready")
         throw std::runtime_error("the peer does not start: " + m_peer.readErrors());
+}
+
+double Bus::processorSeconds() const {
+    return Bench::processorSeconds(m_bus.pid());
 }
 
 } // namespace Bench

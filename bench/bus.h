@@ -10,6 +10,8 @@ namespace Bench {
 class Bus {
 public:
     Bus();
+    /// The processor time, in seconds, that the bus daemon has used so far.
+    double processorSeconds() const;
 
 private:
     Bluetooth::Test::PrivateBus m_bus;

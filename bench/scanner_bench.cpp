@@ -4,6 +4,7 @@
 // Each load is measured in a process of its own, with a filter that picks it.
 
 #include "memory_of.h"
+#include "processor_time.h"
 
 #include "support/child_process.h"
 #include "support/private_bus.h"
@@ -78,15 +79,6 @@ std::string scenario(const Load& load) {
             text << "Known=true\nPresent=false\n";
     }
     return text.str();
-}
-
-/// The processor time that a process has used so far.
-double processorSeconds(pid_t pid) {
-    clockid_t clock = 0;
-    timespec time = {};
-    if (clock_getcpuclockid(pid, &clock) != 0 || clock_gettime(clock, &time) != 0)
-        throw std::runtime_error("the service has ended");
-    return static_cast<double>(time.tv_sec) + static_cast<double>(time.tv_nsec) / 1e9;
 }
 
 /// A client program: asks until the time is over and writes how long each answer took, in
@@ -178,7 +170,7 @@ void measure(benchmark::State& state, const Load& load) {
     for (auto _ : state) {
         askFromAllClients(load.clients, load.warmUp);
         const double memoryBefore = Bench::memoryOf(service.pid(), "status", "VmRSS:");
-        const double usedBefore = processorSeconds(service.pid());
+        const double usedBefore = Bench::processorSeconds(service.pid());
         const long signalsBefore = signalCount;
         const auto start = Clock::now();
         const Result result = askFromAllClients(load.clients, seconds);
@@ -193,7 +185,7 @@ void measure(benchmark::State& state, const Load& load) {
         state.counters["longest_us"] = at(result.times, 1);
         state.counters["answers_per_second"] = answers / duration;
         state.counters["processor_us"] =
-            (processorSeconds(service.pid()) - usedBefore) / answers * 1e6;
+            (Bench::processorSeconds(service.pid()) - usedBefore) / answers * 1e6;
         state.counters["signals_per_second"] =
             static_cast<double>(signalCount - signalsBefore) / duration;
         state.counters["rss_before_bytes"] = memoryBefore;

@@ -5,7 +5,8 @@
 # packages that are missing.
 #   scripts/bench.sh [--quick]   --quick: too short for good figures; leaves docs/ as it is
 # BENCH_FOLDER names another build folder than build-bench. KES_BENCH_BASELINE names the
-# libkesbluetooth.so.1 of another build: it is measured beside this one, and the page compares them.
+# libkesbluetooth.so.1 of another build: it is measured beside this one, and the page compares them
+# (not whole programs, which may need the library of their own version).
 source "$(dirname "$0")/lib.sh"
 
 rounds=3 repetitions=30 lists=20 signals=8 scheduling=3 idle=20 shortest=0.1 threads=5 processes=10
@@ -81,9 +82,9 @@ for ((round = 1; round <= rounds; ++round)); do
     measure one data $round 1 '[^/]*'
     measure all thread $round $threads threads
     if [ -x "$folder/bench/kesbluetooth-bench-process" ]; then
-        measure all process $round $processes '[^/]*'
+        baseline= measure all process $round $processes '[^/]*'
         for load in found-1000 known-1000 found-4000; do
-            measure all scanner $load-$round 1 "scanner/$load"
+            baseline= measure all scanner $load-$round 1 "scanner/$load"
         done
     fi
 done

@@ -24,6 +24,7 @@ public:
     static std::string address(Kind kind);
 
     const std::string& address() const { return m_address; }
+    pid_t pid() const { return m_daemon->pid(); }
     void kill() { m_daemon->kill(); }
     /// Starts it again at the same address after kill().
     void start();
