@@ -364,6 +364,10 @@ The most signals a second before anybody on the way has to queue, so that they a
 peer, the bus or the library.
 
 {table(["library", "one processor", "all processors"], most)}
+In a burst of calls the receive thread looks for signals every millisecond, so that no call has to
+wake it: a string beside an idle receive thread takes 0.89 of the time that it takes when each call
+wakes the thread, on all processors 0.73 (30 repetitions, measured when the page was last reworded).
+
 What a thread that waits for signals takes in a minute in which none comes. kesbluetooth's looks
 once a second whether a blocking call of the program itself has read a signal without waking it;
 `stopLoop()` wakes it at once:
