@@ -7,7 +7,8 @@
 
 namespace Bluetooth::Serving {
 
-/// The configuration of a dbus-daemon that allows everything to everyone who can reach its socket.
+/// The configuration of a dbus-daemon that allows everything to everyone who can reach its socket,
+/// with the limits of a session bus.
 /// @param type  "system" or "session"
 /// @param socket  the path of its socket
 /// @param serviceFolders  where it looks for services that it can start

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: LGPL-2.1-or-later
 #include "support/child_process.h"
 #include "support/private_bus.h"
+#include "support/raw_peer.h"
 
 #include <gtest/gtest.h>
 
@@ -63,6 +64,23 @@ TEST_F(CommandTest, ASignalEndsTheCommandAndWhatItLeavesRunningEndsWithTheSessio
     EXPECT_EQ(process->wait(), 9);
     EXPECT_NE(kill(command, 0), 0);
     EXPECT_NE(kill(std::stoi(runShell("sleep 1000 >/dev/null 2>&1 & echo $!").out), 0), 0);
+}
+
+TEST_F(CommandTest, TheBusesLetManyCallsWaitForTheirAnswers) {
+    const auto process =
+        start({"--no-daemon", "--", "sh", "-c",
+               "echo $DBUS_SYSTEM_BUS_ADDRESS; echo $DBUS_SESSION_BUS_ADDRESS; exec sleep 1000"});
+    for (int bus = 0; bus < 2; ++bus) {
+        const std::string address = process->readLine();
+        RawPeer silent(address, "com.example.Silent");
+        silent.neverReply("Wait");
+        RawPeer caller(address);
+        for (int i = 0; i < 300; ++i)
+            caller.call("com.example.Silent", "/", "com.example.Silent", "Wait");
+        EXPECT_TRUE(silent.waitForCalls("Wait", 300));
+    }
+    process->signal(SIGTERM);
+    process->wait();
 }
 
 TEST_F(CommandTest, TheDaemonCanBeAbsentOrKilledWhileTheBusesStay) {
