@@ -107,8 +107,9 @@ Value WorldControl::comeIn(const CallPtr& call, bool pairing) {
     if (!to.mode().powered())
         throw std::runtime_error("the adapter is off");
     auto known = to.find(from->address);
-    if (known && known->busy())
+    if (known && (known->busy() || known->pairing()))
         throw std::runtime_error("the device is busy");
+    to.learnClass(*from);
     if (!known)
         known = to.addDevice(from->address);
     known->comeIn(pairing);

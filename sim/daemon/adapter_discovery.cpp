@@ -129,6 +129,8 @@ void AdapterDiscovery::askNextName() {
         if (peer->connectable && visible(*peer)) {
             m_adapter.hardware().storage[peer->address].name = peer->name;
             see(*peer);
+            if (const auto device = m_adapter.find(peer->address))
+                device->learnName();
         }
         askNextName();
     });
@@ -164,28 +166,26 @@ void AdapterDiscovery::peerChanged(const std::shared_ptr<PeerDevice>& peer) {
 }
 
 void AdapterDiscovery::see(PeerDevice& peer) {
-    StoredDevice& stored = m_adapter.hardware().storage[peer.address];
-    stored.deviceClass = peer.deviceClass;
-    if (peer.nameInInquiry)
-        stored.name = peer.name;
+    m_adapter.learnClass(peer);
+    // A name that comes with the inquiry is shown, but only one that was asked for is stored.
+    const std::string& stored = m_adapter.hardware().storage[peer.address].name;
+    const std::string& name = peer.nameInInquiry ? peer.name : stored;
 
     const int range = static_cast<int>(peer.rssiVariation);
     const int offset = range ? static_cast<int>(m_round * 3 + 1) % (2 * range + 1) - range : 0;
     const auto rssi = static_cast<gint16>(peer.rssi + offset);
 
     const auto before = m_found.find(peer.address);
-    const bool news = before == m_found.end() || before->second.rssi != rssi ||
-                      before->second.name != stored.name;
-    m_found[peer.address] = {rssi, stored.name, true};
-    if (const auto device = m_adapter.find(peer.address))
-        device->seen();
+    const bool news =
+        before == m_found.end() || before->second.rssi != rssi || before->second.name != name;
+    m_found[peer.address] = {rssi, name, true};
     if (news)
-        report(peer, rssi);
+        report(peer, rssi, name);
 }
 
-void AdapterDiscovery::report(const PeerDevice& peer, gint16 rssi) {
+void AdapterDiscovery::report(const PeerDevice& peer, gint16 rssi, const std::string& name) {
     const StoredDevice& stored = m_adapter.hardware().storage[peer.address];
-    std::string alias = stored.alias.empty() ? stored.name : stored.alias;
+    std::string alias = stored.alias.empty() ? name : stored.alias;
     if (alias.empty())
         alias = withSeparator(peer.address, '-');
     DictBuilder values;
@@ -193,8 +193,8 @@ void AdapterDiscovery::report(const PeerDevice& peer, gint16 rssi) {
         .add("Class", peer.deviceClass)
         .add("Icon", iconOf(peer.deviceClass))
         .add("RSSI", rssi);
-    if (!stored.name.empty())
-        values.add("Name", stored.name);
+    if (!name.empty())
+        values.add("Name", name);
     values.add("Alias", alias).add("LegacyPairing", peer.legacy).add("Paired", stored.paired);
     if (peer.lowEnergy)
         values.add("Broadcaster", peer.broadcaster);

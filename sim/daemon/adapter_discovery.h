@@ -55,7 +55,7 @@ private:
     void askNextName();
     void endRound();
     void see(PeerDevice& peer);
-    void report(const PeerDevice& peer, gint16 rssi);
+    void report(const PeerDevice& peer, gint16 rssi, const std::string& name);
     bool visible(const PeerDevice& peer) const;
 
     ServedAdapter& m_adapter;

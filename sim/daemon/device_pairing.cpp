@@ -73,9 +73,9 @@ void DevicePairing::negotiate() {
         return fail(Errors::authenticationRejected);
     if (const auto& end = peer->pairingEnd) {
         if (end->since == PairingEnd::Since::Begun)
-            return failLater(m_timer, *end);
+            return failLater(*end);
         if (end->since == PairingEnd::Since::Asked)
-            failLater(m_loss, *end);
+            m_loss.start(delayOf(*end), [this] { m_device.link().drop(); });
     }
     if (peer->legacy && peer->displaysPin && m_outgoing)
         displayPin();
@@ -115,10 +115,8 @@ void DevicePairing::askForPin() {
 
 void DevicePairing::displayPin() {
     const GlibPtr<char> pin(g_strdup_printf("%06u", passkey()));
-    m_displaying = true;
     ask("DisplayPinCode", tuple(pathValue(m_device.path()), pin.get()), "",
         [this](const CallResult& answer) {
-            m_displaying = !answer.failed;
             if (!answer.failed)
                 return answered(true);
             // An agent that cannot show a PIN is asked for one.
@@ -135,10 +133,8 @@ void DevicePairing::askByCapabilities() {
         return answered(true);
     if (ours == Capability::KeyboardOnly)
         return enter(passkey(), theirs == Capability::KeyboardOnly);
-    if (theirs == Capability::KeyboardOnly) {
-        m_displaying = true;
-        return display(passkey(), 0);
-    }
+    if (theirs == Capability::KeyboardOnly)
+        return display(passkey());
     confirm(passkey());
 }
 
@@ -162,14 +158,12 @@ void DevicePairing::enter(guint32 passkey, bool typedOnBothSides) {
         });
 }
 
-void DevicePairing::display(guint32 passkey, guint8 entered) {
-    constexpr guint8 digits = 6;
+/// The agent is not told of the keys that are typed, nor when it may stop showing.
+void DevicePairing::display(guint32 passkey) {
+    constexpr guint digits = 6;
     const Times& times = m_device.adapter().daemon().times();
-    m_agent->show("DisplayPasskey", tuple(pathValue(m_device.path()), passkey, entered));
-    if (entered == digits)
-        return answered(true);
-    m_timer.start(times.scaled(times.keyPress),
-                  [this, passkey, entered] { display(passkey, static_cast<guint8>(entered + 1)); });
+    m_agent->show("DisplayPasskey", tuple(pathValue(m_device.path()), passkey));
+    m_timer.start(times.scaled(times.keyPress * digits), [this] { answered(true); });
 }
 
 void DevicePairing::answered(bool right) {
@@ -178,47 +172,35 @@ void DevicePairing::answered(bool right) {
     if (!peer || (end && end->since == PairingEnd::Since::Asked))
         return; // nothing more is heard until the loss is noticed
     if (end && end->since == PairingEnd::Since::Answered)
-        return failLater(m_timer, *end);
+        return failLater(*end);
     m_timer.start(duration(), [this, right] {
         if (right)
-            finish();
+            succeed();
         else
             fail(Errors::authenticationFailed);
     });
 }
 
-void DevicePairing::failLater(OneShotTimer& timer, const PairingEnd& end) {
-    const Times& times = m_device.adapter().daemon().times();
-    const guint delay = end.after ? times.lasting(end.after) : duration();
-    timer.start(delay, [this, error = end.error] { fail(error); });
+guint DevicePairing::delayOf(const PairingEnd& end) const {
+    return end.after ? m_device.adapter().daemon().times().lasting(end.after) : duration();
 }
 
-void DevicePairing::finish() {
-    const Times& times = m_device.adapter().daemon().times();
-    m_done = true;
-    m_loss.stop();
-    if (m_displaying)
-        m_agent->cancel();
-    m_displaying = false;
-    m_device.setTemporary(false);
-    m_device.stored().known = true;
-    m_device.setPaired(true);
-    if (m_outgoing)
-        m_agent->release();
-    m_agent.reset();
-    m_timer.start(times.scaled(m_outgoing ? times.serviceSearch : times.reverseSearch),
-                  [this] { succeed(); });
+void DevicePairing::failLater(const PairingEnd& end) {
+    m_timer.start(delayOf(end), [this, error = end.error] { fail(error); });
 }
 
 void DevicePairing::succeed() {
-    ServedAdapter& adapter = m_device.adapter();
+    ServedDevice& device = m_device;
     const bool outgoing = m_outgoing;
-    m_device.learnServices();
-    if (m_call)
-        m_call->reply(tuple(pathValue(m_device.path())));
-    end();
+    const CallPtr creating = m_call;
+    device.keep();
+    device.setPaired(true);
     if (outgoing)
-        adapter.discovery().resume();
+        m_agent->release();
+    end();
+    device.pairingSucceeded(creating);
+    if (outgoing)
+        device.adapter().discovery().resume();
 }
 
 void DevicePairing::stopTimers() {
@@ -240,7 +222,7 @@ void DevicePairing::end() {
 void DevicePairing::fail(const BusError& error) {
     const auto device = m_device.shared_from_this();
     const bool outgoing = m_outgoing;
-    if (m_agent && (m_agent->busy() || m_displaying))
+    if (m_agent && m_agent->busy())
         m_agent->cancel();
     if (m_call)
         m_call->fail(error);
@@ -260,7 +242,6 @@ void DevicePairing::removeFailed(const std::shared_ptr<ServedDevice>& device, bo
 }
 
 void DevicePairing::cancel(const CallPtr& call) {
-    m_device.setTemporary(true);
     m_cancelled = true;
     stopTimers();
     if (m_device.link().up())
@@ -270,15 +251,11 @@ void DevicePairing::cancel(const CallPtr& call) {
 }
 
 void DevicePairing::linkLost() {
-    if (m_done && !m_cancelled)
-        return succeed(); // paired already: only the services were still being read
-    if (!m_cancelled)
-        return fail(pageTimeout);
     const auto device = m_device.shared_from_this();
     const auto agent = m_agent;
     const CallPtr creating = m_call;
     const bool outgoing = m_outgoing;
-    if (agent && (agent->busy() || m_displaying))
+    if (agent && agent->busy())
         agent->cancel();
     end();
     removeFailed(device, outgoing);
@@ -293,8 +270,6 @@ void DevicePairing::powerLost() {
 }
 
 void DevicePairing::ownerGone() {
-    if (m_done)
-        return;
     m_device.setTemporary(!m_device.stored().known);
     m_cancelled = true;
     stopTimers();

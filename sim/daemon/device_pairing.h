@@ -51,13 +51,13 @@ private:
     void askByCapabilities();
     void confirm(guint32 passkey);
     void enter(guint32 passkey, bool typedOnBothSides);
-    void display(guint32 passkey, guint8 entered);
+    void display(guint32 passkey);
     void ask(const char* member, const Value& arguments, const char* results,
              ClientAgent::OnAnswer onAnswer);
     void answered(bool right);
-    void finish();
     void succeed();
-    void failLater(OneShotTimer& timer, const PairingEnd& end);
+    guint delayOf(const PairingEnd& end) const;
+    void failLater(const PairingEnd& end);
     void fail(const BusError& error);
     void end();
     static void removeFailed(const std::shared_ptr<ServedDevice>& device, bool outgoing);
@@ -69,9 +69,7 @@ private:
     CallPtr m_call; ///< null when the device began the pairing
     std::shared_ptr<ClientAgent> m_agent;
     bool m_outgoing;
-    bool m_displaying = false;
     bool m_cancelled = false;
-    bool m_done = false;
     Link::Hold m_hold;
     OneShotTimer m_timer;
     OneShotTimer m_timeout;

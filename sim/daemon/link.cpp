@@ -78,6 +78,7 @@ void Link::drop() {
 }
 
 void Link::requestDisconnect(const CallPtr& call) {
+    m_device.cancelSearch();
     if (call)
         m_disconnects.push_back(call);
     if (m_disconnect.running())

@@ -3,9 +3,9 @@
 
 #include "daemon/bluetoothd.h"
 #include "daemon/client_agent.h"
-#include "daemon/device_creation.h"
 #include "daemon/device_pairing.h"
 #include "daemon/served_device.h"
+#include "daemon/service_search.h"
 #include "serving/bluez4/address.h"
 #include "serving/bluez4/errors.h"
 #include "serving/bluez4/properties.h"
@@ -43,8 +43,7 @@ ServedAdapter::~ServedAdapter() {
 
 void ServedAdapter::announce() {
     for (const auto& device : m_devices)
-        if (device->stored().paired)
-            device->changed("Paired", true);
+        device->announceStored();
 }
 
 void ServedAdapter::comeUp() {
@@ -63,8 +62,8 @@ void ServedAdapter::loseDevices() {
     for (const auto& device : devices) {
         if (device->pairing())
             device->pairing()->powerLost();
-        else if (device->creation())
-            device->creation()->powerLost();
+        else if (device->search() && !device->link().up())
+            device->search()->notReached();
         device->link().drop();
     }
 }
@@ -113,6 +112,7 @@ std::shared_ptr<ServedDevice> ServedAdapter::find(const std::string& address) co
 std::shared_ptr<ServedDevice> ServedAdapter::addDevice(const std::string& address) {
     auto device = std::make_shared<ServedDevice>(*this, address);
     m_devices.push_back(device);
+    device->announceStored();
     emit("DeviceCreated", tuple(pathValue(device->path())));
     devicesChanged();
     return device;
@@ -123,9 +123,10 @@ void ServedAdapter::forgetDevice(const std::shared_ptr<ServedDevice>& device) {
     if (found == m_devices.end())
         return;
     m_devices.erase(found);
-    device->retire();
     devicesChanged();
     emit("DeviceRemoved", tuple(pathValue(device->path())));
+    device->cancelSearch();
+    device->retire();
     // Alias, class and name are kept apart from the device.
     StoredDevice& stored = device->stored();
     stored.known = false;
@@ -134,6 +135,15 @@ void ServedAdapter::forgetDevice(const std::shared_ptr<ServedDevice>& device) {
     stored.blocked = false;
     stored.uuids.clear();
     m_daemon.bury(device);
+}
+
+void ServedAdapter::learnClass(const PeerDevice& peer) {
+    StoredDevice& stored = m_hardware->storage[peer.address];
+    if (peer.deviceClass == 0 || stored.deviceClass == peer.deviceClass)
+        return;
+    stored.deviceClass = peer.deviceClass;
+    if (const auto device = find(peer.address))
+        device->changed("Class", peer.deviceClass);
 }
 
 void ServedAdapter::emit(const char* member, const Value& arguments) {
@@ -251,7 +261,7 @@ void ServedAdapter::createPairedDevice(const CallPtr& call) {
     if (isOurAgent || !parseCapability(call->text(2)))
         return call->fail(Errors::invalidArguments);
     auto device = find(upperCase(address));
-    if (device && device->busy())
+    if (device && device->pairing())
         return call->fail(Errors::inProgress);
     if (device && device->stored().paired)
         return call->fail(Errors::alreadyExists);
@@ -265,22 +275,29 @@ void ServedAdapter::cancelDeviceCreation(const CallPtr& call) {
     if (!isAddress(address))
         return call->fail(Errors::invalidArguments);
     const auto device = find(upperCase(address));
-    if (!device || !(device->creation() || device->pairing()))
+    const DevicePairing* pairing = device ? device->pairing() : nullptr;
+    const ServiceSearch* search = device ? device->search() : nullptr;
+    std::string owner = pairing ? pairing->owner() : "";
+    if (owner.empty() && search && search->isCreating())
+        owner = search->owner();
+    if (owner.empty())
         return call->fail(Errors::doesNotExist);
-    const std::string owner =
-        device->creation() ? device->creation()->owner() : device->pairing()->owner();
     if (owner != call->sender())
         return call->fail(Errors::notAuthorized);
-    if (device->creation())
-        device->creation()->cancel(call);
-    else
-        device->pairing()->cancel(call);
+    device->setTemporary(true);
+    if (pairing)
+        return device->pairing()->cancel(call);
+    if (device->link().up())
+        return device->link().requestDisconnect(call);
+    forgetDevice(device);
+    call->reply();
 }
 
 void ServedAdapter::removeDevice(const CallPtr& call) {
     const std::string path = call->text(0);
-    const auto found = std::find_if(m_devices.begin(), m_devices.end(),
-                                    [&](const auto& device) { return device->path() == path; });
+    const auto found = std::find_if(m_devices.begin(), m_devices.end(), [&](const auto& device) {
+        return g_ascii_strcasecmp(device->path().c_str(), path.c_str()) == 0;
+    });
     if (found == m_devices.end())
         return call->fail(Errors::doesNotExist);
     const auto device = *found;

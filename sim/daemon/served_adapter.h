@@ -56,6 +56,9 @@ public:
     /// Takes a device off the bus and out of storage, and announces that.
     void forgetDevice(const std::shared_ptr<ServedDevice>& device);
 
+    /// The device has said of what class it is.
+    void learnClass(const PeerDevice& peer);
+
     void emit(const char* member, const Value& arguments);
     void changed(const char* property, const Value& value);
     void uuidsChanged();

@@ -3,17 +3,19 @@
 
 #include "daemon/bluetoothd.h"
 #include "daemon/device_audio.h"
-#include "daemon/device_creation.h"
 #include "daemon/device_pairing.h"
 #include "daemon/served_adapter.h"
+#include "daemon/service_records.h"
 #include "daemon/service_search.h"
 #include "serving/bluez4/address.h"
 #include "serving/bluez4/errors.h"
 #include "serving/bluez4/icon.h"
 #include "serving/bluez4/properties.h"
 #include "serving/bus/dict_builder.h"
+#include "world/settings.h"
 
-#include <algorithm>
+#include <set>
+#include <utility>
 
 namespace Bluetooth::Sim {
 
@@ -22,7 +24,6 @@ ServedDevice::ServedDevice(ServedAdapter& adapter, std::string address)
       m_address(std::move(address)),
       m_path(adapter.path() + "/dev_" + withSeparator(m_address, '_')),
       m_stored(adapter.hardware().storage[m_address]),
-      m_classKnown(m_stored.deviceClass.has_value()),
       m_name(m_stored.name),
       m_link(*this) {
     m_adapter.daemon().objects().add(m_path, deviceInterface<ServedDevice>(), this);
@@ -48,7 +49,6 @@ void ServedDevice::retire() {
         work->abandon();
         daemon.bury(std::move(work));
     };
-    end(m_creation);
     end(m_pairing);
     end(m_search);
     daemon.objects().remove(m_path);
@@ -63,8 +63,9 @@ bool ServedDevice::reachable() const {
     return peer && peer->present && peer->connectable && !m_stored.blocked;
 }
 
-bool ServedDevice::busy() const {
-    return m_creation || m_pairing || m_search;
+void ServedDevice::keep() {
+    m_temporary = false;
+    m_stored.known = true;
 }
 
 void ServedDevice::emit(const char* member, const Value& arguments) {
@@ -128,25 +129,37 @@ void ServedDevice::setTrusted(const CallPtr& call, const Value& value) {
 }
 
 void ServedDevice::setBlocked(const CallPtr& call, const Value& value) {
-    if (value.flag() != m_stored.blocked) {
-        m_stored.blocked = value.flag();
-        if (m_stored.blocked)
-            m_link.drop();
-        changed("Blocked", value);
-    }
+    if (value.flag() == m_stored.blocked)
+        return call->reply();
+    m_stored.blocked = value.flag();
+    changed("Blocked", value);
     call->reply();
+    if (m_stored.blocked)
+        m_link.drop();
 }
 
 void ServedDevice::discoverServices(const CallPtr& call) {
-    if (busy())
+    if (m_search)
         return call->fail(Errors::inProgress);
-    m_search = ServiceSearch::begin(*this, call);
+    const std::string pattern = call->text(0);
+    const std::string uuid = pattern.empty() ? "" : uuidOfPattern(pattern);
+    if (!pattern.empty() && uuid.empty())
+        return call->fail(Errors::invalidArguments);
+    if (!m_adapter.mode().powered())
+        return call->fail(Errors::failed("No route to host"));
+    startSearch(call, uuid);
+}
+
+void ServedDevice::startSearch(const CallPtr& call, const std::string& uuid) {
+    m_reverseSearch.stop();
+    m_search = std::make_shared<ServiceSearch>(*this, call, uuid);
+    m_search->begin();
 }
 
 void ServedDevice::cancelDiscovery(const CallPtr& call) {
     if (!m_search)
         return call->fail(Errors::doesNotExist);
-    if (m_search->owner() != call->sender())
+    if (!m_search->isDiscovering() || m_search->owner() != call->sender())
         return call->fail(Errors::notAuthorized);
     m_search->cancel();
     call->reply();
@@ -159,8 +172,7 @@ void ServedDevice::disconnect(const CallPtr& call) {
 }
 
 void ServedDevice::create(const CallPtr& call) {
-    m_creation = std::make_shared<DeviceCreation>(*this, call);
-    m_creation->begin();
+    startSearch(call);
 }
 
 void ServedDevice::pair(const CallPtr& call) {
@@ -169,36 +181,53 @@ void ServedDevice::pair(const CallPtr& call) {
 }
 
 void ServedDevice::comeIn(bool pairing) {
-    const Times& times = m_adapter.daemon().times();
     m_link.accept(!pairing);
-    if (pairing) {
-        m_pairing = DevicePairing::incoming(*this);
-        m_pairing->begin();
-        return;
-    }
-    m_reverseSearch.start(times.scaled(times.reverseSearch), [this] { learnServices(); });
+    if (!pairing)
+        return startReverseSearch();
+    m_pairing = DevicePairing::incoming(*this);
+    m_pairing->begin();
 }
 
-void ServedDevice::creationEnded() {
-    m_adapter.daemon().bury(std::move(m_creation));
+/// We leave the other side its time to search ours before.
+void ServedDevice::startReverseSearch() {
+    const Times& times = m_adapter.daemon().times();
+    m_reverseSearch.start(times.scaled(times.reverseSearch), [this] {
+        if (!m_search)
+            startSearch(nullptr);
+    });
 }
 
 void ServedDevice::pairingEnded() {
     m_adapter.daemon().bury(std::move(m_pairing));
 }
 
+void ServedDevice::pairingSucceeded(const CallPtr& call) {
+    if (!call)
+        startReverseSearch();
+    else if (!m_search)
+        startSearch(call);
+    // Else the call is never answered: so does the daemon while another search runs.
+}
+
 void ServedDevice::searchEnded() {
     m_adapter.daemon().bury(std::move(m_search));
 }
 
-void ServedDevice::seen() {
-    if (!m_classKnown) {
-        m_classKnown = true;
-        changed("Class", *m_stored.deviceClass);
-        if (const auto icon = iconOf(m_stored.deviceClass))
-            changed("Icon", *icon);
-    }
-    learnName();
+void ServedDevice::cancelSearch() {
+    if (m_search)
+        m_search->cancel();
+}
+
+void ServedDevice::announceStored() {
+    if (m_stored.blocked)
+        changed("Blocked", true);
+    if (m_stored.paired)
+        changed("Paired", true);
+    for (const auto& [name, value] : {std::pair("Vendor", m_stored.vendor),
+                                      {"Product", m_stored.product},
+                                      {"Version", m_stored.version}})
+        if (value)
+            changed(name, *value);
 }
 
 void ServedDevice::learnName() {
@@ -213,23 +242,37 @@ void ServedDevice::learnName() {
         changed("Alias", alias());
 }
 
-void ServedDevice::learnServices() {
+void ServedDevice::learnId(const PeerDevice& peer) {
+    const auto learn = [this](const char* name, std::optional<guint16>& known,
+                              const std::optional<guint16>& value) {
+        if (value.value_or(0) == known.value_or(0))
+            return;
+        known = value;
+        changed(name, *known);
+    };
+    learn("Vendor", m_stored.vendor, peer.vendor);
+    learn("Product", m_stored.product, peer.product);
+    learn("Version", m_stored.version, peer.version);
+}
+
+Value ServedDevice::learnServices(const std::string& uuid) {
     const auto peer = this->peer();
-    if (!peer)
-        return;
-    if (peer->vendor && !m_stored.vendor) {
-        m_stored.vendor = peer->vendor;
-        m_stored.product = peer->product.value_or(0);
-        m_stored.version = peer->version.value_or(0);
-        changed("Vendor", *m_stored.vendor);
-        changed("Product", *m_stored.product);
-        changed("Version", *m_stored.version);
+    const auto records = peer ? serviceRecords(*peer, uuid) : std::vector<ServiceRecord>();
+    std::set<std::string> uuids;
+    if (!uuid.empty() || !peer)
+        uuids.insert(m_stored.uuids.begin(), m_stored.uuids.end());
+    for (const ServiceRecord& record : records) {
+        uuids.insert(record.uuid);
+        if (record.uuid == fullUuid("1200"))
+            learnId(*peer);
     }
-    if (m_stored.uuids == peer->uuids)
-        return;
-    m_stored.uuids = peer->uuids;
-    m_audio->serve();
-    changed("UUIDs", listValue("s", m_stored.uuids));
+    std::vector<std::string> sorted(uuids.begin(), uuids.end());
+    if (sorted != m_stored.uuids) {
+        m_stored.uuids = std::move(sorted);
+        m_audio->serve();
+        changed("UUIDs", listValue("s", m_stored.uuids));
+    }
+    return recordValues(records);
 }
 
 void ServedDevice::setPaired(bool paired) {
@@ -245,9 +288,7 @@ void ServedDevice::linkLost() {
     m_audio->linkLost();
     if (m_search)
         m_search->linkLost();
-    if (m_creation)
-        m_creation->linkLost();
-    else if (m_pairing)
+    if (m_pairing)
         m_pairing->linkLost();
     else if (m_temporary)
         m_adapter.forgetDevice(alive);
@@ -257,8 +298,6 @@ void ServedDevice::clientGone(const std::string& client) {
     const auto alive = shared_from_this();
     if (m_search && m_search->owner() == client)
         m_search->ownerGone();
-    if (m_creation && m_creation->owner() == client)
-        m_creation->ownerGone();
     if (m_pairing && m_pairing->owner() == client)
         m_pairing->ownerGone();
 }

@@ -14,7 +14,6 @@ namespace Bluetooth::Sim {
 
 class ServedAdapter;
 class DeviceAudio;
-class DeviceCreation;
 class DevicePairing;
 class ServiceSearch;
 
@@ -38,8 +37,10 @@ public:
     /// Whether the object goes when its link does: nothing is stored of it yet.
     bool temporary() const { return m_temporary; }
     void setTemporary(bool temporary) { m_temporary = temporary; }
-    /// Whether it is being created, paired or searched.
-    bool busy() const;
+    /// It stays from now on, and is stored.
+    void keep();
+    /// Whether its services are being searched.
+    bool busy() const { return m_search != nullptr; }
 
     /// Each begins one kind of work; the caller has checked that none of that kind is under way.
     void create(const CallPtr& call);
@@ -47,18 +48,24 @@ public:
     /// The device connects to us, and pairs when asked to.
     void comeIn(bool pairing);
     DevicePairing* pairing() const { return m_pairing.get(); }
-    DeviceCreation* creation() const { return m_creation.get(); }
+    ServiceSearch* search() const { return m_search.get(); }
     DeviceAudio& audio() const { return *m_audio; }
     /// Each is called when the work has ended, by the work itself.
-    void creationEnded();
     void pairingEnded();
     void searchEnded();
+    /// It has been paired: its services are searched, and the call is answered after that.
+    /// @param call  null when the device began the pairing
+    void pairingSucceeded(const CallPtr& call);
+    /// Ends the search under way, which is wanted no longer.
+    void cancelSearch();
 
-    /// The device was seen in a discovery: its class, and maybe its name, are known.
-    void seen();
+    /// Says what was stored of it before its object was made.
+    void announceStored();
     void learnName();
     /// Its service records were read.
-    void learnServices();
+    /// @param uuid  what was looked for; "" for everything
+    /// @return the records that have it, as an a{us} of handles and XML
+    Value learnServices(const std::string& uuid);
     void setPaired(bool paired);
     /// The link has gone.
     void linkLost();
@@ -80,6 +87,9 @@ private:
     void disconnect(const CallPtr& call);
 
     std::string alias() const;
+    void startSearch(const CallPtr& call, const std::string& uuid = "");
+    void startReverseSearch();
+    void learnId(const PeerDevice& peer);
     void setAlias(const CallPtr& call, const Value& value);
     void setTrusted(const CallPtr& call, const Value& value);
     void setBlocked(const CallPtr& call, const Value& value);
@@ -89,12 +99,10 @@ private:
     std::string m_path;
     StoredDevice& m_stored;
     bool m_temporary = true;
-    bool m_classKnown = false;
     bool m_retired = false;
     std::string m_name;
     Link m_link;
     OneShotTimer m_reverseSearch;
-    std::shared_ptr<DeviceCreation> m_creation;
     std::shared_ptr<DevicePairing> m_pairing;
     std::shared_ptr<ServiceSearch> m_search;
     std::unique_ptr<DeviceAudio> m_audio;

@@ -4,6 +4,7 @@
 
 #include "serving.h"
 #include "serving/bus/value.h"
+#include "world/peer_device.h"
 
 #include <string>
 #include <vector>
@@ -14,9 +15,18 @@ namespace Bluetooth::Sim {
 /// service class such as "spp"; "" for anything else.
 std::string uuidOfPattern(const std::string& pattern);
 
-/// The records of a device with these service classes, as an a{us} of handles and XML.
-/// @param wanted  one service class only, or "" for all
-Value serviceRecords(const std::vector<std::string>& uuids, const std::string& wanted);
+struct ServiceRecord {
+    guint32 handle;
+    std::string uuid; ///< its service class
+    std::string xml;
+};
+
+/// The records of a device.
+/// @param wanted  only those that have this UUID anywhere in them; "" for all
+std::vector<ServiceRecord> serviceRecords(const PeerDevice& peer, const std::string& wanted);
+
+/// The same as an a{us} of handles and XML.
+Value recordValues(const std::vector<ServiceRecord>& records);
 
 } // namespace Bluetooth::Sim
 

@@ -4,55 +4,85 @@
 #include "daemon/bluetoothd.h"
 #include "daemon/served_adapter.h"
 #include "daemon/served_device.h"
-#include "daemon/service_records.h"
 #include "serving/bluez4/errors.h"
-#include "world/settings.h"
 
 namespace Bluetooth::Sim {
 
-std::shared_ptr<ServiceSearch> ServiceSearch::begin(ServedDevice& device, const CallPtr& call) {
-    const std::string pattern = call->text(0);
-    const std::string uuid = pattern.empty() ? "" : uuidOfPattern(pattern);
-    if (!pattern.empty() && uuid.empty()) {
-        call->fail(Errors::invalidArguments);
-        return nullptr;
-    }
-    if (!device.adapter().mode().powered()) {
-        call->fail(Errors::failed("No route to host"));
-        return nullptr;
-    }
-    auto search = std::make_shared<ServiceSearch>(device, call, uuid);
-    search->run();
-    return search;
+ServiceSearch::Kind ServiceSearch::kindOf(const CallPtr& call) {
+    if (!call)
+        return Kind::Own;
+    if (call->member() == "CreateDevice")
+        return Kind::Create;
+    return call->member() == "CreatePairedDevice" ? Kind::CreatePaired : Kind::Discover;
+}
+
+ServiceSearch::ServiceSearch(ServedDevice& device, CallPtr call, std::string uuid)
+    : m_device(device), m_call(std::move(call)), m_kind(kindOf(m_call)), m_uuid(std::move(uuid)) {}
+
+void ServiceSearch::begin() {
+    if (m_kind == Kind::Create)
+        m_device.adapter().discovery().suspend();
+    m_hold = m_device.link().hold();
+    m_device.link().connect([this](bool reached) {
+        if (reached)
+            run();
+        else
+            notReached();
+    });
 }
 
 void ServiceSearch::run() {
-    m_hold = m_device.link().hold();
-    const auto search = [this](bool reached) {
-        if (!reached) {
-            m_call->fail(Errors::connectionAttemptFailed("Host is down"));
-            return end();
-        }
-        const Times& times = m_device.adapter().daemon().times();
-        m_timer.start(times.scaled(times.serviceSearch), [this] { finish(); });
-    };
-    m_device.link().connect(search);
+    const Times& times = m_device.adapter().daemon().times();
+    m_timer.start(times.scaled(times.serviceSearch), [this] { finish(); });
 }
 
 void ServiceSearch::finish() {
-    m_device.learnServices();
-    m_call->reply(tuple(serviceRecords(m_device.stored().uuids, m_uuid)));
+    const Value records = m_device.learnServices(m_uuid);
+    if (m_kind == Kind::Discover)
+        m_call->reply(tuple(records));
+    else if (m_call)
+        m_call->reply(tuple(pathValue(m_device.path())));
+    if (m_kind == Kind::Create)
+        m_device.keep();
     end();
 }
 
+void ServiceSearch::notReached() {
+    if (m_kind == Kind::Discover)
+        m_call->fail(Errors::connectionAttemptFailed("Host is down"));
+    else if (m_call)
+        m_call->fail(Errors::failed("Host is down"));
+    const auto device = m_device.shared_from_this();
+    end();
+    if (device->temporary())
+        device->adapter().forgetDevice(device);
+}
+
 void ServiceSearch::cancel() {
-    m_call->fail(Errors::failed("Operation canceled"));
+    if (m_call)
+        m_call->fail(Errors::failed("Operation canceled"));
+    if (isCreating())
+        m_device.setTemporary(true);
     end();
 }
 
 void ServiceSearch::linkLost() {
-    m_call->fail(Errors::connectionAttemptFailed("Host is down"));
+    if (m_kind == Kind::Create && m_device.temporary())
+        return; // it goes with the device
+    if (m_kind == Kind::CreatePaired)
+        m_call->reply(tuple(pathValue(m_device.path()))); // it is paired, whatever it offers
+    else if (m_call)
+        m_call->fail(Errors::connectionAttemptFailed("Host is down"));
     end();
+}
+
+void ServiceSearch::ownerGone() {
+    const auto device = m_device.shared_from_this();
+    if (isCreating())
+        device->setTemporary(true);
+    end();
+    if (device->temporary() && !device->link().up())
+        device->adapter().forgetDevice(device);
 }
 
 void ServiceSearch::abandon() {
@@ -61,8 +91,12 @@ void ServiceSearch::abandon() {
 }
 
 void ServiceSearch::end() {
+    AdapterDiscovery& discovery = m_device.adapter().discovery();
+    const bool suspended = m_kind == Kind::Create;
     abandon();
     m_device.searchEnded();
+    if (suspended)
+        discovery.resume();
 }
 
 } // namespace Bluetooth::Sim

@@ -7,38 +7,46 @@
 #include "serving/bus/call.h"
 #include "serving/bus/one_shot_timer.h"
 
-#include <memory>
 #include <string>
 
 namespace Bluetooth::Sim {
 
 class ServedDevice;
 
-/// One DiscoverServices call.
+/// One search for a device's services, by which CreateDevice, CreatePairedDevice and
+/// DiscoverServices are answered, or which the daemon makes for itself.
 class ServiceSearch {
 public:
-    /// @return the search, or null when the call was answered at once
-    static std::shared_ptr<ServiceSearch> begin(ServedDevice& device, const CallPtr& call);
+    /// @param call  what is answered at the end; null when the daemon wants to know by itself
+    /// @param uuid  what is looked for; "" for everything
+    ServiceSearch(ServedDevice& device, CallPtr call, std::string uuid = "");
 
-    ServiceSearch(ServedDevice& device, const CallPtr& call, std::string uuid)
-        : m_device(device), m_call(call), m_uuid(std::move(uuid)) {}
-
-    std::string owner() const { return m_call->sender(); }
+    /// The unique name of the client that wants it; "" for the daemon's own.
+    std::string owner() const { return m_call ? m_call->sender() : ""; }
+    /// Whether a device is being made by it.
+    bool isCreating() const { return m_kind == Kind::Create || m_kind == Kind::CreatePaired; }
+    bool isDiscovering() const { return m_kind == Kind::Discover; }
+    void begin();
     /// The caller is told "Operation canceled".
     void cancel();
+    void notReached();
     void linkLost();
-    void ownerGone() { end(); }
+    void ownerGone();
     /// Stops without a word; the device has gone.
     void abandon();
 
 private:
+    enum class Kind { Own, Create, CreatePaired, Discover };
+
+    static Kind kindOf(const CallPtr& call);
     void run();
     void finish();
     void end();
 
     ServedDevice& m_device;
     CallPtr m_call;
-    std::string m_uuid; ///< what is looked for; "" for everything
+    Kind m_kind;
+    std::string m_uuid;
     Link::Hold m_hold;
     OneShotTimer m_timer;
 };

@@ -19,7 +19,7 @@ namespace Bluetooth::Sim {
 struct PairingEnd {
     enum class Since {
         Begun,   ///< the agent is not asked at all
-        Asked,   ///< the agent is asked meanwhile, and its answer changes nothing
+        Asked,   ///< the link is lost while the agent is asked
         Answered ///< the agent is asked first
     };
     Since since;

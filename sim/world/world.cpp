@@ -36,6 +36,7 @@ void World::store(AdapterHardware& adapter, const PeerDevice& peer) {
     stored.alias = peer.alias;
     stored.deviceClass = peer.deviceClass;
     stored.uuids = peer.uuids;
+    std::sort(stored.uuids.begin(), stored.uuids.end());
     stored.vendor = peer.vendor;
     stored.product = peer.product;
     stored.version = peer.version;

@@ -217,7 +217,7 @@ TEST_F(PairingTest, EveryKindOfDeviceIsPairedOrRefusedWhileAReceiveThreadRuns) {
         {pinReceiver, Agent::PSZ_DISPLAY_YES_NO, "1234", true, "paired", 0}, // gives PINs anyhow
         {phone, Agent::PSZ_DISPLAY_YES_NO, "", true, failed, 0},
         {carKit, Agent::PSZ_KEYBOARD_ONLY, "424241", false, failed, 0},
-        {keyboard, Agent::PSZ_DISPLAY_ONLY, "", false, "paired", 7}, // DisplayPasskey for each key
+        {keyboard, Agent::PSZ_DISPLAY_ONLY, "", false, "paired", 1}, // DisplayPasskey
         {unreachableLaptop, Agent::PSZ_DISPLAY_YES_NO, "", false, "Page Timeout", 0},
     };
     for (const auto& given : cases) {

@@ -6,6 +6,8 @@ namespace Bluetooth::Test {
 using DeviceTest = SimTest;
 
 const std::string serialPort = "a(s:00001101-0000-1000-8000-00805f9b34fb)";
+const std::string withId =
+    serialPort.substr(0, serialPort.size() - 1) + " s:00001200" + serialPort.substr(12);
 const Settings audioDevice{{"Name", "Headset"}, {"Class", "0x240404"}, {"UUIDs", "110b;110e"}};
 const std::string unknownDevice = "error DoesNotExist: Does Not Exist";
 const std::string notConnected = "error NotConnected: Not Connected";
@@ -14,15 +16,22 @@ TEST_F(DeviceTest, CreatingADeviceAnnouncesItAndAnswersAfterTheSearch) {
     add({{"Name", "Phone"}, {"UUIDs", "1101"}, {"Vendor", "15"}});
     EXPECT_EQ(trace({"Adapter.CreateDevice", newDevice}),
               created + lines("device Connected=b:1", "device Name=s:Phone", "device Alias=s:Phone",
-                              "device Vendor=q:15", "device Product=q:0", "device Version=q:0",
-                              "device UUIDs=" + serialPort, "answer CreateDevice o:device"));
+                              "device Vendor=q:15", "device UUIDs=" + withId,
+                              "answer CreateDevice o:device"));
     EXPECT_EQ(call("Device.GetProperties"),
               "a(e(s:Address v(s:00:11:22:33:44:55)) e(s:Name v(s:Phone)) e(s:Alias v(s:Phone)) "
-              "e(s:Vendor v(q:15)) e(s:Product v(q:0)) e(s:Version v(q:0)) e(s:Paired v(b:0)) "
-              "e(s:Trusted v(b:0)) e(s:Blocked v(b:0)) e(s:Connected v(b:1)) e(s:UUIDs v(" +
-                  serialPort + ")) e(s:Services v(a())) e(s:Adapter v(o:hci0)))");
+              "e(s:Vendor v(q:15)) e(s:Paired v(b:0)) e(s:Trusted v(b:0)) e(s:Blocked v(b:0)) "
+              "e(s:Connected v(b:1)) e(s:UUIDs v(" +
+                  withId + ")) e(s:Services v(a())) e(s:Adapter v(o:hci0)))");
     EXPECT_EQ(call({"Adapter.FindDevice", newDevice}), "o:device");
     EXPECT_EQ(call({"Adapter.CreateDevice", newDevice}), "error AlreadyExists: Already Exists");
+    // The id and the name are kept: the one is said before the object, the other no more.
+    call({"Adapter.RemoveDevice", device});
+    control({"SetDevice", newDevice, Settings{{"Version", "1"}, {"UUIDs", "1101;1200"}}});
+    EXPECT_EQ(trace({"Adapter.CreateDevice", newDevice}),
+              lines("device Vendor=q:15") + created +
+                  lines("device Connected=b:1", "device Version=q:1", "device UUIDs=" + withId,
+                        "answer CreateDevice o:device"));
     add({}, "00:aa:bb:cc:dd:ee");
     EXPECT_EQ(call({"Adapter.CreateDevice", "00:aa:bb:cc:dd:ee"}), "o:hci0/dev_00_AA_BB_CC_DD_EE");
 }
@@ -53,6 +62,21 @@ TEST_F(DeviceTest, ACreationEndsWithItsCallerWhoAloneCancelsIt) {
     until(created[1]);
     other.reset();
     EXPECT_EQ(until(removed[1]), removed);
+
+    add(); // and once it is connected:
+    setTime("ServiceSearch", "60000000");
+    start({"Adapter.CreateDevice", newDevice});
+    until("device Connected=b:1");
+    EXPECT_EQ(trace(cancel, removed[1]),
+              lines("answer CreateDevice error Failed: Operation canceled",
+                    "device DisconnectRequested", "answer CancelDeviceCreation",
+                    "device Connected=b:0") +
+                  removed);
+    start({"Adapter.CreateDevice", newDevice});
+    until("device Connected=b:1");
+    control({"DropLink", "hci0", newDevice});
+    EXPECT_EQ(taken(), lines("device Connected=b:0") + removed +
+                           lines("answer CreateDevice error Failed: Operation canceled"));
 }
 
 TEST_F(DeviceTest, ARemovedDeviceIsGone) {
@@ -90,13 +114,13 @@ TEST_F(DeviceTest, PropertiesAreSaidBeforeTheReply) {
     EXPECT_NE(call("Device.GetProperties").find("(s:Alias v(s:Phone))"), std::string::npos);
     EXPECT_EQ(setOfDevice("Trusted", true), lines("device Trusted=b:1", answer));
     EXPECT_EQ(setOfDevice("Blocked", true),
-              lines("device Connected=b:0", "device Blocked=b:1", answer));
+              lines("device Blocked=b:1", answer, "device Connected=b:0"));
     EXPECT_EQ(setOfDevice("Paired", true), lines(answer + " " + badArguments));
     EXPECT_EQ(setOfDevice("Trusted", "true"), lines(answer + " " + badArguments));
 }
 
 TEST_F(DeviceTest, ServicesAreFoundByAnyFormOfTheirClass) {
-    create({{"UUIDs", "1101;110b"}});
+    create({{"UUIDs", "1101;1112"}});
     const auto discover = [&](const char* pattern) {
         return call({"Device.DiscoverServices", pattern});
     };
@@ -105,9 +129,10 @@ TEST_F(DeviceTest, ServicesAreFoundByAnyFormOfTheirClass) {
                            "\n\t<attribute id=\"0x0000\">",
                            0),
               0U);
-    for (const char* form : {"1101", "spp", "00001101-0000-1000-8000-00805F9B34FB"})
+    for (const char* form : {"1101", "SPP", "00001101-0000-1000-8000-00805F9B34FB"})
         EXPECT_EQ(discover(form), serial) << form;
     EXPECT_NE(discover("").find("e(u:65537 "), std::string::npos);
+    EXPECT_EQ(discover("hsp").rfind("a(e(u:65537 ", 0), 0U); // in the list of its profiles
     EXPECT_EQ(discover("1200"), "a()");
     EXPECT_EQ(discover("nonsense"), badArguments);
 }
@@ -123,6 +148,13 @@ TEST_F(DeviceTest, ASearchCanBeCancelledByItsCaller) {
               lines("answer DiscoverServices error Failed: Operation canceled",
                     "answer CancelDiscovery"));
     start(search);
+    EXPECT_EQ(call({"Adapter.RemoveDevice", device}),
+              "error DoesNotExist: Device creation in progress");
+    EXPECT_EQ(trace("Device.Disconnect", "device Connected"),
+              lines("answer DiscoverServices error Failed: Operation canceled",
+                    "device DisconnectRequested", "answer Disconnect", "device Connected=b:0"));
+    start(search);
+    until("device Connected=b:1");
     control({"DropLink", "hci0", newDevice});
     EXPECT_EQ(until("answer").back(),
               "answer DiscoverServices error ConnectionAttemptFailed: Host is down");
@@ -178,10 +210,11 @@ TEST_F(DeviceTest, AServiceOfAnUntrustedDeviceNeedsTheAgentsConsent) {
 }
 
 TEST_F(DeviceTest, ADeviceThatConnectsByItselfStaysOnlyAsLongAsItsLink) {
-    add({{"UUIDs", "1101"}});
+    add({{"UUIDs", "1101"}, {"Class", "0x2540"}});
     control({"ConnectDevice", "hci0", newDevice});
     EXPECT_EQ(until("device UUIDs"),
               created + lines("device Connected=b:1", "device UUIDs=" + serialPort));
+    EXPECT_NE(call("Device.GetProperties").find("(s:Icon v(s:input-keyboard))"), std::string::npos);
     control({"DropLink", "hci0", newDevice});
     EXPECT_EQ(taken(), lines("device Connected=b:0") + removed);
 }
