@@ -104,7 +104,7 @@ stop_all
 
 say "Pairing: an old device wants a PIN, a phone shows a passkey to confirm"
 run kesbt pair "$receiver" --pin 1234
-run kesbt pair "$phone"
+run kesbt pair "$phone" --yes
 run kesbt devices
 
 say "Two programs share one scan; the first question starts the scanner daemon"

@@ -7,18 +7,19 @@ namespace Bluetooth::Test {
 
 namespace {
 
-std::unique_ptr<ChildProcess> startCommand(const Texts& command) {
-    return std::make_unique<ChildProcess>(command, ChildProcess::Output::Capture);
+std::unique_ptr<ChildProcess>
+startCommand(const Texts& command, ChildProcess::Output output = ChildProcess::Output::Capture) {
+    return std::make_unique<ChildProcess>(command, output);
 }
 
 } // namespace
 
-std::unique_ptr<ChildProcess> start(const std::string& arguments) {
+std::unique_ptr<ChildProcess> start(const std::string& arguments, ChildProcess::Output output) {
     Texts command{KESBT};
     std::istringstream words(arguments);
     for (std::string word; std::getline(words, word, ' ');)
         command.push_back(word);
-    return startCommand(command);
+    return startCommand(command, output);
 }
 
 Result run(const std::string& arguments) {

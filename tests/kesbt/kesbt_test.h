@@ -23,7 +23,12 @@ using namespace std::string_literals;
 
 /// Starts the program with its output captured.
 /// @param arguments  with a blank between each two
-std::unique_ptr<ChildProcess> start(const std::string& arguments);
+std::unique_ptr<ChildProcess> start(const std::string& arguments,
+                                    ChildProcess::Output output = ChildProcess::Output::Capture);
+/// The same where somebody can be asked.
+inline std::unique_ptr<ChildProcess> startAtTerminal(const std::string& arguments) {
+    return start(arguments, ChildProcess::Output::Terminal);
+}
 /// Runs it to its end.
 Result run(const std::string& arguments);
 /// Runs it with --json. @return the document that it prints

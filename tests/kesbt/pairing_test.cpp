@@ -10,6 +10,8 @@ protected:
     static std::string begun(const std::string& address) {
         return "Pairing with " + address + " on hci0 (Ctrl-C stops it)\n";
     }
+    /// The end of the line where nobody can be asked.
+    const std::string nobody = "there is no terminal to ask at; answer with ";
     static Json pairedProperty(const std::string& address) {
         return json("device "s + address)["properties"]["Paired"];
     }
@@ -19,7 +21,7 @@ protected:
 };
 
 TEST_F(Pairing, APinIsGivenAndAWrongOneFails) {
-    EXPECT_EQ(run("pair "s + pinReceiver),
+    EXPECT_EQ(run("pair "s + pinReceiver + " --pin 5820"),
               (Result{1, "",
                       begun(pinReceiver) +
                           "00:11:22:33:44:04 asks for a PIN code: 5820\n"
@@ -36,7 +38,7 @@ TEST_F(Pairing, PasskeysAreConfirmedRefusedShownAndEntered) {
     const Result refused = run("pair "s + phone + " --reject");
     EXPECT_EQ(refused.status, 1);
     EXPECT_NE(refused.err.find(": rejected\n"), std::string::npos) << refused;
-    const Result confirmed = run("pair "s + phone);
+    const Result confirmed = run("pair "s + phone + " --yes");
     EXPECT_EQ(confirmed.status, 0);
     EXPECT_NE(confirmed.err.find(": accepted\n"), std::string::npos) << confirmed;
 
@@ -50,6 +52,84 @@ TEST_F(Pairing, PasskeysAreConfirmedRefusedShownAndEntered) {
     EXPECT_EQ(entered.status, 0);
     EXPECT_NE(entered.err.find("asks for a passkey: 424242\n"), std::string::npos) << entered;
     EXPECT_EQ(run("pair "s + headset + " --capability NoInputNoOutput").err, begun(headset));
+}
+
+TEST_F(Pairing, SomebodyAtATerminalIsAskedAndNobodyElsewhere) {
+    simulation.setDevice(pinReceiver, "Name", "GPS\x1b[2J");
+    const std::string confirm = "\"Phone\", which has to show the passkey ";
+    const std::string pin = "PIN code for 00:11:22:33:44:04 \"GPS\\x1b[2J\" (empty refuses): ";
+    const std::string passkey =
+        "Passkey that 00:11:22:33:44:08 \"Car Kit\" shows (empty refuses): ";
+    const std::string refused = ": it was refused here; repeat the command to answer otherwise\n";
+    const struct {
+        std::string arguments, question, keys, end;
+        const char* option; // what is missing where nobody can be asked
+        int status = 1;
+    } rows[] = {
+        {phone, confirm, "no\n", refused, "--yes"},
+        {phone, confirm, "\n", refused, "--yes"},
+        {pinReceiver, pin, "\x04", refused, "--pin TEXT"},
+        {phone, confirm, "\x03",
+         "interrupted while pairing with 00:11:22:33:44:03; repeat the "
+         "command to try again\n",
+         "--yes"},
+        {phone, confirm, "Y\n", "[y/N] Y\n", "--yes", 0},
+        {pinReceiver, pin, "12345678901234567\n1234\n", "\na PIN has 1 to 16 characters\n" + pin,
+         "--pin TEXT", 0},
+        {carKit + " --capability KeyboardOnly"s, passkey, "1e3\n424242\n",
+         "\na passkey has 1 to 6 digits\n" + passkey, "--pin PASSKEY", 0},
+    };
+    for (const auto& row : rows) {
+        const std::string arguments = "pair " + row.arguments + " --json";
+        const Result alone = run(arguments);
+        EXPECT_EQ(alone.status, 1);
+        EXPECT_NE(alone.err.find(nobody + row.option + "\n"), std::string::npos) << alone;
+
+        const auto pairing = startAtTerminal(arguments);
+        pairing->readUntil(row.question);
+        pairing->type(row.keys);
+        const Result result = pairing->finish();
+        EXPECT_EQ(result.status, row.status) << result;
+        EXPECT_NE(result.err.find(row.end), std::string::npos) << result;
+        EXPECT_EQ(result.status == 0, !result.out.empty());
+        if (result.status == 0) {
+            EXPECT_EQ(Json::parse(result.out)["properties"]["Paired"], true);
+        }
+    }
+}
+
+TEST_F(Pairing, AQuestionGoesWithWhatItIsAbout) {
+    const auto ask = [&](const std::string& options) {
+        auto pairing = startAtTerminal(options + "pair " + phone);
+        pairing->readUntil("[y/N] ");
+        return pairing;
+    };
+    EXPECT_EQ(errorsOf(*ask("--timeout 1 ")), "\nthe question was not answered in time; repeat the "
+                                              "command and answer, or give a longer --timeout\n");
+    auto pairing = ask("");
+    run("adapter set Powered off");
+    EXPECT_EQ(errorsOf(*pairing).substr(0, 62),
+              "\ncannot pair with 00:11:22:33:44:03: Authentication Canceled; ");
+    run("adapter set Powered on");
+    pairing = ask("");
+    simulation.process().kill();
+    EXPECT_EQ(errorsOf(*pairing), "\n"s + absentDaemon);
+}
+
+TEST_F(Pairing, ADelayHoldsUpNeitherTheTimeOutNorAnInterruption) {
+    const std::string delayed = "pair "s + phone + " --yes --delay 9999";
+    EXPECT_NE(run("--timeout 1 " + delayed).err.find("time is over"), std::string::npos);
+    auto program = start(delayed);
+    awaitCall("CreatePairedDevice", 2);
+    program->signal(SIGINT);
+    EXPECT_NE(errorsOf(*program).find("interrupted"), std::string::npos);
+
+    program = start("agent --json --yes --delay 9999");
+    awaitEvent(*program, "event", "registered");
+    comeIn(phone);
+    program->signal(SIGTERM);
+    EXPECT_EQ(errorsOf(*program, 0), "");
+    EXPECT_EQ(run("pair "s + phone + " --yes").status, 0) << "something was left behind";
 }
 
 TEST_F(Pairing, OnlyItsProgramCancelsItAndADaemonThatLeavesEndsIt) {
@@ -67,9 +147,11 @@ TEST_F(Pairing, OnlyItsProgramCancelsItAndADaemonThatLeavesEndsIt) {
 }
 
 TEST_F(Pairing, TheAgentAnswersDevicesThatComeAndTellsSo) {
-    const auto agent = start("agent --pin 1234 --json");
+    EXPECT_EQ(failure("agent", 2), nobody + "--yes, --pin TEXT or --reject\n");
+    const auto agent = start("agent --yes --pin 1234 --json");
     EXPECT_EQ(awaitEvent(*agent, "event", "registered")["adapter"], "hci0");
-    EXPECT_EQ(failure("agent"), "hci0 has an agent of another program; end that program first\n");
+    EXPECT_EQ(failure("agent --yes"),
+              "hci0 has an agent of another program; end that program first\n");
 
     comeIn(pinReceiver);
     const Json pin = awaitEvent(*agent, "event", "request");
@@ -88,6 +170,22 @@ TEST_F(Pairing, TheAgentAnswersDevicesThatComeAndTellsSo) {
     EXPECT_EQ(calls("UnregisterAgent"), 1U);
     while (pairedProperty(phone) != true) { // the pairing goes on without the agent
     }
+}
+
+TEST_F(Pairing, TheAgentAsksForEachDeviceThatComes) {
+    const auto agent = startAtTerminal("agent --json");
+    awaitEvent(*agent, "event", "registered");
+    comeIn(phone);
+    agent->readUntil("Pair with 00:11:22:33:44:03");
+    agent->readUntil("[y/N] ");
+    agent->type("y\n");
+    EXPECT_EQ(awaitEvent(*agent, "event", "request")["answer"], "accepted");
+    comeIn(pinReceiver);
+    agent->readUntil("PIN code for ");
+    run("adapter set Powered off");
+    EXPECT_EQ(awaitEvent(*agent, "event", "request")["request"], "Cancel");
+    agent->type("\x03");
+    EXPECT_EQ(agent->finish().status, 0);
 }
 
 TEST_F(Pairing, TheAgentIsReadableByPeopleAndEndsWithTheDaemon) {

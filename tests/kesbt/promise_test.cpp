@@ -141,7 +141,7 @@ TEST_F(Promises, JsonHasTheDocumentedMembers) {
     const auto monitor = start("monitor --json");
     const std::string comesAndGoes = "`monitor` | `daemon-came`, `daemon-gone`";
     document.expectEvent(comesAndGoes, *monitor, "daemon-came");
-    const auto agent = start("agent --json");
+    const auto agent = start("agent --json --yes");
     document.expectEvent("`agent` | `registered`", *agent, "registered");
     simulation.control("StartIncomingPairing", with("hci0", phone));
     document.expectEvent("`agent` | `request`", *agent, "request");

@@ -50,7 +50,7 @@ TEST(Usage, ResultsThatCannotBeWrittenAreAFailureAndGoNowhereElse) {
 
 TEST(Usage, WithoutASystemBusTheLineSaysSo) {
     PrivateBus::address(PrivateBus::Kind::System); // where none runs
-    for (const char* arguments : {"names", "adapters", "monitor", "agent"})
+    for (const char* arguments : {"names", "adapters", "monitor", "agent --yes"})
         EXPECT_EQ(failure(arguments), "the system bus cannot be reached; start dbus-daemon, or "
                                       "try: bluez4-sim -- kesbt adapters\n");
 }
@@ -60,7 +60,7 @@ TEST(Usage, WithoutADaemonOrWithAnotherTheLineSaysSo) {
     for (const char* arguments :
          {"adapters", "adapter set Powered on", "devices", "device 00:11:22:33:44:06",
           "create 00:11:22:33:44:06", "remove 00:11:22:33:44:06", "services 00:11:22:33:44:06",
-          "discover", "monitor", "cancel 00:11:22:33:44:06", "agent",
+          "discover", "monitor", "cancel 00:11:22:33:44:06", "agent --yes",
           "audio connect 00:11:22:33:44:06", "volume up 00:11:22:33:44:06", "scan list",
           "autoconnect targets"})
         EXPECT_EQ(failure(arguments), absentDaemon);

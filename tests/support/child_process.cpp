@@ -3,7 +3,9 @@
 
 #include <fcntl.h>
 #include <poll.h>
+#include <pty.h>
 #include <signal.h>
+#include <sys/ioctl.h>
 #include <sys/prctl.h>
 #include <sys/syscall.h>
 #include <sys/wait.h>
@@ -45,6 +47,25 @@ bool readMore(int descriptor, std::string& buffer, Milliseconds limit) {
     return true;
 }
 
+/// Takes the first bytes.
+std::string cut(std::string& buffer, std::size_t length) {
+    std::string text = buffer.substr(0, length);
+    buffer.erase(0, length);
+    return text;
+}
+
+bool openTerminal(int (&ends)[2]) {
+    if (openpty(&ends[0], &ends[1], nullptr, nullptr, nullptr) != 0)
+        return false;
+    termios settings{};
+    tcgetattr(ends[1], &settings);
+    settings.c_oflag &= ~static_cast<tcflag_t>(ONLCR); // lines end as the program writes them
+    tcsetattr(ends[1], TCSANOW, &settings);
+    for (const int end : ends)
+        fcntl(end, F_SETFD, FD_CLOEXEC);
+    return true;
+}
+
 } // namespace
 
 ChildProcess::ChildProcess(std::vector<std::string> command, Output output,
@@ -54,20 +75,29 @@ ChildProcess::ChildProcess(std::vector<std::string> command, Output output,
     const std::vector<char*> envp = pointers(environment);
     int out[2] = {-1, -1};
     int err[2] = {-1, -1};
-    if (output == Output::Capture && (pipe2(out, O_CLOEXEC) != 0 || pipe2(err, O_CLOEXEC) != 0))
+    const bool isOpen =
+        output == Output::Inherit ||
+        (pipe2(out, O_CLOEXEC) == 0 &&
+         (output == Output::Terminal ? openTerminal(err) : pipe2(err, O_CLOEXEC) == 0));
+    if (!isOpen)
         throw std::runtime_error("no pipe for the output of " + command[0]);
 
     m_pid = fork();
     if (m_pid == 0) {
         prctl(PR_SET_PDEATHSIG, SIGKILL);
-        if (output == Output::Capture) {
+        if (output == Output::Terminal) {
+            setsid();
+            ioctl(err[1], TIOCSCTTY, 0);
+            dup2(err[1], STDIN_FILENO);
+        }
+        if (output != Output::Inherit) {
             dup2(out[1], STDOUT_FILENO);
             dup2(err[1], STDERR_FILENO);
         }
         execvpe(argv[0], argv.data(), envp.data());
         _exit(127);
     }
-    if (output == Output::Capture) {
+    if (output != Output::Inherit) {
         close(out[1]);
         close(err[1]);
         m_output = out[0];
@@ -128,8 +158,8 @@ std::string ChildProcess::readLine(Milliseconds limit) {
         if (!readMore(m_output, m_buffer, limit))
             return std::exchange(m_buffer, {});
     }
-    const std::string line = m_buffer.substr(0, end);
-    m_buffer.erase(0, end + 1);
+    std::string line = cut(m_buffer, end + 1);
+    line.pop_back();
     return line;
 }
 
@@ -140,10 +170,21 @@ std::string ChildProcess::readAll(Milliseconds limit) {
 }
 
 std::string ChildProcess::readErrors(Milliseconds limit) {
-    std::string text;
-    while (readMore(m_errors, text, limit)) {
+    while (readMore(m_errors, m_errorBuffer, limit)) {
     }
-    return text;
+    return std::exchange(m_errorBuffer, {});
+}
+
+std::string ChildProcess::readUntil(const std::string& prompt, Milliseconds limit) {
+    while (m_errorBuffer.find(prompt) == std::string::npos) {
+        if (!readMore(m_errors, m_errorBuffer, limit))
+            throw std::runtime_error("no \"" + prompt + "\" after: " + m_errorBuffer);
+    }
+    return cut(m_errorBuffer, m_errorBuffer.find(prompt) + prompt.size());
+}
+
+void ChildProcess::type(const std::string& keys) const {
+    [[maybe_unused]] const ssize_t written = write(m_errors, keys.data(), keys.size());
 }
 
 } // namespace Bluetooth::Test

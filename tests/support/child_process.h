@@ -30,7 +30,8 @@ inline std::ostream& operator<<(std::ostream& stream, const Result& result) {
 /// A program that runs beside the test. It is killed when this object or the test's process ends.
 class ChildProcess {
 public:
-    enum class Output { Inherit, Capture };
+    /// At a terminal only standard output is a pipe: input and errors are the terminal's.
+    enum class Output { Inherit, Capture, Terminal };
 
     /// Starts a program found through PATH. A failure to start throws std::runtime_error.
     /// @param environment "NAME=VALUE" each, added to the test's own
@@ -57,12 +58,18 @@ public:
     /// The same for standard error, only after standard output has been read to its end.
     std::string readErrors(Milliseconds limit = patience);
 
+    /// Waits until the program at the terminal has written this. @return what came until then
+    std::string readUntil(const std::string& prompt, Milliseconds limit = patience);
+    /// Types at the terminal: "\x03" is Ctrl-C.
+    void type(const std::string& keys) const;
+
 private:
     pid_t m_pid = -1;
     int m_status = -1;
     int m_output = -1;
     int m_errors = -1;
     std::string m_buffer;
+    std::string m_errorBuffer;
 };
 
 } // namespace Bluetooth::Test

@@ -19,6 +19,8 @@ void printLine(const std::string& text) {
 }
 
 void printRequest(const Options& options, const AgentRequest& request) {
+    if (!request.advice.empty())
+        std::cerr << printable(request.text()) << ", for " << request.advice << '\n';
     if (!options.json) {
         printLine(request.text());
         return;
@@ -63,13 +65,15 @@ bool hasDaemonGone(BusFeed& daemon) {
 
 /// Answers requests until the user interrupts. The library's receive thread does not run here: it
 /// would drop them.
-void serve(DBusConnection* connection, const ShownAgent& agent, BusFeed& daemon,
-           Interrupt& interrupt) {
+void serve(DBusConnection* connection, ShownAgent& agent, BusFeed& daemon, Interrupt& interrupt) {
+    Questions& questions = agent.questions();
     while (!interrupt.came()) {
         int fd = -1;
         dbus_connection_get_unix_fd(connection, &fd);
-        waitForInput({fd, daemon.fd(), interrupt.fd()});
+        waitForInput({fd, daemon.fd(), interrupt.fd(), questions.wakeFd(), questions.inputFd()},
+                     questions.due());
         answerRequests(connection);
+        questions.attend();
         const bool hasGone = hasDaemonGone(daemon);
         if (hasGone) {
             // What it asked last comes on the other connection, and is there after any answer of
@@ -85,13 +89,16 @@ void serve(DBusConnection* connection, const ShownAgent& agent, BusFeed& daemon,
 }
 
 void runAgent(const Options& options, const AgentSettings& settings) {
+    if (!settings.canAnswer())
+        throw wrongUsage(nobodyToAsk("--yes, --pin TEXT or --reject"));
     Interrupt interrupt;
     const auto adapter = openAdapter(options);
     BusFeed daemon(BusFeed::Signals::Presence);
-    const ShownAgent agent(
-        settings, [&options](const AgentRequest& request) { printRequest(options, request); });
+    ShownAgent agent(settings,
+                     [&options](const AgentRequest& request) { printRequest(options, request); });
     registerAgent(options, *adapter, agent);
     serve(adapter->getConnection(), agent, daemon, interrupt);
+    agent.questions().end();
     ask(options, "cannot unregister the agent", *adapter, "UnregisterAgent",
         Bluetooth::ObjectPath(agent.getPath()));
 }
@@ -108,7 +115,7 @@ const Verb agentVerb = {"agent",
                         "Pairing",
                         "Answer devices that want to pair, until Ctrl-C",
                         "kesbt agent --pin 1234\n"
-                        "kesbt --adapter hci1 agent --reject\nkesbt agent --json",
+                        "kesbt --adapter hci1 agent --reject\nkesbt agent --yes --json",
                         {{Limit::Stream, build}}};
 
 } // namespace Kesbt

@@ -35,6 +35,8 @@ void Watchdog::throwIfCancelled() const {
 void Watchdog::watch() {
     if (awaitEnd(m_deadline))
         return;
+    if (m_task.questions)
+        m_task.questions->end();
     m_task.cancel();
     // A daemon that does not answer any more must not keep the user waiting: leaving the bus ends
     // the call too.
@@ -56,20 +58,34 @@ bool Watchdog::awaitEnd(Clock::time_point deadline) {
         }
         if (now >= deadline) {
             if (!cancelled)
-                m_reason = Reason::TimedOut;
+                m_reason = isAsking() ? Reason::Unanswered : Reason::TimedOut;
             return false;
         }
         auto next = deadline;
         if (m_task.showsProgress && !cancelled)
             next = std::min(next, now + progressInterval);
-        waitForInput({m_interrupt.fd(), m_ended.fd()}, next);
+        awaitInput(next);
         if (next < deadline && Clock::now() >= next)
             showProgress();
     }
     return true;
 }
 
+/// Waits for what ends the task, and attends to the questions.
+void Watchdog::awaitInput(Clock::time_point limit) {
+    Questions* questions = m_task.questions;
+    if (!questions) {
+        waitForInput({m_interrupt.fd(), m_ended.fd()}, limit);
+        return;
+    }
+    waitForInput({m_interrupt.fd(), m_ended.fd(), questions->wakeFd(), questions->inputFd()},
+                 std::min(limit, questions->due()));
+    questions->attend();
+}
+
 void Watchdog::showProgress() const {
+    if (isAsking())
+        return; // who is asked sees what is waited for
     const auto seconds = std::chrono::duration_cast<std::chrono::seconds>(Clock::now() - m_begin);
     std::cerr << "Still " << m_task.name << " (" << seconds.count() << " s)\n";
 }
@@ -77,6 +93,9 @@ void Watchdog::showProgress() const {
 std::string Watchdog::message(Reason reason) const {
     if (reason == Reason::Interrupted)
         return "interrupted while " + m_task.name + "; repeat the command to try again";
+    if (reason == Reason::Unanswered)
+        return "the question was not answered in time; repeat the command and answer, or give a "
+               "longer --timeout";
     return "time is over while " + m_task.name +
            "; make sure that the device is on and within reach, or give a longer --timeout";
 }

@@ -2,6 +2,7 @@
 #ifndef KESBT_WAIT_WATCHDOG_H
 #define KESBT_WAIT_WATCHDOG_H
 
+#include "wait/questions.h"
 #include "wait/waiting.h"
 
 #include <atomic>
@@ -16,9 +17,10 @@ namespace Kesbt {
 class Watchdog {
 public:
     struct Task {
-        std::string name;             ///< e.g. "creating 00:11:22:33:44:55", for messages
-        std::function<void()> cancel; ///< called at most once, on the watching thread
-        bool showsProgress = false;   ///< tells on standard error every few seconds
+        std::string name;               ///< e.g. "creating 00:11:22:33:44:55", for messages
+        std::function<void()> cancel;   ///< called at most once, on the watching thread
+        bool showsProgress = false;     ///< tells on standard error every few seconds
+        Questions* questions = nullptr; ///< what is asked meanwhile
     };
 
     Watchdog(const TimeLimit& limit, Task task);
@@ -30,10 +32,12 @@ public:
     void throwIfCancelled() const;
 
 private:
-    enum class Reason { None, Interrupted, TimedOut };
+    enum class Reason { None, Interrupted, TimedOut, Unanswered };
 
     void watch();
     bool awaitEnd(Clock::time_point deadline);
+    bool isAsking() const { return m_task.questions && m_task.questions->isAsking(); }
+    void awaitInput(Clock::time_point limit);
     void showProgress() const;
     std::string message(Reason reason) const;
 
