@@ -144,7 +144,7 @@ TEST_F(HostVerbs, ARestartedDaemonHasToComeToTheBus) {
 }
 
 TEST_F(HostVerbs, WithoutAdaptersThereIsNothingToRestartOrAsk) {
-    const Result name = run("name "s + headset + " --timeout 100");
+    const Result name = run("name "s + headset + " --timeout 0.1");
     EXPECT_EQ(name.status, 1);
     EXPECT_EQ(name.err.substr(0, 41), "cannot get the name of 00:11:22:33:44:01:");
     const std::string line = failure("restart-daemon");
