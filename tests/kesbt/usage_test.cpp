@@ -10,7 +10,14 @@ namespace Bluetooth::Test {
 TEST(Usage, WrongUsageIsOneLineThatSaysWhereToReadOnAndStatus2) {
     const std::tuple<std::string, std::string, std::string> wrong[] = {
         {"", "a verb is missing", ""},
-        {"help", "there is no verb \"help\"", ""},
+        {"help", "there is no verb \"help\" (did you mean kesbt --help?)", ""},
+        {"unpair", "there is no verb \"unpair\" (did you mean kesbt remove ADDRESS?)", ""},
+        {"--adapter hci1 power off",
+         "there is no verb \"power\" (did you mean kesbt adapter set Powered off?)", ""},
+        {"connect "s + headset,
+         "there is no verb \"connect\" (did you mean kesbt audio connect 00:11:22:33:44:01?)", ""},
+        {"scan on", "there is no verb \"on\" (did you mean kesbt discover?)", "scan "},
+        {"agent on", "\"on\" is too much (did you mean kesbt agent?)", "agent "},
         {"adaptres", "there is no verb \"adaptres\" (did you mean adapters?)", ""},
         {"wait pared "s + headset, "there is no verb \"pared\" (did you mean paired?)", "wait "},
         {"devices --timout=5", "there is no option \"--timout=5\" (did you mean --timeout?)",
@@ -30,8 +37,8 @@ TEST(Usage, WrongUsageIsOneLineThatSaysWhereToReadOnAndStatus2) {
          "NoInputNoOutput",
          "pair "},
         {"agent --delay -1", "--delay: \"-1\" is no number from 0 to 9999", "agent "},
-        {"name "s + headset + " --timeout soon",
-         "--timeout: \"soon\" is no time such as 10 or 0.5", ""},
+        {"name "s + headset + " --timeout soon", "--timeout: \"soon\" is no time such as 10 or 0.5",
+         ""},
     };
     for (const auto& [arguments, mistake, verb] : wrong)
         EXPECT_EQ(failure(arguments, 2), mistake + "; see: kesbt " + verb + "--help\n");

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: LGPL-2.1-or-later
 #include "command/usage.h"
 
+#include "command/habits.h"
 #include "show/text.h"
 
 #include <string>
@@ -24,7 +25,9 @@ std::vector<std::string> words(const CLI::App& program, const CLI::App& chosen) 
     return result;
 }
 
-std::string unknownWord(const std::string& word, const CLI::App& program, const CLI::App& chosen) {
+std::string unknownWord(const std::vector<std::string>& rest, const CLI::App& program,
+                        const CLI::App& chosen) {
+    const std::string& word = rest.front();
     std::string what;
     if (word.rfind('-', 0) == 0)
         what = "there is no option " + quoted(word);
@@ -32,7 +35,9 @@ std::string unknownWord(const std::string& word, const CLI::App& program, const 
         what = "there is no verb " + quoted(word);
     else
         what = quoted(word) + " is too much";
-    const std::string meant = nearest(word.substr(0, word.find('=')), words(program, chosen));
+    std::string meant = habitMeant(&chosen == &program ? "" : chosen.get_name(), rest);
+    if (meant.empty())
+        meant = nearest(word.substr(0, word.find('=')), words(program, chosen));
     return meant.empty() ? what : what + " (did you mean " + meant + "?)";
 }
 
@@ -55,7 +60,7 @@ Failure usageFailure(const CLI::App& program, const CLI::ParseError& error) {
     if (lacksVerb && rest.empty())
         what = "a verb is missing";
     else if (lacksVerb || dynamic_cast<const CLI::ExtrasError*>(&error))
-        what = unknownWord(rest.front(), program, *chosen);
+        what = unknownWord(rest, program, *chosen);
     return wrongUsage(printable(what) + "; see: " + command + " --help");
 }
 
