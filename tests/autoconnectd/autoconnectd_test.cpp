@@ -43,16 +43,18 @@ struct Daemon : ChildProcess {
         if (!hasEnded()) {
             EXPECT_EQ(stop(), 0);
         }
+        for (const std::string& line : passed)
+            EXPECT_EQ(line.find(".cpp:"), std::string::npos) << "for programmers: " << line;
     }
 
-    /// @return whether the line has come; lines before it are passed over
+    /// @return whether a line has come that begins so; lines before it are passed over
     bool waitFor(const std::string& text, Milliseconds limit = patience) {
         do {
             const std::string line = readLine(limit);
             if (line.empty())
                 return false;
             passed.push_back(line.substr(line.find(": ") + 2)); // "kesbt-autoconnectd[5]: "
-        } while (passed.back() != text);
+        } while (passed.back().rfind(text, 0) != 0);
         return true;
     }
     /// Ends it. @return its exit status
@@ -104,6 +106,10 @@ bool isOwnPipe() {
 
 constexpr uid_t otherUser = 1000;
 
+std::string audioOf(const char* device) {
+    return "audio of "s + device;
+}
+
 } // namespace
 
 class AutoConnectDaemonTest : public AutoConnectFixture {
@@ -123,7 +129,7 @@ protected:
         return std::unique_ptr<Adapter>(Manager().findAdapter(adapter))->getPath();
     }
 
-    const std::string headsetConnected = headset + " connected"s;
+    const std::string headsetConnected = audioOf(headset) + " connected";
 };
 
 TEST_F(AutoConnectDaemonTest, ConnectsAtStartBySinkOrAllAudio) {
@@ -131,7 +137,7 @@ TEST_F(AutoConnectDaemonTest, ConnectsAtStartBySinkOrAllAudio) {
     setConfig(adapter1, "1,"s + otherDevice);
     Daemon daemon;
     for (const char* device : {headset, carKit, otherDevice}) {
-        const std::string connected = device + " connected"s;
+        const std::string connected = audioOf(device) + " connected";
         EXPECT_TRUE(daemon.count(connected) || daemon.waitFor(connected)) << device;
     }
     EXPECT_EQ(connectCalls("AudioSink"), 2u);
@@ -144,13 +150,47 @@ TEST_F(AutoConnectDaemonTest, ADeviceThatIsAwayIsConnectedWhenItAppears) {
     setConfig(adapter0, "1,"s + headset);
     simulation.setDevice(headset, "Connectable", false);
     Daemon daemon;
-    EXPECT_TRUE(daemon.waitFor("connecting "s + headset));
+    EXPECT_TRUE(daemon.waitFor("connecting " + audioOf(headset)));
     simulation.setDevice(headset, "Connectable", true);
     EXPECT_TRUE(daemon.waitFor(headsetConnected));
     simulation.control("DropLink", with("hci0", headset));
-    EXPECT_TRUE(daemon.waitFor(headset + " disconnected"s));
+    EXPECT_TRUE(daemon.waitFor(audioOf(headset) + " disconnected"));
     EXPECT_TRUE(daemon.waitFor(headsetConnected)) << "and again when it comes back";
     EXPECT_EQ(daemon.stop(SIGINT), 0);
+}
+
+TEST_F(AutoConnectDaemonTest, TheLogSaysWhatAPersonCanActOnEachThingOnce) {
+    const std::string silent = audioOf(carKit);
+    setConfig(adapter0, "1,"s + carKit + "," + phone + "," + stranger);
+    std::filesystem::create_directory(configFolder + std::string(adapter1));
+    simulation.setDevice(carKit, "Connectable", false);
+    {
+        Daemon daemon("--interval 3600");
+        EXPECT_TRUE(daemon.waitFor("removed \""s + stranger + "\" from the list of " + adapter0));
+        EXPECT_TRUE(daemon.waitFor(silent + " cannot be connected (Connect Failed; make sure "));
+        const std::string summary = silent + " is still not connected after ";
+        for (const char* attempts : {"4 failed attempts since ", "8 failed attempts since "}) {
+            do
+                EXPECT_TRUE(autoConnect.reload());
+            while (!daemon.waitFor(summary, Milliseconds(100)));
+            EXPECT_EQ(daemon.passed.back().rfind(summary + attempts, 0), 0u)
+                << daemon.passed.back();
+        }
+        simulation.setDevice(carKit, "Connectable", true);
+        EXPECT_TRUE(autoConnect.reload());
+        EXPECT_TRUE(daemon.waitFor(silent + " connected after 8 failed attempts since "));
+        const auto beginWith = [&](const std::string& text) {
+            return std::count_if(daemon.passed.begin(), daemon.passed.end(),
+                                 [&](const std::string& line) { return line.rfind(text, 0) == 0; });
+        };
+        EXPECT_EQ(beginWith(silent + " cannot"), 1);
+        EXPECT_EQ(beginWith(phone + " is not connected: it is no headset"s), 1);
+        EXPECT_EQ(beginWith("the list "s + configFolder + adapter1 + " is not used: make it"), 1);
+    }
+    Daemon verbose("--verbose");
+    EXPECT_TRUE(verbose.waitFor("auto_connect.cpp:"))
+        << "what the library says is there if asked for";
+    verbose.passed.clear();
 }
 
 TEST_F(AutoConnectDaemonTest, CommandsThatRunTogetherAreCarriedOutInOrder) {
@@ -162,8 +202,9 @@ TEST_F(AutoConnectDaemonTest, CommandsThatRunTogetherAreCarriedOutInOrder) {
         EXPECT_TRUE(daemon.waitFor(line));
 
     EXPECT_TRUE(autoConnect.set(adapter0, true, (","s + headset).c_str()));
-    EXPECT_TRUE(daemon.waitFor("watching "s + headset)) << "files are read while it pauses ...";
-    EXPECT_FALSE(daemon.waitFor("connecting "s + headset, Milliseconds(1500)));
+    EXPECT_TRUE(daemon.waitFor("watching " + audioOf(headset)))
+        << "files are read while it pauses ...";
+    EXPECT_FALSE(daemon.waitFor("connecting " + audioOf(headset), Milliseconds(1500)));
     EXPECT_EQ(connectCalls("AudioSink"), 0u) << "... and nothing is connected";
     EXPECT_TRUE(autoConnect.resume());
     EXPECT_TRUE(daemon.waitFor(headsetConnected));
@@ -266,7 +307,7 @@ TEST_F(AutoConnectDaemonTest, FollowsTheBluetoothDaemonAndItsAdapters) {
     simulation.control("AddAdapter", [](Writer& w) {
         w.dict("sv", [](Writer& e) { e.entry("Address", Var{std::string(adapter1)}); });
     });
-    EXPECT_TRUE(daemon.waitFor(otherDevice + " connected"s));
+    EXPECT_TRUE(daemon.waitFor(audioOf(otherDevice) + " connected"));
 }
 
 TEST_F(AutoConnectDaemonTest, HoweverManySignalsComeADeviceIsTriedOncePerInterval) {
@@ -274,7 +315,7 @@ TEST_F(AutoConnectDaemonTest, HoweverManySignalsComeADeviceIsTriedOncePerInterva
     simulation.setDevice(headset, "Connectable", false);
     const std::string hci0 = pathOf(adapter0);
     Daemon daemon("--interval 60");
-    ASSERT_TRUE(daemon.waitFor("connecting "s + headset));
+    ASSERT_TRUE(daemon.waitFor("connecting " + audioOf(headset)));
     EXPECT_TRUE(simulation.awaitCalls("s:ListAdapters ", 4)) << "again, for it has pruned the list";
     const std::size_t before = reloads();
     for (int count = 0; count < 2000; ++count) {
@@ -298,8 +339,8 @@ TEST_F(AutoConnectDaemonTest, HoweverManySignalsComeADeviceIsTriedOncePerInterva
     awaitLoop("off");
     setConfig(adapter0, "1,"s + headset + "," + carKit);
     setPower(hci0, true);
-    EXPECT_TRUE(daemon.waitFor(carKit + " connected"s)) << "not tried before: at once";
-    EXPECT_GE(daemon.count("watching "s + headset), 2) << "its target was made anew";
+    EXPECT_TRUE(daemon.waitFor(audioOf(carKit) + " connected")) << "not tried before: at once";
+    EXPECT_GE(daemon.count("watching " + audioOf(headset)), 2) << "its target was made anew";
     EXPECT_LE(reloads() - before, wholeSecondsSince(start) + 1);
     EXPECT_EQ(simulation.countCalls("44_01 s:org.bluez.AudioSink s:Connect "), 1u);
 }

@@ -12,8 +12,9 @@ namespace Bluetooth::Test {
 
 inline constexpr const char* stranger = "DE:AD:BE:EF:00:01"; // known to none
 
-/// The simulated daemon knows four devices, of which the headset and the other device have a sink
-/// and the keyboard has no audio; there are no lists of devices to connect yet.
+/// The simulated daemon knows five devices, of which the headset and the other device have a sink,
+/// the keyboard has no audio and the phone nothing to connect; there are no lists of devices to
+/// connect yet.
 class AutoConnectFixture : public NamespaceTest {
 protected:
     AutoConnectFixture() {
@@ -35,6 +36,7 @@ protected:
         "[Device 00:11:22:33:44:01]\nAdapter=hci0\nKnown=true\nUUIDs=110b;110e\n"
         "[Device 00:11:22:33:44:08]\nAdapter=hci0\nKnown=true\nUUIDs=1108;111e\n"
         "[Device 00:11:22:33:44:02]\nAdapter=hci0\nKnown=true\nUUIDs=1124\n"
+        "[Device 00:11:22:33:44:03]\nAdapter=hci0\nKnown=true\nUUIDs=1105\n"
         "[Device 00:11:22:33:44:66]\nAdapter=hci1\nKnown=true\nUUIDs=110b\n"};
     AutoConnect autoConnect;
 };

@@ -97,7 +97,7 @@ void AutoConnector::hurryAll() {
 void AutoConnector::remember(const Target& dropped) {
     if (dropped.tried() == Clock::time_point{})
         return;
-    Clock::time_point& tried = m_tried[dropped.address()];
+    Clock::time_point& tried = m_tried[dropped.name()];
     tried = std::max(tried, dropped.tried());
 }
 
@@ -108,14 +108,19 @@ void AutoConnector::forgetOldAttempts() {
     }
 }
 
-/// Asked first, since every call to a daemon that is absent is logged as a failure.
+/// Asked first: a daemon that is absent cannot be told from one that does not answer otherwise.
 bool AutoConnector::hasDaemon() {
     const bool present = Bluetooth::BluezObject::hasBluetoothd();
-    if (present == m_daemonMissed)
-        syslog(LOG_NOTICE,
-               present ? "bluetoothd is back" : "bluetoothd is not running; waiting for it");
-    m_daemonMissed = !present;
+    if (!present || m_daemon == Daemon::Missing)
+        note(present ? Daemon::Answers : Daemon::Missing);
     return present;
+}
+
+void AutoConnector::note(Daemon state) {
+    constexpr const char* texts[] = {"is back", "does not answer; waiting for it",
+                                     "is not running; waiting for it"};
+    if (state != std::exchange(m_daemon, state))
+        syslog(LOG_NOTICE, "bluetoothd %s", texts[static_cast<int>(state)]);
 }
 
 void AutoConnector::watchAdapters() {
@@ -128,22 +133,6 @@ void AutoConnector::watchAdapters() {
     }
 }
 
-/// The entries of the adapters' files, known devices or not.
-std::size_t AutoConnector::countEntries() const {
-    std::size_t count = 0;
-    if (!m_adapters)
-        return count;
-    for (Bluetooth::Adapter* adapter : *m_adapters) {
-        const std::unique_ptr<Bluetooth::Dict> properties(adapter ? adapter->getProperties()
-                                                                  : nullptr);
-        const std::string address = Bluetooth::find(properties.get(), "Address");
-        Bluetooth::AutoConnect::List list;
-        if (!address.empty() && m_files.readList(address.c_str(), list))
-            count += list.devices.size();
-    }
-    return count;
-}
-
 void AutoConnector::reloadAt(Clock::time_point when) {
     m_reloadAt = m_reloadDue ? std::min(m_reloadAt, when) : when;
     m_reloadDue = true;
@@ -154,21 +143,52 @@ void AutoConnector::retryLater() {
     m_retryDelay = std::min(m_retryDelay * 2, m_pace.longest);
 }
 
-std::unique_ptr<Target> AutoConnector::takeOrCreate(Bluetooth::Device& device) {
+/// What cannot be connected is told once, as long as it is listed.
+void AutoConnector::noteUnserved(const std::string& what, const char* why) {
+    m_foundUnserved.insert(what);
+    if (m_unserved.insert(what).second)
+        syslog(LOG_WARNING, "%s %s", what.c_str(), why);
+}
+
+std::unique_ptr<Target> AutoConnector::takeOrCreate(const std::string& device,
+                                                    const Service& service) {
     for (auto& target : m_targets) {
-        if (target && target->path() == device.getPath())
+        if (target && target->isOf(device, service))
             return std::move(target);
     }
-    auto target = Target::create(device, m_pace);
-    if (!target) {
-        syslog(LOG_WARNING, "%s offers no audio; it is not connected", device.getPath());
+    auto target = std::make_unique<Target>(device, service, m_pace);
+    switch (target->open()) {
+    case Target::Opening::Done:
+        break;
+    case Target::Opening::NotServed:
+        noteUnserved(target->name(), "is not connected: bluetoothd does not serve it");
+        return nullptr;
+    case Target::Opening::NotAnswered:
+        retryLater();
         return nullptr;
     }
-    syslog(LOG_INFO, "watching %s", target->address().c_str());
-    const auto attempt = m_tried.find(target->address());
+    syslog(LOG_INFO, "watching %s", target->name().c_str());
+    const auto attempt = m_tried.find(target->name());
     if (attempt != m_tried.end())
         target->wasTried(attempt->second);
     return target;
+}
+
+void AutoConnector::addTargets(Bluetooth::Device& device, Targets& targets) {
+    const std::unique_ptr<Bluetooth::Dict> properties(device.getProperties());
+    if (!properties) {
+        retryLater();
+        return;
+    }
+    const auto services = servicesOf(Bluetooth::find(properties.get(), "UUIDs"));
+    if (services.empty())
+        noteUnserved(Bluetooth::find(properties.get(), "Address"),
+                     "is not connected: it is no headset and no speaker");
+    for (const Service* service : services) {
+        auto target = takeOrCreate(device.getPath(), *service);
+        if (target)
+            targets.push_back(std::move(target));
+    }
 }
 
 void AutoConnector::reload() {
@@ -185,20 +205,21 @@ void AutoConnector::reload() {
     }
     // Watched before the files are read: an adapter that is switched on meanwhile is not missed.
     watchAdapters();
-    const std::size_t entries = countEntries();
-    const std::unique_ptr<Bluetooth::DeviceList> devices(m_files.getAutoConnectDeviceList());
+    const auto devices = m_lists.read(m_adapters.get());
+    note(devices ? Daemon::Answers : Daemon::Silent);
     if (!devices) {
         retryLater();
         return;
     }
-    m_hasPruned |= devices->size() < entries && countEntries() < entries;
-    std::vector<std::unique_ptr<Target>> targets;
+    m_hasPruned |= m_lists.havePruned();
+    m_foundUnserved.clear();
+    Targets targets;
     std::set<std::string> paths; // an entry may stand twice in a file
     for (Bluetooth::Device* device : *devices) {
-        auto target = paths.insert(device->getPath()).second ? takeOrCreate(*device) : nullptr;
-        if (target)
-            targets.push_back(std::move(target));
+        if (paths.insert(device->getPath()).second)
+            addTargets(*device, targets);
     }
+    m_unserved = m_foundUnserved;
     for (const auto& target : m_targets) {
         if (!target)
             continue;

@@ -34,6 +34,7 @@ constexpr int day = 24 * 60 * 60; // s
 
 struct StartOptions {
     bool foreground = false;
+    bool verbose = false;
     std::string pidFile = "/run/kesbt-autoconnectd.pid";
     int interval = 10;     // s
     int maxInterval = 120; // s
@@ -42,6 +43,8 @@ struct StartOptions {
 void addOptions(CLI::App& commandLine, StartOptions& options) {
     commandLine.add_flag("-f,--foreground", options.foreground,
                          "Stay in the foreground, log to standard error too");
+    commandLine.add_flag("-v,--verbose", options.verbose,
+                         "Log also each call that fails, for a report of a fault");
     commandLine.add_option("--pid-file", options.pidFile, "PID file and lock of the only instance")
         ->capture_default_str();
     commandLine
@@ -74,7 +77,15 @@ std::string pidFileProblem(const std::string& path, int error) {
            "; run as root, or choose another file with --pid-file";
 }
 
+/// The library logs each call that fails, for programmers. What a person can act on the daemon logs
+/// itself, on every priority but the library's.
+void keepLibraryQuiet() {
+    setlogmask(LOG_UPTO(LOG_DEBUG) & ~LOG_MASK(LOG_ERR));
+}
+
 int work(const DaemonProgram& program, const StartOptions& options) {
+    if (!options.verbose)
+        keepLibraryQuiet();
     Background background;
     if (!options.foreground && !background.enter())
         return program.fail(std::string("cannot go into the background: ") + strerror(errno));

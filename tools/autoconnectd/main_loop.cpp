@@ -39,7 +39,7 @@ void MainLoop::renewPipe(Clock::time_point now) {
         handleCommands(); // the last that came through the old one
         m_pipe = std::move(next);
     } else if (!isAgain) {
-        syslog(LOG_ERR, "%s", problem.c_str());
+        syslog(LOG_WARNING, "%s", problem.c_str());
     }
 }
 
@@ -67,7 +67,7 @@ int MainLoop::run() {
         renewPipe(Clock::now());
         if (!m_connector.hasBus()) {
             // Not program.fail(): in the foreground the log itself goes to standard error by now.
-            syslog(LOG_ERR, "the system bus has gone; start again when it is back");
+            syslog(LOG_CRIT, "the system bus has gone; start again when it is back");
             return EXIT_FAILURE;
         }
     }

@@ -3,66 +3,56 @@
 
 #include "wakeup.h"
 
-#include <bluetooth/audio.h>
-#include <bluetooth/audio_sink.h>
+#include <bluetooth/bluez_object.h>
 #include <bluetooth/commandlib.h>
-#include <bluetooth/device.h>
 #include <bluetooth/dict_codec.h>
 
 #include <syslog.h>
 
 #include <algorithm>
 #include <cstdlib>
+#include <cstring>
 #include <utility>
 
 namespace AutoConnectd {
 
 namespace {
 
-using Bluetooth::Dict;
-
-constexpr const char* audioSinkUuid = "0000110b-0000-1000-8000-00805f9b34fb";
-
-std::string addressOf(const char* path) {
-    const std::unique_ptr<char, decltype(&free)> address(Bluetooth::getAddressFromPath(path),
-                                                         &free);
+std::string addressOf(const std::string& path) {
+    const std::unique_ptr<char, decltype(&free)> address(
+        Bluetooth::getAddressFromPath(path.c_str()), &free);
     return address ? address.get() : path;
 }
 
-bool hasSink(Bluetooth::Device& device) {
-    const std::unique_ptr<Dict> properties(device.getProperties());
-    return Bluetooth::find(properties.get(), "UUIDs").find(audioSinkUuid) != std::string::npos;
-}
-
-void onSinkChanged(Bluetooth::RemoteObject* /*sender*/) {
-    tellConnection();
-}
-
-void onAudioChanged(Bluetooth::RemoteObject* /*sender*/, const char* /*name*/,
-                    const Bluetooth::Variant* /*value*/) {
-    tellConnection();
+void onChanged(Bluetooth::RemoteObject* /*sender*/, const char* name,
+               const Bluetooth::Variant* /*value*/) {
+    if (strcmp(name, "Connected") == 0 || strcmp(name, "State") == 0)
+        tellConnection();
 }
 
 } // namespace
 
-Target::Target(std::string path, std::string address, Pace pace)
-    : m_path(std::move(path)), m_address(std::move(address)), m_pace(pace), m_delay(pace.first) {}
+Target::Target(const std::string& device, const Service& service, Pace pace)
+    : m_service(service),
+      m_path(device),
+      m_name(std::string(service.name) + " of " + addressOf(device)),
+      m_pace(pace),
+      m_proxy(service.makeProxy(device.c_str())),
+      m_failures(m_name),
+      m_delay(pace.first) {}
 
 Target::~Target() = default;
 
-std::unique_ptr<Target> Target::create(Bluetooth::Device& device, Pace pace) {
-    const char* const path = device.getPath();
-    std::unique_ptr<Target> target(new Target(path, addressOf(path), pace));
-    if (hasSink(device)) {
-        target->m_sink = std::make_unique<Bluetooth::AudioSink>(path);
-        target->m_sink->setConnectedHandler(onSinkChanged);
-        target->m_sink->setDisconnectedHandler(onSinkChanged);
-    } else {
-        target->m_audio = std::make_unique<Bluetooth::Audio>(path);
-        target->m_audio->setPropertyChangedHandler(onAudioChanged);
-    }
+bool Target::isOf(const std::string& device, const Service& service) const {
+    return m_path == device && &m_service == &service;
+}
+
+Target::Opening Target::open() {
     bool connected = false;
-    return target->queryConnected(connected) ? std::move(target) : nullptr;
+    if (m_proxy->setPropertyChangedHandler(onChanged) == 0 && queryConnected(connected))
+        return Opening::Done;
+    return strcmp(m_proxy->getErrorName(), DBUS_ERROR_UNKNOWN_METHOD) == 0 ? Opening::NotServed
+                                                                           : Opening::NotAnswered;
 }
 
 void Target::wasTried(Clock::time_point when) {
@@ -71,42 +61,45 @@ void Target::wasTried(Clock::time_point when) {
 }
 
 bool Target::queryConnected(bool& connected) {
-    if (m_sink)
-        return m_sink->isConnected(connected) == 0;
-    const std::unique_ptr<Dict> properties(m_audio->getProperties());
-    connected = Bluetooth::find(properties.get(), "State") == "connected";
+    const std::unique_ptr<Bluetooth::Dict> properties(m_proxy->getProperties());
+    connected = Bluetooth::find(properties.get(), m_service.property) == m_service.connected;
     return properties != nullptr;
 }
 
 bool Target::check(Clock::time_point now, bool mayConnect) {
+    // Before the state is asked for: who has connected is not called unsuccessful after that.
+    const auto result = m_attempt.takeResult(now);
     bool connected = false;
     if (!queryConnected(connected)) {
         if (m_connected)
-            syslog(LOG_NOTICE, "%s is gone", m_address.c_str());
+            syslog(LOG_NOTICE, "%s is gone", m_name.c_str());
         return false;
     }
-    if (connected != m_connected) {
-        m_connected = connected;
-        syslog(LOG_NOTICE, "%s %s", m_address.c_str(), connected ? "connected" : "disconnected");
-        m_announced = false;
-        m_delay = m_pace.first;
-        m_due = now + m_delay;
-    }
-    if (!m_connected && mayConnect && now >= m_due)
+    if (result && !result->empty() && !connected)
+        m_failures.add(*result);
+    if (connected != m_connected)
+        noteConnection(connected, now);
+    if (!m_connected && mayConnect && now >= m_due && !m_attempt.isRunning())
         connect(now);
     return true;
 }
 
+void Target::noteConnection(bool connected, Clock::time_point now) {
+    m_connected = connected;
+    m_announced = false;
+    m_delay = m_pace.first;
+    m_due = now + m_delay;
+    const std::string failed = connected ? m_failures.end() : "";
+    syslog(LOG_NOTICE, "%s %s%s%s", m_name.c_str(), connected ? "connected" : "disconnected",
+           failed.empty() ? "" : " after ", failed.c_str());
+}
+
 void Target::connect(Clock::time_point now) {
     if (!m_announced)
-        syslog(LOG_INFO, "connecting %s", m_address.c_str());
+        syslog(LOG_INFO, "connecting %s", m_name.c_str());
     m_announced = true;
     m_tried = now;
-    // Whether it came to a connection is seen at the next check: the call does not wait for it.
-    if (m_sink)
-        m_sink->connect();
-    else
-        m_audio->connect();
+    m_attempt.begin(*m_proxy, now);
     m_due = now + m_delay;
     m_delay = std::min(m_delay * 2, m_pace.longest);
 }

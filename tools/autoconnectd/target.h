@@ -2,19 +2,19 @@
 #ifndef KESBT_AUTOCONNECTD_TARGET_H
 #define KESBT_AUTOCONNECTD_TARGET_H
 
+#include "attempt.h"
+#include "failures.h"
+#include "service.h"
+
 #include <chrono>
 #include <memory>
 #include <string>
 
 namespace Bluetooth {
-class Audio;
-class AudioSink;
-class Device;
+class BluezObject;
 } // namespace Bluetooth
 
 namespace AutoConnectd {
-
-using Clock = std::chrono::steady_clock;
 
 /// How long to wait before the next attempt at a device that is away: the first time `first`, then
 /// twice as long each time, up to `longest`.
@@ -23,23 +23,28 @@ struct Pace {
     std::chrono::seconds longest;
 };
 
-/// One device that is to be connected: through its audio sink, or all its audio where it has none.
+/// One service of one device, which is to be connected.
 class Target {
 public:
-    /// @return null when the device offers no audio
-    static std::unique_ptr<Target> create(Bluetooth::Device& device, Pace pace);
+    /// @param device its object path
+    Target(const std::string& device, const Service& service, Pace pace);
     ~Target();
 
-    const std::string& path() const { return m_path; }
-    const std::string& address() const { return m_address; }
+    bool isOf(const std::string& device, const Service& service) const;
+    /// What it is, for people: "audio of 00:11:22:33:44:55".
+    const std::string& name() const { return m_name; }
+
+    enum class Opening { Done, NotServed, NotAnswered };
+    /// Subscribes, and asks for the state. @return what the daemon says to that
+    Opening open();
 
     /// Reckons with an attempt that was made before this target was there.
     void wasTried(Clock::time_point when);
     /// The last attempt; the clock's zero when there was none.
     Clock::time_point tried() const { return m_tried; }
 
-    /// Asks the daemon for the state, logs a change, and connects when the device is away, an
-    /// attempt is due and `mayConnect` is set.
+    /// Asks the daemon for the state, logs a change and what became of an attempt, and connects
+    /// when the device is away, an attempt is due and `mayConnect` is set.
     /// @return false when the daemon does not know the device any more
     bool check(Clock::time_point now, bool mayConnect);
 
@@ -50,20 +55,21 @@ public:
     void beginAgain();
 
     bool isConnected() const { return m_connected; }
-    /// When the next attempt is due; meaningless while connected.
-    Clock::time_point due() const { return m_due; }
+    /// When the next attempt is due, or the running one is given up; meaningless while connected.
+    Clock::time_point due() const { return m_attempt.isRunning() ? m_attempt.deadline() : m_due; }
 
 private:
-    Target(std::string path, std::string address, Pace pace);
-
     bool queryConnected(bool& connected);
+    void noteConnection(bool connected, Clock::time_point now);
     void connect(Clock::time_point now);
 
+    const Service& m_service;
     std::string m_path;
-    std::string m_address;
+    std::string m_name;
     Pace m_pace;
-    std::unique_ptr<Bluetooth::AudioSink> m_sink; // this or m_audio
-    std::unique_ptr<Bluetooth::Audio> m_audio;
+    std::unique_ptr<Bluetooth::BluezObject> m_proxy;
+    Attempt m_attempt;
+    Failures m_failures;
     bool m_connected = false;
     bool m_announced = false; // that it is being waited for
     Clock::time_point m_tried{};

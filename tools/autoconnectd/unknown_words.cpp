@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: LGPL-2.1-or-later
 #include "unknown_words.h"
 
+#include "shown_text.h"
+
 #include <syslog.h>
 
 namespace AutoConnectd {
@@ -9,19 +11,6 @@ namespace {
 
 constexpr std::size_t longest = 64; // bytes
 constexpr std::chrono::seconds pause{1};
-
-std::string escaped(const std::string& bytes) {
-    constexpr const char* digits = "0123456789ABCDEF";
-    std::string text;
-    for (const char byte : bytes) {
-        const auto value = static_cast<unsigned char>(byte);
-        if (value >= ' ' && value <= '~' && value != '\\')
-            text += byte;
-        else
-            text.append("\\x").append(1, digits[value / 16]).append(1, digits[value % 16]);
-    }
-    return text;
-}
 
 } // namespace
 
@@ -34,7 +23,7 @@ void UnknownWords::add(std::string_view bytes) {
 void UnknownWords::log(Clock::time_point now) {
     if (now < due())
         return;
-    syslog(LOG_WARNING, "no command: \"%s\"%s", escaped(m_text).c_str(), m_isCut ? " ..." : "");
+    syslog(LOG_WARNING, "no command: \"%s\"%s", shownText(m_text).c_str(), m_isCut ? " ..." : "");
     m_text.clear();
     m_isCut = false;
     m_due = now + pause;

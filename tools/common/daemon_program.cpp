@@ -32,7 +32,7 @@ std::optional<int> DaemonProgram::start(int argc, char** argv) {
 
 int DaemonProgram::fail(const std::string& problem) const {
     std::cerr << m_name << ": " << problem << std::endl;
-    syslog(LOG_ERR, "%s", problem.c_str());
+    syslog(LOG_CRIT, "%s", problem.c_str());
     return EXIT_FAILURE;
 }
 
