@@ -22,13 +22,17 @@ namespace Errors {
 constexpr BluezError agentNotAvailable{"AgentNotAvailable", "Agent Not Available"};
 constexpr BluezError alreadyConnected{"AlreadyConnected", "Already Connected"};
 constexpr BluezError alreadyExists{"AlreadyExists", "Already Exists"};
+/// InProgress as well, with the other text that the daemon has for it.
+constexpr BluezError busy{"InProgress", "Operation already in progress"};
 constexpr BluezError doesNotExist{"DoesNotExist", "Does Not Exist"};
 constexpr BluezError inProgress{"InProgress", "In Progress"};
 constexpr BluezError invalidArguments{"InvalidArguments", "Invalid arguments in method call"};
 constexpr BluezError noSuchAdapter{"NoSuchAdapter", "No such adapter"};
 constexpr BluezError notAuthorized{"NotAuthorized", "Operation Not Authorized"};
+constexpr BluezError notAvailable{"NotAvailable", "Operation currently not available"};
 constexpr BluezError notConnected{"NotConnected", "Not Connected"};
 constexpr BluezError notReady{"NotReady", "Resource Not Ready"};
+constexpr BluezError notSupported{"NotSupported", "Operation is not supported"};
 constexpr BluezError authenticationCanceled{"AuthenticationCanceled", "Authentication Canceled"};
 constexpr BluezError authenticationFailed{"AuthenticationFailed", "Authentication Failed"};
 constexpr BluezError authenticationRejected{"AuthenticationRejected", "Authentication Rejected"};

@@ -15,9 +15,6 @@ namespace Interfaces {
 inline constexpr const char* manager = "org.bluez.Manager";
 inline constexpr const char* adapter = "org.bluez.Adapter";
 inline constexpr const char* device = "org.bluez.Device";
-inline constexpr const char* audio = "org.bluez.Audio";
-inline constexpr const char* audioSink = "org.bluez.AudioSink";
-inline constexpr const char* control = "org.bluez.Control";
 inline constexpr const char* agent = "org.bluez.Agent"; ///< what clients serve
 
 } // namespace Interfaces
@@ -99,44 +96,6 @@ const Interface& deviceInterface() {
                                      {"CancelDiscovery", {}, {}, handle<&Served::cancelDiscovery>},
                                      {"Disconnect", {}, {}, handle<&Served::disconnect>}},
                                     {Entries::propertyChanged(), {"DisconnectRequested", {}}}};
-    return table;
-}
-
-template <class Served>
-const Interface& audioInterface() {
-    static const Interface table = {"org.bluez.Audio",
-                                    {{"Connect", {}, {}, handle<&Served::connectAudio>},
-                                     {"Disconnect", {}, {}, handle<&Served::disconnectAudio>},
-                                     Entries::getProperties<&Served::audioProperties>()},
-                                    {Entries::propertyChanged()}};
-    return table;
-}
-
-template <class Served>
-const Interface& audioSinkInterface() {
-    static const Interface table = {
-        Interfaces::audioSink,
-        {{"Connect", {}, {}, handle<&Served::connectSink>},
-         {"Disconnect", {}, {}, handle<&Served::disconnectSink>},
-         {"IsConnected", {}, {{"connected", "b"}}, handle<&Served::sinkIsConnected>, true},
-         Entries::getProperties<&Served::sinkProperties>()},
-        {{"Connected", {}, true},
-         {"Disconnected", {}, true},
-         {"Playing", {}, true},
-         {"Stopped", {}, true},
-         Entries::propertyChanged()}};
-    return table;
-}
-
-template <class Served>
-const Interface& remoteControlInterface() {
-    static const Interface table = {
-        Interfaces::control,
-        {{"IsConnected", {}, {{"connected", "b"}}, handle<&Served::controlIsConnected>},
-         Entries::getProperties<&Served::controlProperties>(),
-         {"VolumeUp", {}, {}, handle<&Served::volume>},
-         {"VolumeDown", {}, {}, handle<&Served::volume>}},
-        {{"Connected", {}, true}, {"Disconnected", {}, true}, Entries::propertyChanged()}};
     return table;
 }
 

@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: LGPL-2.1-or-later
 #include "serving/bus/bus_connection.h"
 
+#include <gio/gunixfdlist.h>
+
 #include <atomic>
 #include <stdexcept>
 
@@ -169,21 +171,24 @@ void BusConnection::emit(const std::string& path, const std::string& interface,
 void BusConnection::call(const std::string& destination, const std::string& path,
                          const std::string& interface, const std::string& member,
                          const Value& arguments, int timeout, GCancellable* cancellable,
-                         AnswerHandler answered) {
+                         AnswerHandler answered, int descriptor) {
     const auto finished = [](GObject* source, GAsyncResult* result, gpointer data) {
         const std::unique_ptr<AnswerHandler> handler(static_cast<AnswerHandler*>(data));
         ErrorOut error;
-        const GlibPtr<GVariant> reply(
-            g_dbus_connection_call_finish(G_DBUS_CONNECTION(source), result, error.out()));
+        const GlibPtr<GVariant> reply(g_dbus_connection_call_with_unix_fd_list_finish(
+            G_DBUS_CONNECTION(source), nullptr, result, error.out()));
         if (reply)
             (*handler)({Value(reply.get()), {}, false});
         else if (!g_error_matches(error.get(), G_IO_ERROR, G_IO_ERROR_CANCELLED))
             (*handler)({{}, fromGlib(error.get()), true});
     };
-    g_dbus_connection_call(m_connection, destination.c_str(), path.c_str(), interface.c_str(),
-                           member.c_str(), arguments.get(), nullptr,
-                           G_DBUS_CALL_FLAGS_NO_AUTO_START, timeout, cancellable, finished,
-                           new AnswerHandler(std::move(answered)));
+    const ObjectPtr<GUnixFDList> descriptors(descriptor < 0 ? nullptr : g_unix_fd_list_new());
+    if (descriptors)
+        g_unix_fd_list_append(descriptors.get(), descriptor, nullptr);
+    g_dbus_connection_call_with_unix_fd_list(
+        m_connection, destination.c_str(), path.c_str(), interface.c_str(), member.c_str(),
+        arguments.get(), nullptr, G_DBUS_CALL_FLAGS_NO_AUTO_START, timeout, descriptors.get(),
+        cancellable, finished, new AnswerHandler(std::move(answered)));
 }
 
 void BusConnection::send(const std::string& destination, const std::string& path,

@@ -51,9 +51,10 @@ public:
     /// Calls a method of another client.
     /// @param timeout  milliseconds
     /// @param answered  called with the answer, unless the cancellable is cancelled before
+    /// @param descriptor  what the first "h" of the arguments, of value 0, stands for; -1 for none
     void call(const std::string& destination, const std::string& path, const std::string& interface,
               const std::string& member, const Value& arguments, int timeout,
-              GCancellable* cancellable, AnswerHandler answered);
+              GCancellable* cancellable, AnswerHandler answered, int descriptor = -1);
     /// Sends a call whose answer nobody waits for.
     void send(const std::string& destination, const std::string& path, const std::string& interface,
               const std::string& member, const Value& arguments = {});

@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: LGPL-2.1-or-later
 #include "serving/bus/call.h"
 
+#include <gio/gunixfdlist.h>
+
 namespace Bluetooth::Serving {
 
 namespace {
@@ -63,6 +65,22 @@ void Call::reply(const Value& results) {
     GDBusMessage* reply = g_dbus_message_new_method_reply(m_message);
     if (results)
         g_dbus_message_set_body(reply, results.get());
+    send(reply);
+}
+
+void Call::replyDescriptor(int descriptor, const std::vector<Value>& others) {
+    const ObjectPtr<GUnixFDList> descriptors(g_unix_fd_list_new());
+    const gint index = g_unix_fd_list_append(descriptors.get(), descriptor, nullptr);
+    if (index < 0)
+        return fail({"org.freedesktop.DBus.Error.LimitsExceeded", "Too many open files"});
+    GVariantBuilder body;
+    g_variant_builder_init(&body, G_VARIANT_TYPE_TUPLE);
+    g_variant_builder_add(&body, "h", index);
+    for (const Value& other : others)
+        g_variant_builder_add_value(&body, other.get());
+    GDBusMessage* reply = g_dbus_message_new_method_reply(m_message);
+    g_dbus_message_set_body(reply, g_variant_builder_end(&body));
+    g_dbus_message_set_unix_fd_list(reply, descriptors.get());
     send(reply);
 }
 

@@ -7,6 +7,7 @@
 
 #include <memory>
 #include <string>
+#include <vector>
 
 namespace Bluetooth::Serving {
 
@@ -40,6 +41,8 @@ public:
     bool expectsReply() const;
     /// @param results  a tuple, or nothing for an empty reply
     void reply(const Value& results = {});
+    /// Replies with a descriptor, of which the caller gets a copy, and what comes after it.
+    void replyDescriptor(int descriptor, const std::vector<Value>& others = {});
     void fail(const BusError& error);
 
 private:

@@ -2,8 +2,8 @@
 #include "control/world_control.h"
 
 #include "control/arguments.h"
+#include "daemon/audio/device_audio.h"
 #include "daemon/bluetoothd.h"
-#include "daemon/device_audio.h"
 #include "daemon/served_adapter.h"
 #include "daemon/served_device.h"
 #include "serving/bluez4/address.h"
@@ -12,6 +12,27 @@
 #include <stdexcept>
 
 namespace Bluetooth::Sim {
+
+namespace {
+
+/// The service class that is a call's third argument.
+std::string uuidOf(const CallPtr& call) {
+    const std::string uuid = fullUuid(call->text(2));
+    if (uuid.empty())
+        throw std::runtime_error("\"" + call->text(2) + "\" is not a UUID");
+    return uuid;
+}
+
+/// What configures the whole world changes altogether or not at all.
+template <class Configuration>
+Value configure(Configuration& present, const CallPtr& call) {
+    Configuration copy = present;
+    applySettings(copy, settingsOf(call, 0));
+    present = copy;
+    return {};
+}
+
+} // namespace
 
 ServedAdapter& WorldControl::adapter(const std::string& id) {
     ServedAdapter* found = m_daemon.find(id);
@@ -125,10 +146,31 @@ Value WorldControl::startIncomingPairing(const CallPtr& call) {
 }
 
 Value WorldControl::connectService(const CallPtr& call) {
-    const std::string uuid = fullUuid(call->text(2));
-    if (uuid.empty())
-        throw std::runtime_error("\"" + call->text(2) + "\" is not a UUID");
-    device(call)->audio().serviceConnects(uuid);
+    device(call)->audio().serviceConnects(uuidOf(call));
+    return {};
+}
+
+Value WorldControl::disconnectService(const CallPtr& call) {
+    device(call)->audio().serviceDisconnects(uuidOf(call));
+    return {};
+}
+
+Headset& WorldControl::headset(const CallPtr& call) {
+    Headset* found = device(call)->audio().headset();
+    if (!found || !found->connected())
+        throw std::runtime_error("the device is not connected as a headset");
+    return *found;
+}
+
+Value WorldControl::pressHeadsetButton(const CallPtr& call) {
+    headset(call).press();
+    return {};
+}
+
+Value WorldControl::setHeadsetGain(const CallPtr& call) {
+    const guint16 gain = g_variant_get_uint16(call->argument(3).get());
+    if (!headset(call).setGain(call->text(2), gain))
+        throw std::runtime_error("SpeakerGain and MicrophoneGain change to another value up to 15");
     return {};
 }
 
@@ -151,10 +193,11 @@ Value WorldControl::setTimeScale(const CallPtr& call) {
 }
 
 Value WorldControl::setTimes(const CallPtr& call) {
-    Times copy = m_world.times;
-    applySettings(copy, settingsOf(call, 0));
-    m_world.times = copy;
-    return {};
+    return configure(m_world.times, call);
+}
+
+Value WorldControl::setAudio(const CallPtr& call) {
+    return configure(m_world.audio, call);
 }
 
 } // namespace Bluetooth::Sim

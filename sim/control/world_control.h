@@ -12,6 +12,7 @@
 namespace Bluetooth::Sim {
 
 class Bluetoothd;
+class Headset;
 class ServedAdapter;
 class ServedDevice;
 
@@ -31,10 +32,14 @@ public:
     Value connectDevice(const CallPtr& call);
     Value startIncomingPairing(const CallPtr& call);
     Value connectService(const CallPtr& call);
+    Value disconnectService(const CallPtr& call);
+    Value pressHeadsetButton(const CallPtr& call);
+    Value setHeadsetGain(const CallPtr& call);
     Value dropLink(const CallPtr& call);
     Value setPlaying(const CallPtr& call);
     Value setTimeScale(const CallPtr& call);
     Value setTimes(const CallPtr& call);
+    Value setAudio(const CallPtr& call);
 
     /// The daemon's adapter of that name.
     ServedAdapter& adapter(const std::string& id);
@@ -42,6 +47,7 @@ public:
 private:
     Value comeIn(const CallPtr& call, bool pairing);
     std::shared_ptr<ServedDevice> device(const CallPtr& call);
+    Headset& headset(const CallPtr& call);
     std::shared_ptr<PeerDevice> peer(const std::string& address);
     void peerChanged(const std::shared_ptr<PeerDevice>& peer);
 

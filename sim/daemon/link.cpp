@@ -2,7 +2,7 @@
 #include "daemon/link.h"
 
 #include "daemon/bluetoothd.h"
-#include "daemon/device_audio.h"
+#include "daemon/audio/device_audio.h"
 #include "daemon/served_adapter.h"
 #include "daemon/served_device.h"
 
@@ -55,11 +55,11 @@ Link::Hold Link::hold() {
     return Hold(*this);
 }
 
-void Link::released() {
+void Link::released(guint Times::*idle) {
     if (--m_holds != 0 || m_heldByPeer || !m_up)
         return;
     const Times& times = m_device.adapter().daemon().times();
-    m_idle.start(times.scaled(times.idleDisconnect), [this] { drop(); });
+    m_idle.start(times.scaled(times.*idle), [this] { drop(); });
 }
 
 void Link::drop() {
@@ -84,8 +84,8 @@ void Link::requestDisconnect(const CallPtr& call) {
     if (m_disconnect.running())
         return;
     const Times& times = m_device.adapter().daemon().times();
+    m_device.audio().disconnectRequested(); // what uses the link lets go of it first
     m_device.emit("DisconnectRequested", {});
-    m_device.audio().linkLost(); // what uses the link lets go of it first
     m_disconnect.start(times.scaled(times.disconnectRequest), [this] { drop(); });
 }
 

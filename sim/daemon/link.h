@@ -5,6 +5,7 @@
 #include "serving.h"
 #include "serving/bus/call.h"
 #include "serving/bus/one_shot_timer.h"
+#include "world/times.h"
 
 #include <functional>
 #include <utility>
@@ -31,9 +32,10 @@ public:
             return *this;
         }
         ~Hold() { release(); }
-        void release() {
+        /// @param idle  how long the link stays when this was its last use
+        void release(guint Times::*idle = &Times::idleDisconnect) {
             if (Link* link = std::exchange(m_link, nullptr))
-                link->released();
+                link->released(idle);
         }
 
     private:
@@ -61,7 +63,7 @@ private:
     void page();
     void paged(bool reached);
     void comeUp();
-    void released();
+    void released(guint Times::*idle);
 
     ServedDevice& m_device;
     bool m_up = false;

@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: LGPL-2.1-or-later
 #include "daemon/served_adapter.h"
 
+#include "daemon/audio/adapter_media.h"
+#include "daemon/audio/device_audio.h"
 #include "daemon/bluetoothd.h"
 #include "daemon/client_agent.h"
 #include "daemon/device_pairing.h"
@@ -28,6 +30,7 @@ ServedAdapter::ServedAdapter(Bluetoothd& daemon, std::shared_ptr<AdapterHardware
       m_mode(*this),
       m_discovery(*this) {
     m_daemon.objects().add(m_path, adapterInterface<ServedAdapter>(), this);
+    m_media = std::make_unique<AdapterMedia>(*this);
     for (auto& [address, stored] : m_hardware->storage) {
         if (!stored.known)
             continue;
@@ -71,6 +74,7 @@ void ServedAdapter::loseDevices() {
 void ServedAdapter::clientGone(const std::string& client) {
     m_discovery.clientGone(client);
     m_mode.clientGone(client);
+    m_media->clientGone(client);
     const auto devices = m_devices;
     for (const auto& device : devices)
         device->clientGone(client);
@@ -81,9 +85,12 @@ void ServedAdapter::clientGone(const std::string& client) {
 }
 
 void ServedAdapter::releaseAgents() {
-    for (const auto& device : m_devices)
+    for (const auto& device : m_devices) {
+        device->audio().releaseAgent();
         if (device->pairing())
             device->pairing()->releaseAgent();
+    }
+    m_media->release();
     if (m_agent)
         m_agent->release();
 }
@@ -123,6 +130,7 @@ void ServedAdapter::forgetDevice(const std::shared_ptr<ServedDevice>& device) {
     if (found == m_devices.end())
         return;
     m_devices.erase(found);
+    device->audio().releaseAgent();
     devicesChanged();
     emit("DeviceRemoved", tuple(pathValue(device->path())));
     device->cancelSearch();

@@ -14,6 +14,7 @@
 
 namespace Bluetooth::Sim {
 
+class AdapterMedia;
 class ClientAgent;
 class Bluetoothd;
 class ServedDevice;
@@ -31,6 +32,7 @@ public:
     const std::string& path() const { return m_path; }
     AdapterMode& mode() { return m_mode; }
     AdapterDiscovery& discovery() { return m_discovery; }
+    AdapterMedia& media() { return *m_media; }
     /// The agent that RegisterAgent gave, or null.
     ClientAgent* agent() const { return m_agent.get(); }
     std::shared_ptr<ClientAgent> sharedAgent() const { return m_agent; }
@@ -93,6 +95,7 @@ private:
     AdapterMode m_mode;
     AdapterDiscovery m_discovery;
     std::shared_ptr<ClientAgent> m_agent;
+    std::unique_ptr<AdapterMedia> m_media;
     std::vector<std::shared_ptr<ServedDevice>> m_devices;
 };
 

@@ -1,8 +1,8 @@
 // SPDX-License-Identifier: LGPL-2.1-or-later
 #include "daemon/served_device.h"
 
+#include "daemon/audio/device_audio.h"
 #include "daemon/bluetoothd.h"
-#include "daemon/device_audio.h"
 #include "daemon/device_pairing.h"
 #include "daemon/served_adapter.h"
 #include "daemon/service_records.h"
@@ -296,6 +296,7 @@ void ServedDevice::linkLost() {
 
 void ServedDevice::clientGone(const std::string& client) {
     const auto alive = shared_from_this();
+    m_audio->clientGone(client);
     if (m_search && m_search->owner() == client)
         m_search->ownerGone();
     if (m_pairing && m_pairing->owner() == client)

@@ -57,6 +57,10 @@ const std::vector<Behaviour>& behaviours() {
         {"Unconnectable", "is found, but cannot be reached", with(&PeerDevice::connectable, false)},
         {"Vanishing", "goes out of range 5 seconds after a discovery began",
          with(&PeerDevice::visibleFor, 5000U)},
+        {"NoEndpoint", "has no endpoint for audio streams",
+         with(&PeerDevice::audioEndpoint, false)},
+        {"AudioHangs", "falls silent while audio is connected, for 41 seconds",
+         with(&PeerDevice::audioHangs, true)},
         {"Known", "was created before", with(&PeerDevice::known, true)},
         {"AlreadyPaired", "was paired before",
          [](PeerDevice& device) {

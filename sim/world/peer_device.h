@@ -46,6 +46,8 @@ struct PeerDevice {
     bool lowEnergy = false;
     bool broadcaster = false;
     bool connectsBack = false; ///< opens a channel of its own while we connect audio
+    bool audioEndpoint = true; ///< whether streams find an endpoint on it
+    bool audioHangs = false;   ///< falls silent while we connect audio
     guint visibleFor = 0;      ///< vanishes so long after a discovery began; 0: never
 
     bool legacy = false;

@@ -64,12 +64,14 @@ private:
     void readGroup(const std::string& group) {
         if (group == "Times")
             apply(m_world.times, group);
+        else if (group == "Audio")
+            apply(m_world.audio, group);
         else if (group.compare(0, 8, "Adapter ") == 0)
             readAdapter(group, group.substr(8));
         else if (group.compare(0, 7, "Device ") == 0)
             readDevice(group, upperCase(group.substr(7)));
         else
-            fail(group, "", "is neither [Times], [Adapter hciN] nor [Device ADDRESS]");
+            fail(group, "", "is neither [Times], [Audio], [Adapter hciN] nor [Device ADDRESS]");
     }
 
     void readAdapter(const std::string& group, const std::string& id) {

@@ -115,6 +115,8 @@ const SettingKey<PeerDevice> deviceKeys[] = {
     {"LowEnergy", set<&PeerDevice::lowEnergy>},
     {"Broadcaster", set<&PeerDevice::broadcaster>},
     {"ConnectsBack", set<&PeerDevice::connectsBack>},
+    {"AudioEndpoint", set<&PeerDevice::audioEndpoint>},
+    {"AudioHangs", set<&PeerDevice::audioHangs>},
     {"VisibleFor", set<&PeerDevice::visibleFor>},
     {"LegacyPairing", set<&PeerDevice::legacy>},
     {"Capability", set<&PeerDevice::capability>},
@@ -149,6 +151,24 @@ const SettingKey<AdapterHardware> adapterKeys[] = {
     {"UUIDs", set<&AdapterHardware::uuids>},
 };
 
+const SettingKey<AudioConfiguration> audioKeys[] = {
+    {"Enable",
+     [](AudioConfiguration& audio, const std::string& text) {
+         audio.source = audio.gateway = false;
+         for (const std::string& item : list(text)) {
+             if (item != "Source" && item != "Gateway")
+                 throw std::invalid_argument("\"" + item + "\" is neither Source nor Gateway");
+             (item == "Source" ? audio.source : audio.gateway) = true;
+         }
+     }},
+    {"SCORouting",
+     [](AudioConfiguration& audio, const std::string& text) {
+         if (text != "HCI" && text != "PCM")
+             throw std::invalid_argument("\"" + text + "\" is neither HCI nor PCM");
+         audio.scoByPcm = text == "PCM";
+     }},
+};
+
 template <guint Times::*Member>
 constexpr auto setTime = setUpTo<Member, G_MAXINT, Times>;
 
@@ -169,6 +189,13 @@ const SettingKey<Times> timeKeys[] = {
     {"IdleDisconnect", setTime<&Times::idleDisconnect>},
     {"DisconnectRequest", setTime<&Times::disconnectRequest>},
     {"AudioConnect", setTime<&Times::audioConnect>},
+    {"AudioTimeout", setTime<&Times::audioTimeout>},
+    {"AudioRetry", setTime<&Times::audioRetry>},
+    {"AudioPause", setTime<&Times::audioPause>},
+    {"AudioShutdown", setTime<&Times::audioShutdown>},
+    {"AudioClose", setTime<&Times::audioClose>},
+    {"AudioIdle", setTime<&Times::audioIdle>},
+    {"AudioIdleAtPeer", setTime<&Times::audioIdleAtPeer>},
     {"ControlConnect", setTime<&Times::controlConnect>},
     {"PairingTimeout", setTime<&Times::pairingTimeout>},
     {"AgentTimeout", setTime<&Times::agentTimeout>},
@@ -212,6 +239,10 @@ void applySettings(PeerDevice& device, const Settings& settings) {
 
 void applySettings(AdapterHardware& adapter, const Settings& settings) {
     apply(adapter, adapterKeys, settings);
+}
+
+void applySettings(AudioConfiguration& audio, const Settings& settings) {
+    apply(audio, audioKeys, settings);
 }
 
 void applySettings(Times& times, const Settings& settings) {

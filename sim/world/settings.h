@@ -30,6 +30,7 @@ using Settings = std::vector<std::pair<std::string, std::string>>;
 /// has an unusable value. Behaviours are applied first, so that other keys refine them.
 void applySettings(PeerDevice& device, const Settings& settings);
 void applySettings(AdapterHardware& adapter, const Settings& settings);
+void applySettings(AudioConfiguration& audio, const Settings& settings);
 void applySettings(Times& times, const Settings& settings);
 
 /// Text forms of service classes: "110b", "0x110B" and full UUIDs all become full lower-case UUIDs.

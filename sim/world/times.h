@@ -26,7 +26,14 @@ struct Times {
     guint idleDisconnect = 4000;    ///< until an unused link drops
     guint disconnectRequest = 2000; ///< from DisconnectRequested to the end of the link
     guint audioConnect = 700;       ///< to set up an audio stream
-    guint controlConnect = 2000;    ///< from a stream to the remote control
+    guint audioTimeout = 41000;     ///< until a device that falls silent meanwhile is given up
+    guint audioRetry = 2000;        ///< from a stream's failure to the answer of its Connect
+    guint audioPause = 1000;        ///< between two profiles that are connected together
+    guint audioShutdown = 50;       ///< to close a stream
+    guint audioClose = 1000;        ///< from a closed stream to the end of its profile
+    guint audioIdle = 2000;         ///< from the end of the last profile to that of the link
+    guint audioIdleAtPeer = 3000;   ///< the same when the device has closed it
+    guint controlConnect = 2000;    ///< from a device's own stream to the remote control
 
     guint pairingTimeout = 30000; ///< until a pairing whose agent does not answer is given up
     guint agentTimeout = 60000;   ///< until any other request to an agent is given up

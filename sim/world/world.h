@@ -48,10 +48,18 @@ struct AdapterHardware {
     std::string id() const { return "hci" + std::to_string(index); }
 };
 
+/// The host's audio.conf, as it is shipped.
+struct AudioConfiguration {
+    bool source = false;   ///< whether devices are served as org.bluez.AudioSource
+    bool gateway = false;  ///< whether they are served as org.bluez.HandsfreeGateway
+    bool scoByPcm = false; ///< whether a headset's sound goes past the host
+};
+
 /// Everything that exists apart from the daemon: controllers, devices in the air, and how long
 /// things take. A daemon that restarts finds it as it was.
 struct World {
     Times times;
+    AudioConfiguration audio;
     std::vector<std::shared_ptr<AdapterHardware>> adapters;
     std::vector<std::shared_ptr<PeerDevice>> peers;
 

@@ -126,7 +126,7 @@ TEST_F(CommandTest, WrongScenariosAndUsageGiveOneLine) {
         {device + "\nAdapter=hci7\n", device + " Adapter: there is no adapter \"hci7\""},
         {"[Adapter hci0]\nName=x\n", "[Adapter hci0] Address: is missing"},
         {"[Adapter zero]\n", "[Adapter zero]: an adapter is named hci0 to hci99"},
-        {"[Radio]\n", "[Radio]: is neither [Times], [Adapter hciN] nor [Device ADDRESS]"},
+        {"[Radio]\n", "[Radio]: is neither [Times], [Audio], [Adapter hciN] nor [Device ADDRESS]"},
         {"[Times]\nTea=4\n", "[Times] Tea: there is no such time"}};
     for (const auto& [text, line] : scenarios) {
         std::ofstream(file) << text;

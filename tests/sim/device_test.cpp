@@ -8,7 +8,6 @@ using DeviceTest = SimTest;
 const std::string serialPort = "a(s:00001101-0000-1000-8000-00805f9b34fb)";
 const std::string withId =
     serialPort.substr(0, serialPort.size() - 1) + " s:00001200" + serialPort.substr(12);
-const Settings audioDevice{{"Name", "Headset"}, {"Class", "0x240404"}, {"UUIDs", "110b;110e"}};
 const std::string unknownDevice = "error DoesNotExist: Does Not Exist";
 const std::string notConnected = "error NotConnected: Not Connected";
 
@@ -160,53 +159,6 @@ TEST_F(DeviceTest, ASearchCanBeCancelledByItsCaller) {
               "answer DiscoverServices error ConnectionAttemptFailed: Host is down");
     set("Powered", false);
     EXPECT_EQ(call(search), "error Failed: No route to host");
-}
-
-TEST_F(DeviceTest, AudioConnectsWithAllItsInterfacesAndDisconnects) {
-    create(audioDevice);
-    EXPECT_EQ(call("Control.VolumeUp"), notConnected);
-    const Texts connected{"device Connected", "device Connected=b:1"};
-    const std::string connecting = "device State=s:connecting";
-    const std::string isConnected = "device State=s:connected";
-    EXPECT_EQ(trace("AudioSink.Connect"), lines(connecting, connecting) + connected +
-                                              lines(isConnected, isConnected, "answer Connect"));
-    EXPECT_EQ(until(connected[1]), connected);
-    EXPECT_EQ(call("Control.VolumeUp"), "");
-    EXPECT_EQ(call("AudioSink.Connect"), "error AlreadyConnected: Already Connected");
-    control({"SetPlaying", "hci0", newDevice, true});
-    EXPECT_EQ(taken(), lines("device Playing", "device Playing=b:1", "device State=s:playing"));
-    EXPECT_EQ(call("AudioSink.IsConnected"), "b:1");
-    EXPECT_EQ(call("Control.IsConnected"), "b:1");
-    EXPECT_EQ(call("Control.GetProperties"), "a(e(s:Connected v(b:1)))");
-    EXPECT_EQ(call("AudioSink.GetProperties"),
-              "a(e(s:State v(s:playing)) e(s:Connected v(b:1)) e(s:Playing v(b:1)))");
-    EXPECT_EQ(trace("Audio.Disconnect").front(), "device Stopped");
-    EXPECT_EQ(call("Audio.GetProperties"), "a(e(s:State v(s:disconnected)))");
-    EXPECT_EQ(call("Audio.Disconnect"), notConnected);
-    EXPECT_EQ(call("AudioSink.Disconnect"), notConnected);
-    EXPECT_EQ(call("AudioSink.Connect"), "");
-    EXPECT_EQ(call("AudioSink.Disconnect"), "");
-    control({"SetDevice", newDevice, Settings{{"Connectable", "false"}}});
-    EXPECT_EQ(call("Audio.Connect"), "error Failed: Connect Failed");
-}
-
-TEST_F(DeviceTest, AServiceOfAnUntrustedDeviceNeedsTheAgentsConsent) {
-    Settings settings = audioDevice;
-    settings.emplace_back("ConnectsBack", "true");
-    create(settings);
-    registerAgent();
-    const std::string asked = "agent Authorize o:device s:0000110d-0000-1000-8000-00805f9b34fb";
-    peer().replyError("Authorize", "org.bluez.Error.Rejected", "said no");
-    EXPECT_EQ(call("AudioSink.Connect"), "error Failed: Stream setup failed");
-    until(asked);
-    peer().reply("Authorize");
-    control({"ConnectService", "hci0", newDevice, "110d"});
-    until(asked);
-    until("device State=s:connected");
-    call("Audio.Disconnect");
-    setOfDevice("Trusted", true);
-    for (const std::string& line : trace("Audio.Connect"))
-        EXPECT_EQ(line.find("agent"), std::string::npos) << line;
 }
 
 TEST_F(DeviceTest, ADeviceThatConnectsByItselfStaysOnlyAsLongAsItsLink) {

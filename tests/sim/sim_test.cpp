@@ -12,6 +12,22 @@ std::string joined(const std::string& first, const std::string& second) {
     return second.empty() ? first : first + " " + second;
 }
 
+/// What stands for an audio interface in place of the device's path, of which it would not be seen
+/// which of its interfaces has signalled.
+const std::map<std::string, std::string> audioNames{
+    {"org.bluez.Audio", "Audio"},        {"org.bluez.AudioSink", "Sink"},
+    {"org.bluez.AudioSource", "Source"}, {"org.bluez.Control", "Control"},
+    {"org.bluez.Headset", "Headset"},    {"org.bluez.HandsfreeGateway", "Gateway"}};
+
+/// The beginning of a signal's line.
+std::string origin(DBusMessage* signal) {
+    const std::string member = dbus_message_get_member(signal);
+    const auto audio = audioNames.find(dbus_message_get_interface(signal));
+    if (audio == audioNames.end())
+        return dbus_message_get_path(signal) + (" " + member);
+    return audio->second + (member == "PropertyChanged" ? " " : ".") + member;
+}
+
 std::string answerOf(DBusMessage* reply) {
     ScopedError error;
     if (dbus_set_error_from_message(error, reply))
@@ -47,9 +63,10 @@ SimClient::Callee SimClient::calleeOf(const Question& question) const {
                 member};
     const std::string adapter = m_base + "hci0";
     return {"org.bluez",
-            interface == "Manager"   ? "/"
-            : interface == "Adapter" ? adapter
-                                     : adapter + "/dev_00_11_22_33_44_55",
+            interface == "Manager"                           ? "/"
+            : interface == "Adapter" || interface == "Media" ? adapter
+            : interface == "MediaTransport" ? adapter + "/dev_00_11_22_33_44_55/fd0"
+                                            : adapter + "/dev_00_11_22_33_44_55",
             "org.bluez." + interface, member};
 }
 
@@ -127,7 +144,7 @@ void SimClient::write(DBusMessage* message) {
         const std::string path = dbus_message_get_path(message);
         if (path.rfind(DBUS_PATH_DBUS, 0) == 0)
             return; // the bus's own
-        line = joined(path + " " + dbus_message_get_member(message), argumentsOf(message));
+        line = joined(origin(message), argumentsOf(message));
     } else {
         const auto asked = m_asked.find(dbus_message_get_reply_serial(message));
         if (asked == m_asked.end())
