@@ -1,8 +1,8 @@
 // SPDX-License-Identifier: LGPL-2.1-or-later
 #include "daemon/link.h"
 
-#include "daemon/bluetoothd.h"
 #include "daemon/audio/device_audio.h"
+#include "daemon/bluetoothd.h"
 #include "daemon/served_adapter.h"
 #include "daemon/served_device.h"
 

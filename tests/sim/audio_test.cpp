@@ -258,10 +258,6 @@ protected:
                 text += (text.empty() ? "" : ", ") + line;
         return std::regex_replace(text, std::regex("State=s:|\\b[a-z]:"), "");
     }
-    void expectAnswers(const std::vector<std::pair<const char*, const char*>>& answers) {
-        for (const auto& [question, answer] : answers)
-            EXPECT_EQ(call(question), answer) << question;
-    }
 };
 
 class AudioSequence : public AudioTest, public testing::WithParamInterface<Row> {};
@@ -280,66 +276,32 @@ TEST_P(AudioSequence, IsThatOfTheDaemon) {
 INSTANTIATE_TEST_SUITE_P(Of, AudioSequence, testing::ValuesIn(rows),
                          [](const auto& row) { return row.param.name; });
 
-const char* const notConnected = "error NotConnected: Not Connected";
-const char* const notAvailable = "error NotAvailable: Operation currently not available";
-const char* const inProgress = "error InProgress: In Progress";
-const char* const busy = "error InProgress: Operation already in progress";
-const char* const alreadyConnected = "error AlreadyConnected: Already Connected";
-
-TEST_F(AudioTest, EachStateHasItsAnswers) {
+TEST_F(AudioTest, WhatIsUnderWayAllowsLittle) {
+    const std::string busy = "error InProgress: Operation already in progress";
+    const std::string inProgress = "error InProgress: In Progress";
     createAudio("1108;110b;110e");
-    expectAnswers({{"Audio.Disconnect", notConnected},
-                   {"AudioSink.Disconnect", notConnected},
-                   {"Headset.Disconnect", notConnected},
-                   {"Headset.IndicateCall", notConnected},
-                   {"Headset.Stop", notConnected},
-                   {"Headset.Play", notAvailable},
-                   {"Headset.GetSpeakerGain", notAvailable},
-                   {"Control.VolumeUp", notConnected},
-                   {"AudioSink.IsConnected", "b:0"},
-                   {"Headset.GetProperties",
-                    "a(e(s:Playing v(b:0)) e(s:State v(s:disconnected)) e(s:Connected v(b:0)))"},
-                   {"AudioSource.Connect",
-                    "error org.freedesktop.DBus.Error.UnknownMethod: Method \"Connect\" with "
-                    "signature \"\" on interface \"org.bluez.AudioSource\" doesn't exist\n"}});
-    set("Powered", false);
-    expectAnswers({{"Audio.Connect", "error Failed: Connect Failed"},
-                   {"AudioSink.Connect", "error Failed: Failed to create a stream"}});
-    set("Powered", true);
-
     setTime("AudioConnect", "60000000");
     setTime("AudioIdle", "60000000");
     start("Audio.Connect");
     until("device Connected=b:1");
-    expectAnswers({{"Audio.Connect", inProgress}, {"Headset.Connect", inProgress}});
+    EXPECT_EQ(call("Audio.Connect"), inProgress);
+    EXPECT_EQ(call("Headset.Connect"), inProgress);
     EXPECT_EQ(heard("Audio.Disconnect", "Audio State"),
               "Headset disconnected, Headset.Disconnected, answer Disconnect, " + connectFailed);
     start("AudioSink.Connect");
     until("Control Connected=b:1");
-    expectAnswers({{"AudioSink.Connect", busy}, {"AudioSink.Disconnect", busy}});
+    EXPECT_EQ(call("AudioSink.Connect"), busy);
+    EXPECT_EQ(call("AudioSink.Disconnect"), busy);
     EXPECT_EQ(heard("Audio.Disconnect", "Audio State"),
               controlDown + ", " + setupFailed +
                   ", Sink disconnected, answer Disconnect, Audio disconnected");
 
     setTime("AudioConnect", "700");
-    expectAnswers({{"Audio.Connect", ""},
-                   {"Audio.Connect", alreadyConnected},
-                   {"AudioSink.Connect", alreadyConnected},
-                   {"Headset.Connect", alreadyConnected},
-                   {"Headset.IndicateCall", ""},
-                   {"Headset.CancelCall", ""},
-                   {"Control.VolumeUp", "error NotSupported: Operation is not supported"},
-                   {"Audio.GetProperties", "a(e(s:State v(s:connected)))"},
-                   {"Control.GetProperties", "a(e(s:Connected v(b:1)))"},
-                   {"Headset.GetProperties",
-                    "a(e(s:Playing v(b:0)) e(s:State v(s:connected)) e(s:Connected v(b:1)) "
-                    "e(s:SpeakerGain v(q:15)) e(s:MicrophoneGain v(q:15)))"},
-                   {"AudioSink.GetProperties",
-                    "a(e(s:Playing v(b:0)) e(s:Connected v(b:1)) e(s:State v(s:connected)))"}});
+    EXPECT_EQ(call("Audio.Connect"), "");
     setTime("AudioShutdown", "60000");
     start("Audio.Disconnect");
-    expectAnswers(
-        {{"Audio.Disconnect", ""}, {"AudioSink.Disconnect", "error Failed: Invalid argument"}});
+    EXPECT_EQ(call("Audio.Disconnect"), "");
+    EXPECT_EQ(call("AudioSink.Disconnect"), "error Failed: Invalid argument");
 }
 
 TEST_F(AudioTest, ASinkThatIsConnectedInThePauseLeavesAllOfItWaiting) {
@@ -354,26 +316,15 @@ TEST_F(AudioTest, ASinkThatIsConnectedInThePauseLeavesAllOfItWaiting) {
 }
 
 TEST_F(AudioTest, AHeadsetIsHeardAndHeardOf) {
-    const auto gain = [&](const char* name, std::uint16_t value) {
-        return heard({"Headset.SetProperty", name, Var{value}}, "answer");
-    };
     control({"SetAudio", Settings{{"SCORouting", "PCM"}}});
     createAudio(voice);
     EXPECT_EQ(call("Headset.Connect"), "");
     EXPECT_EQ(heard("Headset.Play", "Headset Playing"),
               "answer Play, Headset playing, Headset.Playing, Headset Playing=1");
-    EXPECT_EQ(call("Headset.IsPlaying"), "b:1");
     EXPECT_EQ(heard("Headset.Stop", "answer"),
               "Headset connected, Headset.Stopped, Headset Playing=0, answer Stop");
-    EXPECT_EQ(gain("SpeakerGain", 7),
+    EXPECT_EQ(heard({"Headset.SetProperty", "SpeakerGain", Var{std::uint16_t{7}}}, "answer"),
               "Headset.SpeakerGainChanged 7, Headset SpeakerGain=7, answer SetProperty");
-    EXPECT_EQ(call({"Headset.SetMicrophoneGain", std::uint16_t{3}}), "");
-    EXPECT_EQ(call("Headset.GetMicrophoneGain"), "q:3");
-    for (const std::uint16_t wrong : {std::uint16_t{7}, std::uint16_t{16}})
-        EXPECT_EQ(gain("SpeakerGain", wrong), "answer SetProperty " + badArguments);
-    EXPECT_EQ(gain("Playing", 1), "answer SetProperty " + badArguments);
-    EXPECT_EQ(call({"Headset.SetProperty", "SpeakerGain", Var{1}}), badArguments);
-    taken();
     control({"SetHeadsetGain", "hci0", newDevice, "MicrophoneGain", std::uint16_t{9}});
     control({"PressHeadsetButton", "hci0", newDevice});
     EXPECT_EQ(taken(), lines("Headset.MicrophoneGainChanged q:9", "Headset MicrophoneGain=q:9",
@@ -383,7 +334,6 @@ TEST_F(AudioTest, AHeadsetIsHeardAndHeardOf) {
 TEST_F(AudioTest, APhoneIsASourceAndAGateway) {
     control({"SetAudio", Settings{{"Enable", "Source;Gateway"}}});
     createAudio("110a;111f");
-    EXPECT_EQ(call("Audio.Connect"), "error Failed: Connect Failed");
     EXPECT_EQ(heard("AudioSource.Connect", "Source State=s:connected"),
               "Source connecting, device Connected=1, answer Connect, Source connected");
     control({"SetPlaying", "hci0", newDevice, true});
@@ -391,15 +341,9 @@ TEST_F(AudioTest, APhoneIsASourceAndAGateway) {
     EXPECT_EQ(heard("AudioSource.Disconnect", "Source State"),
               "answer Disconnect, Source disconnected");
 
-    const Question registerAgent("HandsfreeGateway.RegisterAgent", Path{"/agent"});
-    const Question unregister("HandsfreeGateway.UnregisterAgent", Path{"/agent"});
-    EXPECT_EQ(call("HandsfreeGateway.Connect"), "error AgentNotAvailable: Agent Not Available");
-    EXPECT_EQ(call(unregister), "");
-    EXPECT_EQ(call(registerAgent), "");
-    EXPECT_EQ(call(registerAgent), "error AlreadyExists: Already Exists");
-    EXPECT_EQ(call({"HandsfreeGateway.UnregisterAgent", Path{"/other"}}),
-              "error DoesNotExist: Does Not Exist");
-    EXPECT_EQ(SimClient().call(unregister), "error NotAuthorized: Operation Not Authorized");
+    EXPECT_EQ(call({"HandsfreeGateway.RegisterAgent", Path{"/agent"}}), "");
+    EXPECT_EQ(SimClient().call({"HandsfreeGateway.UnregisterAgent", Path{"/agent"}}),
+              "error NotAuthorized: Operation Not Authorized");
     std::string received;
     peer().handle("NewConnection", [&](DBusMessage* request) {
         int descriptor = -1;
@@ -415,7 +359,6 @@ TEST_F(AudioTest, APhoneIsASourceAndAGateway) {
     EXPECT_EQ(received, "261"); // 1.5
     EXPECT_EQ(heard("HandsfreeGateway.Disconnect", "answer"),
               "Gateway disconnected, answer Disconnect");
-    EXPECT_EQ(call("HandsfreeGateway.Disconnect"), notConnected);
     EXPECT_EQ(call({"Adapter.RemoveDevice", device}), "");
     until("agent Release");
 }
@@ -430,7 +373,7 @@ TEST_F(AudioTest, AnEndpointConfiguresTheStreamAndItsTransportPlays) {
                         }));
     };
     const char* ours = "0000110A-0000-1000-8000-00805F9B34FB";
-    EXPECT_EQ(call(registering("1101", 0)), badArguments);
+    EXPECT_EQ(call(registering("1101", 0)), badArguments) << "that is no sound";
     EXPECT_EQ(call(registering("110b", 0)), "error NotSupported: Operation is not supported");
     EXPECT_EQ(call(registering(ours, 0)), "");
     EXPECT_EQ(call(registering(ours, 0)), "error AlreadyExists: Already Exists");
@@ -479,21 +422,6 @@ TEST_F(AudioTest, AnEndpointConfiguresTheStreamAndItsTransportPlays) {
     until("agent ClearConfiguration o:device/fd0");
     control({"RemoveAdapter", "hci0"});
     until("agent Release");
-}
-
-TEST_F(AudioTest, PlayersAreAcceptedWhenWhatTheySayIsKnown) {
-    const auto registering = [&](const char* key, const char* value) {
-        return call({"Media.RegisterPlayer", Path{"/player"}, Settings{{key, value}},
-                     Settings{{"Title", "Song"}}});
-    };
-    EXPECT_EQ(registering("Status", "resting"), badArguments);
-    EXPECT_EQ(registering("Position", "1"), badArguments) << "it is a number";
-    EXPECT_EQ(registering("Status", "playing"), "");
-    EXPECT_EQ(registering("Status", "playing"), "error AlreadyExists: Already Exists");
-    EXPECT_EQ(trace({"Media.UnregisterPlayer", Path{"/player"}}),
-              lines("agent Release", "answer UnregisterPlayer"));
-    EXPECT_EQ(call({"Media.UnregisterEndpoint", Path{"/player"}}),
-              "error DoesNotExist: Does Not Exist");
 }
 
 } // namespace Bluetooth::Test

@@ -263,13 +263,14 @@ void DeviceAudio::authorize(const std::string& uuid, bool wanted,
 template <class Action>
 void DeviceAudio::atService(const std::string& uuid, const Action& action) {
     const bool isVoice = isOneOf(uuid, {headsetClass, handsFree, headsetGateway, handsFreeGateway});
-    if (isOneOf(uuid, {remoteTarget, remoteControl}) && m_control)
+    const bool isControl = isOneOf(uuid, {remoteTarget, remoteControl});
+    if (isControl && m_control)
         action(*m_control);
     else if (isVoice && m_headset)
         action(*m_headset);
     else if (isVoice && m_gateway)
         action(*m_gateway);
-    else if (!isVoice && (m_sink || m_source))
+    else if (!isVoice && !isControl && (m_sink || m_source))
         action(m_sink ? *m_sink : *m_source);
     else
         throw std::runtime_error("the device has no such audio service");
