@@ -18,6 +18,7 @@ inline constexpr const char* handsfreeGateway = "org.bluez.HandsfreeGateway";
 inline constexpr const char* headset = "org.bluez.Headset";
 inline constexpr const char* media = "org.bluez.Media";
 inline constexpr const char* mediaTransport = "org.bluez.MediaTransport";
+inline constexpr const char* telephonyTest = "org.bluez.TelephonyTest";
 // What clients serve.
 inline constexpr const char* handsfreeAgent = "org.bluez.HandsfreeAgent";
 inline constexpr const char* mediaEndpoint = "org.bluez.MediaEndpoint";
@@ -147,6 +148,24 @@ const Interface& mediaTransportInterface() {
          {"Release", {{"access_type", "s"}}, {}, handle<&Served::release>},
          Entries::setProperty<&Served::setProperty>()},
         {Entries::propertyChanged()}};
+    return table;
+}
+
+/// The telephone system that a daemon has which was built for none.
+template <class Served>
+const Interface& telephonyTestInterface() {
+    static const Arguments number = {{"number", "s"}};
+    static const Interface table = {
+        Interfaces::telephonyTest,
+        {{"OutgoingCall", number, {}, handle<&Served::accept>},
+         {"IncomingCall", number, {}, handle<&Served::accept>},
+         {"CancelCall", {}, {}, handle<&Served::accept>},
+         {"SignalStrength", {{"strength", "u"}}, {}, handle<&Served::setLevel>},
+         {"BatteryLevel", {{"level", "u"}}, {}, handle<&Served::setLevel>},
+         {"RoamingStatus", {{"roaming", "b"}}, {}, handle<&Served::accept>},
+         {"RegistrationStatus", {{"registration", "b"}}, {}, handle<&Served::accept>},
+         {"SetSubscriberNumber", number, {}, handle<&Served::accept>}},
+        {{"VoiceDial", {}}}};
     return table;
 }
 

@@ -2,6 +2,7 @@
 #ifndef KESBLUETOOTH_SIM_DAEMON_BLUETOOTHD_H
 #define KESBLUETOOTH_SIM_DAEMON_BLUETOOTHD_H
 
+#include "daemon/audio/telephony_test.h"
 #include "daemon/own_records.h"
 #include "serving.h"
 #include "serving/bus/bus_connection.h"
@@ -72,6 +73,7 @@ private:
     guint m_burial = 0;
     std::vector<std::shared_ptr<void>> m_ended;
     ObjectTree m_objects;
+    TelephonyTest m_telephony{m_objects};
     std::unique_ptr<BusConnection> m_bus;
     std::unique_ptr<ServedManager> m_manager;
     std::unique_ptr<OwnRecords> m_records;

@@ -33,8 +33,8 @@ struct Question {
 ///
 /// Lines look like "hci0 DeviceCreated o:device", "device Connected=b:1",
 /// "answer CreateDevice o:device", "answer CreateDevice error Failed: Host is down" and
-/// "agent RequestPinCode o:device". Of audio the interface is named, not the device: "Sink.Connected",
-/// "Audio State=s:connected".
+/// "agent RequestPinCode o:device". Of audio the interface is named, not the device:
+/// "Sink.Connected", "Audio State=s:connected".
 class SimClient {
 public:
     SimClient();

@@ -187,10 +187,15 @@ void AdapterMedia::configure(ServedDevice& device, const MediaSide& side, const 
 
 void AdapterMedia::selectConfiguration(ServedDevice& device, const EndpointPtr& endpoint,
                                        const Play& play, const Done& done) {
+    endpoint->transports[&device] = nullptr; // until it is known how it is to be
     ask(device, endpoint, "SelectConfiguration",
         tuple(bytes(sbcCapabilities, sizeof sbcCapabilities)),
         [this, &device, play, done](const CallResult& answer, const EndpointPtr& there) {
-            if (!there || answer.failed || !answer.results.is("(ay)"))
+            // Meanwhile the attempt may have been given up.
+            if (!there || there->transports.count(&device) == 0)
+                return done(false);
+            there->transports.erase(&device);
+            if (answer.failed || !answer.results.is("(ay)"))
                 return done(false);
             const GlibPtr<GVariant> chosen(g_variant_get_child_value(answer.results.get(), 0));
             setConfiguration(device, there, Value(chosen.get()), play, done);
@@ -231,9 +236,10 @@ void AdapterMedia::clear(ServedDevice& device, const MediaSide& side) {
         const auto transport = endpoint->transports.find(&device);
         if (transport == endpoint->transports.end())
             continue;
-        m_adapter.daemon().bus().send(endpoint->owner, endpoint->path, Interfaces::mediaEndpoint,
-                                      "ClearConfiguration",
-                                      tuple(pathValue(transport->second->path())));
+        if (transport->second)
+            m_adapter.daemon().bus().send(endpoint->owner, endpoint->path,
+                                          Interfaces::mediaEndpoint, "ClearConfiguration",
+                                          tuple(pathValue(transport->second->path())));
         endpoint->transports.erase(transport);
     }
 }
@@ -242,7 +248,8 @@ void AdapterMedia::forget(ServedDevice& device) {
     for (const EndpointPtr& endpoint : m_endpoints)
         if (const auto transport = endpoint->transports.find(&device);
             transport != endpoint->transports.end()) {
-            transport->second->abandon();
+            if (transport->second)
+                transport->second->abandon();
             endpoint->transports.erase(transport);
         }
 }
@@ -253,7 +260,8 @@ void AdapterMedia::clientGone(const std::string& client) {
     const auto endpoints = m_endpoints;
     for (const EndpointPtr& endpoint : endpoints) {
         for (const auto& [device, transport] : endpoint->transports)
-            transport->clientGone(client);
+            if (transport)
+                transport->clientGone(client);
         if (isGone(endpoint))
             m_endpoints.erase(std::find(m_endpoints.begin(), m_endpoints.end(), endpoint));
     }
@@ -263,7 +271,8 @@ void AdapterMedia::release() {
     BusConnection& bus = m_adapter.daemon().bus();
     for (const EndpointPtr& endpoint : std::exchange(m_endpoints, {})) {
         for (const auto& [device, transport] : endpoint->transports)
-            transport->abandon();
+            if (transport)
+                transport->abandon();
         bus.send(endpoint->owner, endpoint->path, Interfaces::mediaEndpoint, "Release");
     }
     for (const auto& player : std::exchange(m_players, {}))

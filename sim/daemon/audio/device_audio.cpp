@@ -277,6 +277,8 @@ void DeviceAudio::atService(const std::string& uuid, const Action& action) {
 }
 
 void DeviceAudio::serviceConnects(const std::string& uuid) {
+    if (!m_device.adapter().mode().powered())
+        throw std::runtime_error("the adapter is off");
     atService(uuid, [&](auto& profile) { profile.peerConnects(uuid); });
 }
 
