@@ -59,8 +59,11 @@ expect() {
 }
 # stop STATUS: Ctrl-C for what was started. It exits with the status.
 stop() {
-    local got=0
     kill -INT "$started"
+    ends "$1"
+}
+ends() {
+    local got=0
     wait "$started" || got=$?
     [ "$got" -eq "$1" ] || die "exits with $got after: $(cat <&"$lines")"
 }
@@ -101,6 +104,35 @@ part_pairing() {
     check 0 "paired with $receiver  GPS Receiver" pair "$receiver" 1234
     check 0 "paired with $phone  Phone" pair "$phone"
     check 1 "cannot pair with $phone \(Already Exists\); .*" pair "$phone"
+}
+
+# asks LOOP DEVICE QUESTION ANSWER LAST: the program asks, and after the answer, or after the adapter was
+# switched off in its place, prints the last line.
+asks() {
+    start pair_asking "$1" "$2" <"$typed"
+    expect "$3"
+    if [ "$4" = off ]; then
+        kesbt adapter set Powered off >/dev/null
+        expect 'the question was withdrawn'
+        kesbt adapter set Powered on >/dev/null
+    else
+        echo "$4" >"$typed"
+    fi
+    expect "$5"
+    ends "$([[ $5 == paired* ]]; echo $?)"
+}
+part_questions() {
+    local compare='does it show [0-9]{6}\? y or n' held loop
+    typed=$(mktemp -u)
+    mkfifo "$typed"
+    exec {held}<>"$typed" # so that it does not end
+    for loop in glib queue; do
+        asks "$loop" "$phone" "$compare" off "cannot pair with $phone .*"
+        asks "$loop" "$phone" "$compare" n "cannot pair with $phone \(Authentication Failed\); .*"
+    done
+    asks glib "$phone" "$compare" y "paired with $phone"
+    asks queue "$receiver" 'which PIN code\?' 1234 "paired with $receiver"
+    rm "$typed"
 }
 
 part_interruption() {
@@ -144,6 +176,7 @@ part_absence() {
     for program in list_adapters find_devices share_scan; do
         check 1 'bluetoothd is not running; .*' "$program"
     done
+    check 1 '.*bluetoothd.*start it.*' pair_asking queue "$headset"
     for program in pair auto_connect watch_headset; do
         check 1 '.*bluetoothd.*start it.*' "$program" "$headset"
         check 2 "usage: $program .*" "$program"
@@ -169,7 +202,7 @@ fi
 scenario=$(mktemp)
 printf '%s\n' '[Times]' 'Connect=20000' '[Adapter hci0]' 'Address=00:1A:7D:DA:71:10' \
     "[Device $silent]" 'Behaviour=NeverAnswers' >"$scenario"
-for part in adapters discovery pairing scan lists audio; do
+for part in adapters discovery pairing questions scan lists audio; do
     simulate "$part"
 done
 simulate interruption --scenario "$scenario"
