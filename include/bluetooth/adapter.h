@@ -40,7 +40,10 @@ public:
     /// Blocks until the daemon replies, at most 25 s, and while hciconfig runs, at most 5 s.
     Dict* getProperties() override;
 
-    /// Makes the daemon keep the controller up until releaseSession().
+    /// Makes the daemon keep the controller up until releaseSession(). It needs an agent that was
+    /// registered by registerAgent(). While the controller is off the daemon first asks that agent
+    /// by ConfirmModeChange, which an Agent refuses unless its setDispatcher() was given a function
+    /// that replies: switch it on before, by setProperty("Powered", true).
     /// @dbus RequestSession()
     /// @return 0 when the call was handed to the bus, otherwise -1
     int requestSession();

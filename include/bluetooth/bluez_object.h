@@ -9,21 +9,24 @@ namespace Bluetooth {
 /// What the proxies of all objects of the Bluetooth daemon share (bus name org.bluez on the system
 /// bus): properties, and whether the daemon is on the bus.
 ///
-/// CALLS. Each operation of Manager, Adapter, Device, Audio, AudioSink and Control that calls the
-/// daemon first resets the proxy's error. When it fails, the error message is logged, and
+/// CALLS. Each operation of this class and of those derived from it that calls the daemon first
+/// resets the proxy's error. When it fails, the error message is logged, and
 /// getErrorMessage() returns it until the next call. An operation that returns nothing but success
 /// or failure does not wait for the daemon: 0 means that the call was handed to the bus, not that
 /// the daemon carried it out. The others block until the daemon replies, at most libdbus's default
 /// time-out (25 s). An operation that returns proxies then also asks the bus whether the daemon is
 /// still there, for each of them.
 ///
-/// OTHER METHODS. A method of BlueZ without an operation here is called in steps, and then waits
-/// for the daemon's reply:
+/// OTHER METHODS. A method of BlueZ without an operation here is called in steps, with any time-out,
+/// and so is one whose success matters. An interface without a class needs a BluezObject of its own:
 /// @code
-///     if (device->newMessage("Disconnect") != 0 || device->sendMessage(true, -1) != 0)
-///         std::cerr << device->getErrorMessage() << '\n';
+///     BluezObject service(adapter->getPath(), "org.bluez.Service");
+///     unsigned int handle = 0;
+///     if (service.newMessage("AddRecord") != 0 || service.append(record) != 0 ||
+///         service.sendMessage(true, -1) != 0 || service.getReplyValue(handle) != 0)
+///         std::cerr << service.getErrorMessage() << '\n';
 /// @endcode
-/// An interface without a class, such as org.bluez.Input, needs a BluezObject of its own.
+/// RemoteObject says which D-Bus types can be sent and read so.
 ///
 /// OWNERSHIP. The proxies, lists and dictionaries that an operation returns are new each time; the
 /// caller owns and deletes them.
@@ -45,8 +48,8 @@ public:
     /// Blocks until the daemon replies, at most 25 s.
     virtual Dict* getProperties();
 
-    /// Changes a property, without waiting for the daemon's reply. org.bluez.Manager, Audio,
-    /// AudioSink and Control have no SetProperty in BlueZ 4.101.
+    /// Changes a property, without waiting for the daemon's reply. Of the interfaces that have a
+    /// class only org.bluez.Adapter, Device and Headset have SetProperty in BlueZ 4.101.
     /// @dbus SetProperty(s name, v value)
     /// @param name  e.g. "Powered"
     /// @param value must have the property's own type. An array of strings or a signed integer
