@@ -113,18 +113,22 @@ private:
     }
 
     DBusHandlerResult handle(DBusConnection* connection, DBusMessage* message) {
-        if (!dbus_message_has_interface(message, getInterface()) ||
-            dbus_message_get_type(message) != DBUS_MESSAGE_TYPE_METHOD_CALL)
-            return DBUS_HANDLER_RESULT_NOT_YET_HANDLED;
-        const std::string method = dbus_message_get_member(message);
-        if (method == "Cancel" || method == "Release") {
+        const auto is = [&](const char* method) {
+            return dbus_message_is_method_call(message, getInterface(), method);
+        };
+        if (is("Cancel") || is("Release")) {
             if (m_open)
                 m_open->withdraw();
-            if (m_open && method == "Cancel")
+            if (m_open && is("Cancel"))
                 m_post(m_withdraw);
             m_open.reset();
-            return handlerDispatcher(connection, message, static_cast<Agent*>(this));
         }
+        const bool isQuestion = is("RequestPinCode") || is("RequestPasskey") ||
+                                is("RequestConfirmation") || is("Authorize") ||
+                                is("ConfirmModeChange") || is("DisplayPasskey") ||
+                                is("DisplayPinCode");
+        if (!isQuestion)
+            return handlerDispatcher(connection, message, static_cast<Agent*>(this));
         m_open = std::make_shared<Question>(connection, message);
         m_post([ask = m_ask, question = m_open] { ask(question); });
         if (m_open->isOnlyShown())
