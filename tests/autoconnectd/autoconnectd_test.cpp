@@ -132,14 +132,16 @@ protected:
     const std::string headsetConnected = audioOf(headset) + " connected";
 };
 
-TEST_F(AutoConnectDaemonTest, ConnectsAtStartBySinkOrAllAudio) {
+TEST_F(AutoConnectDaemonTest, ConnectsAtStartBySinkOrAllAudioAndInput) {
     setConfig(adapter0, "1,"s + headset + "," + carKit + "," + keyboard);
     setConfig(adapter1, "1,"s + otherDevice);
     Daemon daemon;
-    for (const char* device : {headset, carKit, otherDevice}) {
-        const std::string connected = audioOf(device) + " connected";
-        EXPECT_TRUE(daemon.count(connected) || daemon.waitFor(connected)) << device;
+    for (const std::string& target : {audioOf(headset), audioOf(carKit), audioOf(otherDevice),
+                                      "input of "s + keyboard, "input of "s + otherDevice}) {
+        const std::string connected = target + " connected";
+        EXPECT_TRUE(daemon.count(connected) || daemon.waitFor(connected)) << target;
     }
+    EXPECT_EQ(connectCalls("Input"), 2u) << "not for a headset's buttons";
     EXPECT_EQ(connectCalls("AudioSink"), 2u);
     EXPECT_EQ(connectCalls("Audio"), 1u);
     EXPECT_EQ(daemon.stop(), 0);

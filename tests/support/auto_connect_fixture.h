@@ -12,9 +12,9 @@ namespace Bluetooth::Test {
 
 inline constexpr const char* stranger = "DE:AD:BE:EF:00:01"; // known to none
 
-/// The simulated daemon knows five devices, of which the headset and the other device have a sink,
-/// the keyboard has no audio and the phone nothing to connect; there are no lists of devices to
-/// connect yet.
+/// The simulated daemon knows five devices: the headset and the other device have a sink, the other
+/// device and the keyboard input, the car kit other audio and the phone nothing to connect; there
+/// are no lists of devices to connect yet.
 class AutoConnectFixture : public NamespaceTest {
 protected:
     AutoConnectFixture() {
@@ -37,7 +37,7 @@ protected:
         "[Device 00:11:22:33:44:08]\nAdapter=hci0\nKnown=true\nUUIDs=1108;111e\n"
         "[Device 00:11:22:33:44:02]\nAdapter=hci0\nKnown=true\nUUIDs=1124\n"
         "[Device 00:11:22:33:44:03]\nAdapter=hci0\nKnown=true\nUUIDs=1105\n"
-        "[Device 00:11:22:33:44:66]\nAdapter=hci1\nKnown=true\nUUIDs=110b\n"};
+        "[Device 00:11:22:33:44:66]\nAdapter=hci1\nKnown=true\nUUIDs=110b;1124\n"};
     AutoConnect autoConnect;
 };
 

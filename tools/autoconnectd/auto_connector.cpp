@@ -183,7 +183,7 @@ void AutoConnector::addTargets(Bluetooth::Device& device, Targets& targets) {
     const auto services = servicesOf(Bluetooth::find(properties.get(), "UUIDs"));
     if (services.empty())
         noteUnserved(Bluetooth::find(properties.get(), "Address"),
-                     "is not connected: it is no headset and no speaker");
+                     "is not connected: it is no headset, speaker, keyboard or mouse");
     for (const Service* service : services) {
         auto target = takeOrCreate(device.getPath(), *service);
         if (target)

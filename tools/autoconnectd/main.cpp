@@ -44,7 +44,7 @@ void addOptions(CLI::App& commandLine, StartOptions& options) {
     commandLine.add_flag("-f,--foreground", options.foreground,
                          "Stay in the foreground, log to standard error too");
     commandLine.add_flag("-v,--verbose", options.verbose,
-                         "Log also each call that fails, for a report of a fault");
+                         "Log calls that fail too, to report a fault");
     commandLine.add_option("--pid-file", options.pidFile, "PID file and lock of the only instance")
         ->capture_default_str();
     commandLine
