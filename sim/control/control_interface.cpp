@@ -23,6 +23,7 @@ constexpr const char* busPath = "/org/freedesktop/DBus";
 const Interface& ControlInterface::table() {
     using Self = ControlInterface;
     static const Arguments device = {{"adapter", "s"}, {"address", "s"}};
+    static const Arguments service = {{"adapter", "s"}, {"address", "s"}, {"uuid", "s"}};
     static const Arguments settings = {{"address", "s"}, {"settings", "a{sv}"}};
     static const Interface table = {
         controlName,
@@ -42,12 +43,9 @@ const Interface& ControlInterface::table() {
           device,
           {},
           handle<&Self::inWorld<&WorldControl::startIncomingPairing>>},
-         {"ConnectService",
-          {{"adapter", "s"}, {"address", "s"}, {"uuid", "s"}},
-          {},
-          handle<&Self::inWorld<&WorldControl::connectService>>},
+         {"ConnectService", service, {}, handle<&Self::inWorld<&WorldControl::connectService>>},
          {"DisconnectService",
-          {{"adapter", "s"}, {"address", "s"}, {"uuid", "s"}},
+          service,
           {},
           handle<&Self::inWorld<&WorldControl::disconnectService>>},
          {"PressHeadsetButton",

@@ -4,6 +4,7 @@
 #include "control/arguments.h"
 #include "daemon/audio/device_audio.h"
 #include "daemon/bluetoothd.h"
+#include "daemon/device_services.h"
 #include "daemon/served_adapter.h"
 #include "daemon/served_device.h"
 #include "serving/bluez4/address.h"
@@ -146,12 +147,18 @@ Value WorldControl::startIncomingPairing(const CallPtr& call) {
 }
 
 Value WorldControl::connectService(const CallPtr& call) {
-    device(call)->audio().serviceConnects(uuidOf(call));
+    const std::string uuid = uuidOf(call);
+    const auto from = device(call);
+    if (!from->services().peerConnects(uuid))
+        from->audio().serviceConnects(uuid);
     return {};
 }
 
 Value WorldControl::disconnectService(const CallPtr& call) {
-    device(call)->audio().serviceDisconnects(uuidOf(call));
+    const std::string uuid = uuidOf(call);
+    const auto from = device(call);
+    from->services().peerDisconnects(uuid);
+    from->audio().serviceDisconnects(uuid);
     return {};
 }
 

@@ -27,7 +27,9 @@ bool AdapterMode::pairable() const {
 }
 
 guint32 AdapterMode::deviceClass() const {
-    return m_adapter.hardware().deviceClass | (m_limited ? limitedDiscoverable : 0);
+    const AdapterHardware& hardware = m_adapter.hardware();
+    return hardware.deviceClass | m_adapter.daemon().records().classBits(hardware.id()) |
+           (m_limited ? limitedDiscoverable : 0);
 }
 
 /// The mode that the next power-on brings back. A time-out of Discoverable does not change it.

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: LGPL-2.1-or-later
 #include "daemon/bluetoothd.h"
 
+#include "daemon/client_records.h"
 #include "daemon/served_adapter.h"
 #include "daemon/served_manager.h"
 #include "serving/bluez4/address.h"
@@ -19,6 +20,7 @@ Bluetoothd::~Bluetoothd() {
 
 void Bluetoothd::start(int pid) {
     m_pid = pid;
+    m_numbers = {};
     auto bus = std::make_unique<BusConnection>(m_busAddress, [this](const CallPtr& call) {
         if (!m_beforeCall(call))
             dispatch(call);
@@ -27,6 +29,7 @@ void Bluetoothd::start(int pid) {
     bus->watchClients([this](const std::string& client) {
         for (const auto& adapter : m_adapters)
             adapter->clientGone(client);
+        m_anyRecords->clientGone(client);
     });
     bus->watchBus([this] {
         if (m_busEnded)
@@ -39,7 +42,7 @@ void Bluetoothd::start(int pid) {
         throw;
     }
     m_bus = std::move(bus);
-    m_objects.add(basePath() + "/any");
+    m_anyRecords = std::make_unique<ClientRecords>(*this, nullptr);
     m_records = std::make_unique<OwnRecords>([this](const std::string& id) {
         if (ServedAdapter* adapter = find(id))
             adapter->uuidsChanged();
@@ -61,6 +64,7 @@ void Bluetoothd::stop() {
 void Bluetoothd::clear() {
     // Adapters use the bus until they are gone; nothing of theirs is said on the way out.
     m_adapters.clear();
+    m_anyRecords.reset();
     m_manager.reset();
     m_objects.remove(basePath() + "/any");
     if (m_burial)
@@ -90,6 +94,18 @@ void Bluetoothd::pullOut(ServedAdapter& adapter) {
     m_manager->adapterRemoved(*gone);
     gone->releaseAgents();
     bury(gone);
+}
+
+void Bluetoothd::changeRecords(const std::function<void()>& change) {
+    std::vector<guint32> before;
+    for (const auto& adapter : m_adapters)
+        before.push_back(adapter->mode().deviceClass());
+    change();
+    for (std::size_t i = 0; i < m_adapters.size(); ++i) {
+        AdapterMode& mode = m_adapters[i]->mode();
+        if (mode.powered() && mode.deviceClass() != before[i])
+            m_adapters[i]->changed("Class", mode.deviceClass());
+    }
 }
 
 ServedAdapter* Bluetoothd::find(const std::string& idOrAddress) const {

@@ -11,11 +11,13 @@
 
 #include <functional>
 #include <memory>
+#include <set>
 #include <string>
 #include <vector>
 
 namespace Bluetooth::Sim {
 
+class ClientRecords;
 class ServedAdapter;
 class ServedManager;
 
@@ -54,9 +56,19 @@ public:
     ObjectTree& objects() { return m_objects; }
     ServedManager& manager() { return *m_manager; }
     OwnRecords& records() { return *m_records; }
+    /// The records for all adapters.
+    ClientRecords& anyRecords() { return *m_anyRecords; }
+    /// Lets records change, then says whose class of device that has changed.
+    void changeRecords(const std::function<void()>& change);
     const std::vector<std::unique_ptr<ServedAdapter>>& adapters() const { return m_adapters; }
     /// The adapter with that id or address, or null.
     ServedAdapter* find(const std::string& idOrAddress) const;
+    /// The numbers that are in use for what the daemon names.
+    struct Numbers {
+        std::set<unsigned> networkInterfaces;
+        unsigned nextProxy = 0;
+    };
+    Numbers& numbers() { return m_numbers; }
     std::string basePath() const { return "/org/bluez/" + std::to_string(m_pid); }
 
     /// Keeps an object that has ended until the code that runs in it has returned.
@@ -70,6 +82,7 @@ private:
     std::function<bool(const CallPtr&)> m_beforeCall;
     std::function<void()> m_busEnded;
     int m_pid = 0;
+    Numbers m_numbers;
     guint m_burial = 0;
     std::vector<std::shared_ptr<void>> m_ended;
     ObjectTree m_objects;
@@ -77,6 +90,7 @@ private:
     std::unique_ptr<BusConnection> m_bus;
     std::unique_ptr<ServedManager> m_manager;
     std::unique_ptr<OwnRecords> m_records;
+    std::unique_ptr<ClientRecords> m_anyRecords;
     std::vector<std::unique_ptr<ServedAdapter>> m_adapters;
 };
 

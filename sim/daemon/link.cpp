@@ -3,6 +3,7 @@
 
 #include "daemon/audio/device_audio.h"
 #include "daemon/bluetoothd.h"
+#include "daemon/device_services.h"
 #include "daemon/served_adapter.h"
 #include "daemon/served_device.h"
 
@@ -86,6 +87,7 @@ void Link::requestDisconnect(const CallPtr& call) {
     const Times& times = m_device.adapter().daemon().times();
     m_device.audio().disconnectRequested(); // what uses the link lets go of it first
     m_device.emit("DisconnectRequested", {});
+    m_device.services().disconnectRequested();
     m_disconnect.start(times.scaled(times.disconnectRequest), [this] { drop(); });
 }
 

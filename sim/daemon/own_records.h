@@ -20,7 +20,7 @@ public:
 
     struct Record {
         std::string adapter; ///< "hci0"; "" when all adapters have it
-        std::string uuid;    ///< its service class, in full
+        std::string uuid;    ///< its service class, in full, or ""
         std::string owner;   ///< the unique name of the client that added it; "" for the daemon's
     };
 
@@ -28,12 +28,15 @@ public:
     void plugIn(const std::string& adapter);
     void pullOut(const std::string& adapter);
 
-    /// @return the handle: the lowest one that is free
-    guint32 add(const Record& record);
+    /// @param handle  a free one; 0 for the lowest that is
+    /// @return the handle
+    guint32 add(const Record& record, guint32 handle = 0);
     void remove(guint32 handle);
     /// The record with that handle, or null.
     const Record* find(guint32 handle) const;
 
+    /// The bits for services in a class of device that clients' records bring with them.
+    guint32 classBits(const std::string& adapter) const;
     /// The service classes of an adapter's records in the order of their handles.
     std::vector<std::string> uuids(const std::string& adapter) const;
 

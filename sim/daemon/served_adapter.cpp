@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: LGPL-2.1-or-later
 #include "daemon/served_adapter.h"
 
+#include "daemon/adapter_services.h"
 #include "daemon/audio/adapter_media.h"
 #include "daemon/audio/device_audio.h"
 #include "daemon/bluetoothd.h"
@@ -31,6 +32,7 @@ ServedAdapter::ServedAdapter(Bluetoothd& daemon, std::shared_ptr<AdapterHardware
       m_discovery(*this) {
     m_daemon.objects().add(m_path, adapterInterface<ServedAdapter>(), this);
     m_media = std::make_unique<AdapterMedia>(*this);
+    m_services = std::make_unique<AdapterServices>(*this);
     for (auto& [address, stored] : m_hardware->storage) {
         if (!stored.known)
             continue;
@@ -57,6 +59,7 @@ void ServedAdapter::goDown() {
     m_mode.goDown();
     for (const auto& device : m_devices)
         device->retire();
+    m_services->retire();
     m_daemon.objects().remove(m_path);
 }
 
@@ -75,6 +78,7 @@ void ServedAdapter::clientGone(const std::string& client) {
     m_discovery.clientGone(client);
     m_mode.clientGone(client);
     m_media->clientGone(client);
+    m_services->clientGone(client);
     const auto devices = m_devices;
     for (const auto& device : devices)
         device->clientGone(client);

@@ -15,6 +15,7 @@
 namespace Bluetooth::Sim {
 
 class AdapterMedia;
+class AdapterServices;
 class ClientAgent;
 class Bluetoothd;
 class ServedDevice;
@@ -33,6 +34,7 @@ public:
     AdapterMode& mode() { return m_mode; }
     AdapterDiscovery& discovery() { return m_discovery; }
     AdapterMedia& media() { return *m_media; }
+    AdapterServices& services() const { return *m_services; }
     /// The agent that RegisterAgent gave, or null.
     ClientAgent* agent() const { return m_agent.get(); }
     std::shared_ptr<ClientAgent> sharedAgent() const { return m_agent; }
@@ -94,6 +96,7 @@ private:
     std::string m_path;
     AdapterMode m_mode;
     AdapterDiscovery m_discovery;
+    std::unique_ptr<AdapterServices> m_services;
     std::shared_ptr<ClientAgent> m_agent;
     std::unique_ptr<AdapterMedia> m_media;
     std::vector<std::shared_ptr<ServedDevice>> m_devices;

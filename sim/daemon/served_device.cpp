@@ -4,6 +4,7 @@
 #include "daemon/audio/device_audio.h"
 #include "daemon/bluetoothd.h"
 #include "daemon/device_pairing.h"
+#include "daemon/device_services.h"
 #include "daemon/served_adapter.h"
 #include "daemon/service_records.h"
 #include "daemon/service_search.h"
@@ -29,6 +30,8 @@ ServedDevice::ServedDevice(ServedAdapter& adapter, std::string address)
     m_adapter.daemon().objects().add(m_path, deviceInterface<ServedDevice>(), this);
     m_audio = std::make_unique<DeviceAudio>(*this);
     m_audio->serve();
+    m_services = std::make_unique<DeviceServices>(*this);
+    m_services->serve();
 }
 
 ServedDevice::~ServedDevice() {
@@ -43,6 +46,7 @@ void ServedDevice::retire() {
     m_reverseSearch.stop();
     Bluetoothd& daemon = m_adapter.daemon();
     m_audio->abandon();
+    m_services->abandon();
     const auto end = [&](auto& work) {
         if (!work)
             return;
@@ -66,6 +70,11 @@ bool ServedDevice::reachable() const {
 void ServedDevice::keep() {
     m_temporary = false;
     m_stored.known = true;
+}
+
+bool ServedDevice::offers(const std::string& uuid) const {
+    const auto& known = m_stored.uuids;
+    return std::find(known.begin(), known.end(), fullUuid(uuid)) != known.end();
 }
 
 void ServedDevice::emit(const char* member, const Value& arguments) {
@@ -270,6 +279,7 @@ Value ServedDevice::learnServices(const std::string& uuid) {
     if (sorted != m_stored.uuids) {
         m_stored.uuids = std::move(sorted);
         m_audio->serve();
+        m_services->serve();
         changed("UUIDs", listValue("s", m_stored.uuids));
     }
     return recordValues(records);
@@ -286,6 +296,7 @@ void ServedDevice::linkLost() {
     const auto alive = shared_from_this();
     m_reverseSearch.stop();
     m_audio->linkLost();
+    m_services->linkLost();
     if (m_search)
         m_search->linkLost();
     if (m_pairing)
@@ -297,6 +308,7 @@ void ServedDevice::linkLost() {
 void ServedDevice::clientGone(const std::string& client) {
     const auto alive = shared_from_this();
     m_audio->clientGone(client);
+    m_services->clientGone(client);
     if (m_search && m_search->owner() == client)
         m_search->ownerGone();
     if (m_pairing && m_pairing->owner() == client)

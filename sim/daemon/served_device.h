@@ -15,6 +15,7 @@ namespace Bluetooth::Sim {
 class ServedAdapter;
 class DeviceAudio;
 class DevicePairing;
+class DeviceServices;
 class ServiceSearch;
 
 /// org.bluez.Device: a device that the daemon knows.
@@ -33,6 +34,8 @@ public:
     /// The device in the air, or null when there is none any more.
     std::shared_ptr<PeerDevice> peer() const;
     bool reachable() const;
+    /// Whether it is known to have a service class, in any form of its UUID.
+    bool offers(const std::string& uuid) const;
 
     /// Whether the object goes when its link does: nothing is stored of it yet.
     bool temporary() const { return m_temporary; }
@@ -50,6 +53,7 @@ public:
     DevicePairing* pairing() const { return m_pairing.get(); }
     ServiceSearch* search() const { return m_search.get(); }
     DeviceAudio& audio() const { return *m_audio; }
+    DeviceServices& services() const { return *m_services; }
     /// Each is called when the work has ended, by the work itself.
     void pairingEnded();
     void searchEnded();
@@ -106,6 +110,7 @@ private:
     std::shared_ptr<DevicePairing> m_pairing;
     std::shared_ptr<ServiceSearch> m_search;
     std::unique_ptr<DeviceAudio> m_audio;
+    std::unique_ptr<DeviceServices> m_services;
 };
 
 } // namespace Bluetooth::Sim

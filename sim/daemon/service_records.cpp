@@ -4,6 +4,7 @@
 #include "world/settings.h"
 
 #include <algorithm>
+#include <cstdlib>
 #include <iterator>
 #include <optional>
 #include <utility>
@@ -142,6 +143,23 @@ std::string uuidOfPattern(const std::string& pattern) {
         if (g_ascii_strcasecmp(pattern.c_str(), name) == 0)
             return fullUuid(uuid);
     return fullUuid(pattern);
+}
+
+std::string serviceNamed(const std::string& pattern) {
+    const auto isDash = [&](std::size_t at) { return pattern[at] == '-'; };
+    if (pattern.size() == 36 && isDash(8) && isDash(13) && isDash(18) && isDash(23))
+        return pattern;
+    const auto number = static_cast<guint16>(std::strtol(pattern.c_str(), nullptr, 16));
+    for (const auto& [name, uuid] : shortNames)
+        if (g_ascii_strcasecmp(pattern.c_str(), name) == 0 ||
+            number == std::strtol(uuid, nullptr, 16))
+            return fullUuid(uuid);
+    return "";
+}
+
+int rfcommChannel(const std::string& uuid) {
+    const ServiceClass* known = classOf(uuid);
+    return known ? known->channel : 0;
 }
 
 std::vector<ServiceRecord> serviceRecords(const PeerDevice& peer, const std::string& wanted) {

@@ -15,6 +15,13 @@ namespace Bluetooth::Sim {
 /// service class such as "spp"; "" for anything else.
 std::string uuidOfPattern(const std::string& pattern);
 
+/// The same for the patterns of Serial and SerialProxyManager: a short name, the number of a
+/// service that has one, or any text of the form of a UUID, which is taken as it is.
+std::string serviceNamed(const std::string& pattern);
+
+/// The RFCOMM channel of a service class, given in full; 0 when it has none.
+int rfcommChannel(const std::string& uuid);
+
 struct ServiceRecord {
     guint32 handle;
     std::string uuid; ///< its service class

@@ -45,10 +45,12 @@ struct PeerDevice {
     bool nameInInquiry = true; ///< whether the name comes with the first DeviceFound
     bool lowEnergy = false;
     bool broadcaster = false;
-    bool connectsBack = false; ///< opens a channel of its own while we connect audio
-    bool audioEndpoint = true; ///< whether streams find an endpoint on it
-    bool audioHangs = false;   ///< falls silent while we connect audio
-    guint visibleFor = 0;      ///< vanishes so long after a discovery began; 0: never
+    bool connectsBack = false;        ///< opens a channel of its own while we connect audio
+    bool audioEndpoint = true;        ///< whether streams find an endpoint on it
+    bool audioHangs = false;          ///< falls silent while we connect audio
+    bool documentedNetwork = false;   ///< Network.Connect does as its document says
+    std::vector<std::string> refuses; ///< the services that do not listen
+    guint visibleFor = 0;             ///< vanishes so long after a discovery began; 0: never
 
     bool legacy = false;
     bool displaysPin = false; ///< a legacy keyboard: we choose the PIN and show it

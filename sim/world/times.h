@@ -25,6 +25,7 @@ struct Times {
     guint linkLoss = 5000;          ///< until the loss of a link is noticed
     guint idleDisconnect = 4000;    ///< until an unused link drops
     guint disconnectRequest = 2000; ///< from DisconnectRequested to the end of the link
+    guint channelConnect = 200;     ///< to open a channel to a service other than audio
     guint audioConnect = 700;       ///< to set up an audio stream
     guint audioTimeout = 41000;     ///< until a device that falls silent meanwhile is given up
     guint audioRetry = 2000;        ///< from a stream's failure to the answer of its Connect

@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <regex>
+#include <set>
 
 namespace Bluetooth::Test {
 
@@ -62,9 +63,11 @@ SimClient::Callee SimClient::calleeOf(const Question& question) const {
         return {interface, "/" + std::regex_replace(interface, std::regex("\\."), "/"), interface,
                 member};
     const std::string adapter = m_base + "hci0";
+    static const std::set<std::string> ofAdapter{"Adapter", "Media", "NetworkServer",
+                                                 "SerialProxyManager", "Service"};
     return {"org.bluez",
-            interface == "Manager"                           ? "/"
-            : interface == "Adapter" || interface == "Media" ? adapter
+            interface == "Manager"          ? "/"
+            : ofAdapter.count(interface)    ? adapter
             : interface == "MediaTransport" ? adapter + "/dev_00_11_22_33_44_55/fd0"
                                             : adapter + "/dev_00_11_22_33_44_55",
             "org.bluez." + interface, member};
