@@ -26,6 +26,8 @@ TEST_F(DeviceVerbs, CreateServicesAndRemove) {
     const Json created = json("create "s + headset);
     EXPECT_EQ(created["properties"]["Name"], "Kestrine Headset");
     EXPECT_NE(failure("create "s + headset).find("Already Exists"), std::string::npos);
+    EXPECT_EQ(errorsOf(*startAtTerminal("create "s + pinReceiver), 0),
+              "Connecting to 00:11:22:33:44:04 on hci0 (Ctrl-C stops it)\n");
 
     const Json sink = json("services "s + headset + " 0x110b");
     ASSERT_EQ(sink.size(), 1U);

@@ -3,6 +3,8 @@
 
 #include "kesbt/kesbt_test.h"
 
+#include <iterator>
+#include <sstream>
 #include <tuple>
 
 namespace Bluetooth::Test {
@@ -42,6 +44,30 @@ TEST(Usage, WrongUsageIsOneLineThatSaysWhereToReadOnAndStatus2) {
     };
     for (const auto& [arguments, mistake, verb] : wrong)
         EXPECT_EQ(failure(arguments, 2), mistake + "; see: kesbt " + verb + "--help\n");
+}
+
+TEST(Usage, ANarrowTerminalBreaksLinesBetweenWords) {
+    const auto words = [](const std::string& text) {
+        std::istringstream stream(text);
+        return Texts{std::istream_iterator<std::string>(stream), {}};
+    };
+    for (const char* command :
+         {"--help", "agent --help", "adapter set --help", "adapters", "adapter"}) {
+        for (const std::size_t width : {std::size_t{40}, std::size_t{60}}) {
+            const std::string line = KESBT " "s + command;
+            ChildProcess both({BLUEZ4_SIM, "--", "sh", "-c",
+                               line + ";" + (width == 60 ? "COLUMNS=60 " : "") + line + " >&2"},
+                              ChildProcess::Output::Terminal, {"NO_COLOR=1"});
+            const auto [status, wide, narrow] = both.finish();
+            EXPECT_EQ(words(wide), words(narrow));
+            EXPECT_LE(wide.find('\n'), 80U);
+            std::istringstream lines(narrow);
+            for (std::string one; std::getline(lines, one);)
+                EXPECT_TRUE(one.size() <= width || words(one).size() == 1 || // cannot be broken
+                            one.rfind("  kesbt ", 0) == 0)                   // or is an example
+                    << one;
+        }
+    }
 }
 
 TEST(Usage, ResultsThatCannotBeWrittenAreAFailureAndGoNowhereElse) {

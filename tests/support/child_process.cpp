@@ -55,7 +55,8 @@ std::string cut(std::string& buffer, std::size_t length) {
 }
 
 bool openTerminal(int (&ends)[2]) {
-    if (openpty(&ends[0], &ends[1], nullptr, nullptr, nullptr) != 0)
+    const winsize narrow{24, 40, 0, 0};
+    if (openpty(&ends[0], &ends[1], nullptr, nullptr, &narrow) != 0)
         return false;
     termios settings{};
     tcgetattr(ends[1], &settings);

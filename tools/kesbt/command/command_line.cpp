@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: LGPL-2.1-or-later
 #include "command/command_line.h"
 
+#include "command/help.h"
 #include "command/usage.h"
 #include "show/text.h"
 
@@ -34,9 +35,7 @@ CommandLine::CommandLine(std::vector<const Verb*> verbs, Offer adapters)
       m_program("Works with Bluetooth through bluetoothd (BlueZ 4).", "kesbt") {
     m_program.fallthrough(); // global options may stand behind the verb too
     m_program.require_subcommand(1);
-    constexpr std::size_t nameColumns = 20;
-    m_program.get_formatter()->column_width(nameColumns);
-    m_program.get_formatter()->label("SUBCOMMAND", "VERB ...");
+    m_program.formatter(std::make_shared<Help>());
     m_program.footer("kesbt VERB --help tells more about a verb and gives examples.\n"
                      "Exit status: 0 success, 1 failure, 2 wrong usage.\n");
     addOptions(adapters);

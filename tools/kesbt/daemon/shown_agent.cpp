@@ -133,24 +133,24 @@ std::shared_ptr<AgentSettings> addAgentOptions(const Syntax& syntax) {
     syntax.app
         .add_option_function<std::string>(
             "--pin", [settings](const std::string& pin) { settings->pin = pin; },
-            "The answer to a request for a PIN code or a\npasskey, without asking anybody")
+            "The answer to a request for a PIN code or a passkey, without asking anybody")
         ->type_name("TEXT")
         ->check(checkPin);
     syntax.app
         .add_flag("--reject", settings->reject,
-                  "Refuse passkeys and services, and PIN codes too\nunless --pin is given")
+                  "Refuse passkeys and services, and PIN codes too unless --pin is given")
         ->excludes(accept);
     const CLI::Option* capability =
         syntax.app
             .add_option("--capability", settings->capability,
-                        "What this side can do: DisplayYesNo (default),\nDisplayOnly, KeyboardOnly "
+                        "What this side can do: DisplayYesNo (default), DisplayOnly, KeyboardOnly "
                         "or NoInputNoOutput")
             ->type_name("NAME")
             ->check(checkCapability);
     syntax.completion.offer(capability, [](const auto&) { return capabilities(); });
     syntax.app
         .add_option("--delay", settings->delay,
-                    "Wait so long before each answer that nobody is\nasked for")
+                    "Wait so long before each answer that nobody is asked for")
         ->type_name("SECONDS")
         ->check([](const std::string& text) {
             constexpr std::size_t longest = 4;

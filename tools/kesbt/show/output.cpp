@@ -101,7 +101,7 @@ void printEvent(const Json& event) {
 }
 
 void printHint(const std::string& text) {
-    if (isatty(STDOUT_FILENO) != 0 && isatty(STDERR_FILENO) != 0)
+    if (isatty(STDERR_FILENO) != 0)
         std::cerr << text << '\n';
 }
 

@@ -1,10 +1,12 @@
 // SPDX-License-Identifier: LGPL-2.1-or-later
 #include "show/style.h"
 
+#include <sys/ioctl.h>
 #include <unistd.h>
 
 #include <cstdlib>
 #include <cstring>
+#include <limits>
 
 namespace Kesbt {
 
@@ -36,6 +38,18 @@ const char* code(Colour colour) {
 }
 
 } // namespace
+
+std::size_t lineWidth() {
+    constexpr std::size_t unlimited = std::numeric_limits<std::size_t>::max();
+    if (isatty(STDOUT_FILENO) == 0)
+        return unlimited;
+    const char* chosen = std::getenv("COLUMNS");
+    if (const long columns = chosen ? std::strtol(chosen, nullptr, 10) : 0; columns > 0)
+        return static_cast<std::size_t>(columns);
+    winsize size{};
+    return ioctl(STDOUT_FILENO, TIOCGWINSZ, &size) == 0 && size.ws_col > 0 ? size.ws_col
+                                                                           : unlimited;
+}
 
 std::string coloured(const std::string& text, Colour colour) {
     static const bool wanted = wantsColour();

@@ -21,7 +21,8 @@ struct Cell {
 /// "yes" in green, anything else plain.
 Cell yesNo(const std::string& text);
 
-/// Rows in aligned columns for people. Unprintable characters are shown as escapes.
+/// Rows in aligned columns for people, as wide as the terminal at most where words allow it.
+/// Unprintable characters are shown as escapes.
 class Table {
 public:
     /// A table without headings: name and value, one a line.
@@ -33,6 +34,12 @@ public:
     void print() const;
 
 private:
+    struct Column {
+        std::size_t begin;
+        bool isOnNewLine; ///< the terminal is too narrow for it beside the others
+    };
+    std::vector<Column> layOut() const;
+
     std::vector<std::vector<Cell>> m_rows;
 };
 

@@ -108,15 +108,18 @@ std::size_t columns(const std::string& text) {
     }));
 }
 
-std::string wrapped(std::string text, std::size_t width) {
-    for (std::size_t begin = 0; text.size() - begin > width;) {
-        const std::size_t blank = text.rfind(' ', begin + width);
-        if (blank == std::string::npos || blank < begin)
+std::string wrapped(std::string line, std::size_t width, std::size_t indent) {
+    for (std::size_t begin = 0; line.size() - begin > width;) {
+        std::size_t blank = line.rfind(' ', begin + width);
+        if (blank == std::string::npos || blank <= begin + indent)
+            blank = line.find(' ', begin + std::max(width, indent) + 1);
+        if (blank == std::string::npos)
             break;
-        text[blank] = '\n';
-        begin = blank + 1;
+        const std::size_t end = line.find_last_not_of(' ', blank) + 1;
+        line.replace(end, blank + 1 - end, '\n' + std::string(indent, ' '));
+        begin = end + 1;
     }
-    return text;
+    return line;
 }
 
 std::string padded(const std::string& text, std::size_t width) {

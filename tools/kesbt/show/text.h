@@ -20,8 +20,10 @@ std::string printableJson(const std::string& document);
 /// How many columns a text takes on a terminal, with one for each character.
 std::size_t columns(const std::string& text);
 
-/// With line breaks in place of blanks, so that no line is wider where words allow it.
-std::string wrapped(std::string text, std::size_t width);
+/// A line with breaks in place of blanks, so that none is wider where words allow it.
+/// @param indent the column that the further lines begin at, and the first too: it is not broken
+///               before
+std::string wrapped(std::string line, std::size_t width, std::size_t indent = 0);
 
 /// The text with blanks after it, at least so many columns wide.
 std::string padded(const std::string& text, std::size_t width);

@@ -141,8 +141,7 @@ std::string settableText() {
     std::string text = "Can be set:";
     for (const SettableProperty& property : settable)
         text.append(&property == settable ? " " : ", ").append(property.name);
-    constexpr std::size_t terminalWidth = 80;
-    return wrapped(text + ". Booleans are true or false, time-outs are seconds.", terminalWidth);
+    return text + ". Booleans are true or false, time-outs are seconds.";
 }
 
 using Words = std::vector<std::string>;

@@ -196,7 +196,7 @@ const Verb autoconnectVerb = {
      {"add", "Put a device into the adapter's list", Limit::Steps,
       oneDevice(addDevice, knownDevices)},
      {"remove", "Take a device out of it", Limit::Steps, oneDevice(removeDevice, listedDevices)},
-     {"list", "Show the listed devices that the adapter knows;\nothers leave an enabled list",
+     {"list", "Show the listed devices that the adapter knows; others leave an enabled list",
       Limit::Whole, noArguments(listKnown)},
      {"targets", "Show all devices that are to be connected, of all adapters", Limit::Whole,
       noArguments(listTargets)},

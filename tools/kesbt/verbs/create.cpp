@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: LGPL-2.1-or-later
 #include "daemon/creation.h"
 #include "daemon/objects.h"
+#include "show/output.h"
 #include "verbs/list.h"
 
 namespace Kesbt {
@@ -9,6 +10,7 @@ namespace {
 
 void createDevice(const Options& options, const std::string& address) {
     const auto adapter = openAdapter(options);
+    printHint("Connecting to " + address + " on " + adapterName(*adapter) + " (Ctrl-C stops it)");
     std::unique_ptr<Bluetooth::Device> device;
     {
         const Watchdog watchdog(options.limit, creationTask(*adapter, address, "creating"));

@@ -30,6 +30,7 @@ void showName(const Options& options, const std::string& address) {
     constexpr int longestName = 249; // HCI's 248 bytes and the end
     const int timeoutMs = options.limit.isGiven() ? static_cast<int>(options.limit.step().count())
                                                   : Bluetooth::GET_NAME_TIMEOUT_DEFAULT;
+    printHint("Asking " + address + " for its name");
     char name[longestName] = "";
     errno = 0;
     if (Bluetooth::getNameFromAddr(address.c_str(), name, sizeof name,

@@ -26,6 +26,7 @@ bool isAdapterMarked() {
 void restartDaemon(const Options& options) {
     if (geteuid() != 0)
         throw Failure("only root may restart bluetoothd; run it as root");
+    printHint("Restarting bluetoothd");
     if (Bluetooth::restartBluetoothd() != 0)
         throw Failure(isAdapterMarked()
                           ? "bluetoothd does not run after its restart; start /usr/sbin/bluetoothd "

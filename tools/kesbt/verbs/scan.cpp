@@ -89,7 +89,7 @@ const Verb scanVerb = {
     "Find devices with a scan that programs share",
     "kesbt scan list\nkesbt scan watch --json\n"
     "kesbt --adapter hci1 scan stop",
-    {{"list", "Show the devices found so far; the first time starts\nthe scan", Limit::Steps,
+    {{"list", "Show the devices found so far; the first time starts the scan", Limit::Steps,
       noArguments(list)},
      {"watch", "Ask each second and show what came, changed and went", Limit::Stream,
       noArguments(watch)},

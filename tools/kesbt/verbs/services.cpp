@@ -19,6 +19,7 @@ Bluetooth::Dict discover(const Options& options, Bluetooth::Device& device,
     task.cancel = [path = std::string(device.getPath())] {
         Bluetooth::Device(path.c_str()).cancelDiscovery();
     };
+    printHint("Asking " + address + " for its services (Ctrl-C stops it)");
     std::unique_ptr<Bluetooth::Dict> records;
     {
         const Watchdog watchdog(options.limit, std::move(task));
@@ -62,7 +63,7 @@ Action build(const Syntax& syntax) {
     auto pattern = std::make_shared<std::string>();
     syntax.app
         .add_option("PATTERN", *pattern,
-                    "Which services: a UUID such as 0x110b, or a name\nsuch as spp")
+                    "Which services: a UUID such as 0x110b, or a name such as spp")
         ->type_name("");
     return [&options = syntax.options, address, pattern] {
         listServices(options, *address, *pattern);
