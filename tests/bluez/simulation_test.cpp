@@ -10,11 +10,16 @@
 #include <bluetooth/adapter.h>
 #include <bluetooth/agent.h>
 #include <bluetooth/audio_sink.h>
+#include <bluetooth/audio_source.h>
 #include <bluetooth/control.h>
 #include <bluetooth/device.h>
 #include <bluetooth/device_list.h>
 #include <bluetooth/dict_codec.h>
+#include <bluetooth/headset.h>
+#include <bluetooth/input.h>
 #include <bluetooth/manager.h>
+#include <bluetooth/network.h>
+#include <bluetooth/serial.h>
 
 #include <algorithm>
 #include <csignal>
@@ -57,6 +62,7 @@ std::string property(BluezObject& object, const char* name) {
 
 class SimulationTest : public ::testing::Test {
 protected:
+    explicit SimulationTest(const std::string& scenario = "") : simulation(scenario) {}
     void SetUp() override {
         KES_NEEDS_RECEIVE_LOOP();
         seen().clear();
@@ -161,6 +167,78 @@ TEST_F(SimulationTest, ADaemonThatIsBackIsUsedAtItsNewPaths) {
     const std::unique_ptr<Adapter> renewed(manager->findAdapter("hci0"));
     ASSERT_TRUE(renewed);
     EXPECT_STRNE(renewed->getPath(), adapter->getPath());
+}
+
+class OfferTest : public SimulationTest {
+protected:
+    OfferTest()
+        : SimulationTest(std::string("[Audio]\nEnable=Source\nSCORouting=PCM\n[Adapter hci0]\n"
+                                     "[Device ") +
+                         newDevice +
+                         "]\nUUIDs=1101;1108;110a;1115;1124\nDocumentedNetwork=true\n") {}
+};
+
+TEST_F(OfferTest, AllThatADeviceOffersIsConnectedUsedAndDisconnected) {
+    const std::unique_ptr<Device> device(adapter->createDevice(newDevice));
+    ASSERT_TRUE(device) << adapter->getErrorMessage();
+    const char* path = device->getPath();
+    Input input(path);
+    Network network(path);
+    Serial serial(path);
+    Headset unit(path);
+    AudioSource source(path);
+    for (BluezObject* each :
+         std::initializer_list<BluezObject*>{device.get(), &input, &network, &unit, &source})
+        ASSERT_EQ(each->setPropertyChangedHandler(
+                      [](RemoteObject* sender, const char* name, const Variant* value) {
+                          seen().add(std::string(sender->getInterface()) + " " + name + "=" +
+                                     variantToString(*value));
+                      }),
+                  0);
+    const RunningLoop running(*manager);
+    std::string name;
+    unsigned short gain = 0;
+    bool yes = false;
+
+    EXPECT_EQ(input.connect(), 0);
+    EXPECT_TRUE(wasSeen("Input Connected=1"));
+    EXPECT_EQ(input.disconnect(), 0);
+    EXPECT_TRUE(wasSeen("Input Connected=0"));
+
+    EXPECT_EQ(network.connect("nap", name), 0) << network.getErrorMessage();
+    EXPECT_EQ(name, property(network, "Interface"));
+    EXPECT_EQ(network.disconnect(), 0);
+    EXPECT_TRUE(wasSeen("Network Connected=0"));
+
+    EXPECT_EQ(serial.connect("spp", name), 0) << serial.getErrorMessage();
+    EXPECT_EQ(access(name.c_str(), R_OK | W_OK), 0) << name;
+    EXPECT_EQ(serial.disconnect(name.c_str()), 0);
+    EXPECT_EQ(property(*device, "Alias"), property(*device, "Name")); // the daemon has done it
+    EXPECT_NE(access(name.c_str(), F_OK), 0);
+
+    EXPECT_EQ(unit.connect(), 0);
+    EXPECT_TRUE(wasSeen("Headset Connected=1"));
+    EXPECT_TRUE(unit.isConnected(yes) == 0 && yes);
+    EXPECT_EQ(unit.indicateCall() + unit.cancelCall(), 0);
+    EXPECT_TRUE(unit.getSpeakerGain(gain) == 0 && gain == 15);
+    EXPECT_EQ(unit.setSpeakerGain(7) + unit.setMicrophoneGain(8), 0);
+    EXPECT_TRUE(wasSeen("Headset SpeakerGain=7") && wasSeen("Headset MicrophoneGain=8"));
+    EXPECT_TRUE(unit.getMicrophoneGain(gain) == 0 && gain == 8);
+    EXPECT_EQ(unit.play(), 0);
+    EXPECT_TRUE(wasSeen("Headset Playing=1"));
+    EXPECT_TRUE(unit.isPlaying(yes) == 0 && yes);
+    EXPECT_EQ(unit.stop(), 0);
+    EXPECT_TRUE(wasSeen("Headset Playing=0"));
+    EXPECT_EQ(unit.disconnect(), 0);
+    EXPECT_TRUE(wasSeen("Headset Connected=0"));
+
+    EXPECT_EQ(source.connect(), 0);
+    EXPECT_TRUE(wasSeen("AudioSource State=connected"));
+    EXPECT_EQ(source.disconnect(), 0);
+    EXPECT_TRUE(wasSeen("AudioSource State=disconnected"));
+    EXPECT_EQ(device->disconnect(), 0);
+    EXPECT_TRUE(wasSeen("Device Connected=0"));
+    EXPECT_EQ(log.take(), Texts{});
 }
 
 class PairingTest : public SimulationTest {
