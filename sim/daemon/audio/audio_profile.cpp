@@ -75,6 +75,17 @@ void AudioProfile::authorize(const std::string& uuid, bool wanted, std::function
     m_audio.authorize(uuid, wanted, ofThisAttempt(std::move(done)));
 }
 
+void AudioProfile::admit(const std::string& uuid, std::function<void()> opened,
+                         std::function<void()> refused) {
+    authorize(uuid, false,
+              [this, opened = std::move(opened), refused = std::move(refused)](bool allowed) {
+                  if (allowed)
+                      later(&Times::audioConnect, opened);
+                  else
+                      refused();
+              });
+}
+
 void AudioProfile::configure(const MediaSide& side, const std::function<void(bool)>& play,
                              std::function<void(bool)> done) {
     m_audio.device().adapter().media().configure(m_audio.device(), side, play,

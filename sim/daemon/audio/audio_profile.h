@@ -50,6 +50,9 @@ protected:
     /// Asks whether the device may use a service.
     /// @param wanted  whether we have connected to it as well
     void authorize(const std::string& uuid, bool wanted, std::function<void(bool)> done);
+    /// Asks the same for a device that connects to us, and sets the profile up.
+    void admit(const std::string& uuid, std::function<void()> opened,
+               std::function<void()> refused);
     /// Lets clients' endpoints configure the stream.
     void configure(const MediaSide& side, const std::function<void(bool)>& play,
                    std::function<void(bool)> done);

@@ -71,13 +71,12 @@ void AudioStream::peerConnects(const std::string& uuid) {
         return;
     accept();
     enter(AudioState::Connecting);
-    authorize(uuid, false, [this](bool allowed) {
-        if (!allowed)
-            return failed();
+    const auto setUp = [this] {
         if (isSink())
             m_audio.connectControlLater();
-        later(&Times::audioConnect, [this] { open(); });
-    });
+        open();
+    };
+    admit(uuid, setUp, [this] { failed(); });
 }
 
 void AudioStream::sessionUp(bool allowed) {

@@ -56,12 +56,8 @@ void HandsfreeGateway::peerConnects(const std::string& uuid) {
         return;
     accept();
     enter(AudioState::Connecting);
-    authorize(uuid, false, [this](bool allowed) {
-        if (allowed)
-            later(&Times::audioConnect, [this] { opened(); });
-        else
-            close();
-    });
+    admit(
+        uuid, [this] { opened(); }, [this] { close(); });
 }
 
 /// The agent is given the connection; that it stands is said when the agent has answered.

@@ -69,12 +69,8 @@ void Headset::peerConnects(const std::string& uuid) {
     m_byPeer = true;
     accept();
     enter(AudioState::Connecting);
-    authorize(uuid, false, [this](bool allowed) {
-        if (allowed)
-            later(&Times::audioConnect, [this] { opened(); });
-        else
-            close();
-    });
+    admit(
+        uuid, [this] { opened(); }, [this] { close(); });
 }
 
 void Headset::opened() {
