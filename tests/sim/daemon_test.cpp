@@ -69,7 +69,7 @@ TEST_F(SimDaemonTest, TheClassSaysLimitedOnlyForAShortTimeThatWasSetWhilePairabl
     EXPECT_EQ(set("DiscoverableTimeout", 61U).back(), isNot);
     EXPECT_EQ(set("DiscoverableTimeout", 0U).back(), answer);
     EXPECT_EQ(set("DiscoverableTimeout", 0U), lines(answer));
-    set("DiscoverableTimeout", 1U);
+    set("DiscoverableTimeout", 30U);
     EXPECT_EQ(set("Discoverable", false), lines("hci0 Discoverable=b:0", answer, isNot));
 }
 
@@ -78,12 +78,13 @@ TEST_F(SimDaemonTest, OneChangeOfTheModeIsMadeAtATime) {
     const auto startSetting = [&](const char* name, bool value) {
         start({"Adapter.SetProperty", name, Var{value}});
     };
-    setTime("ModeChange", "5000");
+    setTime("ModeChange", "50000");
     startSetting("Discoverable", true);
     for (const Question& question : {Question("Adapter.SetProperty", "Powered", Var{false}),
                                      Question("Adapter.SetProperty", "Discoverable", Var{true})})
         EXPECT_EQ(call(question), busy);
     until("answer");
+    setTime("ModeChange", "50");
     startSetting("Powered", false); // this one takes no time
     startSetting("Powered", true);
     until("answer");

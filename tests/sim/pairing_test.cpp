@@ -188,6 +188,7 @@ TEST_F(SimPairingTest, CancellingByItsOwnerKeepsTheDaemonsOrder) {
 
 TEST_F(SimPairingTest, ACreationAndAPairingShareTheLink) {
     add({{"UUIDs", "1101"}});
+    setTime("Connect", "50000"); // all is asked before the link is up
     start({"Adapter.CreateDevice", newDevice});
     startPairing();
     const Question discover("Device.DiscoverServices", "");
@@ -199,11 +200,10 @@ TEST_F(SimPairingTest, ACreationAndAPairingShareTheLink) {
     forgetDevice();
 
     // A search that is still running when the pairing succeeds takes its reply away.
+    setTime("ServiceSearch", "20000");
     startPairing();
-    EXPECT_EQ(call("Device.Disconnect"), "error NotConnected: Not Connected");
-    until("agent RequestConfirmation");
-    setTime("ServiceSearch", "6000");
     start(discover);
+    EXPECT_EQ(call("Device.Disconnect"), "error NotConnected: Not Connected");
     until(paired);
     until("answer DiscoverServices a(e(u:65536");
     control("ClearFaults");
