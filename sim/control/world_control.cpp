@@ -18,7 +18,7 @@ namespace {
 
 /// The service class that is a call's third argument.
 std::string uuidOf(const CallPtr& call) {
-    const std::string uuid = fullUuid(call->text(2));
+    std::string uuid = fullUuid(call->text(2));
     if (uuid.empty())
         throw std::runtime_error("\"" + call->text(2) + "\" is not a UUID");
     return uuid;

@@ -53,6 +53,7 @@ struct Row {
     const char* behaviour = "";
 };
 
+// NOLINTNEXTLINE(readability-identifier-naming): named by GoogleTest
 void PrintTo(const Row& row, std::ostream* out) {
     *out << row.name;
 }

@@ -43,7 +43,8 @@ std::function<void(bool)> AudioProfile::ofThisAttempt(std::function<void(bool)> 
     };
 }
 
-void AudioProfile::reach(std::function<void()> reached, std::function<void()> failed) {
+void AudioProfile::reach(const std::function<void()>& reached,
+                         const std::function<void()>& failed) {
     const auto end = ofThisAttempt([this, reached, failed](bool up) {
         const auto peer = m_audio.device().peer();
         if (!up)

@@ -44,7 +44,7 @@ protected:
 
     /// Takes the link, and reaches the device.
     /// @param failed  when it does not answer, or hangs
-    void reach(std::function<void()> reached, std::function<void()> failed);
+    void reach(const std::function<void()>& reached, const std::function<void()>& failed);
     /// Takes the link that the device brings up by connecting to us.
     void accept();
     /// Asks whether the device may use a service.
