@@ -172,10 +172,10 @@ TEST_F(SimulationTest, ADaemonThatIsBackIsUsedAtItsNewPaths) {
 class OfferTest : public SimulationTest {
 protected:
     OfferTest()
-        : SimulationTest(std::string("[Audio]\nEnable=Source\nSCORouting=PCM\n[Adapter hci0]\n"
-                                     "[Device ") +
-                         newDevice +
-                         "]\nUUIDs=1101;1108;110a;1115;1124\nDocumentedNetwork=true\n") {}
+        : SimulationTest(std::string("[Audio]\nEnable=Source\nSCORouting=PCM\n"
+                                     "[Adapter hci0]\nAddress=") +
+                         adapter0 + "\n[Device " + newDevice +
+                         "]\nName=All\nUUIDs=1101;1108;110a;1116;1124\nDocumentedNetwork=true\n") {}
 };
 
 TEST_F(OfferTest, AllThatADeviceOffersIsConnectedUsedAndDisconnected) {
