@@ -55,8 +55,9 @@ TEST(Usage, ANarrowTerminalBreaksLinesBetweenWords) {
          {"--help", "agent --help", "adapter set --help", "adapters", "adapter"}) {
         for (const std::size_t width : {std::size_t{40}, std::size_t{60}}) {
             const std::string line = KESBT " "s + command;
-            ChildProcess both({BLUEZ4_SIM, "--", "sh", "-c",
-                               line + ";" + (width == 60 ? "COLUMNS=60 " : "") + line + " >&2"},
+            std::string script(line);
+            script.append(width == 60 ? ";COLUMNS=60 " : ";").append(line).append(" >&2");
+            ChildProcess both({BLUEZ4_SIM, "--", "sh", "-c", script},
                               ChildProcess::Output::Terminal, {"NO_COLOR=1"});
             const auto [status, wide, narrow] = both.finish();
             EXPECT_EQ(words(wide), words(narrow));

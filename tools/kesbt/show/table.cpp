@@ -79,7 +79,7 @@ void Table::print() const {
             const std::string blanks(begin - (breaks ? 0 : at), ' ');
             std::string text = row[i].text;
             if (i + 1 == layout.size())
-                text = wrapped(std::string(begin, ' ') + text, width, begin).substr(begin);
+                text = wrapped(text.insert(0, begin, ' '), width, begin).substr(begin);
             std::cout << (breaks && at > 0 ? "\n" : "") << blanks << coloured(text, row[i].colour);
             at = begin + columns(row[i].text);
             breaks = false;
