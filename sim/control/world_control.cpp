@@ -157,8 +157,8 @@ Value WorldControl::connectService(const CallPtr& call) {
 Value WorldControl::disconnectService(const CallPtr& call) {
     const std::string uuid = uuidOf(call);
     const auto from = device(call);
-    from->services().peerDisconnects(uuid);
-    from->audio().serviceDisconnects(uuid);
+    if (!from->services().peerDisconnects(uuid))
+        from->audio().serviceDisconnects(uuid);
     return {};
 }
 

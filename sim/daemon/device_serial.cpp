@@ -162,15 +162,19 @@ void DeviceSerial::release(Port& port) {
     port.owner.clear();
 }
 
-void DeviceSerial::hangUp(const std::string& uuid) {
+bool DeviceSerial::hangUp(const std::string& uuid) {
+    const std::size_t lines = m_lines.size();
+    bool isAnyOpen = false;
     for (Port& port : m_ports) {
         if (!port.terminal || (!uuid.empty() && serviceAt(port) != uuid))
             continue;
         // The daemon does not notice: the port is its client's until that disconnects or leaves.
         port.terminal->hangUp();
         port.channel.close();
+        isAnyOpen = true;
     }
     m_lines.remove_if([&](const auto& line) { return uuid.empty() || line->uuid == uuid; });
+    return isAnyOpen || m_lines.size() < lines;
 }
 
 void DeviceSerial::linkLost() {

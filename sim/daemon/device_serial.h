@@ -37,7 +37,8 @@ public:
     /// Serves the interface and the ports that the device's UUIDs call for.
     void serve();
     /// The device closes what is open to a service of it, or to any for "".
-    void hangUp(const std::string& uuid);
+    /// @return whether something was
+    bool hangUp(const std::string& uuid);
     /// The device has opened a service of ours, and says its name first.
     /// @param local  what it is connected to; owned from now on
     std::weak_ptr<SerialLine> connectTo(int local, const std::string& uuid);

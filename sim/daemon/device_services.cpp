@@ -21,13 +21,14 @@ bool DeviceServices::peerConnects(const std::string& uuid) {
     return true;
 }
 
-void DeviceServices::peerDisconnects(const std::string& uuid) {
+bool DeviceServices::peerDisconnects(const std::string& uuid) {
     if (uuid == fullUuid("1124"))
         m_input.disconnected();
     else if (DeviceNetwork::isRole(uuid))
         m_network.disconnected();
     else
-        m_serial.hangUp(uuid);
+        return m_serial.hangUp(uuid);
+    return true;
 }
 
 void DeviceServices::disconnectRequested() {

@@ -24,8 +24,8 @@ public:
     void serve();
     /// The device opens a service of ours. @return false when it is none of these
     bool peerConnects(const std::string& uuid);
-    /// The device closes one of its services.
-    void peerDisconnects(const std::string& uuid);
+    /// The device closes one of its services. @return false when it is none of these
+    bool peerDisconnects(const std::string& uuid);
     /// The link is about to end; what watches that lets go of it.
     void disconnectRequested();
     void linkLost();

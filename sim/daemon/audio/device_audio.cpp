@@ -273,7 +273,7 @@ void DeviceAudio::atService(const std::string& uuid, const Action& action) {
     else if (!isVoice && !isControl && (m_sink || m_source))
         action(m_sink ? *m_sink : *m_source);
     else
-        throw std::runtime_error("the device has no such audio service");
+        throw std::runtime_error("the device has no such service");
 }
 
 void DeviceAudio::serviceConnects(const std::string& uuid) {
