@@ -51,10 +51,13 @@ public:
     bool wantsText() const { return method == "RequestPinCode" || method == "RequestPasskey"; }
     bool isOnlyShown() const { return method == "DisplayPasskey" || method == "DisplayPinCode"; }
 
-    /// Replies yes. Only the first reply counts. @param text the PIN code or passkey, if wanted
+    /// Replies yes. Only the first reply counts.
+    /// @param text the PIN code or passkey, if wanted; one that is not UTF-8 is refused
     void accept(const std::string& text = "") {
         const std::lock_guard<std::mutex> lock(m_mutex);
         const char* pin = text.c_str();
+        if (!dbus_validate_utf8(pin, nullptr)) // libdbus would end the process
+            return reply(m_no.get());
         const auto passkey = static_cast<dbus_uint32_t>(std::strtoul(pin, nullptr, 10));
         if (m_yes && method == "RequestPinCode")
             dbus_message_append_args(m_yes.get(), DBUS_TYPE_STRING, &pin, DBUS_TYPE_INVALID);
@@ -97,7 +100,7 @@ public:
     using Ask = std::function<void(std::shared_ptr<Question>)>;
 
     /// @param post     makes the main loop run a task soon; any thread calls it. GLib:
-    ///                 g_main_context_invoke_full(); Qt: QMetaObject::invokeMethod(qApp, task,
+    ///                 g_idle_add_full(); Qt: QMetaObject::invokeMethod(qApp, task,
     ///                 Qt::QueuedConnection)
     /// @param ask      opens the dialog; run by the main loop, like the next
     /// @param withdraw closes it: the daemon has cancelled the question

@@ -131,6 +131,7 @@ part_questions() {
         asks "$loop" "$phone" "$compare" n "cannot pair with $phone \(Authentication Failed\); .*"
     done
     asks glib "$phone" "$compare" y "paired with $phone"
+    asks queue "$receiver" 'which PIN code\?' $'\xff' "cannot pair with $receiver .*" # not UTF-8
     asks queue "$receiver" 'which PIN code\?' 1234 "paired with $receiver"
     rm "$typed"
 }
