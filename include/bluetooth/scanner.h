@@ -38,7 +38,8 @@ public:
     ///       org.bluez.Manager.FindAdapter(s pattern) -> o
     /// @param adapterId the adapter's name, e.g. "hci0", or its address
     /// @param logErrors whether a failure of the service is logged; getErrorMessage() returns it
-    ///                  either way. A failure of the Bluetooth daemon is always logged.
+    ///                  either way. An error of the Bluetooth daemon is always logged, its
+    ///                  absence never.
     /// @return a new list of (address, properties), deleted by the caller together with each Dict
     ///         in it; empty when no device was found yet. Null on failure; the service is not
     ///         called when the Bluetooth daemon is absent (getErrorName() is then
@@ -57,7 +58,8 @@ public:
     ///       org.bluez.Manager.FindAdapter(s pattern) -> o
     /// @param adapterId see listDevices()
     /// @return whether the call was handed to the bus; its reply is not awaited. False also when
-    ///         the Bluetooth daemon is absent or does not know the adapter. A failure is logged.
+    ///         the Bluetooth daemon is absent or does not know the adapter. A failure is logged,
+    ///         but not that the daemon is absent.
     bool removeFinder(const char* adapterId);
 
 private:

@@ -29,9 +29,8 @@ public:
     /// Connects to a serial port of the device and makes a terminal for it. The terminal lasts
     /// until disconnect(), or until this process leaves the bus.
     /// @dbus Connect(s pattern) -> s
-    /// @param pattern  which port: a UUID, a short name such as "spp" or "dun", or an RFCOMM
-    /// channel
-    ///                 from "1" to "30"
+    /// @param pattern  which port: a UUID, a short name such as "spp" or "dun", or a channel of
+    ///                 RFCOMM from "1" to "30"
     /// @param terminal receives the terminal's file, e.g. "/dev/rfcomm0"; unchanged on failure
     /// @return 0, or -1 on any failure
     ///
