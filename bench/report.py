@@ -245,8 +245,8 @@ def real_time(figures):
         return ("Real-time priority (`chrt`) was not permitted where this was measured: all of it "
                 "has ordinary scheduling.\n")
     pair = [OURS, "sdbus-c++"]
-    return f"""All of this on one processor had real-time priority (`chrt -f 1`). With ordinary
-scheduling, one processor:
+    return f"""Unless said otherwise, what shares one processor has real-time priority (`chrt -f 1`) on this
+page, and what uses all of them `nice -n -10`. With ordinary scheduling, one processor:
 
 {compared(figures, "plain", SIGNALS, pair, "signals")}
 With real-time priority, all processors:
@@ -364,9 +364,10 @@ The most signals a second before anybody on the way has to queue, so that they a
 peer, the bus or the library.
 
 {table(["library", "one processor", "all processors"], most)}
-In a burst of calls the receive thread looks for signals every millisecond, so that no call has to
-wake it: a string beside an idle receive thread takes 0.89 of the time that it takes when each call
-wakes the thread, on all processors 0.73 (30 repetitions, measured when the page was last reworded).
+In a burst of calls the receive thread looks every millisecond whether the burst is over, so that no
+call has to wake it; a signal wakes it at once. A string beside an idle receive thread takes 0.89 of
+the time that it would take if each call woke the thread, on all processors 0.73 (30 repetitions,
+measured by hand).
 
 What a thread that waits for signals takes in a minute in which none comes. kesbluetooth's looks
 once a second whether a blocking call of the program itself has read a signal without waking it;
