@@ -32,7 +32,7 @@ TEST_F(AdapterVerbs, SetRefusesWhatCannotBeSet) {
     EXPECT_EQ(failure("adapter set Address x"),
               "the daemon does not let Address of hci0 be set to \"x\"" + see);
     EXPECT_EQ(failure("adapter set UUIDs x"),
-              "UUIDs cannot be set; see what can: kesbt adapter set --help\n");
+              "UUIDs cannot be set; see what can be set: kesbt adapter set --help\n");
     EXPECT_EQ(failure("adapter set Colour red"), "hci0 has no property \"Colour\"" + see);
     failure("adapter set Powered perhaps", 2);
     failure("adapter set PairableTimeout -1", 2);
@@ -54,7 +54,7 @@ TEST_F(AdapterVerbs, ACallThatDoesNothingOrIsNotAnsweredIsAFailure) {
               "Powered of hci0 is still \"yes\" within the time-out; try again or give a longer "
               "--timeout\n");
     liar.neverReply("SetProperty");
-    EXPECT_NE(failure(switchOff).find("Did not receive a reply"), std::string::npos);
+    EXPECT_EQ(failure(switchOff).substr(0, 44), "cannot set Powered of hci0 within the time-o");
     // The library's own calls wait for longer than the user wants to.
     liar.neverReply("GetProperties");
     EXPECT_EQ(failure(switchOff),

@@ -59,7 +59,7 @@ TEST_F(Promises, TheExamplesInTheHelpWork) {
                                                              {"UUIDs", "110b;110c;110e"}}));
     Texts verbs = linesOf("kesbt --help | sed -nE 's/^  ([a-z][a-z-]*)  +[A-Z].*/\\1/p'");
     EXPECT_GT(verbs.size(), 15U);
-    verbs.emplace_back("adapter set");
+    verbs.insert(verbs.end(), {"adapter set", "device set"});
     for (const std::string& verb : verbs) {
         const Texts examples =
             linesOf("kesbt " + verb + " --help | sed -n '/^Examples:/,/^$/s/^  //p'");
@@ -171,6 +171,7 @@ TEST_F(Promises, JsonHasTheDocumentedMembers) {
           {"adapters"},
           {"adapter", "adapter info"},
           {"adapter set Pairable on"},
+          {"device set" + mouse + " Trusted on"},
           {"scan list"},
           {"scan stop"},
           {"services" + device},
@@ -191,6 +192,68 @@ TEST_F(Promises, JsonHasTheDocumentedMembers) {
     willing.reply("CancelDeviceCreation");
     document.expect({"cancel" + device});
     EXPECT_EQ(document.unmet(), 2U) << "but for name and restart-daemon, all rows are shown";
+}
+
+TEST_F(Promises, AFailureSaysWhatHelps) {
+    const std::string laptop = unreachableLaptop;
+    const std::string failed = "org.bluez.Error.Failed";
+    const std::string creating = "create " + laptop;
+    const std::string notCreated = "cannot create " + laptop + " on hci0: ";
+    const std::string toSwitchOn = "switch it on: kesbt --adapter hci1 adapter set Powered true";
+    const struct {
+        const char* method; // of the adapter or the device, which fails; "" for none
+        std::string error;
+        std::string text;
+        std::string command;
+        std::string line;
+    } rows[] = {
+        {"", "", "", creating,
+         notCreated + "Host is down; make sure that the device is on, within reach and not in use "
+                      "elsewhere"},
+        {"CreateDevice", failed, "Operation canceled", creating,
+         notCreated + "Operation canceled; the device does not answer or was disconnected, make "
+                      "sure that it is on and within reach"},
+        {"CreateDevice", failed, "Operation already in progress", creating,
+         notCreated + "Operation already in progress; wait until it is done, then try again"},
+        {"CreateDevice", "org.bluez.Error.ConnectionAttemptFailed", "Already Exists", creating,
+         notCreated + "Already Exists; make sure that the device is on and within reach"},
+        {"CreateDevice", "org.freedesktop.DBus.Python.ValueError",
+         "Traceback (most recent call last):\n  File \"x.py\", line 1\nValueError: odd. x\n",
+         creating, notCreated + "ValueError: odd; see what happens meanwhile with: kesbt monitor"},
+        {"CreateDevice", "org.example.Odd", "", creating,
+         notCreated + "org.example.Odd; see what happens meanwhile with: kesbt monitor"},
+        {"SetProperty", DBUS_ERROR_NO_REPLY, "Did not receive a reply", "adapter set Powered off",
+         "cannot set Powered of hci0: Did not receive a reply; the daemon may be busy, try again; "
+         "if it hangs, restart it as root: kesbt restart-daemon"},
+        {"SetProperty", DBUS_ERROR_NO_REPLY, "Did not receive a reply",
+         "--timeout 5 adapter set Powered off",
+         "cannot set Powered of hci0 within the time-out; try again or give a longer --timeout"},
+        {"", "", "", "adapter set Name \xff",
+         "\"\\xff\" is not UTF-8, as names are; write it on a terminal with UTF-8"},
+        {"", "", "", "pair "s + phone + " --reject",
+         "cannot pair with 00:11:22:33:44:03: it was refused here; repeat the command to answer "
+         "otherwise"},
+        {"", "", "", "--adapter hci1 scan list", "hci1 is off; " + toSwitchOn},
+        {"", "", "", "--adapter hci1 scan watch", "hci1 is off; " + toSwitchOn},
+        {"", "", "", "--adapter hci1 discover",
+         "cannot start a discovery on hci1: Resource Not Ready; the adapter is off, " + toSwitchOn},
+        {"", "", "", "--adapter hci1 device "s + knownMouse,
+         "hci1 does not know 00:11:22:33:44:06; see what it knows: kesbt --adapter hci1 devices, "
+         "or make it known: kesbt --adapter hci1 create 00:11:22:33:44:06"},
+        {"", "", "", "autoconnect enable",
+         "there is no /etc/bluetooth for /etc/bluetooth/autoconnect/00:1A:7D:DA:71:10; install "
+         "BlueZ 4, or make it as root: mkdir /etc/bluetooth"},
+    };
+    run("--adapter hci1 adapter set Powered off");
+    std::filesystem::remove_all("/etc/bluetooth");
+    for (const auto& [method, error, text, command, line] : rows) {
+        if (*method)
+            simulation.failNext("org.bluez.Adapter", method, error.c_str(), text.c_str());
+        const Result result = run(command);
+        EXPECT_NE(result.status, 0) << command;
+        const std::string errors = "\n" + result.err;
+        EXPECT_EQ(errors.substr(errors.rfind('\n', errors.size() - 2) + 1), line + "\n") << command;
+    }
 }
 
 } // namespace

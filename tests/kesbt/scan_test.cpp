@@ -34,6 +34,27 @@ TEST_F(ScanVerbs, TwoProgramsShareOneScan) {
     awaitCall("StopDiscovery");
 }
 
+TEST_F(ScanVerbs, WatchingOutlastsARestartOfTheDaemonAndEndsWithTheAdapter) {
+    ChildProcess watch({"sh", "-c", "exec " KESBT " scan watch 2>&1"},
+                       ChildProcess::Output::Capture);
+    const auto await = [&watch](const std::string& beginning) {
+        std::string line = watch.readLine();
+        while (line.rfind(beginning, 0) != 0 && !line.empty())
+            line = watch.readLine();
+        EXPECT_FALSE(line.empty()) << beginning;
+    };
+    await("found     00:11:22:33:44:04");
+    simulation.control("DropName");
+    await("bluetoothd has left the system bus; waiting for it (Ctrl-C ends it)");
+    simulation.control("Restart");
+    await("bluetoothd is back, the scan on hci0 goes on");
+    simulation.setDevice(pinReceiver, "RSSI", "-20");
+    await("changed   00:11:22:33:44:04");
+    run("adapter set Powered off");
+    await("hci0 is off; switch it on: kesbt --adapter hci0 adapter set Powered true");
+    EXPECT_EQ(watch.finish().status, 1);
+}
+
 class ScanVerbsAlone : public KesbtTest {
 protected:
     PrivateBus session{PrivateBus::Kind::Session};

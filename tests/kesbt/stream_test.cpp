@@ -34,22 +34,16 @@ TEST_F(Streams, DiscoverTellsWhatAppearsChangesAndVanishes) {
 }
 
 TEST_F(Streams, DiscoverFailsWhenItCannotGoOn) {
-    run("adapter set Powered off");
-    EXPECT_EQ(failure("discover"),
-              "cannot start a discovery on hci0: Resource Not Ready; the adapter is off, switch it "
-              "on: kesbt adapter set Powered true\n");
-    run("adapter set Powered on");
-
     auto discover = start("discover");
     EXPECT_NE(discover->readLine(), "");
     run("adapter set Powered off");
     EXPECT_EQ(errorsOf(*discover),
-              "hci0 was switched off; switch it on: kesbt adapter set Powered true\n");
+              "hci0 is off; switch it on: kesbt --adapter hci0 adapter set Powered true\n");
 
     discover = start("--adapter hci1 discover");
     EXPECT_NE(discover->readLine(), "");
     simulation.control("RemoveAdapter", with("hci1"));
-    EXPECT_EQ(errorsOf(*discover).substr(0, 9), "hci1 was "); // switched off first, then removed
+    EXPECT_EQ(errorsOf(*discover), "hci1 was removed; plug it in and repeat the command\n");
 
     run("adapter set Powered on");
     discover = start("discover");
@@ -106,7 +100,7 @@ TEST_F(Streams, SignalsOfStrangersAreNotBelieved) {
         const std::string printed = program->readAll();
         EXPECT_EQ(printed.find(newDevice), std::string::npos) << printed;
         EXPECT_EQ(errorsOf(*program),
-                  "hci0 was switched off; switch it on: kesbt adapter set Powered true\n");
+                  "hci0 is off; switch it on: kesbt --adapter hci0 adapter set Powered true\n");
     }
     while (!HasFailure()) {
         const Json event = Json::parse(monitor->readLine());
@@ -144,6 +138,7 @@ TEST_F(Streams, WaitEndsWhenItIsSoAndFailsWhenTimeIsOver) {
     awaitCall("FindDevice");
     EXPECT_EQ(run("pair "s + pinReceiver + " --pin 1234").status, 0);
     EXPECT_EQ(errorsOf(*waiting, 0), "");
+    EXPECT_LE(calls("FindDevice"), 4U) << "with that for the mouse, only when it may be so";
 
     const std::size_t asked = calls("FindDevice");
     const auto interrupted = start("wait paired "s + unreachableLaptop);
@@ -158,7 +153,7 @@ TEST_F(Streams, WaitEndsWhenItIsSoAndFailsWhenTimeIsOver) {
     awaitCall("StartDiscovery", 2);
     run("adapter set Powered off");
     EXPECT_EQ(errorsOf(*searching),
-              "hci0 was switched off; switch it on: kesbt adapter set Powered true\n");
+              "hci0 is off; switch it on: kesbt --adapter hci0 adapter set Powered true\n");
     const std::size_t read = calls("GetProperties");
     const auto pulledOut = start("wait powered");
     awaitCall("GetProperties", read + 1);

@@ -22,6 +22,25 @@ std::string indented(const std::string& lines) {
     return result;
 }
 
+std::vector<CLI::Option*> arguments(CLI::App& app) {
+    return app.get_options([](const CLI::Option* option) { return option->get_positional(); });
+}
+
+/// For a verb that stands alone or has a word behind it the arguments of the verb alone are
+/// optional to the parser, which gives them what is too much behind the word.
+void checkArguments(CLI::App& app) {
+    for (const CLI::Option* argument : arguments(*app.get_parent())) {
+        if (argument->count() != 0)
+            throw wrongUsage(quoted(argument->results().front()) + " is too much; see: kesbt " +
+                             app.get_parent()->get_name() + " " + app.get_name() + " --help");
+    }
+    for (const CLI::Option* argument : arguments(app)) {
+        if (argument->count() == 0 && !app.get_subcommands({}).empty())
+            throw wrongUsage(argument->get_name() + " is required; see: kesbt " + app.get_name() +
+                             " --help");
+    }
+}
+
 std::string checkAdapter(const std::string& text) {
     const bool isName = text.size() > 3 && text.compare(0, 3, "hci") == 0 &&
                         text.find_first_not_of("0123456789", 3) == std::string::npos;
@@ -105,16 +124,21 @@ void CommandLine::add(const Verb& verb) {
             setAction(*app->add_subcommand(form.name, form.summary), form);
     }
     const bool standsAlone = *verb.forms.front().name == '\0';
-    if (!app->get_subcommands({}).empty())
-        app->require_subcommand(standsAlone ? 0 : 1, 1);
+    if (app->get_subcommands({}).empty())
+        return;
+    app->require_subcommand(standsAlone ? 0 : 1, 1);
+    for (CLI::Option* argument : arguments(*app))
+        argument->required(false); // a word in its place is a word
 }
 
 void CommandLine::setAction(CLI::App& app, const Form& form) {
-    app.callback([this, &app, limit = form.limit,
-                  action = form.build({app, m_options, m_completion})] {
-        if (app.get_subcommands().empty()) // otherwise the word behind the verb tells what to do
+    app.callback(
+        [this, &app, limit = form.limit, action = form.build({app, m_options, m_completion})] {
+            if (!app.get_subcommands().empty()) // the word behind the verb tells what to do
+                return;
+            checkArguments(app);
             m_options.limit.run(limit, action);
-    });
+        });
 }
 
 } // namespace Kesbt

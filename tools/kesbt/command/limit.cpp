@@ -11,6 +11,9 @@ namespace Kesbt {
 
 namespace {
 
+// The library's calls end after 25 s, and do not cancel what the daemon does.
+constexpr std::chrono::milliseconds longestTask{24500};
+
 // A process has one such timer.
 std::chrono::microseconds alarmTime{0}; // 0 for none
 int depth = 0;
@@ -40,6 +43,10 @@ void TimeLimit::give(double seconds) {
     sigaction(SIGALRM, &action, nullptr);
 }
 
+bool TimeLimit::canBeLonger() const {
+    return m_isGiven && (m_limit == Limit::OnlyGiven || m_step < longestTask);
+}
+
 void TimeLimit::run(Limit limit, const std::function<void()>& verb) {
     m_limit = limit;
     if (limit == Limit::Whole)
@@ -49,8 +56,6 @@ void TimeLimit::run(Limit limit, const std::function<void()>& verb) {
 }
 
 Clock::time_point TimeLimit::end() const {
-    // The library's calls end after 25 s, and do not cancel what the daemon does.
-    constexpr std::chrono::milliseconds longestTask{24500};
     const bool isEndless = m_limit == Limit::Stream || (m_limit == Limit::OnlyGiven && !m_isGiven);
     if (isEndless)
         return Clock::time_point::max();

@@ -30,6 +30,8 @@ public:
     /// Takes the user's --timeout.
     void give(double seconds);
     bool isGiven() const { return m_isGiven; }
+    /// Whether a longer --timeout than this would let an answer come later.
+    bool canBeLonger() const;
 
     /// Runs a verb with the limit that it declares.
     void run(Limit limit, const std::function<void()>& verb);

@@ -19,6 +19,9 @@ using Bluetooth::AutoConnect;
 constexpr char folder[] = "/etc/bluetooth/autoconnect/";
 
 Failure unusable(const std::string& path, int reason) {
+    if (reason == ENOENT) // the folder's own folder comes with BlueZ
+        return Failure("there is no /etc/bluetooth for " + path +
+                       "; install BlueZ 4, or make it as root: mkdir /etc/bluetooth");
     const bool denied = reason == EACCES || reason == EPERM;
     return Failure("cannot use " + path + ": " + std::strerror(reason) + "; " +
                    (denied ? "run it as root" : "make the file writable or remove it"));
@@ -34,9 +37,8 @@ int writeError(const std::string& path) {
     if (errno != ENOENT)
         return errno;
     // It would be created, and the folder where that is missing.
-    for (std::string parent = folder; parent.size() > 1;) {
-        parent.resize(parent.rfind('/'));
-        if (access(parent.empty() ? "/" : parent.c_str(), W_OK | X_OK) == 0)
+    for (const char* parent : {folder, "/etc/bluetooth"}) {
+        if (access(parent, W_OK | X_OK) == 0)
             return 0;
         if (errno != ENOENT)
             return errno;

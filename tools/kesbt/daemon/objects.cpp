@@ -58,6 +58,13 @@ std::unique_ptr<Adapter> openAdapter(Manager& manager, const Options& options) {
     throw refusal("cannot find the adapter", manager);
 }
 
+Failure adapterLost(Adapter& adapter) {
+    const std::unique_ptr<Bluetooth::Dict> properties(
+        withinLimit([&adapter] { return adapter.BluezObject::getProperties(); }));
+    const std::string name = adapterName(adapter);
+    return !properties && lacksObject(adapter) ? adapterRemoved(name) : adapterOff(name);
+}
+
 std::unique_ptr<Adapter> openAdapter(const Options& options) {
     return openAdapter(*openManager(), options);
 }
@@ -92,9 +99,7 @@ std::unique_ptr<Device> openDevice(Adapter& adapter, const std::string& address)
     if (device)
         return device;
     if (failedWith(adapter, "DoesNotExist"))
-        throw Failure(adapterName(adapter) + " does not know " + address +
-                      "; see what it knows: kesbt devices, or make it known: kesbt create " +
-                      address);
+        throw unknownDevice(adapterName(adapter), address);
     throw refusal("cannot find " + address, adapter);
 }
 

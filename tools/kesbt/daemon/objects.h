@@ -5,6 +5,7 @@
 #include "command/options.h"
 #include "daemon/refusal.h"
 #include "show/output.h"
+#include "wait/waiting.h"
 
 #include <bluetooth/adapter.h>
 #include <bluetooth/device.h>
@@ -26,6 +27,9 @@ std::unique_ptr<Bluetooth::Manager> openManager();
 std::unique_ptr<Bluetooth::Adapter> openAdapter(const Options& options);
 std::unique_ptr<Bluetooth::Adapter> openAdapter(Bluetooth::Manager& manager,
                                                 const Options& options);
+
+/// Why the adapter cannot go on that says it is off: it says so too when it is unplugged.
+Failure adapterLost(Bluetooth::Adapter& adapter);
 
 /// What can be offered where an adapter or a known device of the chosen adapter is to be named.
 std::vector<std::string> adapterNames(const Options& options);
@@ -74,7 +78,8 @@ void ask(const Options& options, const std::string& what, Bluetooth::RemoteObjec
     const int timeoutMs = static_cast<int>(options.limit.step().count());
     if (proxy.newMessage(method) < 0 || (... || (proxy.append(args) < 0)) || proxy.hasError() ||
         proxy.sendMessage(true, timeoutMs) < 0)
-        throw refusal(what, proxy);
+        throw options.limit.canBeLonger() && hasTimedOut(proxy) ? notConfirmed(what)
+                                                                : refusal(what, proxy);
 }
 
 } // namespace Kesbt

@@ -6,6 +6,8 @@
 #include <bluetooth/bluez_object.h>
 #include <bluetooth/dbus_object.h>
 
+#include <sstream>
+
 namespace Kesbt {
 
 namespace {
@@ -16,47 +18,88 @@ constexpr char trySimulation[] = "or try: bluez4-sim -- kesbt adapters";
 
 /// What the daemon's and the bus's errors mean for the user.
 struct Advice {
-    const char* error; // its name
-    const char* text;
+    const char* error;  // its name
+    const char* reason; // its text, where that makes a difference; null for any
+    const char* text;   // {kesbt} stands for the program with the adapter that was asked
 };
 
 constexpr Advice advices[] = {
-    {KESBT_BLUEZ_ERROR "NotReady",
-     "the adapter is off, switch it on: kesbt adapter set Powered true"},
-    {KESBT_BLUEZ_ERROR "ConnectionAttemptFailed",
+    {KESBT_BLUEZ_ERROR "NotReady", nullptr,
+     "the adapter is off, switch it on: {kesbt} adapter set Powered true"},
+    {KESBT_BLUEZ_ERROR "Failed", "No route to host",
+     "the adapter is off, switch it on: {kesbt} adapter set Powered true"},
+    {KESBT_BLUEZ_ERROR "ConnectionAttemptFailed", nullptr,
      "make sure that the device is on and within reach"},
-    {KESBT_BLUEZ_ERROR "Failed",
+    // So one of the daemon's two backends calls a device that is not there.
+    {KESBT_BLUEZ_ERROR "Failed", "Operation canceled",
+     "the device does not answer or was disconnected, make sure that it is on and within reach"},
+    {KESBT_BLUEZ_ERROR "Failed", "Operation already in progress",
+     "wait until it is done, then try again"},
+    {KESBT_BLUEZ_ERROR "Failed", nullptr,
      "make sure that the device is on, within reach and not in use elsewhere"},
-    {KESBT_BLUEZ_ERROR "AlreadyExists", "it is known already, see: kesbt devices"},
-    {KESBT_BLUEZ_ERROR "DoesNotExist", "see what there is: kesbt devices"},
-    {KESBT_BLUEZ_ERROR "InProgress", "wait until it is done, or stop it where it was begun"},
-    {KESBT_BLUEZ_ERROR "NotAuthorized", "only the program that began it can do this"},
-    {KESBT_BLUEZ_ERROR "InvalidArguments", "the daemon does not accept this value"},
-    {KESBT_BLUEZ_ERROR "AuthenticationFailed",
+    {KESBT_BLUEZ_ERROR "AlreadyExists", nullptr, "it is known already, see: {kesbt} devices"},
+    {KESBT_BLUEZ_ERROR "DoesNotExist", nullptr, "see what there is: {kesbt} devices"},
+    {KESBT_BLUEZ_ERROR "InProgress", nullptr,
+     "wait until it is done, or stop it where it was begun"},
+    {KESBT_BLUEZ_ERROR "NotAuthorized", nullptr, "only the program that began it can do this"},
+    {KESBT_BLUEZ_ERROR "InvalidArguments", nullptr, "the daemon does not accept this value"},
+    {KESBT_BLUEZ_ERROR "AuthenticationFailed", nullptr,
      "check the PIN or passkey, and confirm on the device"},
-    {KESBT_BLUEZ_ERROR "AuthenticationRejected",
+    {KESBT_BLUEZ_ERROR "AuthenticationRejected", nullptr,
      "check the PIN or passkey, and confirm on the device"},
-    {KESBT_BLUEZ_ERROR "AuthenticationTimeout", "confirm on the device in time, then try again"},
-    {KESBT_BLUEZ_ERROR "AuthenticationCanceled",
+    {KESBT_BLUEZ_ERROR "AuthenticationTimeout", nullptr,
+     "confirm on the device in time, then try again"},
+    {KESBT_BLUEZ_ERROR "AuthenticationCanceled", nullptr,
      "try again when the adapter and the device are on"},
-    {KESBT_BLUEZ_ERROR "RepeatedAttempts", "wait a minute, then try again"},
-    {KESBT_BLUEZ_ERROR "NotConnected", "connect it first: kesbt audio connect ADDRESS"},
-    {KESBT_BLUEZ_ERROR "AgentNotAvailable", "register an agent first: kesbt agent"},
-    {DBUS_ERROR_NO_REPLY, "the daemon may be busy, try again or give a longer --timeout"},
-    {DBUS_ERROR_ACCESS_DENIED, "the bus does not allow it to this user, run it as root"},
+    {KESBT_BLUEZ_ERROR "RepeatedAttempts", nullptr, "wait a minute, then try again"},
+    {KESBT_BLUEZ_ERROR "NotConnected", nullptr, "connect it first: {kesbt} audio connect ADDRESS"},
+    {KESBT_BLUEZ_ERROR "NotSupported", nullptr, "the device does not offer it"},
+    {KESBT_BLUEZ_ERROR "AgentNotAvailable", nullptr, "register an agent first: {kesbt} agent"},
+    {DBUS_ERROR_NO_REPLY, nullptr,
+     "the daemon may be busy, try again; if it hangs, restart it as root: kesbt restart-daemon"},
+    {DBUS_ERROR_ACCESS_DENIED, nullptr, "the bus does not allow it to this user, run it as root"},
 };
 
-const char* adviceFor(const std::string& errorName) {
+const char* adviceFor(const std::string& errorName, const std::string& reason) {
     for (const Advice& advice : advices) {
-        if (errorName == advice.error)
+        if (errorName == advice.error && (!advice.reason || reason == advice.reason))
             return advice.text;
     }
-    return nullptr;
+    return "see what happens meanwhile with: kesbt monitor";
 }
 
-/// The daemon ends some of its texts with a line break, and libdbus's are long.
-std::string firstSentence(std::string text) {
-    text = text.substr(0, text.find('\n'));
+/// "hci0" of an adapter's path and of those below it; "" of any other.
+std::string adapterIn(const std::string& path) {
+    const std::string name = lastComponent(path.substr(0, path.find("/dev_")));
+    return name.rfind("hci", 0) == 0 ? name : "";
+}
+
+std::string withAdapter(std::string advice, const std::string& adapter) {
+    constexpr char mark[] = "{kesbt}";
+    const std::size_t place = advice.find(mark);
+    if (place != std::string::npos)
+        advice.replace(place, sizeof mark - 1, adapter.empty() ? "kesbt" : kesbtOn(adapter));
+    return advice;
+}
+
+/// The line that says most: of a traceback the last one, which names the exception, of other texts
+/// the first one. The daemon ends some of its texts with a line break.
+std::string tellingLine(const std::string& text) {
+    std::istringstream lines(text);
+    std::string telling;
+    for (std::string line; std::getline(lines, line);) {
+        if (line.find_first_not_of(" \t\r") == std::string::npos)
+            continue;
+        const bool isFirst = telling.empty();
+        telling = line;
+        if (isFirst && line.rfind("Traceback", 0) != 0)
+            break;
+    }
+    return telling;
+}
+
+/// libdbus's texts are long.
+std::string firstSentence(const std::string& text) {
     return printable(text.substr(0, text.find(". ")));
 }
 
@@ -79,7 +122,24 @@ Failure adapterRemoved(const std::string& adapter) {
 }
 
 Failure adapterOff(const std::string& adapter) {
-    return Failure(adapter + " was switched off; switch it on: kesbt adapter set Powered true");
+    return Failure(adapter + " is off; switch it on: " + kesbtOn(adapter) +
+                   " adapter set Powered true");
+}
+
+Failure unknownDevice(const std::string& adapter, const std::string& address) {
+    const std::string kesbt = kesbtOn(adapter);
+    return Failure(adapter + " does not know " + address + "; see what it knows: " + kesbt +
+                   " devices, or make it known: " + kesbt + " create " + address);
+}
+
+Failure notOffered(const std::string& adapter, const std::string& address,
+                   const std::string& what) {
+    return Failure(address + " has no " + what + "; see what it has: " + kesbtOn(adapter) +
+                   " services " + address);
+}
+
+std::string kesbtOn(const std::string& adapter) {
+    return "kesbt --adapter " + adapter;
 }
 
 Failure refusal(const std::string& what, Bluetooth::RemoteObject& proxy) {
@@ -92,21 +152,25 @@ Failure refusal(const std::string& what, Bluetooth::RemoteObject& proxy) {
                                    "install that, ") +
                        trySimulation);
     return Bluetooth::BluezObject::hasBluetoothd()
-               ? refusal(what, proxy.getErrorName(), proxy.getErrorMessage())
+               ? refusal(what, proxy.getErrorName(), proxy.getErrorMessage(),
+                         adapterIn(proxy.getPath()))
                : daemonAbsent();
 }
 
-Failure refusal(const std::string& what, const std::string& errorName, const std::string& reason) {
-    const char* advice = adviceFor(errorName);
-    std::string line = what;
-    if (!reason.empty())
-        line += ": " + firstSentence(reason);
-    return Failure(line + "; " +
-                   (advice ? advice : "see what happens meanwhile with: kesbt monitor"));
+Failure refusal(const std::string& what, const std::string& errorName, const std::string& text,
+                const std::string& adapter) {
+    const std::string reason = tellingLine(text);
+    return Failure(what + ": " + (reason.empty() ? printable(errorName) : firstSentence(reason)) +
+                   "; " + withAdapter(adviceFor(errorName, reason), adapter));
 }
 
 bool failedWith(const Bluetooth::RemoteObject& proxy, const char* error) {
     return proxy.getErrorName() == std::string(KESBT_BLUEZ_ERROR) + error;
+}
+
+bool hasTimedOut(const Bluetooth::RemoteObject& proxy) {
+    return proxy.getErrorName() == std::string(DBUS_ERROR_NO_REPLY) &&
+           Bluetooth::BluezObject::hasBluetoothd();
 }
 
 bool lacksObject(const Bluetooth::RemoteObject& proxy) {

@@ -24,7 +24,7 @@ AudioDevice openAudio(const Options& options, const std::string& address) {
     if (!opened.audio)
         throw daemonLost();
     if (readOptional(*opened.audio).is_null())
-        throw Failure(address + " has no audio; see what it has: kesbt services " + address);
+        throw notOffered(adapterName(*opened.device), address, "audio");
     return opened;
 }
 

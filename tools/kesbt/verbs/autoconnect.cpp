@@ -112,7 +112,8 @@ void removeDevice(const Options& options, const std::string& device) {
         auto& devices = now.devices;
         const auto kept = std::remove_if(devices.begin(), devices.end(), isMeantAs(device));
         if (kept == devices.end())
-            throw Failure(device + " is not in the list; see what is: kesbt autoconnect show");
+            throw Failure(device + " is not in the list; see what is: " + kesbtOn(list.adapter()) +
+                          " autoconnect show");
         devices.erase(kept, devices.end());
     });
     show(options, list);

@@ -46,7 +46,7 @@ void subscribe(Bluetooth::Manager& manager, Bluetooth::Adapter& adapter) {
 }
 
 /// Prints until the user interrupts or the deadline comes. A Failure when the discovery ends.
-void watch(const Options& options, const Bluetooth::Adapter& adapter, BusFeed& daemon,
+void watch(const Options& options, Bluetooth::Adapter& adapter, BusFeed& daemon,
            Interrupt& interrupt, Clock::time_point deadline) {
     DeviceWatch devices(options.json);
     while (!interrupt.came() && Clock::now() < deadline) {
@@ -58,7 +58,7 @@ void watch(const Options& options, const Bluetooth::Adapter& adapter, BusFeed& d
             else if (event->kind == Event::Kind::Removed && event->subject == adapter.getPath())
                 throw adapterRemoved(adapterName(adapter));
             else if (event->kind == Event::Kind::Powered && event->value == false)
-                throw adapterOff(adapterName(adapter));
+                throw adapterLost(adapter);
         }
         for (BusSignal signal; daemon.next(signal);) {
             if (BusFeed::isDaemonGone(signal))

@@ -19,7 +19,12 @@ Failure failure(const std::string& address, int reason) {
     std::string line = "cannot get the name of " + address;
     if (reason == EPERM || reason == EACCES)
         return Failure(line + ": " + std::strerror(reason) + "; run it as root");
-    if (reason == ENODEV || reason == EAFNOSUPPORT)
+    if (reason == EAFNOSUPPORT || reason == EPROTONOSUPPORT)
+        return Failure(line +
+                       ": this kernel has no Bluetooth; load it as root (modprobe bluetooth), "
+                       "or ask bluetoothd: kesbt device " +
+                       address);
+    if (reason == ENODEV)
         return Failure(line + ": no adapter is on; switch one on: kesbt adapter set Powered true");
     if (reason != 0)
         line += std::string(": ") + std::strerror(reason);

@@ -34,11 +34,10 @@ void changeVolume(const Options& options, const std::string& address, bool up) {
     if (!control)
         throw daemonLost();
     if (readOptional(*control).is_null())
-        throw Failure(address + " has no remote control; see what it has: kesbt services " +
-                      address);
+        throw notOffered(adapterName(*device), address, "remote control");
     if (!awaitConnection(options, *control))
-        throw Failure("the remote control of " + address +
-                      " is not connected; connect it first: kesbt audio connect " + address);
+        throw Failure("the remote control of " + address + " is not connected; connect it first: " +
+                      kesbtOn(adapterName(*device)) + " audio connect " + address);
 
     // The volume itself is not told by the daemon: its answer is all that there is to check.
     const char* direction = up ? "up" : "down";

@@ -5,23 +5,39 @@
 #include "verbs/list.h"
 #include "wait/waiting.h"
 
+#include <algorithm>
 #include <iostream>
 
 namespace Kesbt {
 
 namespace {
 
-/// What is waited for. A state is looked at first and after each signal of the daemon.
+/// What is waited for. Whether it is so is looked at first and after each signal that concerns it:
+/// a daemon may send many others.
 struct Awaited {
     const char* name;    ///< e.g. "paired"
     std::string subject; ///< an address or an adapter
     std::function<bool()> isReached;
-    std::function<void(const BusSignal&)> observe = [](const BusSignal&) {};
+    std::function<bool(const BusSignal&)> isConcerned;
 };
 
+bool begins(const Json& arguments, const Json& first) {
+    return !arguments.empty() && arguments[0] == first;
+}
+
+bool isChange(const BusSignal& signal, const std::string& path, const char* property) {
+    return signal.path == path && signal.member == "PropertyChanged" &&
+           begins(signal.arguments, property);
+}
+
+/// Where the daemon has or will have the device.
+std::string devicePath(const Bluetooth::Adapter& adapter, std::string address) {
+    std::replace(address.begin(), address.end(), ':', '_');
+    return std::string(adapter.getPath()) + "/dev_" + address;
+}
+
 bool isRemoval(const BusSignal& signal, const Bluetooth::Adapter& adapter) {
-    return signal.member == "AdapterRemoved" && !signal.arguments.empty() &&
-           signal.arguments[0] == adapter.getPath();
+    return signal.member == "AdapterRemoved" && begins(signal.arguments, adapter.getPath());
 }
 
 void await(const Options& options, BusFeed& feed, const Bluetooth::Adapter& adapter,
@@ -29,7 +45,8 @@ void await(const Options& options, BusFeed& feed, const Bluetooth::Adapter& adap
     Interrupt interrupt;
     const auto deadline = options.limit.end();
     bool isTold = false;
-    while (!goal.isReached()) {
+    bool isToBeRead = true;
+    while (!isToBeRead || !goal.isReached()) {
         if (!isTold)
             printHint("Waiting until " + goal.subject + " is " + goal.name + " (Ctrl-C ends it)");
         isTold = true;
@@ -39,12 +56,13 @@ void await(const Options& options, BusFeed& feed, const Bluetooth::Adapter& adap
         if (Clock::now() >= deadline)
             throw notConfirmed(goal.subject + " was not " + goal.name);
         waitForInput({feed.fd(), interrupt.fd()}, deadline);
+        isToBeRead = false;
         for (BusSignal signal; feed.next(signal);) {
             if (BusFeed::isDaemonGone(signal))
                 throw daemonLost();
             if (isRemoval(signal, adapter))
                 throw adapterRemoved(adapterName(adapter));
-            goal.observe(signal);
+            isToBeRead = goal.isConcerned(signal) || isToBeRead;
         }
     }
     if (options.json)
@@ -57,18 +75,17 @@ void awaitFound(const Options& options, const std::string& address) {
     BusFeed feed(BusFeed::Signals::All);
     const auto adapter = openAdapter(options);
     bool isFound = false;
-    Awaited goal = {"found", address, [&isFound] { return isFound; }};
-    goal.observe = [&](const BusSignal& signal) {
-        if (signal.path != adapter->getPath())
-            return;
-        if (signal.member == "PropertyChanged" && signal.arguments == Json{"Powered", false})
-            throw adapterOff(adapterName(*adapter));
-        isFound = isFound || (signal.member == "DeviceFound" && !signal.arguments.empty() &&
-                              signal.arguments[0] == address);
+    const std::string path = adapter->getPath();
+    const auto isConcerned = [&](const BusSignal& signal) {
+        if (isChange(signal, path, "Powered") && signal.arguments == Json{"Powered", false})
+            throw adapterLost(*adapter);
+        isFound = isFound || (signal.path == path && signal.member == "DeviceFound" &&
+                              begins(signal.arguments, address));
+        return isFound;
     };
     ask(options, "cannot start a discovery on " + adapterName(*adapter), *adapter,
         "StartDiscovery"); // it ends with this process
-    await(options, feed, *adapter, goal);
+    await(options, feed, *adapter, {"found", address, [&isFound] { return isFound; }, isConcerned});
 }
 
 void awaitDevice(const Options& options, const std::string& address, const char* name,
@@ -79,14 +96,22 @@ void awaitDevice(const Options& options, const std::string& address, const char*
         const Json properties = readIfKnown(*adapter, address);
         return properties.is_object() && properties.value(property, false);
     };
-    await(options, feed, *adapter, {name, address, isSo});
+    const std::string path = devicePath(*adapter, address); // it need not be known yet
+    const auto isConcerned = [&](const BusSignal& signal) {
+        return isChange(signal, path, property) ||
+               (signal.member == "DeviceCreated" && begins(signal.arguments, path));
+    };
+    await(options, feed, *adapter, {name, address, isSo, isConcerned});
 }
 
 void awaitPower(const Options& options) {
     BusFeed feed(BusFeed::Signals::All);
     const auto adapter = openAdapter(options);
     const auto isOn = [&] { return readProperties(*adapter).value("Powered", false); };
-    await(options, feed, *adapter, {"powered", adapterName(*adapter), isOn});
+    const auto isConcerned = [&](const BusSignal& signal) {
+        return isChange(signal, adapter->getPath(), "Powered");
+    };
+    await(options, feed, *adapter, {"powered", adapterName(*adapter), isOn, isConcerned});
 }
 
 void awaitConnected(const Options& options, const std::string& address) {

@@ -19,7 +19,10 @@ constexpr std::chrono::seconds progressInterval{5};
 } // namespace
 
 Watchdog::Watchdog(const TimeLimit& limit, Task task)
-    : m_task(std::move(task)), m_deadline(limit.end()), m_thread([this] { watch(); }) {}
+    : m_task(std::move(task)),
+      m_deadline(limit.end()),
+      m_canBeLonger(limit.canBeLonger()),
+      m_thread([this] { watch(); }) {}
 
 Watchdog::~Watchdog() {
     m_hasEnded = true;
@@ -97,7 +100,8 @@ std::string Watchdog::message(Reason reason) const {
         return "the question was not answered in time; repeat the command and answer, or give a "
                "longer --timeout";
     return "time is over while " + m_task.name +
-           "; make sure that the device is on and within reach, or give a longer --timeout";
+           "; make sure that the device is on and within reach" +
+           (m_canBeLonger ? ", or give a longer --timeout" : "");
 }
 
 } // namespace Kesbt

@@ -44,6 +44,7 @@ private:
     const Task m_task;
     const Clock::time_point m_begin = Clock::now();
     const Clock::time_point m_deadline;
+    const bool m_canBeLonger;
     Interrupt m_interrupt;
     Wakeup m_ended;
     std::atomic<bool> m_hasEnded{false};
