@@ -1,7 +1,10 @@
 // SPDX-License-Identifier: LGPL-2.1-or-later
 #include "kesbt/kesbt_test.h"
 
+#include <bluetooth/audio_sink.h>
+
 #include <csignal>
+#include <filesystem>
 
 namespace Bluetooth::Test {
 
@@ -98,6 +101,47 @@ TEST_F(DeviceVerbs, APropertyIsSetAndReadBack) {
     failure("device", 2);
 }
 
+TEST_F(DeviceVerbs, ADeviceIsConnectedAndDisconnected) {
+    EXPECT_EQ(json("input connect "s + knownMouse)["input"]["Connected"], true);
+    EXPECT_EQ(json("device "s + knownMouse)["properties"]["Connected"], true);
+    EXPECT_EQ(run("disconnect "s + knownMouse).out,
+              "00:11:22:33:44:06 is disconnected from hci0\n");
+    EXPECT_EQ(json("device "s + knownMouse)["properties"]["Connected"], false);
+    EXPECT_EQ(run("disconnect "s + knownMouse).status, 0); // it is so already
+    EXPECT_EQ(calls("Disconnect"), 1U);
+    run("create "s + phone);
+    EXPECT_EQ(
+        failure("network connect "s + phone),
+        "cannot connect the network of 00:11:22:33:44:03: this bluetoothd takes no service for "
+        "it, as that of BlueZ 4.101; use another version of BlueZ 4\n");
+}
+
+TEST_F(DeviceVerbs, ASerialPortIsHeldUntilItsProgramEnds) {
+    const std::string receiver = pinReceiver;
+    run("create " + receiver);
+    auto serial = start("serial connect " + receiver);
+    const std::string terminal = serial->readLine();
+    EXPECT_TRUE(std::filesystem::exists(terminal)) << terminal;
+    EXPECT_EQ(failure("serial disconnect " + receiver + " " + terminal),
+              "cannot disconnect " + terminal +
+                  ": Operation Not Authorized; only the program that began it can do this\n");
+    serial->signal(SIGINT);
+    EXPECT_EQ(errorsOf(*serial, 0), "");
+    EXPECT_FALSE(std::filesystem::exists(terminal));
+    EXPECT_EQ(failure("serial connect " + receiver + " dun"),
+              receiver + " has no \"dun\"; see what it has: kesbt --adapter hci0 services " +
+                  receiver + "\n");
+    EXPECT_EQ(failure("serial connect "s + knownMouse).substr(0, 33),
+              "00:11:22:33:44:06 has no serial p");
+
+    serial = start("serial connect " + receiver);
+    serial->readLine();
+    simulation.control("DropLink", with("hci0", pinReceiver));
+    EXPECT_EQ(errorsOf(*serial), receiver +
+                                     " has ended the connection; make sure that it is within "
+                                     "reach and repeat the command\n");
+}
+
 TEST_F(DeviceVerbs, AudioIsConnectedShownAndDisconnected) {
     run("create "s + headset);
     const std::string seeMouse =
@@ -112,6 +156,25 @@ TEST_F(DeviceVerbs, AudioIsConnectedShownAndDisconnected) {
     const Json connected = json("audio connect "s + headset);
     EXPECT_EQ(connected["audio"]["State"], "connected");
     EXPECT_EQ(run("audio connect "s + headset).status, 0); // it is so already
+    EXPECT_NE(failure("headset play "s + headset).find("set SCORouting=PCM in"), std::string::npos);
+
+    // Connected by the headset alone: the sink is missing.
+    const std::string path = json("device "s + headset)["path"];
+    const auto dropSink = [&] {
+        AudioSink(path.c_str()).disconnect();
+        while (json("audio status "s + headset)["sink"]["Connected"] == true) {
+        }
+        EXPECT_EQ(json("audio status "s + headset)["audio"]["State"], "connected");
+    };
+    dropSink();
+    EXPECT_EQ(json("audio connect "s + headset)["sink"]["Connected"], true);
+    dropSink();
+    simulation.failNext("org.bluez.AudioSink", "Connect", "org.bluez.Error.Failed",
+                        "Stream setup failed");
+    EXPECT_NE(failure("audio connect "s + headset)
+                  .find("cannot connect the sink of 00:11:22:33:44:01: Stream setup failed; "),
+              std::string::npos);
+    run("audio connect "s + headset);
     EXPECT_EQ(run("volume down "s + headset).out, "Volume down sent to 00:11:22:33:44:01\n");
     awaitCall("VolumeDown");
     EXPECT_EQ(json("audio disconnect "s + headset)["audio"]["State"], "disconnected");

@@ -41,9 +41,9 @@ void expectSuccess(const std::string& example) {
     run((has(" (create|pair|paired) ") ? "remove "s : "create "s) + newDevice);
     if (has(" paired "))
         run("pair "s + newDevice);
-    if (has(" (volume|connected) "))
+    if (has(" (volume|connected|headset) "))
         run("audio connect "s + newDevice);
-    const bool isStream = has(" (monitor|agent|discover|scan watch)");
+    const bool isStream = has(" (monitor|agent|discover|scan watch|serial connect)");
     ChildProcess shell({"sh", "-c", (isStream ? "exec " : "") + example},
                        ChildProcess::Output::Capture);
     if (isStream) {
@@ -55,8 +55,9 @@ void expectSuccess(const std::string& example) {
 }
 
 TEST_F(Promises, TheExamplesInTheHelpWork) {
-    simulation.control("AddDevice", with(newDevice, Settings{{"Behaviour", "JustWorks"},
-                                                             {"UUIDs", "110b;110c;110e"}}));
+    simulation.control("AddDevice",
+                       with(newDevice, Settings{{"Behaviour", "JustWorks"},
+                                                {"UUIDs", "1101;1108;110b;110c;110e;1124"}}));
     Texts verbs = linesOf("kesbt --help | sed -nE 's/^  ([a-z][a-z-]*)  +[A-Z].*/\\1/p'");
     EXPECT_GT(verbs.size(), 15U);
     verbs.insert(verbs.end(), {"adapter set", "device set"});
@@ -64,8 +65,8 @@ TEST_F(Promises, TheExamplesInTheHelpWork) {
         const Texts examples =
             linesOf("kesbt " + verb + " --help | sed -n '/^Examples:/,/^$/s/^  //p'");
         EXPECT_FALSE(examples.empty()) << verb;
-        if (verb == "name" || verb == "restart-daemon" || verb == "cancel")
-            continue; // they need hardware, or something that another program does
+        if (verb == "name" || verb == "restart-daemon" || verb == "cancel" || verb == "network")
+            continue; // they need hardware, another daemon, or what another program does
         for (const std::string& example : examples)
             expectSuccess(example);
     }
@@ -73,7 +74,8 @@ TEST_F(Promises, TheExamplesInTheHelpWork) {
 
 /// The members of a document and their types, as the documentation writes them.
 std::string shape(const Json& value, const std::string& member = "") {
-    static const std::set<std::string> ofDaemon = {"properties", "audio", "sink", "control"};
+    static const std::set<std::string> ofDaemon = {"properties", "audio",   "sink", "control",
+                                                   "headset",    "network", "input"};
     if (ofDaemon.count(member) != 0 && value.is_object())
         return "{…}";
     if (member == "old" || member == "new")
@@ -165,6 +167,12 @@ TEST_F(Promises, JsonHasTheDocumentedMembers) {
     const std::string receiver = std::string(" ") + pinReceiver;
     document.expect({"device" + mouse, "create" + device, "pair" + receiver + " --pin 1234"});
     run("audio connect "s + headset);
+    const std::string headsets = "`headset status`, `headset play`, `headset stop`";
+    for (const char* verb : {"status", "stop"})
+        document.expect(headsets, json("headset "s + verb + device));
+    const std::string held = " connect` | `connected`, `disconnected`";
+    const auto serial = start("serial connect --json" + receiver);
+    document.expectEvent("`serial" + held, *serial, "connected");
     run("autoconnect add "s + knownMouse);
     for (const Texts& commands :
          {Texts{"names"},
@@ -178,6 +186,8 @@ TEST_F(Promises, JsonHasTheDocumentedMembers) {
           {"volume up" + device, "volume down" + device},
           {"wait found" + device, "wait connected" + device, "wait paired" + mouse, "wait powered"},
           {"audio connect" + device, "audio status" + device, "audio disconnect" + device},
+          {"disconnect" + mouse},
+          {"input connect" + mouse, "input disconnect" + mouse},
           {"remove" + device},
           {"autoconnect show", "autoconnect disable", "autoconnect enable",
            "autoconnect add" + device, "autoconnect remove" + device},
@@ -191,6 +201,18 @@ TEST_F(Promises, JsonHasTheDocumentedMembers) {
     willing.reply("DefaultAdapter", with(Path{"/org/bluez/1/hci0"}));
     willing.reply("CancelDeviceCreation");
     document.expect({"cancel" + device});
+    willing.reply("FindDevice", with(Path{"/org/bluez/1/hci0/dev_1"}));
+    willing.reply("GetProperties", [](Writer& w) {
+        w.dict("sv", [](Writer& d) { d.entry("Connected", Var{false}); });
+    });
+    willing.reply("Connect", with("bnep0"));
+    willing.reply("Disconnect");
+    const auto network = start("network connect --json" + device);
+    document.expectEvent("`network" + held, *network, "connected");
+    network->signal(SIGINT);
+    document.expectEvent("`network" + held, *network, "disconnected");
+    document.expect({"network disconnect" + device});
+    document.expect("`serial disconnect`", json("serial disconnect" + device + " /dev/rfcomm0"));
     EXPECT_EQ(document.unmet(), 2U) << "but for name and restart-daemon, all rows are shown";
 }
 

@@ -1,48 +1,48 @@
 // SPDX-License-Identifier: LGPL-2.1-or-later
-#include "daemon/objects.h"
+#include "daemon/profile.h"
 #include "verbs/list.h"
-#include "wait/waiting.h"
 
 #include <bluetooth/audio.h>
 #include <bluetooth/audio_sink.h>
 #include <bluetooth/control.h>
+#include <bluetooth/headset.h>
+
+#include <array>
 
 namespace Kesbt {
 
 namespace {
 
-/// A device's audio: all its profiles together.
-struct AudioDevice {
-    std::unique_ptr<Bluetooth::Device> device;
-    std::unique_ptr<Bluetooth::Audio> audio;
+using namespace std::string_literals;
+using Bluetooth::Audio;
+
+Profile<Audio> openAudio(const Options& options, const std::string& address) {
+    return {options, address, Audio::getAudio, "audio"};
+}
+
+/// The profiles that audio consists of. Null for one that the device does not have.
+struct Part {
+    const char* name;
+    std::unique_ptr<Bluetooth::BluezObject> proxy;
+    Json properties;
+
+    Part(const char* called, Bluetooth::BluezObject* created)
+        : name(called), proxy(made(created)), properties(readOptional(*proxy)) {}
 };
 
-AudioDevice openAudio(const Options& options, const std::string& address) {
-    AudioDevice opened;
-    opened.device = openDevice(options, address);
-    opened.audio.reset(Bluetooth::Audio::getAudio(opened.device->getPath()));
-    if (!opened.audio)
-        throw daemonLost();
-    if (readOptional(*opened.audio).is_null())
-        throw notOffered(adapterName(*opened.device), address, "audio");
-    return opened;
+std::array<Part, 3> partsOf(const Bluetooth::Device& device) {
+    const char* path = device.getPath();
+    return {Part("sink", Bluetooth::AudioSink::getAudioSink(path)),
+            Part("headset", Bluetooth::Headset::getHeadset(path)),
+            Part("control", Bluetooth::Control::getControl(path))};
 }
 
-template <class Proxy>
-Json readOptional(Proxy* created) {
-    const std::unique_ptr<Proxy> proxy(created);
-    if (!proxy)
-        throw daemonLost();
-    return Kesbt::readOptional(*proxy);
-}
-
-void printStatus(const Options& options, AudioDevice& device, const std::string& address) {
-    const char* path = device.device->getPath();
-    const Json document = {{"address", address},
-                           {"adapter", adapterName(*device.device)},
-                           {"audio", readProperties(*device.audio)},
-                           {"sink", readOptional(Bluetooth::AudioSink::getAudioSink(path))},
-                           {"control", readOptional(Bluetooth::Control::getControl(path))}};
+void printStatus(const Options& options, const Profile<Audio>& audio, const std::string& address) {
+    Json document = {{"address", address},
+                     {"adapter", adapterName(*audio.device)},
+                     {"audio", readProperties(*audio.proxy)}};
+    for (const Part& part : partsOf(*audio.device))
+        document[part.name] = part.properties;
     if (options.json) {
         printDocument(document);
         return;
@@ -50,36 +50,32 @@ void printStatus(const Options& options, AudioDevice& device, const std::string&
     const auto part = [&](const char* name) {
         return document[name].is_null() ? Json("none") : document[name];
     };
-    printProperties(
-        {{"Audio", part("audio")}, {"Sink", part("sink")}, {"Remote control", part("control")}});
-}
-
-void change(const Options& options, const std::string& address, bool connect) {
-    AudioDevice device = openAudio(options, address);
-    const auto isThere = [&] {
-        const std::string state = readProperties(*device.audio).value("State", "");
-        return connect ? state == "connected" || state == "playing" : state == "disconnected";
-    };
-    // The daemon refuses what is so already.
-    if (!isThere())
-        ask(options, std::string("cannot ") + (connect ? "connect " : "disconnect ") + address,
-            *device.audio, connect ? "Connect" : "Disconnect");
-    if (!waitUntil(isThere, options.limit.step()))
-        throw notConfirmed(address + " is not " + (connect ? "connected" : "disconnected"));
-    printStatus(options, device, address);
+    printProperties({{"Audio", part("audio")},
+                     {"Sink", part("sink")},
+                     {"Headset", part("headset")},
+                     {"Remote control", part("control")}});
 }
 
 void connect(const Options& options, const std::string& address) {
-    change(options, address, true);
+    const auto audio = openAudio(options, address);
+    setConnected(options, *audio.proxy, address, true);
+    // Audio counts as connected by any of its profiles alone. A remote control comes by itself,
+    // with the sink or some seconds later.
+    for (const Part& part : partsOf(*audio.device)) {
+        if (!part.properties.is_null() && part.name != std::string("control"))
+            setConnected(options, *part.proxy, "the "s + part.name + " of " + address, true);
+    }
+    printStatus(options, audio, address);
 }
 
 void disconnect(const Options& options, const std::string& address) {
-    change(options, address, false);
+    const auto audio = openAudio(options, address);
+    setConnected(options, *audio.proxy, address, false);
+    printStatus(options, audio, address);
 }
 
 void showStatus(const Options& options, const std::string& address) {
-    AudioDevice device = openAudio(options, address);
-    printStatus(options, device, address);
+    printStatus(options, openAudio(options, address), address);
 }
 
 } // namespace

@@ -17,12 +17,17 @@
     VERB(devices)                                                                                  \
     VERB(device)                                                                                   \
     VERB(create)                                                                                   \
+    VERB(disconnect)                                                                               \
     VERB(remove)                                                                                   \
     VERB(services)                                                                                 \
+    VERB(input)                                                                                    \
+    VERB(network)                                                                                  \
+    VERB(serial)                                                                                   \
     VERB(pair)                                                                                     \
     VERB(cancel)                                                                                   \
     VERB(agent)                                                                                    \
     VERB(audio)                                                                                    \
+    VERB(headset)                                                                                  \
     VERB(volume)                                                                                   \
     VERB(autoconnect)                                                                              \
     VERB(name)                                                                                     \
