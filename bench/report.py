@@ -128,7 +128,7 @@ def verdict(spread, limit):
 
 def goals(figures):
     """One row for each goal: the worst of all that it is for."""
-    one, every, both, usual = ("one",), ("all",), ("one", "all"), ("one", "plain", "all")
+    one, every, both, usual = ("one",), ("all",), ("one", "all"), tuple(PLACES)
     idle, loop, answers = [("idle-minute", "a minute")], [("stop/loop", "a loop")], "scanner/"
     many = [(answers + "found-4000", "64 clients, 4,000 devices")]
     entries = [(case, f"entries: {text}") for case, text in DECODING]

@@ -132,6 +132,8 @@ private:
                                 is("DisplayPinCode");
         if (!isQuestion)
             return handlerDispatcher(connection, message, static_cast<Agent*>(this));
+        if (m_open) // of another adapter; one dialog is open at a time
+            m_open->refuse();
         m_open = std::make_shared<Question>(connection, message);
         m_post([ask = m_ask, question = m_open] { ask(question); });
         if (m_open->isOnlyShown())
