@@ -5,6 +5,8 @@
 #include "wait/waiting.h"
 
 #include <iostream>
+#include <set>
+#include <string>
 
 namespace Kesbt {
 
@@ -23,16 +25,23 @@ void HeldConnection::hold(const Options& options, BusFeed& feed,
         flushOutput();
         printHint("Connected with " + address + " (Ctrl-C ends it)");
     }
+    const Json lost = {"Connected", false};
     while (!interrupt.came()) {
+        // The feed may still have the end of a connection before this one, and then its beginning.
+        std::set<std::string> ended;
         for (BusSignal signal; feed.next(signal);) {
             if (BusFeed::isDaemonGone(signal))
                 throw daemonLost();
-            if (signal.path == device.getPath() && signal.member == "PropertyChanged" &&
-                (signal.interface == interface || signal.interface == device.getInterface()) &&
-                signal.arguments == Json{"Connected", false})
-                throw Failure(address + " has ended the connection; make sure that it is within "
-                                        "reach and repeat the command");
+            if (signal.path != device.getPath() || signal.member != "PropertyChanged")
+                continue;
+            if (signal.arguments == lost)
+                ended.insert(signal.interface);
+            else if (signal.arguments == Json{"Connected", true})
+                ended.erase(signal.interface);
         }
+        if (ended.count(interface) + ended.count(device.getInterface()) > 0)
+            throw Failure(address + " has ended the connection; make sure that it is within "
+                                    "reach and repeat the command");
         waitForInput({feed.fd(), interrupt.fd()});
     }
 }
