@@ -44,7 +44,10 @@ void DevicePairing::begin() {
     if (m_outgoing)
         m_device.adapter().discovery().suspend();
     m_hold = m_device.link().hold();
-    m_device.link().connect([this](bool reached) {
+    m_running = std::make_shared<bool>();
+    m_device.link().connect([this, running = std::weak_ptr<void>(m_running)](bool reached) {
+        if (running.expired())
+            return;
         if (reached)
             negotiate();
         else
@@ -210,6 +213,7 @@ void DevicePairing::stopTimers() {
 }
 
 void DevicePairing::abandon() {
+    m_running.reset();
     stopTimers();
     m_hold.release();
 }

@@ -23,6 +23,8 @@ std::unique_ptr<PseudoTerminal> PseudoTerminal::make() {
     if (terminal < 0 || tcgetattr(terminal, &settings) != 0) {
         const int error = errno;
         close(device);
+        if (terminal >= 0)
+            close(terminal);
         errno = error;
         return nullptr;
     }

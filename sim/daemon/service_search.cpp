@@ -23,7 +23,10 @@ void ServiceSearch::begin() {
     if (m_kind == Kind::Create)
         m_device.adapter().discovery().suspend();
     m_hold = m_device.link().hold();
-    m_device.link().connect([this](bool reached) {
+    m_running = std::make_shared<bool>();
+    m_device.link().connect([this, running = std::weak_ptr<void>(m_running)](bool reached) {
+        if (running.expired())
+            return;
         if (reached)
             run();
         else
@@ -86,6 +89,7 @@ void ServiceSearch::ownerGone() {
 }
 
 void ServiceSearch::abandon() {
+    m_running.reset();
     m_timer.stop();
     m_hold.release();
 }
