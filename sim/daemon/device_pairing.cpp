@@ -94,8 +94,10 @@ void DevicePairing::ask(const char* member, const Value& arguments, const char* 
     if (m_agent->busy())
         return answered(false);
     m_timeout.start(times.pairingTimeout, [this] { fail(Errors::authenticationTimeout); });
+    m_asking = true;
     m_agent->ask(member, arguments, results, times.agentTimeout,
                  [this, onAnswer = std::move(onAnswer)](const CallResult& answer) {
+                     m_asking = false;
                      m_timeout.stop();
                      if (!m_cancelled)
                          onAnswer(answer);
@@ -226,7 +228,7 @@ void DevicePairing::end() {
 void DevicePairing::fail(const BusError& error) {
     const auto device = m_device.shared_from_this();
     const bool outgoing = m_outgoing;
-    if (m_agent && m_agent->busy())
+    if (m_agent && m_asking)
         m_agent->cancel();
     if (m_call)
         m_call->fail(error);
@@ -259,7 +261,7 @@ void DevicePairing::linkLost() {
     const auto agent = m_agent;
     const CallPtr creating = m_call;
     const bool outgoing = m_outgoing;
-    if (agent && agent->busy())
+    if (agent && m_asking)
         agent->cancel();
     end();
     removeFailed(device, outgoing);

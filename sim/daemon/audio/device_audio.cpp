@@ -90,6 +90,7 @@ AudioState DeviceAudio::headsetState() const {
 
 void DeviceAudio::enter(AudioState state) {
     if (state == AudioState::Disconnected) {
+        stopAsking();
         m_authorized = false;
         m_ending = false;
         m_shutdown.stop();
@@ -251,13 +252,21 @@ void DeviceAudio::authorize(const std::string& uuid, bool wanted,
     if (!agent || agent->busy())
         return done(false);
     const Times& times = m_device.adapter().daemon().times();
+    m_asking = true;
     agent->ask("Authorize", tuple(pathValue(m_device.path()), uuid), "", times.agentTimeout,
                [this, alive = m_device.weak_from_this(), done](const CallResult& answer) {
                    if (alive.expired())
                        return;
+                   m_asking = false;
                    m_authorized = !answer.failed;
                    done(!answer.failed);
                });
+}
+
+void DeviceAudio::stopAsking() {
+    ClientAgent* agent = m_device.adapter().agent();
+    if (std::exchange(m_asking, false) && agent)
+        agent->cancel();
 }
 
 template <class Action>
@@ -305,6 +314,7 @@ void DeviceAudio::linkLost() {
 }
 
 void DeviceAudio::allLost() {
+    stopAsking();
     m_lost.stop();
     m_sinkPause.stop();
     m_headsetPause.stop();

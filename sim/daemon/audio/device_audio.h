@@ -77,12 +77,15 @@ private:
     /// Closes the stream, or gives it up; sinkChanged() goes on from there.
     void shutDownSink();
     void allLost();
+    /// Nobody needs an answer any more: the agent is told.
+    void stopAsking();
 
     ServedDevice& m_device;
     bool m_served = false;
     AudioState m_state = AudioState::Disconnected;
     bool m_connectAll = true; ///< whether what connects brings the other profile along
     bool m_ending = false;
+    bool m_asking = false; ///< the agent
     bool m_authorized = false;
     CallPtr m_connect;    ///< Connect that waits
     CallPtr m_disconnect; ///< Disconnect that waits
