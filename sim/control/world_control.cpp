@@ -149,6 +149,8 @@ Value WorldControl::startIncomingPairing(const CallPtr& call) {
 Value WorldControl::connectService(const CallPtr& call) {
     const std::string uuid = uuidOf(call);
     const auto from = device(call);
+    if (!from->adapter().mode().powered())
+        throw std::runtime_error("the adapter is off");
     if (!from->services().peerConnects(uuid))
         from->audio().serviceConnects(uuid);
     return {};

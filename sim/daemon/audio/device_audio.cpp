@@ -279,15 +279,13 @@ void DeviceAudio::atService(const std::string& uuid, const Action& action) {
         action(*m_headset);
     else if (isVoice && m_gateway)
         action(*m_gateway);
-    else if (!isVoice && !isControl && (m_sink || m_source))
+    else if (isOneOf(uuid, {audioSource, audioSink, advancedAudio}) && (m_sink || m_source))
         action(m_sink ? *m_sink : *m_source);
     else
         throw std::runtime_error("the device has no such service");
 }
 
 void DeviceAudio::serviceConnects(const std::string& uuid) {
-    if (!m_device.adapter().mode().powered())
-        throw std::runtime_error("the adapter is off");
     atService(uuid, [&](auto& profile) { profile.peerConnects(uuid); });
 }
 
