@@ -7,12 +7,14 @@
 #include "daemon/served_adapter.h"
 #include "daemon/served_device.h"
 
+#include <algorithm>
+
 namespace Bluetooth::Sim {
 
-void Link::connect(OnPaged onPaged) {
+void Link::connect(const Hold& hold, OnPaged onPaged) {
     if (m_up)
         return onPaged(true);
-    m_waiting.push_back(std::move(onPaged));
+    m_waiting.push_back({&hold, std::move(onPaged)});
     if (!m_pager.running())
         page();
 }
@@ -33,8 +35,8 @@ void Link::paged(bool reached) {
         comeUp();
     const auto waiting = std::move(m_waiting);
     m_waiting.clear();
-    for (const OnPaged& onPaged : waiting)
-        onPaged(reached);
+    for (const Waiting& one : waiting)
+        one.onPaged(reached);
 }
 
 void Link::accept(bool stays) {
@@ -56,7 +58,12 @@ Link::Hold Link::hold() {
     return Hold(*this);
 }
 
-void Link::released(guint Times::*idle) {
+void Link::released(const Hold& hold, guint Times::*idle) {
+    const auto left = std::remove_if(m_waiting.begin(), m_waiting.end(),
+                                     [&](const Waiting& one) { return one.hold == &hold; });
+    m_waiting.erase(left, m_waiting.end());
+    if (m_waiting.empty())
+        m_pager.stop(); // nobody wants it any more
     if (--m_holds != 0 || m_heldByPeer || !m_up)
         return;
     const Times& times = m_device.adapter().daemon().times();
@@ -76,6 +83,13 @@ void Link::drop() {
         call->reply();
     m_device.changed("Connected", false);
     m_device.linkLost();
+}
+
+void Link::powerLost() {
+    if (m_up)
+        return drop();
+    m_pager.stop();
+    paged(false);
 }
 
 void Link::requestDisconnect(const CallPtr& call) {

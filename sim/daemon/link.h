@@ -35,7 +35,7 @@ public:
         /// @param idle  how long the link stays when this was its last use
         void release(guint Times::*idle = &Times::idleDisconnect) {
             if (Link* link = std::exchange(m_link, nullptr))
-                link->released(idle);
+                link->released(*this, idle);
         }
 
     private:
@@ -47,29 +47,38 @@ public:
     bool up() const { return m_up; }
 
     /// Reaches the device, at once when it is connected already.
-    void connect(OnPaged onPaged);
+    /// @param hold  the caller's, which stays where it is; with its release the caller waits no
+    /// longer
+    void connect(const Hold& hold, OnPaged onPaged);
     /// The device has connected to us.
     /// @param stays  whether it keeps the link for itself
     void accept(bool stays);
     Hold hold();
     /// Disconnects now, and says so.
     void drop();
+    /// The adapter goes off: drops the link, or gives up reaching the device.
+    void powerLost();
     /// Announces the end of the link, waits, answers the call if there is one, and disconnects.
     void requestDisconnect(const CallPtr& call);
     /// Forgets everything without a word; the device has gone.
     void abandon();
 
 private:
+    struct Waiting {
+        const Hold* hold;
+        OnPaged onPaged;
+    };
+
     void page();
     void paged(bool reached);
     void comeUp();
-    void released(guint Times::*idle);
+    void released(const Hold& hold, guint Times::*idle);
 
     ServedDevice& m_device;
     bool m_up = false;
     bool m_heldByPeer = false;
     unsigned m_holds = 0;
-    std::vector<OnPaged> m_waiting;
+    std::vector<Waiting> m_waiting;
     std::vector<CallPtr> m_disconnects;
     OneShotTimer m_pager;
     OneShotTimer m_idle;

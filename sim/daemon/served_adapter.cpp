@@ -68,9 +68,7 @@ void ServedAdapter::loseDevices() {
     for (const auto& device : devices) {
         if (device->pairing())
             device->pairing()->powerLost();
-        else if (device->search() && !device->link().up())
-            device->search()->notReached();
-        device->link().drop();
+        device->link().powerLost();
     }
 }
 

@@ -24,7 +24,7 @@ void ServiceSearch::begin() {
         m_device.adapter().discovery().suspend();
     m_hold = m_device.link().hold();
     m_running = std::make_shared<bool>();
-    m_device.link().connect([this, running = std::weak_ptr<void>(m_running)](bool reached) {
+    m_device.link().connect(m_hold, [this, running = std::weak_ptr<void>(m_running)](bool reached) {
         if (running.expired())
             return;
         if (reached)

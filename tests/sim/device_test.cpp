@@ -139,19 +139,25 @@ TEST_F(DeviceTest, ServicesAreFoundByAnyFormOfTheirClass) {
 TEST_F(DeviceTest, ASearchCanBeCancelledByItsCaller) {
     create();
     const Question search("Device.DiscoverServices", "");
+    const std::string canceled = "answer DiscoverServices error Failed: Operation canceled";
     EXPECT_EQ(call("Device.CancelDiscovery"), unknownDevice);
     setTime("ServiceSearch", "60000000");
     start(search);
     EXPECT_EQ(call(search), "error InProgress: In Progress");
-    EXPECT_EQ(trace("Device.CancelDiscovery"),
-              lines("answer DiscoverServices error Failed: Operation canceled",
-                    "answer CancelDiscovery"));
+    EXPECT_EQ(trace("Device.CancelDiscovery"), lines(canceled, "answer CancelDiscovery"));
+    control({"DropLink", "hci0", newDevice}); // and before the link is up, which then stays down
+    taken();
+    setTime("Connect", "60000000");
     start(search);
+    EXPECT_EQ(trace("Device.CancelDiscovery").front(), canceled);
+    setTime("Connect", "600");
+    start(search);
+    until("device Connected=b:1");
     EXPECT_EQ(call({"Adapter.RemoveDevice", device}),
               "error DoesNotExist: Device creation in progress");
-    EXPECT_EQ(trace("Device.Disconnect", "device Connected"),
-              lines("answer DiscoverServices error Failed: Operation canceled",
-                    "device DisconnectRequested", "answer Disconnect", "device Connected=b:0"));
+    EXPECT_EQ(
+        trace("Device.Disconnect", "device Connected"),
+        lines(canceled, "device DisconnectRequested", "answer Disconnect", "device Connected=b:0"));
     start(search);
     until("device Connected=b:1");
     control({"DropLink", "hci0", newDevice});

@@ -55,9 +55,9 @@ void AudioProfile::reach(const std::function<void()>& reached,
             reached();
     });
     Link& link = m_audio.device().link();
-    m_hold = link.hold();
-    ++m_paging;
-    link.connect([this, end](bool up) {
+    if (m_paging++ == 0)
+        m_hold = link.hold();
+    link.connect(m_hold, [this, end](bool up) {
         --m_paging;
         end(up);
         if (disconnected())
