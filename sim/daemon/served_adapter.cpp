@@ -311,7 +311,7 @@ void ServedAdapter::removeDevice(const CallPtr& call) {
     if (found == m_devices.end())
         return call->fail(Errors::doesNotExist);
     const auto device = *found;
-    if (device->temporary() || device->busy())
+    if (device->temporary() || device->pairing() || device->busy())
         return call->fail(BluezError{"DoesNotExist", "Device creation in progress"});
     if (!device->link().up()) {
         forgetDevice(device);

@@ -84,7 +84,7 @@ void ServiceSearch::ownerGone() {
     if (isCreating())
         device->setTemporary(true);
     end();
-    if (device->temporary() && !device->link().up())
+    if (device->temporary() && !device->link().up() && !device->pairing())
         device->adapter().forgetDevice(device);
 }
 
