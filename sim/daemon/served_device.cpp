@@ -257,7 +257,7 @@ void ServedDevice::learnId(const PeerDevice& peer) {
         if (value.value_or(0) == known.value_or(0))
             return;
         known = value;
-        changed(name, *known);
+        changed(name, value.value_or(0));
     };
     learn("Vendor", m_stored.vendor, peer.vendor);
     learn("Product", m_stored.product, peer.product);
