@@ -40,7 +40,7 @@ std::string systemBusAddress() {
 }
 
 /// Where the reading thread leaves calls. `connection` is used on the main loop only, and null once
-/// the it is gone; calls that are still under way are dropped then.
+/// it is gone; calls that are still under way are dropped then.
 struct BusConnection::Inbox {
     BusConnection* connection;
     CallHandler onCall;
