@@ -70,8 +70,11 @@ void serve(DBusConnection* connection, ShownAgent& agent, BusFeed& daemon, Inter
     while (!interrupt.came()) {
         int fd = -1;
         dbus_connection_get_unix_fd(connection, &fd);
+        // What came with the answer to a call waits in the queue, where no descriptor tells of it.
+        const bool isQueued =
+            dbus_connection_get_dispatch_status(connection) == DBUS_DISPATCH_DATA_REMAINS;
         waitForInput({fd, daemon.fd(), interrupt.fd(), questions.wakeFd(), questions.inputFd()},
-                     questions.due());
+                     isQueued ? Clock::now() : questions.due());
         answerRequests(connection);
         questions.attend();
         const bool hasGone = hasDaemonGone(daemon);
