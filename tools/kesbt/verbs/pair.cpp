@@ -38,11 +38,15 @@ std::unique_ptr<Bluetooth::Device> createPaired(const Options& options, Bluetoot
     Watchdog::Task task = creationTask(adapter, address, "pairing with");
     task.showsProgress = true;
     task.questions = &agent.questions();
-    const Watchdog watchdog(options.limit, std::move(task));
-    std::unique_ptr<Bluetooth::Device> device(adapter.createPairedDevice(address.c_str(), agent));
+    std::unique_ptr<Bluetooth::Device> device;
+    { // whose thread gives the answers of the person, and tells about them
+        const Watchdog watchdog(options.limit, std::move(task));
+        device.reset(adapter.createPairedDevice(address.c_str(), agent));
+        if (!device)
+            watchdog.throwIfCancelled();
+    }
     if (device)
         return device;
-    watchdog.throwIfCancelled();
     if (!requests.advice.empty())
         throw Failure(what + ": " + requests.advice);
     if (requests.isRefused)
