@@ -237,6 +237,9 @@ TEST_F(Promises, AFailureSaysWhatHelps) {
                       "sure that it is on and within reach"},
         {"CreateDevice", failed, "Operation already in progress", creating,
          notCreated + "Operation already in progress; wait until it is done, then try again"},
+        {"CreateDevice", failed, "connect: No route to host (113)", creating,
+         notCreated + "connect: No route to host (113); the adapter is off, switch it on: kesbt "
+                      "--adapter hci0 adapter set Powered true"},
         {"CreateDevice", "org.bluez.Error.ConnectionAttemptFailed", "Already Exists", creating,
          notCreated + "Already Exists; make sure that the device is on and within reach"},
         {"CreateDevice", "org.freedesktop.DBus.Python.ValueError",

@@ -19,7 +19,7 @@ constexpr char trySimulation[] = "or try: bluez4-sim -- kesbt adapters";
 /// What the daemon's and the bus's errors mean for the user.
 struct Advice {
     const char* error;  // its name
-    const char* reason; // its text, where that makes a difference; null for any
+    const char* reason; // what stands in its text, where that makes a difference; null for any
     const char* text;   // {kesbt} stands for the program with the adapter that was asked
 };
 
@@ -62,7 +62,8 @@ constexpr Advice advices[] = {
 
 const char* adviceFor(const std::string& errorName, const std::string& reason) {
     for (const Advice& advice : advices) {
-        if (errorName == advice.error && (!advice.reason || reason == advice.reason))
+        if (errorName == advice.error &&
+            (!advice.reason || reason.find(advice.reason) != std::string::npos))
             return advice.text;
     }
     return "see what happens meanwhile with: kesbt monitor";
