@@ -131,6 +131,9 @@ TEST_F(DeviceVerbs, ASerialPortIsHeldUntilItsProgramEnds) {
     EXPECT_EQ(failure("serial connect " + receiver + " dun"),
               receiver + " has no \"dun\"; see what it has: kesbt --adapter hci0 services " +
                   receiver + "\n");
+    EXPECT_EQ(failure("serial disconnect " + receiver + " /dev/none"),
+              "\"/dev/none\" is no terminal of " + receiver +
+                  "; kesbt serial connect tells it when it connects one\n");
     EXPECT_EQ(failure("serial connect "s + knownMouse).substr(0, 33),
               "00:11:22:33:44:06 has no serial p");
 

@@ -15,23 +15,26 @@ namespace {
 using Bluetooth::Serial;
 
 /// Asks the serial ports of a device, which it may not have. They have no properties.
+/// @param unknown the Failure's text where there is no such port
 void askPorts(const Options& options, const std::string& what, Serial& ports,
-              const std::string& address, const char* method, const std::string& argument) {
+              const std::string& address, const char* method, const std::string& argument,
+              const std::string& unknown) {
     try {
         ask(options, what, ports, method, argument.c_str());
     } catch (const Failure&) {
         if (lacksObject(ports))
             throw notOffered(adapterName(ports), address, "serial port");
         if (failedWith(ports, "DoesNotExist"))
-            throw Failure(address + " has no " + quoted(argument) + "; see what it has: " +
-                          kesbtOn(adapterName(ports)) + " services " + address);
+            throw Failure(unknown);
         throw;
     }
 }
 
 void release(const Options& options, const std::string& address, Serial& ports,
              const std::string& terminal) {
-    askPorts(options, "cannot disconnect " + terminal, ports, address, "Disconnect", terminal);
+    askPorts(options, "cannot disconnect " + terminal, ports, address, "Disconnect", terminal,
+             quoted(terminal) + " is no terminal of " + address +
+                 "; kesbt serial connect tells it when it connects one");
 }
 
 void connect(const Options& options, const std::string& address, const std::string& service) {
@@ -39,7 +42,9 @@ void connect(const Options& options, const std::string& address, const std::stri
     const auto device = openDevice(options, address);
     const auto ports = made(Serial::getSerial(device->getPath()));
     askPorts(options, "cannot connect a serial port of " + address, *ports, address, "Connect",
-             service);
+             service,
+             address + " has no " + quoted(service) +
+                 "; see what it has: " + kesbtOn(adapterName(*ports)) + " services " + address);
     std::string terminal;
     ports->getReplyValue(terminal);
     const HeldConnection held = {address, "terminal", terminal, ports->getInterface()};
