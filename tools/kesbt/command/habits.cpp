@@ -19,6 +19,7 @@ struct Habit {
 constexpr Habit habits[] = {
     {"agent on", "agent"},
     {"alias", "device set ADDRESS Alias NAME"},
+    {"audio headset", "headset"},
     {"autoconnect off", "autoconnect disable"},
     {"autoconnect on", "autoconnect enable"},
     {"block", "device set ADDRESS Blocked true"},
@@ -43,6 +44,7 @@ constexpr Habit habits[] = {
     {"set", "adapter set NAME VALUE"},
     {"show", "adapter"},
     {"status", "audio status ADDRESS"},
+    {"status headset", "headset status ADDRESS"}, // typed as "audio headset status"
     {"trust", "device set ADDRESS Trusted true"},
     {"unblock", "device set ADDRESS Blocked false"},
     {"unpair", "remove ADDRESS"},

@@ -36,6 +36,9 @@ std::string unknownWord(const std::vector<std::string>& rest, const CLI::App& pr
     else
         what = quoted(word) + " is too much";
     std::string meant = habitMeant(&chosen == &program ? "" : chosen.get_name(), rest);
+    const CLI::Option* adapter = program.get_option("--adapter");
+    if (!meant.empty() && adapter->count() != 0)
+        meant.insert(meant.find(' '), " --adapter " + adapter->results().front());
     if (meant.empty())
         meant = nearest(word.substr(0, word.find('=')), words(program, chosen));
     return meant.empty() ? what : what + " (did you mean " + meant + "?)";
