@@ -36,11 +36,13 @@ std::string reasonOf(const DBusError& error) {
     }
     const std::string text = error.message;
     std::string reason = shownText(text.substr(0, std::min(text.find('\n'), longestText)));
+    if (reason.empty())
+        reason = error.name;
     for (const auto& [name, advice] : advices) {
         if (dbus_error_has_name(&error, name))
             reason.append("; ").append(advice);
     }
-    return reason.empty() ? error.name : reason;
+    return reason;
 }
 
 } // namespace
