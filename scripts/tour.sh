@@ -9,7 +9,11 @@ case "${1:-}" in
 '')
     enter=(unshare --mount)
     [ "$(id -u)" -eq 0 ] || enter=(unshare --user --map-root-user --mount)
-    "${enter[@]}" true 2>/dev/null && exec "${enter[@]}" "$0" isolated
+    # A container may have the namespace and not the mounts.
+    "${enter[@]}" sh -ec 'mount -t tmpfs tmpfs /run
+        mkdir /run/upper /run/work
+        mount -t overlay overlay -o lowerdir=/etc,upperdir=/run/upper,workdir=/run/work /etc' 2>/dev/null &&
+        exec "${enter[@]}" "$0" isolated
     echo "Without namespaces: no HCI versions, and no auto-connect, which writes to /etc."
     ;;
 isolated) # The simulated adapters' hciconfig stands in /usr/bin, and /etc can be written.
