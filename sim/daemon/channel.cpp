@@ -15,9 +15,7 @@ void Channel::open(const Target& target, OnEnd onEnd) {
     m_hold = m_device.link().hold();
     if (!m_device.adapter().mode().powered())
         return end(target.off);
-    m_device.link().connect(m_hold, [this, target, attempt = ++m_attempt](bool up) {
-        if (!opening() || attempt != m_attempt)
-            return;
+    m_device.link().connect(m_hold, [this, target](bool up) {
         if (up)
             reached(target);
         else

@@ -48,7 +48,6 @@ private:
 
     ServedDevice& m_device;
     State m_state = State::Closed;
-    unsigned m_attempt = 0; ///< tells a late answer to an attempt that was given up
     Link::Hold m_hold;
     OneShotTimer m_timer;
     OnEnd m_onEnd;

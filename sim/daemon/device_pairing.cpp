@@ -44,10 +44,7 @@ void DevicePairing::begin() {
     if (m_outgoing)
         m_device.adapter().discovery().suspend();
     m_hold = m_device.link().hold();
-    m_running = std::make_shared<bool>();
-    m_device.link().connect(m_hold, [this, running = std::weak_ptr<void>(m_running)](bool reached) {
-        if (running.expired())
-            return;
+    m_device.link().connect(m_hold, [this](bool reached) {
         if (reached)
             negotiate();
         else
@@ -215,7 +212,6 @@ void DevicePairing::stopTimers() {
 }
 
 void DevicePairing::abandon() {
-    m_running.reset();
     stopTimers();
     m_hold.release();
 }

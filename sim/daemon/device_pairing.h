@@ -70,8 +70,7 @@ private:
     std::shared_ptr<ClientAgent> m_agent;
     bool m_outgoing;
     bool m_cancelled = false;
-    bool m_asking = false;           ///< the agent, which may be busy with something else
-    std::shared_ptr<void> m_running; ///< null once it has ended: the link may answer later
+    bool m_asking = false; ///< the agent, which may be busy with something else
     Link::Hold m_hold;
     OneShotTimer m_timer;
     OneShotTimer m_timeout;

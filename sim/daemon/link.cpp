@@ -7,8 +7,6 @@
 #include "daemon/served_adapter.h"
 #include "daemon/served_device.h"
 
-#include <algorithm>
-
 namespace Bluetooth::Sim {
 
 void Link::connect(const Hold& hold, OnPaged onPaged) {
@@ -33,10 +31,13 @@ void Link::page() {
 void Link::paged(bool reached) {
     if (reached)
         comeUp();
-    const auto waiting = std::move(m_waiting);
-    m_waiting.clear();
-    for (const Waiting& one : waiting)
-        one.onPaged(reached);
+    // What one of them does may let another wait no longer, or anew.
+    m_answered.splice(m_answered.end(), m_waiting);
+    while (!m_answered.empty()) {
+        const OnPaged onPaged = std::move(m_answered.front().onPaged);
+        m_answered.pop_front();
+        onPaged(reached);
+    }
 }
 
 void Link::accept(bool stays) {
@@ -59,9 +60,8 @@ Link::Hold Link::hold() {
 }
 
 void Link::released(const Hold& hold, guint Times::*idle) {
-    const auto left = std::remove_if(m_waiting.begin(), m_waiting.end(),
-                                     [&](const Waiting& one) { return one.hold == &hold; });
-    m_waiting.erase(left, m_waiting.end());
+    for (std::list<Waiting>* all : {&m_waiting, &m_answered})
+        all->remove_if([&](const Waiting& one) { return one.hold == &hold; });
     if (m_waiting.empty())
         m_pager.stop(); // nobody wants it any more
     if (--m_holds != 0 || m_heldByPeer || !m_up)
@@ -108,6 +108,7 @@ void Link::requestDisconnect(const CallPtr& call) {
 void Link::abandon() {
     m_up = false;
     m_waiting.clear();
+    m_answered.clear();
     m_disconnects.clear();
     m_pager.stop();
     m_idle.stop();

@@ -8,6 +8,7 @@
 #include "world/times.h"
 
 #include <functional>
+#include <list>
 #include <utility>
 #include <vector>
 
@@ -47,8 +48,7 @@ public:
     bool up() const { return m_up; }
 
     /// Reaches the device, at once when it is connected already.
-    /// @param hold  the caller's, which stays where it is; with its release the caller waits no
-    /// longer
+    /// @param hold  the caller's; it stays where it is, and its release ends the waiting
     void connect(const Hold& hold, OnPaged onPaged);
     /// The device has connected to us.
     /// @param stays  whether it keeps the link for itself
@@ -78,7 +78,8 @@ private:
     bool m_up = false;
     bool m_heldByPeer = false;
     unsigned m_holds = 0;
-    std::vector<Waiting> m_waiting;
+    std::list<Waiting> m_waiting;
+    std::list<Waiting> m_answered; ///< those whose turn it is, once the device was reached or not
     std::vector<CallPtr> m_disconnects;
     OneShotTimer m_pager;
     OneShotTimer m_idle;

@@ -23,10 +23,7 @@ void ServiceSearch::begin() {
     if (m_kind == Kind::Create)
         m_device.adapter().discovery().suspend();
     m_hold = m_device.link().hold();
-    m_running = std::make_shared<bool>();
-    m_device.link().connect(m_hold, [this, running = std::weak_ptr<void>(m_running)](bool reached) {
-        if (running.expired())
-            return;
+    m_device.link().connect(m_hold, [this](bool reached) {
         if (reached)
             run();
         else
@@ -57,7 +54,7 @@ void ServiceSearch::notReached() {
         m_call->fail(Errors::failed("Host is down"));
     const auto device = m_device.shared_from_this();
     end();
-    if (device->temporary())
+    if (device->temporary() && !device->pairing()) // whose own failure comes next
         device->adapter().forgetDevice(device);
 }
 
@@ -89,7 +86,6 @@ void ServiceSearch::ownerGone() {
 }
 
 void ServiceSearch::abandon() {
-    m_running.reset();
     m_timer.stop();
     m_hold.release();
 }

@@ -7,7 +7,6 @@
 #include "serving/bus/call.h"
 #include "serving/bus/one_shot_timer.h"
 
-#include <memory>
 #include <string>
 
 namespace Bluetooth::Sim {
@@ -48,7 +47,6 @@ private:
     CallPtr m_call;
     Kind m_kind;
     std::string m_uuid;
-    std::shared_ptr<void> m_running; ///< null once it has ended: the link may answer later
     Link::Hold m_hold;
     OneShotTimer m_timer;
 };

@@ -208,6 +208,15 @@ TEST_F(SimPairingTest, ACreationAndAPairingShareTheLink) {
     until("answer DiscoverServices a(e(u:65536");
     control("ClearFaults");
     EXPECT_EQ(taken(), Texts{});
+    forgetDevice();
+
+    // Nobody there: both are told.
+    control({"SetDevice", newDevice, Settings{{"Connectable", "false"}}});
+    start({"Adapter.CreateDevice", newDevice});
+    startPairing();
+    until("answer CreateDevice error Failed: Host is down");
+    EXPECT_EQ(until(removed[1]),
+              lines(failed + "ConnectionAttemptFailed: Page Timeout", "agent Release") + removed);
 }
 
 TEST_F(SimPairingTest, PowerOffCancels) {
