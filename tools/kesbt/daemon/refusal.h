@@ -17,8 +17,8 @@ Failure daemonAbsent();
 /// The daemon was there when the verb began.
 Failure daemonLost();
 
-/// What the daemon answered, with advice where there is any for the error's name. Its text, which is
-/// the daemon's and may be another one tomorrow, makes advice more exact where it is known.
+/// What the daemon answered, with advice where there is any for the error's name. Its text, which
+/// is the daemon's and may be another one tomorrow, makes advice more exact where it is known.
 /// @param what what was not possible, e.g. "cannot start a discovery on hci0"
 Failure refusal(const std::string& what, Bluetooth::RemoteObject& proxy);
 /// @param adapter which one the advice is for; "" where it is for none
