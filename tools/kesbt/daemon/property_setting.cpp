@@ -79,7 +79,7 @@ const Bluetooth::DictEntry* findProperty(const Bluetooth::Dict& all, const std::
 
 /// Where an alias is emptied the daemon shows the name in its place.
 bool hasTaken(const Json& now, const Json& wanted, const Json& old, const Json& name) {
-    return now == wanted || (wanted == "" && (now != old || now == name));
+    return now == wanted || (display(wanted).empty() && (now != old || now == name));
 }
 
 } // namespace

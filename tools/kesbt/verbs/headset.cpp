@@ -18,21 +18,21 @@ void showStatus(const Options& options, const std::string& address) {
     openHeadset(options, address).print(options, address, "headset");
 }
 
-template <bool playing>
+template <bool Playing>
 void change(const Options& options, const std::string& address) {
     const auto headset = openHeadset(options, address);
     const Json before = readProperties(*headset.proxy);
-    if (playing && !before.value("Connected", false))
+    if (Playing && !before.value("Connected", false))
         throw Failure("the headset " + address + " is not connected; connect it first: " +
                       kesbtOn(adapterName(*headset.device)) + " audio connect " + address);
     const auto isDone = [&] {
-        return readProperties(*headset.proxy).value("Playing", false) == playing;
+        return readProperties(*headset.proxy).value("Playing", false) == Playing;
     };
     const std::string what =
-        std::string("cannot ") + (playing ? "open" : "close") + " the sound of " + address;
+        std::string("cannot ") + (Playing ? "open" : "close") + " the sound of " + address;
     try {
         if (!isDone())
-            ask(options, what, *headset.proxy, playing ? "Play" : "Stop");
+            ask(options, what, *headset.proxy, Playing ? "Play" : "Stop");
     } catch (const Failure&) {
         if (!failedWith(*headset.proxy, "NotAvailable"))
             throw;
@@ -40,7 +40,7 @@ void change(const Options& options, const std::string& address) {
                              "/etc/bluetooth/audio.conf and restart bluetoothd");
     }
     if (!waitUntil(isDone, options.limit.step()))
-        throw notConfirmed("the sound of " + address + " is not " + (playing ? "open" : "closed"));
+        throw notConfirmed("the sound of " + address + " is not " + (Playing ? "open" : "closed"));
     headset.print(options, address, "headset");
 }
 

@@ -8,11 +8,11 @@ namespace Kesbt {
 
 namespace {
 
-template <bool connected>
+template <bool Connected>
 void change(const Options& options, const std::string& address) {
     using Bluetooth::Input;
     const Profile<Input> input(options, address, Input::getInput, "keyboard, mouse or buttons");
-    setConnected(options, *input.proxy, address, connected);
+    setConnected(options, *input.proxy, address, Connected);
     input.print(options, address, "input");
 }
 
