@@ -17,8 +17,8 @@ namespace Bluetooth {
 /// time-out (25 s). An operation that returns proxies then also asks the bus whether the daemon is
 /// still there, for each of them.
 ///
-/// OTHER METHODS. A method of BlueZ without an operation here is called in steps, with any time-out,
-/// and so is one whose success matters. An interface without a class needs a BluezObject of its own:
+/// OTHER METHODS. A method of BlueZ without an operation here is called in steps, with any
+/// time-out, and so is one whose success matters. Without a class, an interface has a BluezObject:
 /// @code
 ///     BluezObject service(adapter->getPath(), "org.bluez.Service");
 ///     unsigned int handle = 0;

@@ -32,11 +32,11 @@ namespace Bluetooth {
 ///         std::cerr << bus.getErrorMessage() << '\n';
 /// @endcode
 ///
-/// TYPES. append() sends the D-Bus types b, s, o, u, q, and v of b, s, u or q. getReplyValue() reads
-/// s, o, b, u, q, ay, as, ao, and dictionaries with keys s or u and values s, or v of s, o, b, u, q,
-/// n, as or ao. A value of any other type makes the whole dictionary unreadable (error 4). What else
-/// there is, such as file descriptors, arguments a{sv} and second values of a reply, is libdbus's
-/// own, on the connection of the proxy (getConnection()).
+/// TYPES. append() sends the D-Bus types b, s, o, u, q, and v of b, s, u or q. getReplyValue()
+/// reads s, o, b, u, q, ay, as, ao, and dictionaries with keys s or u and values s, or v of s, o,
+/// b, u, q, n, as or ao. A value of any other type makes the whole dictionary unreadable (error 4).
+/// What else there is, such as file descriptors, arguments a{sv} and second values of a reply, is
+/// libdbus's own, on the connection of the proxy (getConnection()).
 ///
 /// ERRORS. Operations that return int return 0 for success and -1 for failure, and record an error
 /// number and message in the proxy. An error stays until resetError(): no success clears it.
