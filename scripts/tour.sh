@@ -71,7 +71,7 @@ start() {
 sink_connected() {
     local try
     for try in {1..50}; do
-        kesbt audio status "$headset" | grep -q 'Sink *State=connected' && return
+        kesbt audio status "$headset" | grep -q '^Sink .*State=connected' && return
         sleep 0.2
     done
     return 1
