@@ -365,7 +365,7 @@ peer, the bus or the library.
 
 {table(["library", "one processor", "all processors"], most)}
 In a burst of calls the receive thread looks every millisecond whether the burst is over, so that no
-call has to wake it; a signal wakes it at once. A string beside an idle receive thread takes 0.89 of
+call has to wake it; a signal wakes it at once. A string beside an idle receive thread takes 0.90 of
 the time that it would take if each call woke the thread, on all processors 0.73 (30 repetitions,
 measured by hand).
 
@@ -419,15 +419,17 @@ OBSTACLES = """What stands in the way where a goal is missed:
   woken goes to the end of the queue: in three signals that were traced the receive thread waited 21
   to 35 microseconds for its turn. The receive thread leading always, waiting inside libdbus and
   `dbus_watch_handle` were tried, and cost the calls more than they gave the signals.
-- Signals while nobody calls, and a call against sdbus-c++: raw libdbus is behind sdbus-c++ too.
+- Signals while nobody calls, and a call against sdbus-c++: raw libdbus is behind sdbus-c++
+  in most of these rows too.
 - A list of 100: the bus daemon is busy most of the time that a list takes (below), and has to
-  answer each question; on all processors it also wakes the reader for each answer. Letting the
-  reader sleep between answers was tried and gained nothing.
+  answer each question; on all processors that alone is more than 0.3 of the time one by one.
+  Letting the reader sleep between answers was tried once and gained nothing.
 - `kesbt adapters`: it makes eight calls, one after the other, where `gdbus call` makes two; at 0.1 ms
-  each on all processors that is what it takes longer.
-- An answer with 1,000 known devices: two thirds of it are the simulated daemon's and the bus's.
+  each on all processors that is most of what it takes longer.
+- An answer with 1,000 known devices: the service works a third of that time (below); the rest is
+  the client's, the bus's and the simulated daemon's.
 - The scanner service's processor time: of an answer of 4,000 devices 11% is spent in this library
-  (perf), the rest in libdbus (38%, half of it checking UTF-8), in dbus-glib and GLib (16%), and in
+  (perf), the rest in libdbus (38%, nearly half of it checking UTF-8), in dbus-glib and GLib (16%), and in
   the C library for both; an answer has to go through dbus-glib.
 """
 

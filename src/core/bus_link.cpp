@@ -522,7 +522,7 @@ void BusLink::receive(Deliver deliver, void* context) {
 void BusLink::receiveMore(Lock& lock, Milliseconds limit) {
     const auto sinceCall = Clock::now() - m_lastCall;
     if (m_reading || !m_waiters.empty() || sinceCall < callBurst) {
-        // In a burst of calls nobody has to wake this thread, which would take an eighth to a third
+        // In a burst of calls nobody has to wake this thread, which would take a tenth to a third
         // of each call's time: it looks again soon enough.
         m_receiverParked = sinceCall >= 2 * callBurst;
         m_receiverWake.wait_for(lock, m_receiverParked ? limit : callBurst);
