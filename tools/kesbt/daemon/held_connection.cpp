@@ -50,4 +50,12 @@ void HeldConnection::printEnd(const Options& options) const {
     print(options, "disconnected");
 }
 
+std::string connectedName(Bluetooth::RemoteObject& proxy, const std::string& address) {
+    std::string name;
+    if (proxy.getReplyValue(name) != 0 || name.empty())
+        throw Failure("bluetoothd does not name what it connected of " + address +
+                      "; restart it and repeat the command");
+    return name;
+}
+
 } // namespace Kesbt

@@ -25,6 +25,9 @@ private:
     void print(const Options& options, const char* event) const;
 };
 
+/// Reads the name of what was just connected. A Failure when the reply has none.
+std::string connectedName(Bluetooth::RemoteObject& proxy, const std::string& address);
+
 } // namespace Kesbt
 
 #endif

@@ -27,9 +27,7 @@ std::string connectNetwork(const Options& options, const std::string& address, N
         throw Failure(what + ": this bluetoothd takes no service for it, as that of BlueZ 4.101; "
                              "use another version of BlueZ 4");
     }
-    std::string interface;
-    network.getReplyValue(interface);
-    return interface;
+    return connectedName(network, address);
 }
 
 void connect(const Options& options, const std::string& address, const std::string& service) {

@@ -45,8 +45,7 @@ void connect(const Options& options, const std::string& address, const std::stri
              service,
              address + " has no " + quoted(service) +
                  "; see what it has: " + kesbtOn(adapterName(*ports)) + " services " + address);
-    std::string terminal;
-    ports->getReplyValue(terminal);
+    const std::string terminal = connectedName(*ports, address);
     const HeldConnection held = {address, "terminal", terminal, ports->getInterface()};
     held.hold(options, feed, *device);
     release(options, address, *ports, terminal);
